@@ -1,0 +1,42 @@
+# Settings that every target of ours shares, and the small functions that declare them.
+
+add_library(mirabel_settings INTERFACE)
+target_include_directories(mirabel_settings INTERFACE ${CMAKE_SOURCE_DIR}/src)
+target_compile_options(mirabel_settings INTERFACE -Wall -Wextra -Wpedantic -Wshadow -Wconversion
+                                                  -Wno-sign-conversion -Wnon-virtual-dtor)
+if(MIRABEL_WERROR)
+  target_compile_options(mirabel_settings INTERFACE -Werror)
+endif()
+if(MIRABEL_SANITIZE)
+  target_compile_options(mirabel_settings INTERFACE -fsanitize=${MIRABEL_SANITIZE}
+                                                    -fno-omit-frame-pointer
+                                                    -fno-sanitize-recover=all)
+  target_link_options(mirabel_settings INTERFACE -fsanitize=${MIRABEL_SANITIZE})
+endif()
+if(CMAKE_BUILD_TYPE STREQUAL "Debug" OR CMAKE_BUILD_TYPE STREQUAL "RelWithDebInfo")
+  # Standard-library preconditions are checked wherever people develop.
+  target_compile_definitions(mirabel_settings INTERFACE _GLIBCXX_ASSERTIONS)
+endif()
+
+# One folder of src/ as a library of objects. The folders that it may import are named after
+# LINKS, so that an import up the list of layers does not even link.
+function(mirabel_layer name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;LINKS;SYSTEM" ${ARGN})
+  add_library(mirabel_${name} STATIC ${ARG_SOURCES})
+  target_link_libraries(mirabel_${name} PUBLIC mirabel_settings Threads::Threads)
+  foreach(link IN LISTS ARG_LINKS)
+    target_link_libraries(mirabel_${name} PUBLIC mirabel_${link})
+  endforeach()
+  target_link_libraries(mirabel_${name} PRIVATE ${ARG_SYSTEM})
+endfunction()
+
+# One folder of tests/ as one test program, whose cases ctest sees one by one.
+function(mirabel_tests name)
+  cmake_parse_arguments(ARG "" "" "SOURCES;LINKS;LABELS" ${ARGN})
+  add_executable(${name} ${ARG_SOURCES})
+  target_include_directories(${name} PRIVATE ${CMAKE_SOURCE_DIR}/tests)
+  target_link_libraries(${name} PRIVATE mirabel_settings ${ARG_LINKS} GTest::gmock GTest::gtest
+                                        GTest::gtest_main)
+  gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
+                       PROPERTIES TIMEOUT 300 LABELS "${ARG_LABELS}")
+endfunction()

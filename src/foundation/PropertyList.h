@@ -1,0 +1,59 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <variant>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "foundation/Values.h"
+
+namespace mirabel {
+
+/// One value of a property list: a boolean, a number, a date, bytes, text (UTF-8), an array or a
+/// dictionary with text keys in the order in which they were added.
+class PropertyList {
+ public:
+  using Array = std::vector<PropertyList>;
+  using Dictionary = std::vector<std::pair<std::string, PropertyList>>;
+  using Value = std::variant<bool, Number, Date, Data, std::string, Array, Dictionary>;
+
+  /// Bounds on what `decode` accepts. An object is counted each time it is referred to, so that
+  /// small input cannot unfold into large values.
+  struct Limits {
+    std::size_t depth = 64;
+    std::size_t objects = 1'000'000;
+    std::size_t bytes = 64u << 20;  ///< payload bytes of all values together
+  };
+
+  PropertyList() : value_(false) {}
+  PropertyList(Value value) : value_(std::move(value)) {}
+
+  [[nodiscard]] const Value& value() const { return value_; }
+  template <class T>
+  [[nodiscard]] const T* as() const {
+    return std::get_if<T>(&value_);
+  }
+  /// The dictionary's entry; null when this is no dictionary or has no such key.
+  [[nodiscard]] const PropertyList* find(std::string_view key) const;
+
+  /// The binary form ("bplist00"). Errors: text that is not UTF-8, a date outside the range.
+  [[nodiscard]] Result<Data> encode() const;
+  /// Reads any well-formed binary property list whose values are of the types above. Strict:
+  /// every offset is checked, cycles and duplicate keys are refused, and work is bounded by
+  /// `limits` whatever the bytes claim.
+  [[nodiscard]] static Result<PropertyList> decode(std::span<const std::uint8_t> bytes,
+                                                   const Limits& limits);
+  [[nodiscard]] static Result<PropertyList> decode(std::span<const std::uint8_t> bytes);
+
+  friend bool operator==(const PropertyList&, const PropertyList&) = default;
+
+ private:
+  Value value_;
+};
+
+}  // namespace mirabel

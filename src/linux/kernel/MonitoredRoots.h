@@ -1,0 +1,51 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "linux/kernel/UniqueFd.h"
+
+namespace mirabel::linux_ {
+
+/// The folders that are presented, open for the life of the process. Everything below them is
+/// reached through their descriptors, without following a symbolic link and without crossing onto
+/// another mount, so that nothing put in the way can lead out of the tree. Paths may be of any
+/// length. Immutable once made; any thread may call it.
+class MonitoredRoots {
+ public:
+  /// Paths are absolute and resolved. One that does not exist is kept and is simply empty.
+  explicit MonitoredRoots(std::vector<std::string> paths);
+
+  struct Place {
+    std::size_t root;
+    std::string_view relative;  ///< below the root, without a leading "/"; empty for the root
+  };
+  /// The root that holds `path`, by whole components; nothing for a path outside.
+  [[nodiscard]] std::optional<Place> locate(std::string_view path) const;
+
+  [[nodiscard]] const std::vector<std::string>& paths() const { return paths_; }
+  [[nodiscard]] int descriptor(std::size_t root) const;
+
+  /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
+  /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its
+  /// final link not followed. POSIX errors: ELOOP for a symbolic link on the way, EXDEV for
+  /// another mount, ENOENT.
+  [[nodiscard]] Result<UniqueFd> open(const std::string& path, int flags) const;
+
+ private:
+  std::vector<std::string> paths_;
+  std::vector<std::shared_ptr<UniqueFd>> descriptors_;
+};
+
+/// The parent of an absolute path, and its last component.
+struct SplitPath {
+  std::string parent;
+  std::string name;
+};
+[[nodiscard]] SplitPath splitPath(const std::string& path);
+
+}  // namespace mirabel::linux_

@@ -1,0 +1,45 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "foundation/Error.h"
+#include "foundation/ResourceValues.h"
+
+namespace mirabel::linux_ {
+
+/// What one statx tells of an object. Times are nanoseconds since 1970 in UTC where they are used
+/// to tell objects apart, so that comparing them is one comparison; far dates saturate.
+struct ObjectStatus {
+  std::uint64_t inode = 0;
+  std::uint64_t device = 0;  ///< makedev number of the file system (of the subvolume on btrfs)
+  FileKind kind = FileKind::other;
+  std::uint16_t mode = 0;
+  std::uint32_t owner = 0;
+  std::uint32_t linkCount = 0;
+  std::uint64_t size = 0;
+  std::uint64_t attributes = 0;  ///< STATX_ATTR_… bits that are set
+  bool hasBirthTime = false;
+  std::int64_t birthTime = 0;
+  std::int64_t changeTime = 0;
+  std::int64_t modificationTime = 0;
+};
+
+/// Looks at `name` in the folder `directory`; an empty name looks at the descriptor itself. A
+/// final symbolic link is not followed, nothing is opened, no automount is set off. POSIX errors.
+[[nodiscard]] Result<ObjectStatus> statusAt(int directory, const std::string& name);
+/// The same for an absolute path of any length, also beyond PATH_MAX.
+[[nodiscard]] Result<ObjectStatus> statusOf(const std::string& path);
+
+/// The kernel's handle of an object: bytes that name it among all objects, of now and of before,
+/// on its file system. Starts with the handle's type. Nothing where the file system has none.
+[[nodiscard]] std::optional<std::string> handleAt(int directory, const std::string& name);
+
+/// Nanoseconds since 1970 on the clock that stamps files.
+[[nodiscard]] std::int64_t coarseNow();
+
+Date dateFromNanoseconds(std::int64_t nanoseconds);
+
+}  // namespace mirabel::linux_

@@ -1,0 +1,71 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "foundation/Error.h"
+#include "foundation/Values.h"
+#include "linux/kernel/MonitoredRoots.h"
+#include "linux/kernel/ObjectStatus.h"
+
+namespace mirabel::linux_ {
+
+/// A name seen in a folder, and the identity that the index gives to what it names.
+struct Sighting {
+  std::string name;
+  ObjectStatus status;
+  bool isPackage = false;
+  std::uint64_t fileID = 0;      ///< answered
+  std::uint32_t documentID = 0;  ///< answered; 0 for what is no document
+};
+
+/// The lasting identities of one volume: which object has which file ID, which document has which
+/// document ID, and where they were last seen. Kept in the database "volume.db" of the volume's
+/// state folder; one process owns it at a time. Thread-safe. Whatever an operation has answered
+/// is on disk.
+class VolumeIndex {
+ public:
+  struct Options {
+    /// The state folder of the program; the volume's own folder is made below it.
+    std::string stateFolder;
+    /// Whether a folder of that name is a package; asked for names met while searching.
+    std::function<bool(std::string_view name)> isPackageName;
+    /// How long to wait for another process that owns the volume.
+    std::chrono::milliseconds timeout{30'000};
+    /// Told once when it has to wait, and when a damaged database was set aside.
+    std::function<void(std::string_view)> notice;
+  };
+
+  /// Opens or makes the index of the volume that holds the first root. Errors: POSIX EBUSY when
+  /// another process owned it to the end of the timeout; EPERM for a state folder that is a
+  /// symbolic link or belongs to somebody else; other POSIX errors; `ErrorDomain::store`.
+  [[nodiscard]] static Result<std::unique_ptr<VolumeIndex>> open(const MonitoredRoots& roots,
+                                                                 Options options);
+  virtual ~VolumeIndex() = default;
+
+  /// Gives identities to names seen in the folder that is open as `folder` (O_PATH will do) and
+  /// lies at `folderPath`. What it had not seen it learns; document IDs are allocated at once.
+  [[nodiscard]] virtual Result<void> learn(const std::string& folderPath, int folder,
+                                           std::span<Sighting> sightings) = 0;
+  /// The same for one object by path: a root, something below one, or outside them all.
+  [[nodiscard]] virtual Result<Sighting> learnPath(const std::string& path,
+                                                   const ObjectStatus& status,
+                                                   bool isPackage) = 0;
+
+  /// Checked against the disk; looks further when the object is not where it was. ENOENT.
+  [[nodiscard]] virtual Result<std::string> pathOfFileID(std::uint64_t fileID) = 0;
+  /// ENOENT when no object holds the document.
+  [[nodiscard]] virtual Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) = 0;
+
+  [[nodiscard]] virtual UUID historyUUID() const = 0;
+  /// The volume's number as the system sees it; never 0.
+  [[nodiscard]] virtual std::uint32_t device() const = 0;
+};
+
+}  // namespace mirabel::linux_

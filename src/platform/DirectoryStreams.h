@@ -1,0 +1,39 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string_view>
+
+#include "foundation/Error.h"
+#include "foundation/ResourceValues.h"
+#include "foundation/URL.h"
+
+namespace mirabel {
+
+/// One name in a folder. The name is valid until the next call on the stream.
+struct DirectoryEntry {
+  std::string_view name;
+  FileKind kind = FileKind::other;
+};
+
+/// The names of one folder in the file system's own order, "." and ".." among them. Used by one
+/// thread at a time.
+class DirectoryStream {
+ public:
+  virtual ~DirectoryStream() = default;
+  /// Nothing at the end; a read error ends the stream too.
+  [[nodiscard]] virtual std::optional<DirectoryEntry> next() = 0;
+  /// POSIX errors. The destructor closes silently when this was not called.
+  [[nodiscard]] virtual Result<void> close() = 0;
+};
+
+/// Opens folders for reading. Any thread may call it.
+class DirectoryStreams {
+ public:
+  virtual ~DirectoryStreams() = default;
+  /// A symbolic link below a monitored folder is not followed (POSIX error ELOOP or ENOTDIR), and
+  /// neither is the mount point of another file system entered (EXDEV).
+  [[nodiscard]] virtual Result<std::unique_ptr<DirectoryStream>> open(const URL& folder) = 0;
+};
+
+}  // namespace mirabel
