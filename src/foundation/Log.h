@@ -1,6 +1,7 @@
 #pragma once
 
 #include <atomic>
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -17,9 +18,15 @@ class LogSink {
                      std::string_view line) = 0;
 };
 
+/// What builds a message when it is asked to: a callable whose answer reads as text.
+template <class Build>
+concept MessageBuilder = requires(Build& build) {
+  std::string_view(build());
+};
+
 /// The process's one log handle: subsystem "com.norvane.Vessel", category "mirabel". Lines below
 /// the threshold cost one relaxed load. Until a sink is set, lines at error level go to standard
-/// error and the others nowhere.
+/// error and the others nowhere. Any thread; usable until the process is gone.
 class Log {
  public:
   static Log& shared();
@@ -33,6 +40,11 @@ class Log {
 
   /// The line as it stands, without a level word.
   void plain(LogLevel level, std::string_view line);
+  /// The same for a line that costs something to build.
+  template <MessageBuilder Build>
+  void plain(LogLevel level, Build&& build) {
+    if (isEnabled(level)) plain(level, std::string_view(build()));
+  }
 
  private:
   Log();
@@ -48,10 +60,13 @@ void logError(std::string_view message);
 void logMessage(LogLevel level, std::string_view message);
 
 /// The same for messages that cost something to build: `build` runs only when the level is on.
-template <class Build>
-  requires requires(Build build) { std::string_view(build()); }
+template <MessageBuilder Build>
 void logDebug(Build&& build) {
   if (Log::shared().isEnabled(LogLevel::debug)) logDebug(std::string_view(build()));
+}
+template <MessageBuilder Build>
+void logMessage(LogLevel level, Build&& build) {
+  if (Log::shared().isEnabled(level)) logMessage(level, std::string_view(build()));
 }
 
 /// A numbered bracket around a step: writes "[DEBUG] ┏N label" when made and "[DEBUG] ┗N" when it
