@@ -1,5 +1,6 @@
 #pragma once
 
+#include <memory>
 #include <vector>
 
 #include "foundation/URL.h"
@@ -7,17 +8,24 @@
 namespace mirabel {
 
 /// The document folders of the applications that expose theirs, in canonical form. Asked for
-/// every identifier that is computed, from any thread, so answering must be cheap.
+/// every identifier that is computed, from any thread, so answering must be cheap: an
+/// implementation keeps the list and replaces it as a whole when it changes.
 class AppLibraryRoots {
  public:
+  using List = std::shared_ptr<const std::vector<URL>>;
+
   virtual ~AppLibraryRoots() = default;
-  [[nodiscard]] virtual std::vector<URL> rootURLsForAppLibraries() const = 0;
+  /// Never null.
+  [[nodiscard]] virtual List rootURLsForAppLibraries() const = 0;
 };
 
 /// Where no applications are known.
 class NoAppLibraryRoots final : public AppLibraryRoots {
  public:
-  [[nodiscard]] std::vector<URL> rootURLsForAppLibraries() const override { return {}; }
+  [[nodiscard]] List rootURLsForAppLibraries() const override { return none_; }
+
+ private:
+  List none_ = std::make_shared<const std::vector<URL>>();
 };
 
 }  // namespace mirabel

@@ -1,0 +1,366 @@
+#pragma once
+
+#include <cerrno>
+#include <functional>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/Platform.h"
+
+namespace mirabel::testing {
+
+/// An empty document storage and the means to change it behind the platform's back, as other
+/// programs do. Names are relative to the storage; a failing change throws.
+class Volume {
+ public:
+  virtual ~Volume() = default;
+  [[nodiscard]] virtual const Platform& platform() = 0;
+  virtual void makeFolder(std::string_view name) = 0;
+  /// Creates, or replaces the contents of the object that is there.
+  virtual void writeFile(std::string_view name, std::string_view contents) = 0;
+  virtual void makeSymlink(std::string_view name, std::string_view target) = 0;
+  virtual void makeFifo(std::string_view name) = 0;
+  virtual void link(std::string_view existing, std::string_view added) = 0;
+  virtual void rename(std::string_view from, std::string_view to) = 0;
+  virtual void remove(std::string_view name) = 0;
+  /// A name that makes a folder a package.
+  [[nodiscard]] virtual std::string packageName() const = 0;
+};
+
+using VolumeFactory = std::function<std::unique_ptr<Volume>()>;
+
+/// What every implementation of the platform keeps to. A test program includes this header and
+/// instantiates the suite with the factories of its volumes:
+///   INSTANTIATE_TEST_SUITE_P(Fake, PlatformConformance, ::testing::Values(makeFakeVolume));
+class PlatformConformance : public ::testing::TestWithParam<VolumeFactory> {
+ protected:
+  const Platform& platform() { return volume->platform(); }
+
+  /// Made anew, so that nothing of it is cached.
+  URL at(std::string_view name) {
+    const std::string root = platform().manager.documentStorageURL().path();
+    return URL::fileURL(name.empty() ? root : root + "/" + std::string(name));
+  }
+  ResourceValues valuesOf(std::string_view name) {
+    return platform().resources.readValues(at(name)).value();
+  }
+  std::uint64_t fileID(std::string_view name) { return valuesOf(name).fileID; }
+  std::uint32_t documentID(std::string_view name, Allocation allocation = Allocation::ifNone) {
+    return platform().documents.permanentStorageForItemAtURL(at(name), allocation).value();
+  }
+  DeviceID device() { return platform().objects.open(at("")).value()->device().value(); }
+  Result<std::string> pathOf(std::uint64_t fileID) {
+    return platform().objects.pathOfFileID(device(), fileID);
+  }
+  std::uint16_t linkCount(std::string_view name) {
+    return platform().objects.status(at(name)).value().linkCount;
+  }
+  Result<void> setAttribute(std::string_view name, std::string_view attribute, const Data& value) {
+    auto target = platform().attributes.open(at(name));
+    if (!target) return fail(target.error());
+    return (*target)->set(attribute, value);
+  }
+  Result<Data> attribute(std::string_view name, std::string_view attribute) {
+    const auto size = platform().attributes.size(attribute, at(name));
+    if (!size) return fail(size.error());
+    return platform().attributes.read(attribute, at(name), *size);
+  }
+
+  std::unique_ptr<Volume> volume = GetParam()();
+};
+
+template <class T>
+int posixCode(const Result<T>& result) {
+  if (result) return 0;
+  return result.error().domain == ErrorDomain::posix ? static_cast<int>(result.error().code) : -1;
+}
+
+TEST_P(PlatformConformance, FileIDStaysThroughRenamesAndIsNeverGivenAgain) {
+  volume->makeFolder("folder");
+  volume->writeFile("folder/a", "1");
+  const std::uint64_t folder = fileID("folder");
+  const std::uint64_t file = fileID("folder/a");
+  EXPECT_NE(folder, file);
+
+  volume->rename("folder", "moved");
+  volume->rename("moved/a", "b");
+  EXPECT_EQ(fileID("moved"), folder);
+  EXPECT_EQ(fileID("b"), file);
+  EXPECT_EQ(pathOf(folder).value(), at("moved").path());
+  EXPECT_EQ(pathOf(file).value(), at("b").path());
+
+  volume->remove("b");
+  volume->writeFile("b", "2");
+  EXPECT_NE(fileID("b"), file);
+  EXPECT_EQ(posixCode(pathOf(file)), ENOENT);
+  EXPECT_EQ(posixCode(pathOf(0)), ENOENT);
+  EXPECT_EQ(posixCode(pathOf(~std::uint64_t{0})), ENOENT);
+}
+
+TEST_P(PlatformConformance, PathOfFileIDFollowsARenamedParent) {
+  volume->makeFolder("a");
+  volume->makeFolder("a/b");
+  volume->writeFile("a/b/c", "");
+  const std::uint64_t file = fileID("a/b/c");
+  volume->rename("a", "z");
+  EXPECT_EQ(pathOf(file).value(), at("z/b/c").path());
+  volume->remove("z");
+  EXPECT_EQ(posixCode(pathOf(file)), ENOENT);
+}
+
+TEST_P(PlatformConformance, HardLinkIsFoundUnderANameThatIsLeft) {
+  volume->writeFile("a", "");
+  volume->link("a", "b");
+  EXPECT_EQ(fileID("a"), fileID("b"));
+  const std::uint64_t file = fileID("a");
+  volume->remove("a");
+  EXPECT_EQ(pathOf(file).value(), at("b").path());
+}
+
+TEST_P(PlatformConformance, DocumentIDIsAllocatedOnceAndFollowsTheDocument) {
+  volume->writeFile("a", "1");
+  volume->writeFile("other", "1");
+  EXPECT_EQ(documentID("a", Allocation::never), 0U);
+  const std::uint32_t id = documentID("a");
+  EXPECT_NE(id, 0U);
+  EXPECT_NE(documentID("other"), id);
+  EXPECT_EQ(documentID("a", Allocation::never), id);
+  EXPECT_EQ(valuesOf("a").documentID, id);
+
+  const auto object = platform().objects.open(at("a")).value();
+  EXPECT_EQ(object->attributes().value().documentID, id);
+  EXPECT_EQ(platform().documents.permanentStorage(*object).value(), id);
+
+  volume->rename("a", "b");
+  EXPECT_EQ(valuesOf("b").documentID, id);
+  EXPECT_EQ(platform().documents.fileIDOfDocument(device(), id).value(), fileID("b"));
+}
+
+TEST_P(PlatformConformance, DocumentIDSurvivesAFileRenamedOverIt) {
+  volume->writeFile("a", "1");
+  const std::uint32_t id = documentID("a");
+  const std::uint64_t before = fileID("a");
+  volume->writeFile("a.new", "2");
+  volume->rename("a.new", "a");
+  EXPECT_EQ(documentID("a", Allocation::never), id);
+  EXPECT_NE(fileID("a"), before);
+  EXPECT_EQ(platform().documents.fileIDOfDocument(device(), id).value(), fileID("a"));
+  EXPECT_EQ(posixCode(pathOf(before)), ENOENT);
+}
+
+TEST_P(PlatformConformance, UnknownDocumentIDsAreNotFound) {
+  volume->writeFile("a", "1");
+  const std::uint32_t id = documentID("a");
+  volume->remove("a");
+  const std::int64_t gone = id;
+  for (const std::int64_t unknown :
+       {gone, std::int64_t{0}, std::int64_t{-1}, gone + (std::int64_t{1} << 32)}) {
+    EXPECT_EQ(posixCode(platform().documents.fileIDOfDocument(device(), unknown)), ENOENT);
+  }
+}
+
+TEST_P(PlatformConformance, OpenObjectTellsItsKindWithoutFollowingOrBlocking) {
+  volume->makeFolder("folder");
+  volume->writeFile("file", "");
+  volume->makeSymlink("link", "folder");
+  volume->makeFifo("fifo");
+  const std::pair<std::string_view, FileKind> cases[] = {{"folder", FileKind::folder},
+                                                         {"file", FileKind::regular},
+                                                         {"link", FileKind::symbolicLink},
+                                                         {"fifo", FileKind::other}};
+  for (const auto& [name, kind] : cases) {
+    const auto object = platform().objects.open(at(name)).value();
+    const ObjectAttributes attributes = object->attributes().value();
+    EXPECT_EQ(attributes.kind, kind) << name;
+    EXPECT_EQ(attributes.fileID, fileID(name)) << name;
+    EXPECT_EQ(object->device().value(), device()) << name;
+  }
+  EXPECT_NE(device(), 0U);
+  EXPECT_EQ(posixCode(platform().objects.open(at("missing"))), ENOENT);
+}
+
+TEST_P(PlatformConformance, ResourceValuesTellEachKind) {
+  const std::string package = volume->packageName();
+  volume->makeFolder("folder");
+  volume->makeFolder(package);
+  volume->writeFile("notes.txt", "12345");
+  volume->makeSymlink("link", "notes.txt");
+  volume->makeFifo("fifo");
+
+  const ResourceValues file = valuesOf("notes.txt");
+  EXPECT_EQ(file.kind, FileKind::regular);
+  EXPECT_EQ(file.size, 5U);
+  EXPECT_EQ(file.typeIdentifier, "text/plain");
+  EXPECT_TRUE(file.isWritable);
+  EXPECT_FALSE(file.isPackage);
+  EXPECT_TRUE(file.contentModificationDate);
+
+  const ResourceValues folder = valuesOf("folder");
+  EXPECT_EQ(folder.kind, FileKind::folder);
+  EXPECT_EQ(folder.typeIdentifier, "inode/directory");
+  EXPECT_FALSE(folder.isPackage);
+
+  const ResourceValues packageValues = valuesOf(package);
+  EXPECT_EQ(packageValues.kind, FileKind::folder);
+  EXPECT_TRUE(packageValues.isPackage);
+  EXPECT_NE(packageValues.typeIdentifier, "inode/directory");
+
+  EXPECT_EQ(valuesOf("link").kind, FileKind::symbolicLink);
+  EXPECT_NE(valuesOf("link").typeIdentifier, "text/plain");
+  EXPECT_EQ(valuesOf("fifo").kind, FileKind::other);
+
+  const auto missing = platform().resources.readValues(at("missing"));
+  ASSERT_FALSE(missing);
+  EXPECT_EQ(missing.error(), Error::file(FileErrorCode::noSuchFile));
+}
+
+TEST_P(PlatformConformance, PrefetchTellsWhatSingleReadsTell) {
+  volume->makeFolder("folder");
+  volume->writeFile("folder/a.txt", "123");
+  volume->writeFile("b", "");
+  volume->makeSymlink("link", "b");
+  volume->makeFifo("fifo");
+  ASSERT_TRUE(setAttribute("b", "com.norvane.test", {1}));
+  documentID("b");
+
+  const std::string_view names[] = {"folder", "folder/a.txt", "b", "link", "fifo", "missing"};
+  std::vector<URL> urls;
+  for (const std::string_view name : names)
+    urls.push_back(at(name));
+  ASSERT_TRUE(platform().resources.prefetch(urls));
+
+  EXPECT_FALSE(urls.back().resources().isFilled());
+  urls.pop_back();
+  for (const URL& url : urls) {
+    const auto cached = url.resources().snapshot();
+    const auto single = platform().resources.readValues(URL::fileURL(url.path()));
+    ASSERT_TRUE(cached && single) << url.path();
+    EXPECT_EQ(cached->kind, single->kind) << url.path();
+    EXPECT_EQ(cached->isPackage, single->isPackage) << url.path();
+    EXPECT_EQ(cached->isWritable, single->isWritable) << url.path();
+    EXPECT_EQ(cached->fileID, single->fileID) << url.path();
+    EXPECT_EQ(cached->documentID, single->documentID) << url.path();
+    EXPECT_EQ(cached->size, single->size) << url.path();
+    EXPECT_EQ(cached->creationDate, single->creationDate) << url.path();
+    EXPECT_EQ(cached->contentModificationDate, single->contentModificationDate) << url.path();
+    EXPECT_EQ(cached->typeIdentifier, single->typeIdentifier) << url.path();
+    EXPECT_EQ(url.resources().hasAttribute("com.norvane.test"), url.lastPathComponent() == "b")
+        << url.path();
+  }
+}
+
+TEST_P(PlatformConformance, AttributesAreReplacedAndRemovedWhole) {
+  volume->writeFile("a", "");
+  volume->makeFolder("folder");
+  constexpr std::string_view name = "com.norvane.metadata:_kMDItemUserTags";
+  for (const std::string_view object : {"a", "folder"}) {
+    EXPECT_EQ(posixCode(attribute(object, name)), ENODATA);
+    for (const Data& value : {Data{1, 2, 3}, Data{}, Data{0}, Data(500, 0xff)}) {
+      ASSERT_TRUE(setAttribute(object, name, value));
+      EXPECT_EQ(attribute(object, name).value(), value);
+    }
+    EXPECT_EQ(platform().attributes.names(at(object)).value(),
+              std::vector<std::string>{std::string(name)});
+    EXPECT_EQ(posixCode(platform().attributes.read(name, at(object), 499)), ERANGE);
+
+    const auto target = platform().attributes.open(at(object)).value();
+    EXPECT_TRUE(target->remove(name));
+    EXPECT_EQ(posixCode(target->remove(name)), ENODATA);
+    EXPECT_EQ(posixCode(attribute(object, name)), ENODATA);
+  }
+  EXPECT_EQ(posixCode(attribute("missing", name)), ENOENT);
+  EXPECT_EQ(posixCode(platform().attributes.open(at("missing"))), ENOENT);
+}
+
+TEST_P(PlatformConformance, AttributesGoWithTheFileAndNotThroughALink) {
+  volume->writeFile("a", "");
+  volume->makeSymlink("link", "a");
+  volume->makeFifo("fifo");
+  ASSERT_TRUE(setAttribute("a", "com.norvane.test", {1}));
+  for (const std::string_view name : {"link", "fifo"}) {
+    EXPECT_EQ(posixCode(setAttribute(name, "com.norvane.test", {2})), EPERM) << name;
+    EXPECT_FALSE(attribute(name, "com.norvane.test")) << name;
+  }
+  volume->rename("a", "b");
+  EXPECT_EQ(attribute("b", "com.norvane.test").value(), Data{1});
+}
+
+TEST_P(PlatformConformance, DirectoryStreamGivesEachNameOnceWithItsKind) {
+  const std::string_view files[] = {"plain", ".hidden", "100%", "new\nline", "\xff\xfe bytes"};
+  for (const std::string_view name : files)
+    volume->writeFile(name, "");
+  volume->makeFolder("folder");
+  volume->makeSymlink("link", "folder");
+  volume->makeFifo("fifo");
+
+  std::vector<std::pair<std::string, FileKind>> expected = {{".", FileKind::folder},
+                                                            {"..", FileKind::folder},
+                                                            {"folder", FileKind::folder},
+                                                            {"link", FileKind::symbolicLink},
+                                                            {"fifo", FileKind::other}};
+  for (const std::string_view name : files)
+    expected.emplace_back(name, FileKind::regular);
+
+  const auto stream = platform().directories.open(at("")).value();
+  std::vector<std::pair<std::string, FileKind>> entries;
+  while (const auto entry = stream->next())
+    entries.emplace_back(entry->name, entry->kind);
+  EXPECT_THAT(entries, ::testing::UnorderedElementsAreArray(expected));
+  EXPECT_FALSE(stream->next());
+  EXPECT_TRUE(stream->close());
+}
+
+TEST_P(PlatformConformance, DirectoryStreamsOpenFoldersOnly) {
+  volume->writeFile("file", "");
+  volume->makeFolder("folder");
+  volume->makeSymlink("link", "folder");
+  EXPECT_EQ(posixCode(platform().directories.open(at("file"))), ENOTDIR);
+  EXPECT_EQ(posixCode(platform().directories.open(at("missing"))), ENOENT);
+  EXPECT_THAT(posixCode(platform().directories.open(at("link"))), ::testing::AnyOf(ELOOP, ENOTDIR));
+}
+
+TEST_P(PlatformConformance, StatusCountsTheEntriesOfAFolder) {
+  volume->makeFolder("folder");
+  EXPECT_EQ(linkCount("folder"), 2);
+  volume->writeFile("folder/a", "");
+  volume->makeFolder("folder/b");
+  volume->writeFile("folder/.hidden", "");
+  EXPECT_EQ(linkCount("folder"), 5);
+  EXPECT_EQ(platform().objects.status(at("folder/a")).value().fileID, fileID("folder/a"));
+  EXPECT_EQ(posixCode(platform().objects.status(at("missing"))), ENOENT);
+}
+
+TEST_P(PlatformConformance, DirectorySizeSumsTheFilesBelowIt) {
+  volume->makeFolder("folder");
+  volume->makeFolder("folder/deep");
+  EXPECT_EQ(platform().sizes.directorySize(at("folder")).value(), 0U);
+  volume->writeFile("folder/a", "12345");
+  volume->writeFile("folder/deep/b", "123");
+  volume->writeFile("outside", "1234567");
+  volume->makeSymlink("folder/link", "../outside");
+  const std::uint64_t size = platform().sizes.directorySize(at("folder")).value();
+  EXPECT_EQ(size, 8U);
+  EXPECT_EQ(posixCode(platform().sizes.directorySize(at("missing"))), ENOENT);
+}
+
+TEST_P(PlatformConformance, CreateDirectoryMakesWhatIsMissingAndAcceptsWhatIsThere) {
+  for (int time = 0; time < 2; ++time) {
+    EXPECT_TRUE(platform().operations.createDirectory(at("a/b/c")));
+    EXPECT_EQ(valuesOf("a/b/c").kind, FileKind::folder);
+  }
+  volume->writeFile("file", "");
+  EXPECT_NE(posixCode(platform().operations.createDirectory(at("file"))), 0);
+  EXPECT_NE(posixCode(platform().operations.createDirectory(at("file/below"))), 0);
+}
+
+TEST_P(PlatformConformance, HistoryKeepsItsUUID) {
+  const UUID uuid = platform().history.historyUUID(at("")).value();
+  EXPECT_FALSE(uuid.isNil());
+  EXPECT_EQ(platform().history.historyUUID(at("")).value(), uuid);
+}
+
+}  // namespace mirabel::testing

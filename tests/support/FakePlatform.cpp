@@ -1,0 +1,399 @@
+#include "support/FakePlatform.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <limits>
+#include <mutex>
+#include <utility>
+
+namespace mirabel::testing {
+namespace {
+
+using NodePointer = std::shared_ptr<FakeNode>;
+
+/// What the interfaces share.
+struct Core {
+  FakeVolume& volume;
+  FaultScript& faults;
+  std::mutex mutex;
+
+  Result<NodePointer> look(Op op, const URL& url) {
+    if (auto error = faults.hit(op)) return fail(*std::move(error));
+    return volume.find(url.path());
+  }
+};
+
+bool holdsAttributes(const FakeNode& node) {
+  return node.kind == FileKind::regular || node.kind == FileKind::folder;
+}
+
+std::vector<std::string> attributeNames(const FakeNode& node) {
+  std::vector<std::string> names;
+  for (const auto& [name, value] : node.attributes)
+    names.push_back(name);
+  return names;
+}
+
+class Resources final : public ResourceValueSource {
+ public:
+  explicit Resources(Core& core) : core_(core) {}
+
+  Result<ResourceValues> readValues(const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::readValues, url);
+    if (node) return FakeVolume::values(**node, url.lastPathComponent());
+    if (node.error().isPosix(ENOENT)) return fail(Error::file(FileErrorCode::noSuchFile));
+    return fail(node.error());
+  }
+
+  Result<void> prefetch(std::span<const URL> urls) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::prefetch)) return fail(*std::move(error));
+    for (const URL& url : urls) {
+      const auto node = core_.volume.find(url.path());
+      if (!node) continue;
+      url.resources().fill(FakeVolume::values(**node, url.lastPathComponent()));
+      url.resources().setAttributeNames(attributeNames(**node));
+    }
+    return {};
+  }
+
+ private:
+  Core& core_;
+};
+
+class OpenAttributes final : public AttributeTarget {
+ public:
+  OpenAttributes(Core& core, NodePointer node) : core_(core), node_(std::move(node)) {}
+
+  Result<void> set(std::string_view name, const Data& value) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::attributeSet)) return fail(*std::move(error));
+    if (!holdsAttributes(*node_)) return fail(Error::posix(EPERM));
+    if (!node_->isWritable) return fail(Error::posix(EACCES));
+    node_->attributes[std::string(name)] = value;
+    return {};
+  }
+
+  Result<void> remove(std::string_view name) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::attributeRemove)) return fail(*std::move(error));
+    if (!holdsAttributes(*node_)) return fail(Error::posix(EPERM));
+    if (!node_->isWritable) return fail(Error::posix(EACCES));
+    if (node_->attributes.erase(std::string(name)) == 0) return fail(Error::posix(ENODATA));
+    return {};
+  }
+
+ private:
+  Core& core_;
+  NodePointer node_;
+};
+
+class Attributes final : public ExtendedAttributeStore {
+ public:
+  explicit Attributes(Core& core) : core_(core) {}
+
+  Result<std::vector<std::string>> names(const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::attributeNames, url);
+    if (!node) return fail(node.error());
+    return attributeNames(**node);
+  }
+
+  Result<std::size_t> size(std::string_view name, const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto data = value(Op::attributeSize, name, url);
+    if (!data) return fail(data.error());
+    return data->size();
+  }
+
+  Result<Data> read(std::string_view name, const URL& url, std::size_t size) override {
+    const std::lock_guard lock(core_.mutex);
+    auto data = value(Op::attributeRead, name, url);
+    if (data && data->size() > size) return fail(Error::posix(ERANGE));
+    return data;
+  }
+
+  Result<std::unique_ptr<AttributeTarget>> open(const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::attributeOpen, url);
+    if (!node) return fail(node.error());
+    return std::make_unique<OpenAttributes>(core_, *node);
+  }
+
+ private:
+  Result<Data> value(Op op, std::string_view name, const URL& url) {
+    const auto node = core_.look(op, url);
+    if (!node) return fail(node.error());
+    const auto found = (*node)->attributes.find(name);
+    if (found == (*node)->attributes.end()) return fail(Error::posix(ENODATA));
+    return found->second;
+  }
+
+  Core& core_;
+};
+
+class OpenObject final : public FileObject {
+ public:
+  OpenObject(Core& core, NodePointer opened) : node(std::move(opened)), core_(core) {}
+
+  Result<DeviceID> device() override {
+    if (auto error = core_.faults.hit(Op::device)) return fail(*std::move(error));
+    return FakePlatform::deviceID;
+  }
+
+  Result<ObjectAttributes> attributes() override {
+    if (auto error = core_.faults.hit(Op::attributes)) return fail(*std::move(error));
+    const std::lock_guard lock(core_.mutex);
+    return ObjectAttributes{node->kind, node->documentID, node->fileID};
+  }
+
+  const NodePointer node;
+
+ private:
+  Core& core_;
+};
+
+class Objects final : public FileObjects {
+ public:
+  explicit Objects(Core& core) : core_(core) {}
+
+  Result<std::unique_ptr<FileObject>> open(const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::openObject, url);
+    if (!node) return fail(node.error());
+    return std::make_unique<OpenObject>(core_, *node);
+  }
+
+  Result<FileStatus> status(const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::status, url);
+    if (!node) return fail(node.error());
+    if ((*node)->kind != FileKind::folder) return FileStatus{(*node)->fileID, 1};
+    const std::size_t links = std::min<std::size_t>((*node)->entries.size() + 2,
+                                                    std::numeric_limits<std::uint16_t>::max());
+    return FileStatus{(*node)->fileID,
+                      (*node)->linkCount.value_or(static_cast<std::uint16_t>(links))};
+  }
+
+  Result<std::string> pathOfFileID(DeviceID device, std::uint64_t fileID) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::pathOfFileID)) return fail(*std::move(error));
+    const auto path = core_.volume.pathOfFileID(fileID);
+    if (device != FakePlatform::deviceID || !path) return fail(Error::posix(ENOENT));
+    return *path;
+  }
+
+ private:
+  Core& core_;
+};
+
+class Documents final : public GenerationalStore {
+ public:
+  explicit Documents(Core& core) : core_(core) {}
+
+  Result<std::uint32_t> permanentStorage(FileObject& object) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::permanentStorage)) return fail(*std::move(error));
+    return core_.volume.documentIDOf(*static_cast<OpenObject&>(object).node);
+  }
+
+  Result<std::uint32_t> permanentStorageForItemAtURL(const URL& url,
+                                                     Allocation allocation) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::permanentStorageForItemAtURL, url);
+    if (!node) return fail(node.error());
+    if (allocation == Allocation::never) return (*node)->documentID;
+    return core_.volume.documentIDOf(**node);
+  }
+
+  Result<std::uint64_t> fileIDOfDocument(DeviceID device, std::int64_t documentID) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::fileIDOfDocument)) return fail(*std::move(error));
+    const std::uint64_t fileID =
+        core_.volume.fileIDOfDocument(static_cast<std::uint64_t>(documentID));
+    if (device != FakePlatform::deviceID || fileID == 0) return fail(Error::posix(ENOENT));
+    return fileID;
+  }
+
+ private:
+  Core& core_;
+};
+
+/// The names as they were when the folder was opened.
+class OpenDirectory final : public DirectoryStream {
+ public:
+  OpenDirectory(Core& core, const FakeNode& folder) : core_(core) {
+    names_ = {{".", FileKind::folder}, {"..", FileKind::folder}};
+    for (const auto& [name, node] : folder.entries)
+      names_.emplace_back(name, node->kind);
+  }
+
+  std::optional<DirectoryEntry> next() override {
+    if (core_.faults.hit(Op::nextEntry)) next_ = names_.size();
+    if (next_ == names_.size()) return {};
+    const auto& [name, kind] = names_[next_++];
+    return DirectoryEntry{name, kind};
+  }
+
+  Result<void> close() override {
+    if (auto error = core_.faults.hit(Op::closeDirectory)) return fail(*std::move(error));
+    return {};
+  }
+
+ private:
+  Core& core_;
+  std::vector<std::pair<std::string, FileKind>> names_;
+  std::size_t next_ = 0;
+};
+
+class Directories final : public DirectoryStreams {
+ public:
+  explicit Directories(Core& core) : core_(core) {}
+
+  Result<std::unique_ptr<DirectoryStream>> open(const URL& folder) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::openDirectory, folder);
+    if (!node) return fail(node.error());
+    if ((*node)->kind != FileKind::folder) return fail(Error::posix(ENOTDIR));
+    return std::make_unique<OpenDirectory>(core_, **node);
+  }
+
+ private:
+  Core& core_;
+};
+
+std::uint64_t totalSize(const FakeNode& node) {
+  std::uint64_t size = node.kind == FileKind::regular ? node.contents.size() : 0;
+  for (const auto& [name, child] : node.entries)
+    size += totalSize(*child);
+  return size;
+}
+
+class Sizer final : public DirectorySizer {
+ public:
+  explicit Sizer(Core& core) : core_(core) {}
+
+  Result<std::uint64_t> directorySize(const URL& folder) override {
+    const std::lock_guard lock(core_.mutex);
+    const auto node = core_.look(Op::directorySize, folder);
+    if (!node) return fail(node.error());
+    return totalSize(**node);
+  }
+
+ private:
+  Core& core_;
+};
+
+class Operations final : public FileOperations {
+ public:
+  explicit Operations(Core& core) : core_(core) {}
+
+  Result<void> createDirectory(const URL& url) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::createDirectory)) return fail(*std::move(error));
+    const auto existing = core_.volume.find(url.path());
+    if (existing && (*existing)->kind != FileKind::folder) return fail(Error::posix(EEXIST));
+    if (!existing && !existing.error().isPosix(ENOENT)) return fail(existing.error());
+    core_.volume.makeFolder(url.path());
+    return {};
+  }
+
+ private:
+  Core& core_;
+};
+
+class Manager final : public VesselManager {
+ public:
+  explicit Manager(URL documentStorage) : documentStorage_(std::move(documentStorage)) {}
+  const URL& documentStorageURL() const override { return documentStorage_; }
+
+ private:
+  URL documentStorage_;
+};
+
+class History final : public VolumeHistory {
+ public:
+  History(Core& core, const UUID& uuid) : core_(core), uuid_(uuid) {}
+
+  Result<UUID> historyUUID(const URL&) override {
+    if (auto error = core_.faults.hit(Op::historyUUID)) return fail(*std::move(error));
+    return uuid_;
+  }
+
+ private:
+  Core& core_;
+  const UUID& uuid_;
+};
+
+}  // namespace
+
+std::optional<BundleProxy> FakeApplications::proxyForBundleIdentifier(std::string_view identifier) {
+  const auto found = std::ranges::find_if(
+      installed, [&](const BundleProxy& proxy) { return proxy.bundleIdentifier == identifier; });
+  return found == installed.end() ? std::nullopt : std::optional(*found);
+}
+
+std::optional<BundleProxy> FakeApplications::proxyAt(const URL& url) {
+  for (const BundleProxy& proxy : installed) {
+    if (!proxy.dataContainerURL) continue;
+    const URL documents = proxy.dataContainerURL->appendingPathComponent("Documents");
+    if (documents.properURL() == url.properURL()) return proxy;
+  }
+  return {};
+}
+
+struct FakePlatform::Interfaces {
+  Interfaces(FakePlatform& owner, URL documentStorage)
+      : core{owner.volume, owner.faults, {}},
+        manager(std::move(documentStorage)),
+        history(core, owner.historyUUID) {}
+
+  Core core;
+  Resources resources{core};
+  Attributes attributes{core};
+  Objects objects{core};
+  Documents documents{core};
+  Directories directories{core};
+  Sizer sizes{core};
+  Operations operations{core};
+  Manager manager;
+  History history;
+};
+
+FakePlatform::FakePlatform(std::string_view documentStorage)
+    : interfaces_(std::make_unique<Interfaces>(*this, URL::fileURL(documentStorage))),
+      platform_(std::make_unique<Platform>(
+          Platform{interfaces_->resources, interfaces_->attributes, interfaces_->objects,
+                   interfaces_->documents, interfaces_->directories, interfaces_->sizes,
+                   interfaces_->operations, applications, interfaces_->manager,
+                   interfaces_->history, clock})) {
+  volume.makeFolder(documentStorage);
+}
+
+FakePlatform::~FakePlatform() = default;
+
+URL FakePlatform::url(std::string_view relative) const {
+  URL url = interfaces_->manager.documentStorageURL();
+  while (!relative.empty()) {
+    const std::string_view component = relative.substr(0, relative.find('/'));
+    url = url.appendingPathComponent(component);
+    relative.remove_prefix(std::min(relative.size(), component.size() + 1));
+  }
+  return url;
+}
+
+std::string FakePlatform::path(std::string_view relative) const {
+  return url(relative).path();
+}
+
+BundleProxy FakePlatform::install(std::string_view bundleIdentifier, std::string_view container,
+                                  std::optional<std::string> localizedName) {
+  volume.makeFolder(std::string(container) + "/Documents");
+  BundleProxy proxy{std::string(bundleIdentifier), URL::fileURL(container),
+                    std::move(localizedName)};
+  applications.installed.push_back(proxy);
+  return proxy;
+}
+
+}  // namespace mirabel::testing

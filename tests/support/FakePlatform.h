@@ -1,0 +1,65 @@
+#pragma once
+
+#include <chrono>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/Platform.h"
+#include "support/FakeVolume.h"
+#include "support/FaultScript.h"
+
+namespace mirabel::testing {
+
+/// Installed applications, as the test lists them.
+class FakeApplications final : public ApplicationRegistry {
+ public:
+  std::optional<BundleProxy> proxyForBundleIdentifier(std::string_view identifier) override;
+  std::optional<BundleProxy> proxyAt(const URL& url) override;
+
+  std::vector<BundleProxy> installed;
+};
+
+/// Stands still but for sleeping, which it writes down instead of doing it.
+class FakeClock final : public Clock {
+ public:
+  Date now() override { return time; }
+  void sleep(std::chrono::milliseconds duration) override { sleeps.push_back(duration); }
+
+  Date time{1'763'700'000, 0};
+  std::vector<std::chrono::milliseconds> sleeps;
+};
+
+/// Every interface of the platform over a volume in memory: what the Linux layer promises, kept
+/// without a disk, with failures as scripted. The interfaces may be called from any thread; the
+/// volume is set up while nothing else runs.
+class FakePlatform {
+ public:
+  static constexpr DeviceID deviceID = 7;
+
+  explicit FakePlatform(std::string_view documentStorage = "/home/me/Documents");
+  ~FakePlatform();
+
+  [[nodiscard]] const Platform& platform() const { return *platform_; }
+  /// A URL below the document storage, made step by step; the storage itself for "".
+  [[nodiscard]] URL url(std::string_view relative = {}) const;
+  [[nodiscard]] std::string path(std::string_view relative) const;
+  /// Adds an application with a data container and, in it, an empty Documents folder.
+  BundleProxy install(std::string_view bundleIdentifier, std::string_view container,
+                      std::optional<std::string> localizedName = {});
+
+  FakeVolume volume;
+  FaultScript faults;
+  FakeApplications applications;
+  FakeClock clock;
+  UUID historyUUID = UUID::fromString("11111111-2222-3333-4444-555555555555").value();
+
+ private:
+  struct Interfaces;
+  std::unique_ptr<Interfaces> interfaces_;
+  std::unique_ptr<Platform> platform_;
+};
+
+}  // namespace mirabel::testing
