@@ -40,13 +40,14 @@ class ExtendedAttributeStore {
 };
 
 /// The attribute's value. Nothing when it is not there, and after a failure that was logged.
+/// The names that the file has are asked for once and kept in the URL's resource cache.
 [[nodiscard]] std::optional<Data> extendedAttribute(ExtendedAttributeStore& store,
                                                     std::string_view name, const URL& url);
 
 /// Sets the attribute to `value`, or removes it where there is none; removing what is not there
-/// is no error. A failure is logged and returned.
-std::optional<Error> setExtendedAttribute(AttributeTarget& target,
-                                          const std::optional<Data>& value,
+/// is no error. A failure is logged and returned. Resource caches of the file's URLs keep what
+/// they know: the caller clears them.
+std::optional<Error> setExtendedAttribute(AttributeTarget& target, const std::optional<Data>& value,
                                           std::string_view name);
 
 }  // namespace mirabel

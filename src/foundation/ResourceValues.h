@@ -52,6 +52,10 @@ struct ResourceValues {
   std::string typeIdentifier;
 };
 
+/// The value of one key as a look at a file of that name tells it.
+[[nodiscard]] ResourceValue resourceValue(const ResourceValues& values, ResourceKey key,
+                                          std::string_view name);
+
 /// Where resource values come from. Implemented by the platform; any thread may call it.
 class ResourceValueSource {
  public:

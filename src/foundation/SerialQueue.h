@@ -1,6 +1,5 @@
 #pragma once
 
-#include <chrono>
 #include <functional>
 #include <memory>
 #include <string>
@@ -11,40 +10,26 @@ namespace mirabel {
 
 /// Runs blocks one at a time in the order in which they came, on threads borrowed from a pool: an
 /// idle queue costs no thread. A handle; copies are the same queue. Blocks that were submitted
-/// run even when the last handle goes away first.
+/// run even when the last handle goes away first. The pool outlives the work of the queue. Any
+/// thread may call.
 class SerialQueue {
  public:
   explicit SerialQueue(std::string label, ThreadPool& pool = ThreadPool::shared());
 
+  /// Runs `block` after everything before it, and destroys it before the next block begins. A
+  /// block that throws ends the process.
   void async(std::function<void()> block);
-  /// Runs `block` after everything before it and returns when it is done. On an idle queue it
-  /// runs on the calling thread. Calling it from a block of the same queue is fatal (a deadlock).
+  /// Runs `block` after everything before it, on the calling thread, and returns when it is done;
+  /// what it throws comes out here. On an idle queue that is at once. Calling it from a block of
+  /// the same queue is fatal (a deadlock).
   void sync(const std::function<void()>& block);
 
+  /// Whether the calling code is a block of this queue, or was called by `sync` of another queue
+  /// from such a block.
   [[nodiscard]] bool isCurrent() const;
   /// Fatal when the calling code is not running on this queue.
   void assertOnQueue() const;
   [[nodiscard]] const std::string& label() const;
-
- private:
-  struct State;
-  std::shared_ptr<State> state_;
-};
-
-/// Counts work that was started elsewhere and tells when all of it has ended. A handle; copies
-/// are the same group.
-class DispatchGroup {
- public:
-  DispatchGroup();
-
-  void enter();
-  /// One call per `enter`; one too many is fatal.
-  void leave();
-  /// Whether the count reached zero before the time was up.
-  [[nodiscard]] bool wait(std::chrono::milliseconds timeout);
-  void wait();
-  /// Submits `block` to `queue` once the count is zero; at once when it is zero now.
-  void notify(SerialQueue queue, std::function<void()> block);
 
  private:
   struct State;
