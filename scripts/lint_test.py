@@ -82,6 +82,7 @@ class Sources(unittest.TestCase):
         self.assertEqual([], self.found(**{
             "tests/fs/WalkTest.cpp": "TEST(Walk, EndsAtTheEnd) {}",
             "tests/fs/deep/CutTest.cpp": "",
+            "docs/a.md": "[up](../README.md#top), [out](https://example.org/x)", "README.md": "",
             "tests/fs/CMakeLists.txt": "mirabel_tests(fs_tests SOURCES WalkTest.cpp\n"
                                        "  deep/CutTest.cpp)"}))
 
@@ -92,6 +93,7 @@ class Sources(unittest.TestCase):
             "fuzz/TokenFuzz.cpp": ("", ""),
             "src/fs/Walk.h": ("int a;  // TO" "DO", ""),
             "src/fs/Cut.h": ("int a;  // NO" "LINT", ""),
+            "docs/a.md": ("see [it](gone.md)", ""),
             "tests/fs/Walk.h": ("TEST(Walk, DISABLED" "_Ends)", ""),
         }
         for name, (text, build) in table.items():
