@@ -7,9 +7,10 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "linux/kernel/LongPath.h"
 #include "linux/kernel/UniqueFd.h"
 
-namespace mirabel::linux_ {
+namespace mirabel {
 
 /// The folders that are presented, open for the life of the process. Everything below them is
 /// reached through their descriptors, without following a symbolic link and without crossing onto
@@ -41,11 +42,4 @@ class MonitoredRoots {
   std::vector<std::shared_ptr<UniqueFd>> descriptors_;
 };
 
-/// The parent of an absolute path, and its last component.
-struct SplitPath {
-  std::string parent;
-  std::string name;
-};
-[[nodiscard]] SplitPath splitPath(const std::string& path);
-
-}  // namespace mirabel::linux_
+}  // namespace mirabel

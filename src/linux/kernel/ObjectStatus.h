@@ -7,8 +7,9 @@
 
 #include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
+#include "foundation/Values.h"
 
-namespace mirabel::linux_ {
+namespace mirabel {
 
 /// What one statx tells of an object. Times are nanoseconds since 1970 in UTC where they are used
 /// to tell objects apart, so that comparing them is one comparison; far dates saturate.
@@ -42,4 +43,4 @@ struct ObjectStatus {
 
 Date dateFromNanoseconds(std::int64_t nanoseconds);
 
-}  // namespace mirabel::linux_
+}  // namespace mirabel

@@ -9,7 +9,7 @@
 #include "foundation/ResourceValues.h"
 #include "linux/kernel/UniqueFd.h"
 
-namespace mirabel::linux_ {
+namespace mirabel {
 
 /// Reads the entries of an open folder straight from the kernel, a buffer at a time.
 class RawDirectory {
@@ -45,4 +45,4 @@ FileKind kindOfDirectoryType(unsigned char type);
 /// How many entries an open folder has, "." and ".." not counted. POSIX errors.
 [[nodiscard]] Result<std::uint64_t> countEntries(UniqueFd folder);
 
-}  // namespace mirabel::linux_
+}  // namespace mirabel

@@ -1,10 +1,9 @@
 #pragma once
 
 #include <unistd.h>
-
 #include <utility>
 
-namespace mirabel::linux_ {
+namespace mirabel {
 
 /// Owns a file descriptor.
 class UniqueFd {
@@ -31,4 +30,4 @@ class UniqueFd {
   int fd_ = -1;
 };
 
-}  // namespace mirabel::linux_
+}  // namespace mirabel

@@ -14,7 +14,7 @@
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/kernel/ObjectStatus.h"
 
-namespace mirabel::linux_ {
+namespace mirabel {
 
 /// A name seen in a folder, and the identity that the index gives to what it names.
 struct Sighting {
@@ -34,6 +34,8 @@ class VolumeIndex {
   struct Options {
     /// The state folder of the program; the volume's own folder is made below it.
     std::string stateFolder;
+    /// A folder that exists, on the volume of the roots.
+    std::string volumePath;
     /// Whether a folder of that name is a package; asked for names met while searching.
     std::function<bool(std::string_view name)> isPackageName;
     /// How long to wait for another process that owns the volume.
@@ -42,7 +44,7 @@ class VolumeIndex {
     std::function<void(std::string_view)> notice;
   };
 
-  /// Opens or makes the index of the volume that holds the first root. Errors: POSIX EBUSY when
+  /// Opens or makes the index of the volume that holds `volumePath`. Errors: POSIX EBUSY when
   /// another process owned it to the end of the timeout; EPERM for a state folder that is a
   /// symbolic link or belongs to somebody else; other POSIX errors; `ErrorDomain::store`.
   [[nodiscard]] static Result<std::unique_ptr<VolumeIndex>> open(const MonitoredRoots& roots,
@@ -55,8 +57,7 @@ class VolumeIndex {
                                            std::span<Sighting> sightings) = 0;
   /// The same for one object by path: a root, something below one, or outside them all.
   [[nodiscard]] virtual Result<Sighting> learnPath(const std::string& path,
-                                                   const ObjectStatus& status,
-                                                   bool isPackage) = 0;
+                                                   const ObjectStatus& status, bool isPackage) = 0;
 
   /// Checked against the disk; looks further when the object is not where it was. ENOENT.
   [[nodiscard]] virtual Result<std::string> pathOfFileID(std::uint64_t fileID) = 0;
@@ -68,4 +69,4 @@ class VolumeIndex {
   [[nodiscard]] virtual std::uint32_t device() const = 0;
 };
 
-}  // namespace mirabel::linux_
+}  // namespace mirabel

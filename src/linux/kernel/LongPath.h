@@ -1,0 +1,28 @@
+#pragma once
+
+#include <climits>
+#include <cstddef>
+#include <string>
+
+#include "foundation/Error.h"
+#include "linux/kernel/UniqueFd.h"
+
+namespace mirabel {
+
+/// The kernel takes paths shorter than this in one go (the terminating NUL counts).
+inline constexpr std::size_t longPathThreshold = PATH_MAX;
+
+/// The parent of an absolute path, and its last component; "/" and "" for the root.
+struct SplitPath {
+  std::string parent;
+  std::string name;
+};
+[[nodiscard]] SplitPath splitPath(const std::string& path);
+
+/// Opens `path`, relative to `directory` unless it is absolute, in as many steps as its length
+/// asks for. `resolve` holds RESOLVE_… bits that every step obeys. O_NOFOLLOW and O_CLOEXEC are
+/// added. An empty path opens `directory` itself again. POSIX errors.
+[[nodiscard]] Result<UniqueFd> openLongPath(int directory, const std::string& path, int flags,
+                                            unsigned long long resolve = 0);
+
+}  // namespace mirabel

@@ -1,0 +1,57 @@
+#include "linux/kernel/MonitoredRoots.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <fcntl.h>
+#include <linux/openat2.h>
+
+namespace mirabel {
+namespace {
+
+// Symbolic links are refused anywhere on the way, and so is another mount: what is mounted below
+// a root is listed and not entered.
+constexpr unsigned long long beneath =
+    RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
+
+bool holds(const std::string& root, std::string_view path) {
+  if (!path.starts_with(root)) return false;
+  return path.size() == root.size() || root == "/" || path[root.size()] == '/';
+}
+
+}  // namespace
+
+MonitoredRoots::MonitoredRoots(std::vector<std::string> paths) : paths_(std::move(paths)) {
+  for (const std::string& path : paths_) {
+    auto opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
+    descriptors_.push_back(std::make_shared<UniqueFd>(opened ? std::move(*opened) : UniqueFd()));
+  }
+}
+
+std::optional<MonitoredRoots::Place> MonitoredRoots::locate(std::string_view path) const {
+  std::optional<Place> best;
+  for (std::size_t i = 0; i < paths_.size(); ++i) {
+    if (!holds(paths_[i], path)) continue;
+    // Of nested roots the innermost one owns the path.
+    if (best && paths_[best->root].size() >= paths_[i].size()) continue;
+    std::string_view relative = path.substr(paths_[i].size());
+    if (relative.starts_with('/')) relative.remove_prefix(1);
+    best = Place{i, relative};
+  }
+  return best;
+}
+
+int MonitoredRoots::descriptor(std::size_t root) const {
+  return descriptors_[root]->get();
+}
+
+Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const {
+  if (path.find('\0') != std::string::npos) return fail(Error::posix(EINVAL));
+  const int allFlags = flags | ((flags & O_PATH) != 0 ? 0 : O_NONBLOCK | O_NOCTTY);
+  const auto place = locate(path);
+  if (!place) return openLongPath(AT_FDCWD, path, allFlags);
+  const int root = descriptor(place->root);
+  if (root < 0) return fail(Error::posix(ENOENT));
+  return openLongPath(root, std::string(place->relative), allFlags, beneath);
+}
+
+}  // namespace mirabel

@@ -1,0 +1,125 @@
+#include "linux/kernel/ObjectStatus.h"
+
+#include <array>
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <limits>
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
+#include <time.h>
+
+#include "linux/kernel/LongPath.h"
+
+// Missing from older headers; kernels that do not know it answer EINVAL.
+#ifndef AT_HANDLE_FID
+#define AT_HANDLE_FID 0x200
+#endif
+
+namespace mirabel {
+namespace {
+
+constexpr std::int64_t nanosecondsPerSecond = 1'000'000'000;
+
+std::int64_t nanoseconds(const statx_timestamp& stamp) {
+  std::int64_t result = 0;
+  if (__builtin_mul_overflow(stamp.tv_sec, nanosecondsPerSecond, &result) ||
+      __builtin_add_overflow(result, static_cast<std::int64_t>(stamp.tv_nsec), &result)) {
+    return stamp.tv_sec < 0 ? std::numeric_limits<std::int64_t>::min()
+                            : std::numeric_limits<std::int64_t>::max();
+  }
+  return result;
+}
+
+FileKind kindOfMode(unsigned mode) {
+  if (S_ISREG(mode)) return FileKind::regular;
+  if (S_ISDIR(mode)) return FileKind::folder;
+  if (S_ISLNK(mode)) return FileKind::symbolicLink;
+  return FileKind::other;
+}
+
+ObjectStatus statusFrom(const struct statx& from) {
+  ObjectStatus status;
+  status.inode = from.stx_ino;
+  status.device = makedev(from.stx_dev_major, from.stx_dev_minor);
+  status.kind = kindOfMode(from.stx_mode);
+  status.mode = from.stx_mode;
+  status.owner = from.stx_uid;
+  status.linkCount = from.stx_nlink;
+  status.size = from.stx_size;
+  status.attributes = from.stx_attributes;
+  status.hasBirthTime = (from.stx_mask & STATX_BTIME) != 0;
+  if (status.hasBirthTime) status.birthTime = nanoseconds(from.stx_btime);
+  // Asking for the change time is what makes newer kernels give the next change a time of its own.
+  status.changeTime = nanoseconds(from.stx_ctime);
+  status.modificationTime = nanoseconds(from.stx_mtime);
+  return status;
+}
+
+Result<ObjectStatus> look(int directory, const char* name) {
+  struct statx buffer;
+  const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | (*name == '\0' ? AT_EMPTY_PATH : 0);
+  if (::statx(directory, name, flags, STATX_BASIC_STATS | STATX_BTIME, &buffer) != 0) {
+    return fail(Error::posix(errno));
+  }
+  return statusFrom(buffer);
+}
+
+// Room for the kernel's largest handle, laid out as the kernel fills it.
+struct HandleBuffer {
+  alignas(file_handle) std::array<char, sizeof(file_handle) + MAX_HANDLE_SZ> bytes{};
+  file_handle* handle() { return reinterpret_cast<file_handle*>(bytes.data()); }
+};
+
+bool readHandle(int directory, const char* name, HandleBuffer& buffer, int flags) {
+  buffer.handle()->handle_bytes = MAX_HANDLE_SZ;
+  int mount = 0;
+  const int empty = *name == '\0' ? AT_EMPTY_PATH : 0;
+  return ::name_to_handle_at(directory, name, buffer.handle(), &mount, flags | empty) == 0;
+}
+
+}  // namespace
+
+Result<ObjectStatus> statusAt(int directory, const std::string& name) {
+  return look(directory, name.c_str());
+}
+
+Result<ObjectStatus> statusOf(const std::string& path) {
+  if (path.size() < longPathThreshold) return look(AT_FDCWD, path.c_str());
+  auto parent = openLongPath(AT_FDCWD, splitPath(path).parent, O_PATH | O_DIRECTORY);
+  if (!parent) return fail(parent.error());
+  return look(parent->get(), splitPath(path).name.c_str());
+}
+
+std::optional<std::string> handleAt(int directory, const std::string& name) {
+  // File systems that can name an object but not open it by that name only give the first form,
+  // kernels before 6.5 only the second. Where both are given they are the same bytes.
+  HandleBuffer buffer;
+  if (!readHandle(directory, name.c_str(), buffer, AT_HANDLE_FID) &&
+      !readHandle(directory, name.c_str(), buffer, 0)) {
+    return std::nullopt;
+  }
+  const file_handle& handle = *buffer.handle();
+  std::string result(sizeof(handle.handle_type) + handle.handle_bytes, '\0');
+  std::memcpy(result.data(), &handle.handle_type, sizeof(handle.handle_type));
+  std::memcpy(result.data() + sizeof(handle.handle_type), handle.f_handle, handle.handle_bytes);
+  return result;
+}
+
+std::int64_t coarseNow() {
+  timespec now{};
+  ::clock_gettime(CLOCK_REALTIME_COARSE, &now);
+  return now.tv_sec * nanosecondsPerSecond + now.tv_nsec;
+}
+
+Date dateFromNanoseconds(std::int64_t nanosecondsSince1970) {
+  std::int64_t seconds = nanosecondsSince1970 / nanosecondsPerSecond;
+  std::int64_t rest = nanosecondsSince1970 % nanosecondsPerSecond;
+  if (rest < 0) {
+    rest += nanosecondsPerSecond;
+    --seconds;
+  }
+  return Date{seconds, static_cast<std::uint32_t>(rest)};
+}
+
+}  // namespace mirabel

@@ -1,0 +1,20 @@
+#include "linux/volume/EntryLook.h"
+
+#include <fcntl.h>
+#include <utility>
+
+namespace mirabel {
+
+Result<EntryLook> lookAt(const MonitoredRoots& roots, const std::string& path) {
+  const auto place = roots.locate(path);
+  const bool isRoot = path == "/" || (place && place->relative.empty());
+  const SplitPath split = isRoot ? SplitPath{path, ""} : splitPath(path);
+  auto folder = roots.open(split.parent, O_PATH | O_DIRECTORY);
+  if (!folder) return fail(folder.error());
+  auto status = statusAt(folder->get(), split.name);
+  if (!status) return fail(status.error());
+  SeenObject seen{folder->get(), split.name, *status};
+  return EntryLook{std::move(*folder), std::move(seen)};
+}
+
+}  // namespace mirabel

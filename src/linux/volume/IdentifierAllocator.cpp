@@ -1,0 +1,76 @@
+#include "linux/volume/IdentifierAllocator.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <limits>
+
+namespace mirabel {
+namespace {
+
+// Large enough that writing the witness costs nothing per ID, small enough that losing the rest
+// of a block with the database does not matter.
+constexpr std::uint64_t documentBlock = 1u << 16;
+constexpr std::uint64_t fileBlock = 1u << 20;
+
+}  // namespace
+
+Result<IdentifierAllocator> IdentifierAllocator::open(IdentityStore& store, Witness& witness,
+                                                      const StateFolder& folder) {
+  IdentifierAllocator allocator(store, witness, folder);
+  auto document = store.number("next_document_id");
+  auto file = store.number("next_file_id");
+  auto spent = store.number("inode_numbers_spent");
+  for (const auto* number : {&document, &file, &spent}) {
+    if (!*number) return fail(number->error());
+  }
+  allocator.savedDocument_ = document->value_or(0);
+  allocator.savedFile_ = file->value_or(0);
+  allocator.nextDocument_ = std::max<std::uint64_t>(1, allocator.savedDocument_);
+  allocator.nextFile_ = std::max(upperFileIDs, allocator.savedFile_);
+  allocator.inodesSpent_ = spent->value_or(0) != 0;
+  return allocator;
+}
+
+Result<std::uint32_t> IdentifierAllocator::nextDocumentID() {
+  if (nextDocument_ > std::numeric_limits<std::uint32_t>::max()) {
+    return fail(Error::posix(EOVERFLOW, "all document IDs of this volume have been given"));
+  }
+  if (nextDocument_ >= witness_->documentLimit) {
+    Witness noted = *witness_;
+    noted.documentLimit = nextDocument_ + documentBlock;
+    if (auto written = noted.write(*folder_); !written) return fail(written.error());
+    *witness_ = noted;
+  }
+  return static_cast<std::uint32_t>(nextDocument_++);
+}
+
+Result<std::uint64_t> IdentifierAllocator::nextFileID() {
+  if (nextFile_ >= witness_->fileLimit) {
+    Witness noted = *witness_;
+    noted.fileLimit = nextFile_ + fileBlock;
+    if (auto written = noted.write(*folder_); !written) return fail(written.error());
+    *witness_ = noted;
+  }
+  return nextFile_++;
+}
+
+Result<void> IdentifierAllocator::save() {
+  if (nextDocument_ != savedDocument_) {
+    if (auto set = store_->setNumber("next_document_id", nextDocument_); !set) return set;
+    savedDocument_ = nextDocument_;
+  }
+  if (nextFile_ != savedFile_) {
+    if (auto set = store_->setNumber("next_file_id", nextFile_); !set) return set;
+    savedFile_ = nextFile_;
+  }
+  return {};
+}
+
+Result<void> IdentifierAllocator::spendInodeNumbers() {
+  inodesSpent_ = true;
+  nextDocument_ = std::max(nextDocument_, witness_->documentLimit);
+  nextFile_ = std::max(nextFile_, witness_->fileLimit);
+  return store_->setNumber("inode_numbers_spent", 1);
+}
+
+}  // namespace mirabel

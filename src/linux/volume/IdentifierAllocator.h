@@ -1,0 +1,47 @@
+#pragma once
+
+#include <cstdint>
+
+#include "foundation/Error.h"
+#include "linux/volume/IdentityStore.h"
+#include "linux/volume/Witness.h"
+
+namespace mirabel {
+
+/// Hands out document IDs and upper file IDs, each once in the life of the volume. A block of them
+/// is noted in the witness before the first of it is handed out, so that even a lost database
+/// gives none a second time. Used under the lock of the index.
+class IdentifierAllocator {
+ public:
+  /// Both outlive it. The counters start behind everything that either of them knows.
+  [[nodiscard]] static Result<IdentifierAllocator> open(IdentityStore& store, Witness& witness,
+                                                        const StateFolder& folder);
+
+  /// Errors: POSIX EOVERFLOW when all 2^32 - 1 document IDs have been given; those of writing
+  /// the witness.
+  [[nodiscard]] Result<std::uint32_t> nextDocumentID();
+  [[nodiscard]] Result<std::uint64_t> nextFileID();
+
+  /// Writes the counters into the transaction under way, when they have moved.
+  [[nodiscard]] Result<void> save();
+
+  /// Whether inode numbers may no longer serve as file IDs, because it is not known which of
+  /// them did before.
+  [[nodiscard]] bool inodeNumbersAreSpent() const { return inodesSpent_; }
+  [[nodiscard]] Result<void> spendInodeNumbers();
+
+ private:
+  IdentifierAllocator(IdentityStore& store, Witness& witness, const StateFolder& folder)
+      : store_(&store), witness_(&witness), folder_(&folder) {}
+
+  IdentityStore* store_;
+  Witness* witness_;
+  const StateFolder* folder_;
+  std::uint64_t nextDocument_ = 1;
+  std::uint64_t nextFile_ = upperFileIDs;
+  std::uint64_t savedDocument_ = 0;
+  std::uint64_t savedFile_ = 0;
+  bool inodesSpent_ = false;
+};
+
+}  // namespace mirabel

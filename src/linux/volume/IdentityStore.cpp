@@ -1,0 +1,319 @@
+#include "linux/volume/IdentityStore.h"
+
+#include <algorithm>
+#include <cstring>
+#include <utility>
+
+namespace mirabel {
+namespace {
+
+constexpr std::uint64_t schemaVersion = 1;
+
+// Names are blobs: bytes, compared as bytes. The columns that a listing compares come first, the
+// handle, which it seldom needs, last.
+constexpr const char* schema = R"(
+CREATE TABLE IF NOT EXISTS meta(key TEXT PRIMARY KEY, value NOT NULL) WITHOUT ROWID;
+CREATE TABLE IF NOT EXISTS objects(
+  slot INTEGER PRIMARY KEY,
+  file_id INTEGER NOT NULL,
+  document_id INTEGER,
+  kind INTEGER NOT NULL,
+  folder INTEGER,
+  name BLOB,
+  birth_time INTEGER NOT NULL,
+  change_time INTEGER NOT NULL,
+  settled INTEGER NOT NULL,
+  modification_time INTEGER NOT NULL,
+  size INTEGER NOT NULL,
+  inode INTEGER,
+  file_system INTEGER,
+  handle BLOB);
+CREATE UNIQUE INDEX IF NOT EXISTS objects_place ON objects(folder, name)
+  WHERE folder IS NOT NULL;
+CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
+  WHERE document_id IS NOT NULL;
+CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id <> slot;
+CREATE UNIQUE INDEX IF NOT EXISTS objects_foreign ON objects(file_system, inode)
+  WHERE file_system IS NOT NULL;
+CREATE TABLE IF NOT EXISTS links(
+  folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
+  PRIMARY KEY(folder, name)) WITHOUT ROWID;
+CREATE INDEX IF NOT EXISTS links_slot ON links(slot);
+CREATE TABLE IF NOT EXISTS handovers(
+  folder INTEGER NOT NULL, name BLOB NOT NULL, document_id INTEGER NOT NULL,
+  PRIMARY KEY(folder, name)) WITHOUT ROWID;
+CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
+)";
+
+#define OBJECT_COLUMNS                                                                 \
+  "slot, file_id, document_id, kind, folder, name, birth_time, change_time, settled, " \
+  "modification_time, size, inode, file_system, handle "
+
+}  // namespace
+
+// In the order of the texts in `prepare`.
+struct IdentityStore::Statements {
+  std::vector<Statement> all;
+  Statement& bySlot = all[0];
+  Statement& byFileID = all[1];
+  Statement& byDocument = all[2];
+  Statement& byPlace = all[3];
+  Statement& byForeign = all[4];
+  Statement& unchanged = all[5];
+  Statement& occupied = all[6];
+  Statement& put = all[7];
+  Statement& remove = all[8];
+  Statement& linkAt = all[9];
+  Statement& linksOf = all[10];
+  Statement& addLink = all[11];
+  Statement& removeLink = all[12];
+  Statement& handoverAt = all[13];
+  Statement& addHandover = all[14];
+  Statement& removeHandovers = all[15];
+  Statement& meta = all[16];
+  Statement& setMeta = all[17];
+};
+
+Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
+  std::unique_ptr<IdentityStore> store(new IdentityStore(database));
+  if (auto made = database.execute(schema); !made) return fail(made.error());
+  if (auto prepared = store->prepare(); !prepared) return fail(prepared.error());
+  auto version = store->number("schema");
+  if (!version) return fail(version.error());
+  if (!*version) {
+    if (auto set = store->setNumber("schema", schemaVersion); !set) return fail(set.error());
+  } else if (**version > schemaVersion) {
+    return fail(Error::store(0, "the database was written by a later version of this program"));
+  }
+  return store;
+}
+
+Result<void> IdentityStore::prepare() {
+  const char* const sql[] = {
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE slot = ?1",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1 AND file_id <> slot",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1 AND name = ?2",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_system = ?1 AND inode = ?2",
+      "SELECT file_id, document_id, kind, folder, name, birth_time, change_time, settled "
+      "FROM objects WHERE slot = ?1",
+      "SELECT EXISTS(SELECT 1 FROM objects WHERE folder = ?1 AND name = ?2) OR "
+      "EXISTS(SELECT 1 FROM links WHERE folder = ?1 AND name = ?2) OR "
+      "EXISTS(SELECT 1 FROM handovers WHERE folder = ?1 AND name = ?2)",
+      // Not OR REPLACE: that would silently drop another object with the same place or document.
+      "INSERT INTO objects(" OBJECT_COLUMNS
+      ") VALUES(?1,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14) ON CONFLICT(slot) DO UPDATE SET "
+      "file_id=?2, document_id=?3, kind=?4, folder=?5, name=?6, birth_time=?7, change_time=?8, "
+      "settled=?9, modification_time=?10, size=?11, inode=?12, file_system=?13, handle=?14",
+      "DELETE FROM objects WHERE slot = ?1",
+      "SELECT slot FROM links WHERE folder = ?1 AND name = ?2",
+      "SELECT folder, name FROM links WHERE slot = ?1",
+      "INSERT OR REPLACE INTO links(folder, name, slot) VALUES(?1,?2,?3)",
+      "DELETE FROM links WHERE folder = ?1 AND name = ?2",
+      "SELECT document_id FROM handovers WHERE folder = ?1 AND name = ?2",
+      "INSERT OR REPLACE INTO handovers(folder, name, document_id) VALUES(?1,?2,?3)",
+      "DELETE FROM handovers WHERE document_id = ?1",
+      "SELECT value FROM meta WHERE key = CAST(?1 AS TEXT)",
+      "INSERT OR REPLACE INTO meta(key, value) VALUES(CAST(?1 AS TEXT), ?2)",
+  };
+  std::vector<Statement> made;
+  for (const char* text : sql) {
+    auto statement = database_.prepare(text);
+    if (!statement) return fail(statement.error());
+    made.push_back(std::move(*statement));
+  }
+  statements_ = std::shared_ptr<Statements>(new Statements{std::move(made)});
+  return {};
+}
+
+Result<std::optional<ObjectRow>> IdentityStore::readObject(Statement& statement) {
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  if (!*found) return std::nullopt;
+  ObjectRow row;
+  row.slot = statement.unsignedInteger(0);
+  row.fileID = statement.unsignedInteger(1);
+  row.documentID = static_cast<std::uint32_t>(statement.integer(2));
+  row.kind = static_cast<ObjectKind>(statement.integer(3));
+  if (!statement.isNull(4)) {
+    row.location = Location{statement.unsignedInteger(4), std::string(statement.blob(5))};
+  }
+  row.birthTime = statement.integer(6);
+  row.changeTime = statement.integer(7);
+  row.isSettled = statement.integer(8) != 0;
+  row.modificationTime = statement.integer(9);
+  row.size = statement.unsignedInteger(10);
+  row.inode = statement.isNull(11) ? row.slot : statement.unsignedInteger(11);
+  row.fileSystem = statement.unsignedInteger(12);
+  row.handle = statement.blob(13);
+  return row;
+}
+
+Result<std::optional<ObjectRow>> IdentityStore::objectInSlot(std::uint64_t slot) {
+  return readObject(statements_->bySlot.bind(1, slot));
+}
+
+Result<std::optional<ObjectRow>> IdentityStore::objectByFileID(std::uint64_t fileID) {
+  // Most objects have their file ID as key; the index holds the others only.
+  auto row = objectInSlot(fileID);
+  if (!row || (*row && (*row)->fileID == fileID)) return row;
+  return readObject(statements_->byFileID.bind(1, fileID));
+}
+
+Result<std::optional<ObjectRow>> IdentityStore::objectByDocumentID(std::uint32_t documentID) {
+  return readObject(statements_->byDocument.bind(1, std::int64_t{documentID}));
+}
+
+Result<std::optional<ObjectRow>> IdentityStore::objectAt(std::uint64_t folder,
+                                                         std::string_view name) {
+  return readObject(statements_->byPlace.bind(1, folder).bindBlob(2, name));
+}
+
+Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t fileSystem,
+                                                              std::uint64_t inode) {
+  return readObject(statements_->byForeign.bind(1, fileSystem).bind(2, inode));
+}
+
+Result<std::optional<KnownObject>> IdentityStore::unchangedObject(
+    std::uint64_t slot, std::uint64_t folder, std::string_view name, ObjectKind kind,
+    std::int64_t birthTime, std::int64_t changeTime) {
+  Statement& statement = statements_->unchanged.bind(1, slot);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  if (!*found || statement.unsignedInteger(3) != folder ||
+      statement.integer(2) != static_cast<int>(kind) || statement.integer(5) != birthTime ||
+      statement.integer(6) != changeTime || statement.integer(7) == 0 ||
+      statement.blob(4) != name) {
+    return std::nullopt;
+  }
+  return KnownObject{statement.unsignedInteger(0),
+                     static_cast<std::uint32_t>(statement.integer(1))};
+}
+
+Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view name) {
+  Statement& statement = statements_->occupied.bind(1, folder).bindBlob(2, name);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  return *found && statement.integer(0) != 0;
+}
+
+Result<void> IdentityStore::put(const ObjectRow& row) {
+  Statement& statement = statements_->put;
+  statement.bind(1, row.slot).bind(2, row.fileID);
+  if (row.documentID != 0) {
+    statement.bind(3, std::int64_t{row.documentID});
+  } else {
+    statement.bindNull(3);
+  }
+  statement.bind(4, static_cast<std::int64_t>(row.kind));
+  if (row.location) {
+    statement.bind(5, row.location->folder).bindBlob(6, row.location->name);
+  } else {
+    statement.bindNull(5).bindNull(6);
+  }
+  statement.bind(7, row.birthTime).bind(8, row.changeTime).bind(9, std::int64_t{row.isSettled});
+  statement.bind(10, row.modificationTime).bind(11, row.size);
+  if (row.fileSystem != 0 || row.inode != row.slot) {
+    statement.bind(12, row.inode).bind(13, row.fileSystem);
+  } else {
+    statement.bindNull(12).bindNull(13);
+  }
+  statement.bindBlob(14, row.handle);
+  return statement.run();
+}
+
+Result<void> IdentityStore::remove(std::uint64_t slot) {
+  return statements_->remove.bind(1, slot).run();
+}
+
+Result<std::optional<std::uint64_t>> IdentityStore::linkAt(std::uint64_t folder,
+                                                           std::string_view name) {
+  Statement& statement = statements_->linkAt.bind(1, folder).bindBlob(2, name);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  if (!*found) return std::nullopt;
+  return statement.unsignedInteger(0);
+}
+
+Result<std::vector<Location>> IdentityStore::links(std::uint64_t slot) {
+  Statement& statement = statements_->linksOf.bind(1, slot);
+  StatementScope scope(statement);
+  std::vector<Location> result;
+  while (true) {
+    auto found = statement.step();
+    if (!found) return fail(found.error());
+    if (!*found) return result;
+    result.push_back({statement.unsignedInteger(0), std::string(statement.blob(1))});
+  }
+}
+
+Result<void> IdentityStore::addLink(const Location& location, std::uint64_t slot) {
+  return statements_->addLink.bind(1, location.folder)
+      .bindBlob(2, location.name)
+      .bind(3, slot)
+      .run();
+}
+
+Result<void> IdentityStore::removeLink(std::uint64_t folder, std::string_view name) {
+  return statements_->removeLink.bind(1, folder).bindBlob(2, name).run();
+}
+
+Result<std::optional<std::uint32_t>> IdentityStore::handoverAt(std::uint64_t folder,
+                                                               std::string_view name) {
+  Statement& statement = statements_->handoverAt.bind(1, folder).bindBlob(2, name);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  if (!*found) return std::nullopt;
+  return static_cast<std::uint32_t>(statement.integer(0));
+}
+
+Result<void> IdentityStore::addHandover(const Location& location, std::uint32_t documentID) {
+  return statements_->addHandover.bind(1, location.folder)
+      .bindBlob(2, location.name)
+      .bind(3, std::int64_t{documentID})
+      .run();
+}
+
+Result<void> IdentityStore::removeHandovers(std::uint32_t documentID) {
+  return statements_->removeHandovers.bind(1, std::int64_t{documentID}).run();
+}
+
+Result<std::optional<std::uint64_t>> IdentityStore::number(std::string_view key) {
+  Statement& statement = statements_->meta.bindBlob(1, key);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  if (!*found) return std::nullopt;
+  return statement.unsignedInteger(0);
+}
+
+Result<void> IdentityStore::setNumber(std::string_view key, std::uint64_t value) {
+  return statements_->setMeta.bindBlob(1, key).bind(2, value).run();
+}
+
+Result<std::optional<UUID>> IdentityStore::historyUUID() {
+  Statement& statement = statements_->meta.bindBlob(1, "history");
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  if (!*found) return std::nullopt;
+  const std::string_view bytes = statement.blob(0);
+  UUID uuid;
+  if (bytes.size() != uuid.bytes.size()) {
+    return fail(Error::store(0, "the history's UUID has a wrong length"));
+  }
+  std::memcpy(uuid.bytes.data(), bytes.data(), bytes.size());
+  return uuid;
+}
+
+Result<void> IdentityStore::setHistoryUUID(const UUID& uuid) {
+  const std::string_view bytes(reinterpret_cast<const char*>(uuid.bytes.data()), uuid.bytes.size());
+  return statements_->setMeta.bindBlob(1, "history").bindBlob(2, bytes).run();
+}
+
+}  // namespace mirabel

@@ -1,0 +1,122 @@
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "foundation/Values.h"
+#include "linux/volume/Database.h"
+
+namespace mirabel {
+
+/// Sorts of objects as the database numbers them.
+enum class ObjectKind : std::uint8_t {
+  regular = 0,
+  folder = 1,
+  symbolicLink = 2,
+  other = 3,
+  package = 4,
+};
+
+[[nodiscard]] constexpr bool isDocumentKind(ObjectKind kind) {
+  return kind == ObjectKind::regular || kind == ObjectKind::package;
+}
+
+/// Where an object lies: a name in a folder. The roots have the folder 0 and their path as name.
+struct Location {
+  std::uint64_t folder = 0;  ///< file ID
+  std::string name;
+
+  friend bool operator==(const Location&, const Location&) = default;
+};
+
+/// One object that the volume has, or had: a row of the table `objects`.
+struct ObjectRow {
+  /// Key: the inode number where that can be a key, see `slotOf`, else the file ID.
+  std::uint64_t slot = 0;
+  std::uint64_t fileID = 0;
+  std::uint32_t documentID = 0;
+  ObjectKind kind = ObjectKind::other;
+  /// Absent for an object that is not where it was and was not found elsewhere. It keeps its
+  /// identity in case it comes back, and its inode number stays spent.
+  std::optional<Location> location;
+  std::int64_t birthTime = 0;  ///< 0: the file system has none
+  std::int64_t changeTime = 0;
+  /// Whether the change time was old when it was read, so that an object made later cannot have
+  /// the same one.
+  bool isSettled = false;
+  std::int64_t modificationTime = 0;
+  std::uint64_t size = 0;
+  std::uint64_t inode = 0;
+  std::uint64_t fileSystem = 0;  ///< 0: the volume itself; else what is mounted there
+  std::string handle;            ///< empty: the file system has none
+};
+
+/// What the quick look-up of a listing compares and answers.
+struct KnownObject {
+  std::uint64_t fileID;
+  std::uint32_t documentID;
+};
+
+/// File IDs at and above this are given to objects whose inode number cannot be theirs.
+inline constexpr std::uint64_t upperFileIDs = std::uint64_t{1} << 62;
+
+/// The tables of the volume's database, one method per statement. All errors are of
+/// `ErrorDomain::store`. Used under the lock of the index, inside its transactions.
+class IdentityStore {
+ public:
+  /// Makes the tables where they are missing. Fails on a database of a later schema.
+  [[nodiscard]] static Result<std::unique_ptr<IdentityStore>> open(Database& database);
+
+  [[nodiscard]] Result<std::optional<ObjectRow>> objectInSlot(std::uint64_t slot);
+  [[nodiscard]] Result<std::optional<ObjectRow>> objectByFileID(std::uint64_t fileID);
+  [[nodiscard]] Result<std::optional<ObjectRow>> objectByDocumentID(std::uint32_t documentID);
+  [[nodiscard]] Result<std::optional<ObjectRow>> objectAt(std::uint64_t folder,
+                                                          std::string_view name);
+  [[nodiscard]] Result<std::optional<ObjectRow>> foreignObject(std::uint64_t fileSystem,
+                                                               std::uint64_t inode);
+  /// The object in `slot` if it was last seen under this very name, with these times, for sure.
+  [[nodiscard]] Result<std::optional<KnownObject>> unchangedObject(
+      std::uint64_t slot, std::uint64_t folder, std::string_view name, ObjectKind kind,
+      std::int64_t birthTime, std::int64_t changeTime);
+  /// Whether the index has anything under that name: an object, a link or a handover.
+  [[nodiscard]] Result<bool> isOccupied(std::uint64_t folder, std::string_view name);
+  /// Inserts, or replaces what the slot held. Fails when another object has its place or document.
+  [[nodiscard]] Result<void> put(const ObjectRow& row);
+  [[nodiscard]] Result<void> remove(std::uint64_t slot);
+
+  /// Further names of hard-linked objects.
+  [[nodiscard]] Result<std::optional<std::uint64_t>> linkAt(std::uint64_t folder,
+                                                            std::string_view name);
+  [[nodiscard]] Result<std::vector<Location>> links(std::uint64_t slot);
+  [[nodiscard]] Result<void> addLink(const Location& location, std::uint64_t slot);
+  [[nodiscard]] Result<void> removeLink(std::uint64_t folder, std::string_view name);
+
+  /// Documents whose file was renamed to a backup of itself: the next file under the old name
+  /// takes the document over.
+  [[nodiscard]] Result<std::optional<std::uint32_t>> handoverAt(std::uint64_t folder,
+                                                                std::string_view name);
+  [[nodiscard]] Result<void> addHandover(const Location& location, std::uint32_t documentID);
+  [[nodiscard]] Result<void> removeHandovers(std::uint32_t documentID);
+
+  [[nodiscard]] Result<std::optional<std::uint64_t>> number(std::string_view key);
+  [[nodiscard]] Result<void> setNumber(std::string_view key, std::uint64_t value);
+  [[nodiscard]] Result<std::optional<UUID>> historyUUID();
+  [[nodiscard]] Result<void> setHistoryUUID(const UUID& uuid);
+
+ private:
+  explicit IdentityStore(Database& database) : database_(database) {}
+  [[nodiscard]] Result<void> prepare();
+  [[nodiscard]] Result<std::optional<ObjectRow>> readObject(Statement& statement);
+
+  struct Statements;
+  Database& database_;
+  std::shared_ptr<Statements> statements_;
+};
+
+}  // namespace mirabel

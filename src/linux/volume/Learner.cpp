@@ -1,0 +1,209 @@
+#include "linux/volume/Learner.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <fcntl.h>
+#include <utility>
+#include <vector>
+
+#include "linux/volume/EntryLook.h"
+
+namespace mirabel {
+
+Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, const MonitoredRoots& roots,
+                 std::uint64_t device, PackageNames isPackageName)
+    : store_(store),
+      roots_(roots),
+      device_(device),
+      isPackageName_(std::move(isPackageName)),
+      finder_(roots),
+      placer_(store, allocator, finder_, roots, *this, device, isPackageName_) {
+  placer_.setOthers([] { return std::vector<ObjectRow>(); });
+}
+
+// Folders ---------------------------------------------------------------------------------------
+
+Result<std::uint64_t> Learner::rootID(std::size_t root) {
+  const int folder = roots_.descriptor(root);
+  auto status = statusAt(folder, "");
+  if (!status) return fail(status.error());
+  const std::string& path = roots_.paths()[root];
+  auto row =
+      placer_.place({{folder, "", *status}, path, {0, path}, objectKind(status->kind, false)});
+  if (!row) return fail(row.error());
+  return row->fileID;
+}
+
+Result<std::uint64_t> Learner::folderID(const std::string& path, int folder) {
+  auto status = statusAt(folder, "");
+  if (!status) return fail(status.error());
+  SeenObject seen{folder, "", *status};
+  auto slot = placer_.slotOf(seen);
+  if (!slot) return fail(slot.error());
+  if (slot->row && slot->row->location && compare(*slot->row, seen) == Match::same) {
+    auto known = placer_.pathOf(*slot->row->location);
+    if (!known) return fail(known.error());
+    if (*known == path) return slot->row->fileID;
+  }
+  const auto place = roots_.locate(path);
+  if (!place) {
+    auto learned = learnPath(path, *status, false);
+    if (!learned) return fail(learned.error());
+    return learned->fileID;
+  }
+  // Not known to lie there: learn the way to it from the top.
+  auto id = rootID(place->root);
+  std::size_t end = roots_.paths()[place->root].size();
+  while (id && end < path.size()) {
+    const std::size_t start = end + 1;
+    end = std::min(path.find('/', start), path.size());
+    auto look = lookAt(roots_, path.substr(0, end));
+    if (!look) return fail(look.error());
+    const std::string name = path.substr(start, end - start);
+    const ObjectKind kind = objectKind(look->seen.status.kind, isPackageName_(name));
+    auto row = placer_.place({look->seen, path.substr(0, start - 1), {*id, name}, kind});
+    if (!row) return fail(row.error());
+    id = row->fileID;
+  }
+  return id;
+}
+
+// Names seen ------------------------------------------------------------------------------------
+
+Result<void> Learner::learn(const std::string& folderPath, int folder,
+                            std::span<Sighting> sightings) {
+  finder_.forget();
+  auto id = folderID(folderPath, folder);
+  if (!id) return fail(id.error());
+  for (std::size_t i = 0; i < sightings.size(); ++i) {
+    Sighting& sighting = sightings[i];
+    const ObjectStatus& status = sighting.status;
+    const ObjectKind kind = objectKind(status.kind, sighting.isPackage);
+    if (status.device == device_ && status.inode < upperFileIDs) {
+      auto known = store_.unchangedObject(status.inode, *id, sighting.name, kind, status.birthTime,
+                                          status.changeTime);
+      if (!known) return fail(known.error());
+      if (*known && ((*known)->documentID != 0 || !isDocumentKind(kind))) {
+        sighting.fileID = (*known)->fileID;
+        sighting.documentID = isDocumentKind(kind) ? (*known)->documentID : 0;
+        continue;
+      }
+    }
+    auto occupied = store_.isOccupied(*id, sighting.name);
+    if (!occupied) return fail(occupied.error());
+    placer_.setOthers(
+        [&] { return occupants(*id, sightings.subspan(i)).value_or(std::vector<ObjectRow>()); });
+    auto row = placer_.place(
+        {{folder, sighting.name, status}, folderPath, {*id, sighting.name}, kind, *occupied});
+    placer_.setOthers([] { return std::vector<ObjectRow>(); });
+    if (!row && row.error().isPosix(ESTALE)) continue;
+    if (!row) return fail(row.error());
+    sighting.fileID = row->fileID;
+    sighting.documentID = isDocumentKind(row->kind) ? row->documentID : 0;
+  }
+  return {};
+}
+
+Result<std::vector<ObjectRow>> Learner::occupants(std::uint64_t folder,
+                                                  std::span<const Sighting> sightings) {
+  std::vector<ObjectRow> result;
+  for (const Sighting& sighting : sightings) {
+    auto occupant = store_.objectAt(folder, sighting.name);
+    if (!occupant) return fail(occupant.error());
+    if (*occupant && (*occupant)->documentID != 0 && (*occupant)->inode != sighting.status.inode) {
+      result.push_back(std::move(**occupant));
+    }
+  }
+  return result;
+}
+
+Result<Sighting> Learner::learnPath(const std::string& path, const ObjectStatus& status,
+                                    bool isPackage) {
+  auto look = lookAt(roots_, path);
+  if (!look) return fail(look.error());
+  const auto place = roots_.locate(path);
+  if (place && !place->relative.empty()) {
+    const SplitPath split = splitPath(path);
+    Sighting sighting{split.name, status, isPackage};
+    auto learned = learn(split.parent, look->folder.get(), {&sighting, 1});
+    if (!learned) return fail(learned.error());
+    if (sighting.fileID == 0) return fail(Error::posix(ENOENT));
+    return sighting;
+  }
+  finder_.forget();
+  // A root, or something outside of all: known by its whole path.
+  const ObjectKind kind = objectKind(status.kind, isPackage);
+  auto row = placer_.place({look->seen, splitPath(path).parent, {0, path}, kind});
+  if (!row) return fail(row.error());
+  return Sighting{path, status, isPackage, row->fileID,
+                  isDocumentKind(row->kind) ? row->documentID : 0};
+}
+
+// Finding again ---------------------------------------------------------------------------------
+
+Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
+  if (!row.location) return std::nullopt;
+  auto path = placer_.pathOf(*row.location);
+  if (!path) return fail(path.error());
+  if (!*path) return std::nullopt;
+  const auto look = lookAt(roots_, **path);
+  if (!look || look->seen.status.inode != row.inode || compare(row, look->seen) != Match::same) {
+    return std::nullopt;
+  }
+  return path;
+}
+
+Result<void> Learner::learnSuccessor(const ObjectRow& row) {
+  if (!row.location) return {};
+  auto path = placer_.pathOf(*row.location);
+  if (!path) return fail(path.error());
+  if (!*path) return {};
+  const auto look = lookAt(roots_, **path);
+  if (!look) return {};
+  const std::string name = splitPath(**path).name;
+  auto learned = learnPath(**path, look->seen.status, isPackageName_(name));
+  if (!learned && !learned.error().isPosix(ENOENT)) return fail(learned.error());
+  return {};
+}
+
+Result<std::optional<std::string>> Learner::search(ObjectRow row) {
+  std::optional<std::string> hint;
+  if (row.location) {
+    auto path = placer_.pathOf(*row.location);
+    if (!path) return fail(path.error());
+    if (*path) hint = splitPath(**path).parent;
+  }
+  const auto found = finder_.find(row, hint.value_or(roots_.paths().front()),
+                                  [] { return std::vector<ObjectRow>(); });
+  if (!found) {
+    row.location.reset();
+    if (auto written = store_.put(row); !written) return fail(written.error());
+    return std::nullopt;
+  }
+  auto placed = placer_.placeFound(std::move(row), *found);
+  if (!placed) return fail(placed.error());
+  return verify(*placed);
+}
+
+Result<std::optional<std::string>> Learner::find(std::uint64_t fileID) {
+  finder_.forget();
+  auto row = store_.objectByFileID(fileID);
+  if (!row) return fail(row.error());
+  if (!*row) return std::nullopt;
+  auto path = verify(**row);
+  if (!path || *path) return path;
+
+  if (auto learned = learnSuccessor(**row); !learned) return fail(learned.error());
+  row = store_.objectByFileID(fileID);
+  if (!row) return fail(row.error());
+  if (!*row) return std::nullopt;
+  path = verify(**row);
+  if (!path || *path) return path;
+
+  auto promoted = placer_.promoteLink(**row);
+  if (!promoted) return fail(promoted.error());
+  if (*promoted) return verify(**row);
+  return search(std::move(**row));
+}
+
+}  // namespace mirabel

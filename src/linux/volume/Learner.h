@@ -1,0 +1,60 @@
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "foundation/Error.h"
+#include "linux/kernel/MonitoredRoots.h"
+#include "linux/volume/Placer.h"
+#include "linux/volume/VolumeIndex.h"
+
+namespace mirabel {
+
+/// Takes what was seen on disk, name by name or a folder's worth at a time, into the index, and
+/// answers the identities. Used under the lock of the index, inside one of its transactions.
+class Learner final : private FolderIdentities {
+ public:
+  using PackageNames = std::function<bool(std::string_view)>;
+
+  /// References outlive it. `device` is the number of the volume's own file system.
+  Learner(IdentityStore& store, IdentifierAllocator& allocator, const MonitoredRoots& roots,
+          std::uint64_t device, PackageNames isPackageName);
+
+  /// File ID of the folder at `path`, which is open as `folder`; learns it and the folders above
+  /// where they are not known to lie there.
+  [[nodiscard]] Result<std::uint64_t> folderID(const std::string& path, int folder) override;
+
+  /// Fills in the identities of names seen in that folder. A name that went away meanwhile is
+  /// left with the file ID 0.
+  [[nodiscard]] Result<void> learn(const std::string& folderPath, int folder,
+                                   std::span<Sighting> sightings);
+  [[nodiscard]] Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
+                                           bool isPackage);
+
+  /// Where the object lies now, the disk being right; nothing when it is not to be found. What
+  /// was found out is in the index then, a save of the document by another object included.
+  [[nodiscard]] Result<std::optional<std::string>> find(std::uint64_t fileID);
+
+ private:
+  /// Whether the object is at the path that the index gives; the path if so.
+  [[nodiscard]] Result<std::optional<std::string>> verify(const ObjectRow& row);
+  /// Learns what is at the object's place instead of it.
+  [[nodiscard]] Result<void> learnSuccessor(const ObjectRow& row);
+  [[nodiscard]] Result<std::optional<std::string>> search(ObjectRow row);
+  [[nodiscard]] Result<std::uint64_t> rootID(std::size_t root);
+  [[nodiscard]] Result<std::vector<ObjectRow>> occupants(std::uint64_t folder,
+                                                         std::span<const Sighting> sightings);
+
+  IdentityStore& store_;
+  const MonitoredRoots& roots_;
+  std::uint64_t device_;
+  PackageNames isPackageName_;
+  ObjectFinder finder_;
+  Placer placer_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,40 @@
+#include "linux/volume/ObjectFinder.h"
+
+#include <set>
+#include <utility>
+
+#include "linux/volume/TreeSearch.h"
+
+namespace mirabel {
+
+std::optional<ObjectFinder::Found> ObjectFinder::find(const ObjectRow& row,
+                                                      const std::string& folderPath,
+                                                      const Others& others) {
+  if (auto known = answers_.find(row.slot); known != answers_.end()) return known->second;
+
+  std::map<std::uint64_t, ObjectRow> lost{{row.inode, row}};
+  std::set<std::uint64_t> wanted{row.inode};
+  const auto visitor = [&](const Candidate& candidate) {
+    const ObjectRow& sought = lost.at(candidate.inode);
+    const auto look = lookPrecisely(candidate.folder, candidate.name);
+    if (!look || look->status.inode != sought.inode || compare(sought, *look) != Match::same) {
+      return false;
+    }
+    answers_[sought.slot] = Found{candidate.folderPath, candidate.name, look->status};
+    return true;
+  };
+  searchFolder(roots_, folderPath, wanted, visitor);
+  if (!wanted.empty()) {
+    for (ObjectRow& other : others()) {
+      if (answers_.contains(other.slot) || lost.contains(other.inode)) continue;
+      wanted.insert(other.inode);
+      lost.emplace(other.inode, std::move(other));
+    }
+    searchRoots(roots_, wanted, visitor);
+  }
+  for (const std::uint64_t inode : wanted)
+    answers_[lost.at(inode).slot] = std::nullopt;
+  return answers_.at(row.slot);
+}
+
+}  // namespace mirabel

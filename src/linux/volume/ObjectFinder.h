@@ -1,0 +1,39 @@
+#pragma once
+
+#include <functional>
+#include <map>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "linux/kernel/MonitoredRoots.h"
+#include "linux/volume/IdentityStore.h"
+#include "linux/volume/ObjectMatcher.h"
+
+namespace mirabel {
+
+/// Finds out where objects are that left the place where they were last seen. One look through
+/// the roots answers for many: what it learned is kept until `forget`.
+class ObjectFinder {
+ public:
+  explicit ObjectFinder(const MonitoredRoots& roots) : roots_(roots) {}
+
+  struct Found {
+    std::string folderPath;
+    std::string name;
+    ObjectStatus status;
+  };
+  /// Further objects that will be asked for soon; called before the roots are looked through.
+  using Others = std::function<std::vector<ObjectRow>()>;
+
+  /// Looks in the folder at `folderPath` first, then everywhere.
+  [[nodiscard]] std::optional<Found> find(const ObjectRow& row, const std::string& folderPath,
+                                          const Others& others);
+  void forget() { answers_.clear(); }
+
+ private:
+  const MonitoredRoots& roots_;
+  std::map<std::uint64_t, std::optional<Found>> answers_;  // by slot
+};
+
+}  // namespace mirabel

@@ -1,0 +1,115 @@
+#include "linux/volume/ObjectMatcher.h"
+
+#include <algorithm>
+#include <array>
+#include <cctype>
+#include <fcntl.h>
+
+#include "linux/kernel/LongPath.h"
+
+namespace mirabel {
+namespace {
+
+// Clocks that stamp files step by up to 10 ms; ten steps leave no doubt.
+constexpr std::int64_t settlingTime = 100'000'000;
+
+bool isSettledAt(std::int64_t changeTime, std::int64_t now) {
+  return changeTime < now - settlingTime;
+}
+
+bool isOfKind(ObjectKind kind, FileKind seen) {
+  switch (seen) {
+    case FileKind::regular:
+      return kind == ObjectKind::regular;
+    case FileKind::folder:
+      return kind == ObjectKind::folder || kind == ObjectKind::package;
+    case FileKind::symbolicLink:
+      return kind == ObjectKind::symbolicLink;
+    case FileKind::other:
+      return kind == ObjectKind::other;
+  }
+  return false;
+}
+
+// What the times alone tell; nothing when the handle is needed.
+std::optional<Match> compareTimes(const ObjectRow& row, const ObjectStatus& status) {
+  if (!isOfKind(row.kind, status.kind)) return Match::different;
+  if (row.birthTime != 0 && status.hasBirthTime && row.birthTime != status.birthTime) {
+    return Match::different;
+  }
+  if (row.isSettled && row.changeTime == status.changeTime) return Match::same;
+  return std::nullopt;
+}
+
+Match compareHandles(const ObjectRow& row, const ObjectStatus& status, std::string_view handle) {
+  if (!row.handle.empty() && !handle.empty()) {
+    return row.handle == handle ? Match::same : Match::different;
+  }
+  return status.changeTime < row.changeTime ? Match::different : Match::same;
+}
+
+}  // namespace
+
+Match compare(const ObjectRow& row, const SeenObject& seen) {
+  if (auto decided = compareTimes(row, seen.status)) return *decided;
+  std::optional<std::string> handle;
+  if (!row.handle.empty()) handle = handleAt(seen.directory, seen.name);
+  return compareHandles(row, seen.status, handle.value_or(""));
+}
+
+Match compare(const ObjectRow& row, const PreciseLook& look) {
+  if (auto decided = compareTimes(row, look.status)) return *decided;
+  return compareHandles(row, look.status, look.handle);
+}
+
+std::optional<PreciseLook> lookPrecisely(int directory, const std::string& name) {
+  UniqueFd object(
+      ::openat(directory, name.empty() ? "." : name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+  if (!object) return std::nullopt;
+  auto status = statusAt(object.get(), "");
+  if (!status) return std::nullopt;
+  return PreciseLook{*status, handleAt(object.get(), "").value_or("")};
+}
+
+void refresh(ObjectRow& row, const ObjectStatus& status) {
+  row.birthTime = status.birthTime;
+  row.changeTime = status.changeTime;
+  row.isSettled = isSettledAt(status.changeTime, coarseNow());
+  row.modificationTime = status.modificationTime;
+  row.size = status.size;
+}
+
+bool isStale(const ObjectRow& row, const ObjectStatus& status) {
+  return row.changeTime != status.changeTime ||
+         (!row.isSettled && isSettledAt(status.changeTime, coarseNow()));
+}
+
+ObjectKind objectKind(FileKind kind, bool isPackage) {
+  switch (kind) {
+    case FileKind::regular:
+      return ObjectKind::regular;
+    case FileKind::folder:
+      return isPackage ? ObjectKind::package : ObjectKind::folder;
+    case FileKind::symbolicLink:
+      return ObjectKind::symbolicLink;
+    case FileKind::other:
+      return ObjectKind::other;
+  }
+  return ObjectKind::other;
+}
+
+bool isBackupName(std::string_view name, std::string_view original) {
+  if (name == original) return false;
+  if (name.starts_with('.') && !original.starts_with('.')) return true;
+  if (!name.starts_with(original)) return false;
+  const std::string_view suffix = name.substr(original.size());
+  static constexpr std::array<std::string_view, 6> suffixes = {"~",     ".bak", ".BAK",
+                                                               ".orig", ".old", ".backup"};
+  if (std::ranges::find(suffixes, suffix) != suffixes.end()) return true;
+  // Numbered backups: ".~12~".
+  return suffix.size() > 3 && suffix.starts_with(".~") && suffix.ends_with('~') &&
+         std::ranges::all_of(suffix.substr(2, suffix.size() - 3),
+                             [](unsigned char c) { return std::isdigit(c) != 0; });
+}
+
+}  // namespace mirabel

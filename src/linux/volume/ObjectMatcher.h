@@ -1,0 +1,46 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "linux/kernel/ObjectStatus.h"
+#include "linux/volume/IdentityStore.h"
+
+namespace mirabel {
+
+/// An entry on disk and what one look at it told. The descriptor is open on the folder as long as
+/// this is used.
+struct SeenObject {
+  int directory = -1;
+  std::string name;  ///< in `directory`; empty for the descriptor itself
+  ObjectStatus status;
+};
+
+enum class Match { same, different };
+
+/// Whether what is seen is the object of `row`. Costs a system call only where times cannot tell:
+/// a settled change time that still stands proves it, as any object made later has a later one;
+/// otherwise the kernel's handle decides, and where there are none, birth and change time.
+[[nodiscard]] Match compare(const ObjectRow& row, const SeenObject& seen);
+
+/// Looks again through a descriptor of the object itself, so that status and handle are surely
+/// those of one object. Nothing when it has gone.
+struct PreciseLook {
+  ObjectStatus status;
+  std::string handle;  ///< empty where the file system has none
+};
+[[nodiscard]] std::optional<PreciseLook> lookPrecisely(int directory, const std::string& name);
+[[nodiscard]] Match compare(const ObjectRow& row, const PreciseLook& look);
+
+/// Copies the times and the size into the row, and decides whether its change time is settled.
+void refresh(ObjectRow& row, const ObjectStatus& status);
+/// Whether the row differs from what `refresh` would make of it.
+[[nodiscard]] bool isStale(const ObjectRow& row, const ObjectStatus& status);
+
+[[nodiscard]] ObjectKind objectKind(FileKind kind, bool isPackage);
+
+/// Whether `name` is what editors call the former version of `original` while they save:
+/// "name~", "name.bak", "name.orig", "name.~1~", or any hidden name.
+[[nodiscard]] bool isBackupName(std::string_view name, std::string_view original);
+
+}  // namespace mirabel

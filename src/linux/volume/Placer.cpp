@@ -1,0 +1,357 @@
+#include "linux/volume/Placer.h"
+
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/vfs.h>
+#include <utility>
+
+#include "linux/kernel/LongPath.h"
+#include "linux/volume/EntryLook.h"
+
+namespace mirabel {
+namespace {
+
+// More folders above each other than any path has; a longer chain is a damaged index.
+constexpr int deepestFolder = 1 << 20;
+// Moves that uncover moves. Each detaches a row first, so this is only reached when names change
+// faster than they are read.
+constexpr int deepestChain = 64;
+
+// The kernel's own ID of the file system mounted at an entry, which outlasts device numbers.
+std::uint64_t fileSystemID(const SeenObject& seen) {
+  UniqueFd object(::openat(seen.directory, seen.name.empty() ? "." : seen.name.c_str(),
+                           O_PATH | O_NOFOLLOW | O_CLOEXEC));
+  struct statfs info;
+  std::uint64_t id = 0;
+  if (object && ::fstatfs(object.get(), &info) == 0) {
+    static_assert(sizeof(info.f_fsid) == sizeof(id));
+    std::memcpy(&id, &info.f_fsid, sizeof(id));
+  }
+  return id != 0 ? id : seen.status.device;
+}
+
+class Deeper {
+ public:
+  explicit Deeper(int& depth) : depth_(depth) { ++depth_; }
+  ~Deeper() { --depth_; }
+  Deeper(const Deeper&) = delete;
+  Deeper& operator=(const Deeper&) = delete;
+
+ private:
+  int& depth_;
+};
+
+}  // namespace
+
+Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
+               const MonitoredRoots& roots, FolderIdentities& folders, std::uint64_t device,
+               std::function<bool(std::string_view)> isPackageName)
+    : store_(store),
+      allocator_(allocator),
+      finder_(finder),
+      roots_(roots),
+      folders_(folders),
+      device_(device),
+      isPackageName_(std::move(isPackageName)) {}
+
+Result<Slot> Placer::slotOf(const SeenObject& seen) {
+  Slot slot;
+  if (seen.status.device == device_ && seen.status.inode < upperFileIDs) {
+    slot.number = seen.status.inode;
+    auto row = store_.objectInSlot(slot.number);
+    if (!row) return fail(row.error());
+    slot.row = std::move(*row);
+    return slot;
+  }
+  if (seen.status.device != device_) slot.fileSystem = fileSystemID(seen);
+  auto row = store_.foreignObject(slot.fileSystem, seen.status.inode);
+  if (!row) return fail(row.error());
+  slot.row = std::move(*row);
+  if (slot.row) slot.number = slot.row->slot;
+  return slot;
+}
+
+Result<ObjectRow> Placer::place(Arrival arrival) {
+  auto slot = slotOf(arrival.seen);
+  if (!slot) return fail(slot.error());
+  if (slot->row && compare(*slot->row, arrival.seen) == Match::same) {
+    return placeKnown(arrival, std::move(*slot->row));
+  }
+  if (!slot->row) {
+    std::string handle = handleAt(arrival.seen.directory, arrival.seen.name).value_or("");
+    return placeNew(arrival, *slot, std::move(handle));
+  }
+  // It looks like a new object with a used number. Status and handle were read one after the
+  // other, so the name may have changed hands in between: look again at one object for sure.
+  const auto look = lookPrecisely(arrival.seen.directory, arrival.seen.name);
+  if (!look) return fail(Error::posix(ESTALE));
+  arrival.seen.status = look->status;
+  arrival.kind = objectKind(look->status.kind, isPackageName_(arrival.location.name));
+  slot = slotOf(arrival.seen);
+  if (!slot) return fail(slot.error());
+  if (slot->row && compare(*slot->row, *look) == Match::same) {
+    return placeKnown(arrival, std::move(*slot->row));
+  }
+  return placeNew(arrival, *slot, look->handle);
+}
+
+// Known objects ---------------------------------------------------------------------------------
+
+Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
+  const bool changed = row.kind != arrival.kind || isStale(row, arrival.seen.status);
+  row.kind = arrival.kind;
+  refresh(row, arrival.seen.status);
+  const std::uint32_t before = row.documentID;
+  if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
+  if (row.location == arrival.location) {
+    if (!changed && row.documentID == before) return row;
+    return put(std::move(row));
+  }
+  auto further = isFurtherLink(arrival, row);
+  if (!further) return fail(further.error());
+  if (*further) return put(std::move(row));
+  return moveTo(arrival, std::move(row));
+}
+
+Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row) {
+  if (arrival.seen.status.linkCount < 2 || arrival.seen.status.kind == FileKind::folder) {
+    return false;
+  }
+  auto link = store_.linkAt(arrival.location.folder, arrival.location.name);
+  if (!link) return fail(link.error());
+  if (*link == row.slot) return true;
+  if (!row.location) return false;
+  auto still = isStillAt(row, *row.location);
+  if (!still || !*still) return still;
+  // Linking over a document ends it: the object that arrives is shown under its other names too,
+  // and keeps the identity that it has there.
+  if (auto vacated = vacate(arrival, row.slot); !vacated) return fail(vacated.error());
+  if (auto added = store_.addLink(arrival.location, row.slot); !added) return fail(added.error());
+  return true;
+}
+
+Result<bool> Placer::isStillAt(const ObjectRow& row, const Location& location) {
+  auto path = pathOf(location);
+  if (!path) return fail(path.error());
+  if (!*path) return false;
+  const auto look = lookAt(roots_, **path);
+  return look && look->seen.status.inode == row.inode && compare(row, look->seen) == Match::same;
+}
+
+Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
+  const std::optional<Location> from = std::exchange(row.location, std::nullopt);
+  // Off its old name first: what is found to lie there now can then be put there.
+  if (auto detached = store_.put(row); !detached) return fail(detached.error());
+  if (arrival.seen.status.linkCount < 2) {
+    if (auto dropped = dropLinks(row.slot); !dropped) return fail(dropped.error());
+  }
+  auto inherited = vacate(arrival, row.slot);
+  if (inherited && !*inherited) inherited = takeHandover(arrival, row.documentID);
+  if (!inherited) return fail(inherited.error());
+  // Making room may have touched this row too.
+  auto current = store_.objectInSlot(row.slot);
+  if (!current) return fail(current.error());
+  if (*current) row.documentID = (*current)->documentID;
+  if (*inherited) {
+    if (auto ended = store_.removeHandovers(row.documentID); !ended) return fail(ended.error());
+    row.documentID = **inherited;
+  }
+  if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
+  row.location = arrival.location;
+  if (row.documentID != 0) {
+    if (auto ended = store_.removeHandovers(row.documentID); !ended) return fail(ended.error());
+    if (from && from->folder == arrival.location.folder &&
+        isBackupName(arrival.location.name, from->name)) {
+      auto noted = store_.addHandover(*from, row.documentID);
+      if (!noted) return fail(noted.error());
+    }
+  }
+  return put(std::move(row));
+}
+
+Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& found) {
+  auto folder = roots_.open(found.folderPath, O_PATH | O_DIRECTORY);
+  if (!folder) return row;
+  auto id = folders_.folderID(found.folderPath, folder->get());
+  if (!id) return fail(id.error());
+  // Learning the way there may have moved the row itself.
+  auto current = store_.objectInSlot(row.slot);
+  if (!current) return fail(current.error());
+  if (*current) row = std::move(**current);
+  Arrival arrival{{folder->get(), found.name, found.status},
+                  found.folderPath,
+                  {*id, found.name},
+                  objectKind(found.status.kind, isPackageName_(found.name))};
+  return placeKnown(arrival, std::move(row));
+}
+
+// New objects -----------------------------------------------------------------------------------
+
+Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std::string handle) {
+  std::optional<std::uint32_t> document;
+  if (slot.row) {
+    // The number's former holder is gone. Where it had this very name, this is its save.
+    const bool isSave = slot.row->location == arrival.location && slot.row->kind == arrival.kind;
+    if (isSave && slot.row->documentID != 0) document = slot.row->documentID;
+    if (auto dropped = dropLinks(slot.row->slot); !dropped) return fail(dropped.error());
+    if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
+  }
+  if (!document) {
+    auto inherited = vacate(arrival, slot.number);
+    if (inherited && !*inherited) inherited = takeHandover(arrival, 0);
+    if (!inherited) return fail(inherited.error());
+    document = *inherited;
+  }
+  ObjectRow row;
+  row.kind = arrival.kind;
+  row.location = arrival.location;
+  row.inode = arrival.seen.status.inode;
+  row.fileSystem = slot.fileSystem;
+  row.handle = std::move(handle);
+  refresh(row, arrival.seen.status);
+  const bool ownNumber = slot.fileSystem == 0 && row.inode < upperFileIDs;
+  if (ownNumber && !slot.row && !allocator_.inodeNumbersAreSpent()) {
+    row.fileID = row.inode;
+  } else {
+    auto next = allocator_.nextFileID();
+    if (!next) return fail(next.error());
+    row.fileID = *next;
+  }
+  row.slot = ownNumber ? row.inode : row.fileID;
+  row.documentID = document.value_or(0);
+  if (document) {
+    if (auto ended = store_.removeHandovers(*document); !ended) return fail(ended.error());
+  }
+  if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
+  return put(std::move(row));
+}
+
+// What was there before -------------------------------------------------------------------------
+
+Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivingSlot) {
+  if (!arrival.isOccupied) return std::nullopt;
+  auto link = store_.linkAt(arrival.location.folder, arrival.location.name);
+  if (!link) return fail(link.error());
+  if (*link) {
+    auto removed = store_.removeLink(arrival.location.folder, arrival.location.name);
+    if (!removed) return fail(removed.error());
+    return std::nullopt;
+  }
+  auto occupant = store_.objectAt(arrival.location.folder, arrival.location.name);
+  if (!occupant) return fail(occupant.error());
+  if (!*occupant || (arrivingSlot != 0 && (*occupant)->slot == arrivingSlot)) return std::nullopt;
+  auto elsewhere = promoteLink(**occupant);
+  if (!elsewhere) return fail(elsewhere.error());
+  if (*elsewhere) return std::nullopt;
+  (*occupant)->location.reset();
+  if (auto detached = store_.put(**occupant); !detached) return fail(detached.error());
+  // Where a folder or a link went is found out when somebody asks; whose a document is, now.
+  if ((*occupant)->documentID == 0 || !isDocumentKind((*occupant)->kind)) return std::nullopt;
+  return vacateDocument(arrival, std::move(**occupant));
+}
+
+Placer::Inheritance Placer::vacateDocument(const Arrival& arrival, ObjectRow occupant) {
+  const Deeper deeper(depth_);
+  if (depth_ > deepestChain) return std::nullopt;
+  const bool canInherit = occupant.kind == arrival.kind;
+  const auto found = finder_.find(occupant, arrival.folderPath, others_);
+  if (!found) {
+    if (!canInherit) return std::nullopt;
+    const std::uint32_t document = std::exchange(occupant.documentID, 0);
+    if (auto written = store_.put(occupant); !written) return fail(written.error());
+    return document;
+  }
+  const bool isBackup =
+      found->folderPath == arrival.folderPath && isBackupName(found->name, arrival.location.name);
+  std::optional<std::uint32_t> inherited;
+  if (isBackup && canInherit) {
+    inherited = std::exchange(occupant.documentID, 0);
+    if (auto written = store_.put(occupant); !written) return fail(written.error());
+  }
+  auto moved = placeFound(std::move(occupant), *found);
+  if (!moved) return fail(moved.error());
+  return inherited;
+}
+
+Placer::Inheritance Placer::takeHandover(const Arrival& arrival, std::uint32_t ownDocument) {
+  if (!arrival.isOccupied || !isDocumentKind(arrival.kind)) return std::nullopt;
+  auto document = store_.handoverAt(arrival.location.folder, arrival.location.name);
+  if (!document) return fail(document.error());
+  if (!*document || **document == ownDocument) return std::nullopt;
+  if (auto ended = store_.removeHandovers(**document); !ended) return fail(ended.error());
+  auto holder = store_.objectByDocumentID(**document);
+  if (!holder) return fail(holder.error());
+  if (!*holder) return *document;
+  ObjectRow& backup = **holder;
+  const bool stands =
+      backup.kind == arrival.kind &&
+      (!backup.location || (backup.location->folder == arrival.location.folder &&
+                            isBackupName(backup.location->name, arrival.location.name)));
+  if (!stands) return std::nullopt;
+  backup.documentID = 0;
+  if (backup.location) {
+    auto own = allocator_.nextDocumentID();
+    if (!own) return fail(own.error());
+    backup.documentID = *own;
+  }
+  if (auto written = store_.put(backup); !written) return fail(written.error());
+  return *document;
+}
+
+Result<bool> Placer::promoteLink(ObjectRow& row) {
+  auto names = store_.links(row.slot);
+  if (!names) return fail(names.error());
+  for (const Location& name : *names) {
+    if (auto removed = store_.removeLink(name.folder, name.name); !removed) {
+      return fail(removed.error());
+    }
+    auto still = isStillAt(row, name);
+    if (!still) return still;
+    if (!*still) continue;
+    row.location = name;
+    if (auto written = store_.put(row); !written) return fail(written.error());
+    return true;
+  }
+  return false;
+}
+
+Result<void> Placer::dropLinks(std::uint64_t slot) {
+  auto names = store_.links(slot);
+  if (!names) return fail(names.error());
+  for (const Location& name : *names) {
+    if (auto removed = store_.removeLink(name.folder, name.name); !removed) return removed;
+  }
+  return {};
+}
+
+Result<void> Placer::ensureDocument(ObjectRow& row) {
+  if (!isDocumentKind(row.kind) || row.documentID != 0) return {};
+  auto next = allocator_.nextDocumentID();
+  if (!next) return fail(next.error());
+  row.documentID = *next;
+  return {};
+}
+
+Result<ObjectRow> Placer::put(ObjectRow row) {
+  if (auto written = store_.put(row); !written) return fail(written.error());
+  return row;
+}
+
+Result<std::optional<std::string>> Placer::pathOf(const Location& location) {
+  std::vector<std::string> names{location.name};
+  std::uint64_t folder = location.folder;
+  for (int depth = 0; folder != 0; ++depth) {
+    auto above = store_.objectByFileID(folder);
+    if (!above) return fail(above.error());
+    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
+    names.push_back((*above)->location->name);
+    folder = (*above)->location->folder;
+  }
+  std::string path = std::move(names.back());
+  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
+    path.append("/").append(*name);
+  return path;
+}
+
+}  // namespace mirabel

@@ -1,0 +1,104 @@
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "linux/volume/IdentifierAllocator.h"
+#include "linux/volume/IdentityStore.h"
+#include "linux/volume/ObjectFinder.h"
+#include "linux/volume/ObjectMatcher.h"
+
+namespace mirabel {
+
+/// An entry on its way into the index.
+struct Arrival {
+  SeenObject seen;
+  std::string folderPath;
+  Location location;
+  ObjectKind kind = ObjectKind::other;
+  bool isOccupied = true;  ///< false: the index surely has nothing under that name
+};
+
+/// Which row of the index is an object's, or would be.
+struct Slot {
+  std::uint64_t number = 0;      ///< 0: it needs one of its own
+  std::uint64_t fileSystem = 0;  ///< 0: the volume itself
+  std::optional<ObjectRow> row;
+};
+
+/// Gives the file ID of a folder, learning it where need be.
+class FolderIdentities {
+ public:
+  virtual ~FolderIdentities() = default;
+  [[nodiscard]] virtual Result<std::uint64_t> folderID(const std::string& path, int folder) = 0;
+};
+
+/// Brings one row of the index in step with an entry seen on disk. What happened between two
+/// looks is told apart here:
+///
+/// - a known object under another name was renamed or moved, or has a further link;
+/// - another object under a known document's name is a save of that document, and takes its
+///   document ID over, when the former object is gone or was renamed to a backup of itself in the
+///   same folder; when it is found elsewhere it was moved, and keeps its document;
+/// - another generation of an inode number is a new object with a file ID of its own.
+///
+/// Used under the lock of the index, inside one of its transactions.
+class Placer {
+ public:
+  /// References outlive it. `device` is the number of the volume's own file system.
+  Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
+         const MonitoredRoots& roots, FolderIdentities& folders, std::uint64_t device,
+         std::function<bool(std::string_view)> isPackageName);
+
+  /// The row as it is afterwards. POSIX error ESTALE when the entry went away meanwhile.
+  [[nodiscard]] Result<ObjectRow> place(Arrival arrival);
+
+  [[nodiscard]] Result<Slot> slotOf(const SeenObject& seen);
+
+  /// Asked for before the whole tree is looked through, so that one search serves a batch.
+  void setOthers(ObjectFinder::Others others) { others_ = std::move(others); }
+
+  /// Puts an object that is not at its place where the finder has found it.
+  [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
+  /// Moves the row to one of the object's other names that still stands; false when none does.
+  [[nodiscard]] Result<bool> promoteLink(ObjectRow& row);
+  /// Whether the disk has the object under that name.
+  [[nodiscard]] Result<bool> isStillAt(const ObjectRow& row, const Location& location);
+
+  /// Where the index believes a place to be; nothing when a folder above it is detached.
+  [[nodiscard]] Result<std::optional<std::string>> pathOf(const Location& location);
+
+ private:
+  [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
+  [[nodiscard]] Result<ObjectRow> placeNew(const Arrival& arrival, const Slot& slot,
+                                           std::string handle);
+  [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row);
+  [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, const ObjectRow& row);
+
+  /// A document ID that an arrival takes over; nothing when it takes none.
+  using Inheritance = Result<std::optional<std::uint32_t>>;
+  /// Takes whatever the index has under the arrival's name away from there.
+  [[nodiscard]] Inheritance vacate(const Arrival& arrival, std::uint64_t arrivingSlot);
+  [[nodiscard]] Inheritance vacateDocument(const Arrival& arrival, ObjectRow occupant);
+  [[nodiscard]] Inheritance takeHandover(const Arrival& arrival, std::uint32_t ownDocument);
+  [[nodiscard]] Result<void> dropLinks(std::uint64_t slot);
+  [[nodiscard]] Result<void> ensureDocument(ObjectRow& row);
+  /// Writes the row and answers it.
+  [[nodiscard]] Result<ObjectRow> put(ObjectRow row);
+
+  IdentityStore& store_;
+  IdentifierAllocator& allocator_;
+  ObjectFinder& finder_;
+  const MonitoredRoots& roots_;
+  FolderIdentities& folders_;
+  std::uint64_t device_;
+  std::function<bool(std::string_view)> isPackageName_;
+  ObjectFinder::Others others_;
+  int depth_ = 0;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,113 @@
+#include "linux/volume/VolumeIndex.h"
+
+#include <cerrno>
+#include <fcntl.h>
+#include <mutex>
+#include <utility>
+
+#include "linux/volume/Learner.h"
+#include "linux/volume/VolumeState.h"
+#include "linux/volume/VolumeUUID.h"
+
+namespace mirabel {
+namespace {
+
+class StoredVolumeIndex final : public VolumeIndex {
+ public:
+  StoredVolumeIndex(std::unique_ptr<VolumeState> state, const MonitoredRoots& roots,
+                    std::uint64_t device, std::function<bool(std::string_view)> isPackageName)
+      : state_(std::move(state)),
+        learner_(state_->store(), state_->allocator(), roots, device, std::move(isPackageName)),
+        device_(device) {}
+
+  Result<void> learn(const std::string& folderPath, int folder,
+                     std::span<Sighting> sightings) override {
+    const std::scoped_lock lock(mutex_);
+    return state_->transaction([&] { return learner_.learn(folderPath, folder, sightings); });
+  }
+
+  Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
+                             bool isPackage) override {
+    const std::scoped_lock lock(mutex_);
+    Result<Sighting> answer = fail(Error::posix(ENOENT));
+    auto done = state_->transaction([&]() -> Result<void> {
+      answer = learner_.learnPath(path, status, isPackage);
+      if (!answer) return fail(answer.error());
+      return {};
+    });
+    if (!done) return fail(done.error());
+    return answer;
+  }
+
+  Result<std::string> pathOfFileID(std::uint64_t fileID) override {
+    const std::scoped_lock lock(mutex_);
+    std::optional<std::string> path;
+    auto done = state_->transaction([&]() -> Result<void> { return find(fileID, path); });
+    if (!done) return fail(done.error());
+    if (!path) return fail(Error::posix(ENOENT));
+    return std::move(*path);
+  }
+
+  Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) override {
+    const std::scoped_lock lock(mutex_);
+    std::optional<std::uint64_t> fileID;
+    auto done = state_->transaction([&] { return findHolder(documentID, fileID); });
+    if (!done) return fail(done.error());
+    if (!fileID) return fail(Error::posix(ENOENT));
+    return *fileID;
+  }
+
+  UUID historyUUID() const override { return state_->history(); }
+
+  std::uint32_t device() const override {
+    const auto folded = static_cast<std::uint32_t>(device_ ^ (device_ >> 32));
+    return folded == 0 ? 1 : folded;
+  }
+
+ private:
+  Result<void> find(std::uint64_t fileID, std::optional<std::string>& path) {
+    auto found = learner_.find(fileID);
+    if (!found) return fail(found.error());
+    path = std::move(*found);
+    return {};
+  }
+
+  // Looking for the holder may find that another object has saved over it since.
+  Result<void> findHolder(std::uint32_t documentID, std::optional<std::uint64_t>& fileID) {
+    auto holder = state_->store().objectByDocumentID(documentID);
+    if (!holder) return fail(holder.error());
+    if (!*holder) return {};
+    std::optional<std::string> path;
+    if (auto found = find((*holder)->fileID, path); !found) return found;
+    holder = state_->store().objectByDocumentID(documentID);
+    if (!holder) return fail(holder.error());
+    if (*holder && (*holder)->location && isDocumentKind((*holder)->kind)) {
+      fileID = (*holder)->fileID;
+    }
+    return {};
+  }
+
+  std::mutex mutex_;
+  std::unique_ptr<VolumeState> state_;
+  Learner learner_;
+  std::uint64_t device_;
+};
+
+}  // namespace
+
+Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(const MonitoredRoots& roots,
+                                                       Options options) {
+  auto status = statusOf(options.volumePath);
+  if (!status) return fail(status.error());
+  auto uuid = volumeUUID(options.volumePath);
+  if (!uuid) return fail(uuid.error());
+  auto folder = StateFolder::acquire(options.stateFolder, *uuid, options.timeout, options.notice);
+  if (!folder) return fail(folder.error());
+  auto state = VolumeState::open(std::move(*folder), options.notice);
+  if (!state) return fail(state.error());
+  if (!options.isPackageName) options.isPackageName = [](std::string_view) { return false; };
+  return std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device,
+                                             std::move(options.isPackageName));
+}
+
+}  // namespace mirabel

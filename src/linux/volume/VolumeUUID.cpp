@@ -1,0 +1,54 @@
+#include "linux/volume/VolumeUUID.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/ioctl.h>
+#include <sys/statfs.h>
+#include <sys/vfs.h>
+
+#include "linux/kernel/LongPath.h"
+
+namespace mirabel {
+namespace {
+
+// The kernel's own declaration came with 6.9; older headers lack it.
+struct KernelUUID {
+  std::uint8_t length;
+  std::uint8_t bytes[16];
+};
+#define MIRABEL_IOC_GETFSUUID _IOR(0x15, 0, KernelUUID)
+
+Result<UUID> uuidFromFileSystemID(int folder) {
+  struct statfs info;
+  if (::fstatfs(folder, &info) != 0) return fail(Error::posix(errno));
+  UUID uuid;
+  static_assert(sizeof(info.f_fsid) == 8);
+  std::memcpy(uuid.bytes.data(), &info.f_fsid, 8);
+  const auto type = static_cast<std::uint64_t>(info.f_type);
+  std::memcpy(uuid.bytes.data() + 8, &type, 8);
+  // Version 8: a UUID of a make of its own.
+  uuid.bytes[6] = static_cast<std::uint8_t>((uuid.bytes[6] & 0x0F) | 0x80);
+  uuid.bytes[8] = static_cast<std::uint8_t>((uuid.bytes[8] & 0x3F) | 0x80);
+  return uuid;
+}
+
+}  // namespace
+
+Result<UUID> volumeUUID(const std::string& folder) {
+  auto opened = openLongPath(AT_FDCWD, folder, O_RDONLY | O_DIRECTORY);
+  // A folder that may be searched but not read still tells its file system's ID.
+  if (!opened) opened = openLongPath(AT_FDCWD, folder, O_PATH | O_DIRECTORY);
+  if (!opened) return fail(opened.error());
+  KernelUUID answer{};
+  UUID uuid;
+  if (::ioctl(opened->get(), MIRABEL_IOC_GETFSUUID, &answer) == 0 &&
+      answer.length == uuid.bytes.size()) {
+    std::copy(std::begin(answer.bytes), std::end(answer.bytes), uuid.bytes.begin());
+    if (!uuid.isNil()) return uuid;
+  }
+  return uuidFromFileSystemID(opened->get());
+}
+
+}  // namespace mirabel
