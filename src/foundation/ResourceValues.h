@@ -47,9 +47,9 @@ struct ResourceValues {
   std::uint64_t fileID = 0;
   std::uint32_t documentID = 0;  ///< 0: none assigned yet
   std::uint64_t size = 0;
-  std::optional<Date> creationDate;
-  std::optional<Date> contentModificationDate;
-  std::string typeIdentifier;
+  std::optional<Date> creationDate = {};
+  std::optional<Date> contentModificationDate = {};
+  std::string typeIdentifier = {};
 };
 
 /// The value of one key as a look at a file of that name tells it.

@@ -1,0 +1,190 @@
+#include <csignal>
+#include <future>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <latch>
+#include <numeric>
+#include <stdexcept>
+#include <thread>
+#include <vector>
+
+#include "foundation/DispatchGroup.h"
+#include "foundation/SerialQueue.h"
+
+namespace mirabel {
+namespace {
+
+using namespace std::chrono_literals;
+using ::testing::KilledBySignal;
+
+TEST(SerialQueue, RunsAsyncAndSyncBlocksInTheOrderInWhichTheyCame) {
+  SerialQueue queue("order");
+  std::vector<int> order;
+  std::promise<void> gate;
+  queue.async([opened = gate.get_future().share()] { opened.wait(); });
+  for (int i = 0; i < 50; ++i)
+    queue.async([&order, i] { order.push_back(i); });
+  gate.set_value();
+  queue.sync([&] { order.push_back(50); });
+  queue.async([&] { order.push_back(51); });
+  queue.sync([&] { order.push_back(52); });
+  std::vector<int> expected(53);
+  std::iota(expected.begin(), expected.end(), 0);
+  EXPECT_EQ(order, expected);
+}
+
+TEST(SerialQueue, KeepsBlocksOfManyThreadsApartAndEachThreadsInOrder) {
+  constexpr int perThread = 500;
+  SerialQueue queue("contended");
+  std::vector<std::pair<int, int>> seen;  // unguarded: the queue is its guard
+  {
+    std::vector<std::jthread> threads;
+    for (int t = 0; t < 4; ++t) {
+      threads.emplace_back([&, t] {
+        for (int i = 0; i < perThread; ++i) {
+          const auto block = [&seen, t, i] { seen.emplace_back(t, i); };
+          if (i % 3 == 0) {
+            queue.sync(block);
+          } else {
+            queue.async(block);
+          }
+        }
+      });
+    }
+  }
+  queue.sync([] {});
+  EXPECT_EQ(seen.size(), 4u * perThread);
+  std::ranges::stable_sort(seen, {}, &std::pair<int, int>::first);
+  EXPECT_TRUE(std::ranges::is_sorted(seen));
+}
+
+TEST(SerialQueue, SyncRunsOnTheCallingThreadAndAnIdleQueueNeedsNoOther) {
+  ThreadPool pool;
+  SerialQueue queue("idle", pool);
+  std::thread::id ranOn;
+  queue.sync([&] { ranOn = std::this_thread::get_id(); });
+  EXPECT_EQ(ranOn, std::this_thread::get_id());
+  EXPECT_EQ(pool.threadCount(), 0u);
+}
+
+TEST(SerialQueue, IsCurrentOnlyInItsOwnBlocksAndThoseCalledFromThem) {
+  SerialQueue outer("outer");
+  SerialQueue inner("inner");
+  EXPECT_FALSE(outer.isCurrent());
+  outer.sync([&] {
+    EXPECT_TRUE(outer.isCurrent());
+    EXPECT_FALSE(inner.isCurrent());
+    inner.sync([&] {
+      outer.assertOnQueue();
+      inner.assertOnQueue();
+    });
+    inner.async([&] { EXPECT_FALSE(outer.isCurrent()); });
+  });
+  inner.sync([&] { EXPECT_FALSE(outer.isCurrent()); });
+}
+
+TEST(SerialQueueDeathTest, MisuseIsFatal) {
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  SerialQueue queue("events");
+  SerialQueue other("other");
+  EXPECT_EXIT(queue.assertOnQueue(), KilledBySignal(SIGABRT), "not running on queue \"events\"");
+  EXPECT_EXIT(queue.sync([&] { other.sync([&] { queue.sync([] {}); }); }), KilledBySignal(SIGABRT),
+              "sync on queue \"events\" from one of its own blocks");
+  EXPECT_EXIT(DispatchGroup().leave(), KilledBySignal(SIGABRT), "left more often than entered");
+}
+
+TEST(SerialQueue, GoesOnAfterASyncBlockThatThrows) {
+  SerialQueue queue("throwing");
+  EXPECT_THROW(queue.sync([] { throw std::runtime_error("no"); }), std::runtime_error);
+  bool ran = false;
+  queue.async([&] { ran = true; });
+  queue.sync([] {});
+  EXPECT_TRUE(ran);
+}
+
+TEST(SerialQueue, DestroysABlockBeforeTheNextAndRunsItWithoutAHandle) {
+  std::promise<bool> wasReleased;
+  {
+    SerialQueue queue("dropped");
+    auto held = std::make_shared<int>(1);
+    const std::weak_ptr<int> watched = held;
+    queue.async([held = std::move(held)] {});
+    queue.async([&wasReleased, watched] { wasReleased.set_value(watched.expired()); });
+  }
+  EXPECT_TRUE(wasReleased.get_future().get());
+}
+
+TEST(ThreadPool, BlockedQueuesStarveNobody) {
+  constexpr int queues = 24;
+  ThreadPool pool(0ms);
+  std::latch everybodyIsHere(queues);
+  DispatchGroup done;
+  for (int i = 0; i < queues; ++i) {
+    done.enter();
+    SerialQueue("blocked", pool).async([&] {
+      everybodyIsHere.arrive_and_wait();
+      done.leave();
+    });
+  }
+  done.wait();
+  // Threads without work end by themselves.
+  while (pool.threadCount() > 0)
+    std::this_thread::yield();
+}
+
+TEST(ThreadPool, EndsOnlyAfterItsWorkAndWhatThatSubmitted) {
+  std::atomic<int> ran = 0;
+  {
+    ThreadPool pool;
+    for (int i = 0; i < 20; ++i) {
+      pool.submit([&] {
+        ++ran;
+        pool.submit([&] { ++ran; });
+      });
+    }
+  }
+  EXPECT_EQ(ran, 40);
+}
+
+TEST(DispatchGroup, NotifiesOnceWhenTheCountIsZero) {
+  SerialQueue queue("notified");
+  DispatchGroup group;
+  int notified = 0;
+  const auto count = [&] {
+    int seen = 0;
+    queue.sync([&] { seen = notified; });
+    return seen;
+  };
+  const auto notify = [&] { group.notify(queue, [&] { queue.assertOnQueue(), ++notified; }); };
+  notify();
+  EXPECT_EQ(count(), 1) << "at once in an empty group";
+  group.enter();
+  group.enter();
+  notify();
+  notify();
+  group.leave();
+  EXPECT_EQ(count(), 1);
+  group.leave();
+  EXPECT_EQ(count(), 3);
+  group.enter();
+  group.leave();
+  EXPECT_EQ(count(), 3);
+}
+
+TEST(DispatchGroup, WaitsForTheLastToLeave) {
+  DispatchGroup group;
+  EXPECT_TRUE(group.wait(0ms));
+  group.enter();
+  EXPECT_FALSE(group.wait(1ms));
+  int written = 0;
+  SerialQueue queue("leaving");
+  queue.async([&, group]() mutable {
+    written = 1;
+    group.leave();
+  });
+  group.wait();
+  EXPECT_EQ(written, 1);
+}
+
+}  // namespace
+}  // namespace mirabel
