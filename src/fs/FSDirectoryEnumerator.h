@@ -23,7 +23,8 @@ struct EnumeratorOptions {
   constexpr EnumeratorOptions() = default;
   constexpr explicit EnumeratorOptions(std::int64_t raw) : rawValue(raw) {}
   constexpr EnumeratorOptions(std::initializer_list<EnumeratorOptions> options) {
-    for (const EnumeratorOptions& option : options) rawValue |= option.rawValue;
+    for (const EnumeratorOptions& option : options)
+      rawValue |= option.rawValue;
   }
 
   [[nodiscard]] constexpr bool contains(EnumeratorOptions o) const {

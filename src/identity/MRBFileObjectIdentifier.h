@@ -16,6 +16,8 @@ class MRBFileObjectIdentifier {
  public:
   static std::string fromFileID(std::uint64_t fileID);
   static std::string fromDocumentID(std::uint64_t documentID);
+  /// "#(null)" for a proxy without a bundle identifier.
+  static std::string fromBundleProxy(const BundleProxy& proxy);
   /// Nothing, with an error line, when no application has its document folder there.
   static std::optional<std::string> fromAppLibraryDataContainerURL(ApplicationRegistry& registry,
                                                                    const URL& url);

@@ -8,7 +8,7 @@ namespace mirabel {
 
 /// The document folder of an installed application. Its identity, parent and name come from the
 /// application registry; hidden entries of the folder are not counted as children.
-class LocalAppLibraryItem final : public LocalItem {
+class LocalAppLibraryItem : public LocalItem {
  public:
   /// Nothing, with an error line, for a proxy without a data container or whose folder cannot
   /// be made an item.
@@ -18,8 +18,11 @@ class LocalAppLibraryItem final : public LocalItem {
   bool vs_isContainer() const override { return true; }
   std::string description() const override;
 
- private:
+ protected:
   using LocalItem::LocalItem;
+
+ private:
+  void leaveOutHiddenEntries();
 };
 
 }  // namespace mirabel

@@ -4,7 +4,7 @@
 #include <memory>
 #include <optional>
 #include <string>
-#include <vector>
+#include <string_view>
 
 #include "foundation/URL.h"
 #include "foundation/Values.h"
@@ -89,6 +89,7 @@ class LocalItem {
   bool isShared() const { return false; }
 
   /// Where the item came from before it was trashed; read from its attribute on first access.
+  /// Always a place below the document folder of the application that owns the item.
   const std::optional<URL>& putBackURL() const;
 
   /// One line for logs: class, identifier, parent, name.
@@ -97,9 +98,23 @@ class LocalItem {
  protected:
   LocalItem(const ItemContext& context, URL url);
   /// Fills every property in the order that the messages promise; false when it failed.
-  bool build(ItemOverrides overrides);
+  [[nodiscard]] bool build(ItemOverrides overrides);
+  [[nodiscard]] std::string describe(std::string_view className) const;
 
   ItemContext context_;
+
+ private:
+  bool buildIdentity(ItemOverrides& overrides);
+  bool buildName(ItemOverrides& overrides);
+  void buildContent();
+  void buildUserMetadata();
+  void buildStatus();
+  void buildOwner(ItemOverrides& overrides);
+  [[nodiscard]] bool isAppLibrary() const { return itemIdentifier_.starts_with('#'); }
+  [[nodiscard]] std::uint64_t computedCapabilities() const;
+  [[nodiscard]] std::optional<Number> computedSize(bool isPackage) const;
+  [[nodiscard]] std::optional<URL> computedPutBackURL() const;
+
   URL fileURL_;
   std::string itemIdentifier_;
   std::string parentItemIdentifier_;

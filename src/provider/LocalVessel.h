@@ -19,6 +19,8 @@ class LocalVessel {
   /// Everything passed in outlives the provider.
   LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
               const AppLibraryOwners& owners);
+  LocalVessel(const LocalVessel&) = delete;
+  LocalVessel& operator=(const LocalVessel&) = delete;
 
   using ErrorHandler = std::function<void(std::optional<Error>)>;
 
@@ -41,7 +43,8 @@ class LocalVessel {
   void itemChangedAtURL(const URL& url) const;
 
   /// Lookups that the operations share. `urlForIdentifier` fails with the host's no-such-item
-  /// error; `lookUpItem` logs nothing of its own.
+  /// error; `lookUpItem` logs nothing of its own. Items refer to this provider and to what was
+  /// passed to it until their `putBackURL` was asked for.
   [[nodiscard]] Result<URL> urlForIdentifier(std::string_view identifier) const;
   [[nodiscard]] std::shared_ptr<LocalItem> lookUpItem(std::string_view identifier) const;
   [[nodiscard]] const ItemContext& itemContext() const { return context_; }
@@ -49,6 +52,9 @@ class LocalVessel {
   [[nodiscard]] const FileObjectURLs& identity() const { return identity_; }
 
  private:
+  [[nodiscard]] std::shared_ptr<LocalItem> temporaryLocalFolder() const;
+  [[nodiscard]] std::optional<std::string> identifierForURL(const URL& url) const;
+
   Platform platform_;
   FileObjectURLs identity_;
   ItemContext context_;

@@ -1,0 +1,272 @@
+#include <cerrno>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <string>
+#include <vector>
+
+#include "identity/FileObjectURLs.h"
+#include "support/FakeAppLibraries.h"
+#include "support/FakePlatform.h"
+#include "support/LogCapture.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr std::size_t always = 1000;
+
+class FileObjectURLsTest : public ::testing::Test {
+ protected:
+  std::string idOf(std::string_view name) {
+    return identity.itemIdentifier(fake.url(name)).value_or("nothing");
+  }
+  std::string fid(std::string_view name) {
+    return "fid=" + std::to_string(fake.volume.at(fake.path(name)).fileID);
+  }
+
+  FakePlatform fake;
+  FakeAppLibraries libraries{fake.applications};
+  FileObjectURLs identity{fake.platform(), libraries};
+  LogCapture log;
+};
+
+TEST_F(FileObjectURLsTest, DocumentsAreNamedByDocumentIDAndTheRestByFileID) {
+  fake.volume.makeFolder(fake.path("folder"));
+  fake.volume.writeFile(fake.path("file"));
+  fake.volume.makeFolder(fake.path("letter.quill"));
+  fake.volume.makeSymlink(fake.path("link"), "file");
+  fake.volume.makeFifo(fake.path("fifo"));
+  EXPECT_EQ(idOf("folder"), fid("folder"));
+  EXPECT_EQ(idOf("link"), fid("link"));
+  EXPECT_EQ(idOf("fifo"), fid("fifo"));
+  EXPECT_EQ(idOf("file"), "did=1");
+  EXPECT_EQ(idOf("letter.quill"), "did=2");
+  EXPECT_EQ(idOf("file"), "did=1");
+  EXPECT_THAT(log.lines(), IsEmpty());
+
+  for (const std::string_view name : {"", "folder", "link", "fifo", "file", "letter.quill"}) {
+    const auto url = identity.fileURLWithItemIdentifier(idOf(name));
+    ASSERT_TRUE(url) << name;
+    EXPECT_EQ(*url, fake.url(name));
+  }
+}
+
+TEST_F(FileObjectURLsTest, AnsweringAgainDoesNotTouchTheDisk) {
+  fake.volume.makeFolder(fake.path("folder"));
+  fake.volume.writeFile(fake.path("file"));
+  fake.volume.makeFolder(fake.path("letter.quill"));
+  for (const std::string_view name : {"folder", "file", "letter.quill"}) {
+    const URL url = fake.url(name);
+    const auto first = identity.itemIdentifier(url);
+    fake.faults.reset();
+    EXPECT_EQ(identity.itemIdentifier(url), first);
+    EXPECT_EQ(fake.faults.calls(), 0U) << name;
+  }
+}
+
+TEST_F(FileObjectURLsTest, RootsAreTheRootContainerAndTheLibraries) {
+  fake.install("org.example.draw", "/apps/draw");
+  EXPECT_EQ(idOf(""), VesselRootContainerItemIdentifier);
+  const URL library = URL::fileURL("/apps/draw/Documents");
+  EXPECT_EQ(identity.itemIdentifier(library), "#org.example.draw");
+  // A folder of that library is named by itself.
+  fake.volume.makeFolder("/apps/draw/Documents/a");
+  EXPECT_EQ(identity.itemIdentifier(URL::fileURL("/apps/draw/Documents/a")),
+            "fid=" + std::to_string(fake.volume.at("/apps/draw/Documents/a").fileID));
+
+  class Orphan final : public AppLibraryRoots {
+    List rootURLsForAppLibraries() const override {
+      return std::make_shared<std::vector<URL>>(1, URL::fileURL("/apps/gone/Documents"));
+    }
+  } orphan;
+  const FileObjectURLs other(fake.platform(), orphan);
+  EXPECT_FALSE(other.itemIdentifier(URL::fileURL("/apps/gone/Documents")));
+  EXPECT_THAT(log.lines(), ElementsAre(LogLine{LogLevel::error,
+                                               "[ERROR] can't find bundle proxy at "
+                                               "file:///apps/gone/Documents"}));
+}
+
+TEST_F(FileObjectURLsTest, OnlyFilesInSightHaveAnIdentifier) {
+  EXPECT_FALSE(identity.itemIdentifier(URL::fromString("https://example.org/a")));
+  EXPECT_FALSE(identity.itemIdentifier(URL::fileURL("/var/tmp/a")));
+  EXPECT_THAT(
+      log.lines(),
+      ElementsAre(
+          LogLine{LogLevel::error, "can't compute file object identifier if not a file URL"},
+          LogLine{LogLevel::debug,
+                  "can't compute file object identifier because \"/private/var/tmp/a\" is not "
+                  "part of Mirabel"}));
+  // Containment is a plain string prefix.
+  fake.volume.makeFolder("/home/me/Documents2/f");
+  EXPECT_TRUE(identity.itemIdentifier(URL::fileURL("/home/me/Documents2/f")));
+}
+
+TEST(FileObjectURLsCanonical, BothSpellingsOfVarAreOnePlace) {
+  for (const std::string_view storage : {"/private/var/me/Documents", "/var/me/Documents"}) {
+    FakePlatform fake(storage);
+    const NoAppLibraryRoots none;
+    const FileObjectURLs identity(fake.platform(), none);
+    for (const std::string_view spelling : {"/private/var/me/Documents", "/var/me/Documents"}) {
+      fake.volume.makeFolder(std::string(spelling) + "/f");
+      const URL url = URL::fileURL(spelling);
+      EXPECT_EQ(identity.itemIdentifier(url), VesselRootContainerItemIdentifier);
+      EXPECT_TRUE(identity.itemIdentifier(url.appendingPathComponent("f"))->starts_with("fid="));
+    }
+  }
+}
+
+TEST_F(FileObjectURLsTest, EachFailingStepSaysWhatItWas) {
+  fake.volume.writeFile(fake.path("f"));
+  const std::string path = "\"" + fake.path("f") + "\"";
+  const Error gone = Error::file(FileErrorCode::noSuchFile);
+  const Error broken = Error::posix(EIO);
+  struct Case {
+    Op op;
+    Error error;
+    LogLine line;
+  };
+  const Case cases[] = {
+      {Op::readValues,
+       gone,
+       {LogLevel::debug, "can't get resource value for documentIdentifier; " + gone.description()}},
+      {Op::readValues,
+       broken,
+       {LogLevel::error,
+        "can't get resource value for documentIdentifier; " + broken.description()}},
+      {Op::openObject,
+       Error::posix(EACCES),
+       {LogLevel::error, "can't open file at " + path + "; " + std::to_string(EACCES)}},
+      {Op::attributes,
+       broken,
+       {LogLevel::error, "can't get attribute list for " + path + "; " + std::to_string(EIO)}},
+      {Op::permanentStorage, broken, {LogLevel::error, "can't get permanent storage for " + path}},
+  };
+  for (const Case& c : cases) {
+    fake.faults.reset();
+    fake.faults.fail(c.op, c.error, 1, always);
+    log.clear();
+    EXPECT_EQ(idOf("f"), "nothing");
+    EXPECT_THAT(log.lines(), ElementsAre(c.line));
+  }
+}
+
+TEST_F(FileObjectURLsTest, CachedKindDecidesWhichValueIsMissed) {
+  fake.volume.makeFolder(fake.path("f"));
+  const Error broken = Error::posix(EIO);
+  fake.faults.fail(Op::readValues, broken, 1, always);
+  const URL folder = fake.url("f");
+  folder.resources().set(ResourceKey::isDirectory, true);
+  folder.resources().set(ResourceKey::isPackage, false);
+  EXPECT_FALSE(identity.itemIdentifier(folder));
+  const URL file = fake.url("f");
+  file.resources().set(ResourceKey::documentIdentifier, ResourceValue{});
+  EXPECT_FALSE(identity.itemIdentifier(file));
+  EXPECT_THAT(
+      log.lines(),
+      ElementsAre(LogLine{LogLevel::error,
+                          "can't get resource value for fileIdentifier; " + broken.description()},
+                  LogLine{LogLevel::error, "can't get resource isPackage for \"" + fake.path("f") +
+                                               "\"; " + broken.description()}));
+}
+
+TEST_F(FileObjectURLsTest, IdentifiersThatNameNothingAreRefusedWithTheirReason) {
+  const auto components = [](std::string_view count) {
+    return LogLine{
+        LogLevel::error,
+        "invalid identifier; identifier should have 2 components, not " + std::string(count)};
+  };
+  const auto unresolved = [](std::string_view number) {
+    return LogLine{LogLevel::debug, "can't resolve path matching file ID \"" + std::string(number) +
+                                        "\"; " + std::to_string(ENOENT)};
+  };
+  const std::pair<std::string_view, LogLine> cases[] = {
+      {"", components("1")},
+      {"#org.example.draw", components("1")},
+      {"did=5=6", components("3")},
+      {"xid=5", {LogLevel::error, "invalid host for identifier \"xid=5\""}},
+      {"FID=5", {LogLevel::error, "invalid host for identifier \"FID=5\""}},
+      {"fid=abc", unresolved("0")},
+      {"fid=", unresolved("0")},
+      {"fid=-7x", unresolved("-7")},
+      {"fid=18446744073709551615", unresolved("9223372036854775807")},
+      {"fid=-99999999999999999999", unresolved("-9223372036854775808")},
+      {"did=7", {LogLevel::error, "can't resolve doc ID \"7\"; " + std::to_string(ENOENT)}},
+  };
+  for (const auto& [identifier, line] : cases) {
+    log.clear();
+    EXPECT_FALSE(identity.fileURLWithItemIdentifier(identifier)) << identifier;
+    EXPECT_THAT(log.lines(), ElementsAre(line)) << identifier;
+  }
+}
+
+TEST_F(FileObjectURLsTest, VolumeWithoutADeviceResolvesNothing) {
+  for (const Op op : {Op::openObject, Op::device}) {
+    fake.faults.fail(op, Error::posix(EIO), 1, 2);
+    log.clear();
+    EXPECT_FALSE(identity.fileURLWithItemIdentifier("fid=100"));
+    EXPECT_FALSE(identity.fileURLWithFileIdentifier(100));
+    const LogLine line{LogLevel::error,
+                       "can't get device ID for \"" + fake.path("") + "\"; " + std::to_string(EIO)};
+    EXPECT_THAT(log.lines(), ElementsAre(line, line));
+  }
+  EXPECT_EQ(identity.deviceID(fake.url("missing")), 0U);
+  EXPECT_EQ(identity.deviceIDWithError(fake.url("missing")).error(), Error::posix(ENOENT));
+}
+
+TEST_F(FileObjectURLsTest, DocumentIsAskedForUpToSixTimes) {
+  fake.volume.writeFile(fake.path("f"));
+  ASSERT_EQ(idOf("f"), "did=1");
+  const auto resting = [](int code) {
+    return LogLine{LogLevel::debug, "doc ID resolution failed with errno(" + std::to_string(code) +
+                                        "), let's try again after resting"};
+  };
+  struct Case {
+    std::vector<int> failures;
+    bool isFound;
+    std::vector<LogLine> last;
+  };
+  const Case cases[] = {
+      {{EBUSY, EBUSY}, true, {}},
+      {{EAGAIN, EBUSY, ESTALE, EAGAIN, EAGAIN}, true, {}},
+      {{EAGAIN, EAGAIN, EAGAIN, EAGAIN, EAGAIN, EAGAIN},
+       false,
+       {{LogLevel::debug, "can't resolve doc ID \"1\" after five attempts"}}},
+      {{EAGAIN, EIO},
+       false,
+       {{LogLevel::error, "can't resolve doc ID \"1\"; " + std::to_string(EIO)}}},
+  };
+  for (const Case& c : cases) {
+    fake.faults.reset();
+    fake.clock.sleeps.clear();
+    log.clear();
+    std::vector<LogLine> expected;
+    for (std::size_t i = 0; i < c.failures.size(); ++i) {
+      fake.faults.fail(Op::fileIDOfDocument, Error::posix(c.failures[i]), i + 1);
+      expected.push_back(resting(c.failures[i]));
+    }
+    if (!c.isFound) expected.back() = c.last.front();
+    EXPECT_EQ(identity.fileURLWithItemIdentifier("did=1").has_value(), c.isFound);
+    EXPECT_EQ(log.lines(), expected);
+    EXPECT_EQ(fake.clock.sleeps,
+              std::vector(c.failures.size() - (c.isFound ? 0 : 1), std::chrono::milliseconds(1)));
+  }
+}
+
+#ifndef NDEBUG
+TEST_F(FileObjectURLsTest, ValueThatIsNoNumberStopsTheProcess) {
+  fake.volume.writeFile(fake.path("f"));
+  const URL url = fake.url("f");
+  url.resources().set(ResourceKey::documentIdentifier, std::string("7"));
+  EXPECT_DEATH(
+      {
+        Log::shared().setSink(nullptr, LogLevel::error);
+        static_cast<void>(identity.itemIdentifier(url));
+      },
+      "class Number.*class String");
+}
+#endif
+
+}  // namespace
+}  // namespace mirabel::testing
