@@ -14,7 +14,9 @@ namespace mirabel::keyedarchive {
 /// the extended attributes and of the cache files. The bytes are a binary property list; see
 /// docs/formats/keyed-archive.md. Reading answers an error of domain `propertyList` for bytes
 /// that are no archive and for a root of another type. Strings are bytes: one that is not UTF-8
-/// comes back as it went in.
+/// comes back as it went in; but the texts within a dictionary must be UTF-8. Writing answers an
+/// error of that domain for a date outside the calendar, and for a value that is too large to be
+/// read back: 64 KiB for the attributes' classes, 16 MiB for a dictionary.
 
 [[nodiscard]] Result<Data> archiveDate(const Date& date);
 [[nodiscard]] Result<Data> archiveNumber(const Number& number);
