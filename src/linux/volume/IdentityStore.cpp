@@ -76,16 +76,25 @@ struct IdentityStore::Statements {
 
 Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
   std::unique_ptr<IdentityStore> store(new IdentityStore(database));
-  if (auto made = database.execute(schema); !made) return fail(made.error());
-  if (auto prepared = store->prepare(); !prepared) return fail(prepared.error());
-  auto version = store->number("schema");
-  if (!version) return fail(version.error());
-  if (!*version) {
-    if (auto set = store->setNumber("schema", schemaVersion); !set) return fail(set.error());
-  } else if (**version > schemaVersion) {
-    return fail(Error::store(0, "the database was written by a later version of this program"));
+  // All of it at once: a half-made schema would be taken for a damaged one.
+  if (auto begun = database.execute("BEGIN"); !begun) return fail(begun.error());
+  auto made = store->make();
+  if (made) made = database.execute("COMMIT");
+  if (!made) {
+    static_cast<void>(database.execute("ROLLBACK"));
+    return fail(made.error());
   }
   return store;
+}
+
+Result<void> IdentityStore::make() {
+  if (auto tables = database_.execute(schema); !tables) return tables;
+  if (auto prepared = prepare(); !prepared) return prepared;
+  auto version = number("schema");
+  if (!version) return fail(version.error());
+  if (!*version) return setNumber("schema", schemaVersion);
+  if (**version <= schemaVersion) return {};
+  return fail(Error::store(0, "the database was written by a later version of this program"));
 }
 
 Result<void> IdentityStore::prepare() {

@@ -111,6 +111,7 @@ class IdentityStore {
 
  private:
   explicit IdentityStore(Database& database) : database_(database) {}
+  [[nodiscard]] Result<void> make();
   [[nodiscard]] Result<void> prepare();
   [[nodiscard]] Result<std::optional<ObjectRow>> readObject(Statement& statement);
 

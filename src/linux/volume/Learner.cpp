@@ -6,7 +6,7 @@
 #include <utility>
 #include <vector>
 
-#include "linux/volume/EntryLook.h"
+#include "linux/volume/DiskEntry.h"
 
 namespace mirabel {
 

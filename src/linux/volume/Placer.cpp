@@ -7,7 +7,7 @@
 #include <utility>
 
 #include "linux/kernel/LongPath.h"
-#include "linux/volume/EntryLook.h"
+#include "linux/volume/DiskEntry.h"
 
 namespace mirabel {
 namespace {

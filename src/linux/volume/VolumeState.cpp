@@ -123,6 +123,10 @@ Result<void> VolumeState::setAside(const Notice& notice) {
 }
 
 Result<void> VolumeState::openDatabase(Trust trust) {
+  // SQLite gives its log the mode of the database.
+  const UniqueFd made(::openat(folder_.descriptor(), std::string(databaseName).c_str(),
+                               O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+  if (!made) return fail(Error::posix(errno, folder_.file(databaseName)));
   auto database = Database::open(folder_.file(databaseName));
   if (!database) return fail(database.error());
   if (trust != Trust::asClosed) {

@@ -1,11 +1,11 @@
-#include "linux/volume/EntryLook.h"
+#include "linux/volume/DiskEntry.h"
 
 #include <fcntl.h>
 #include <utility>
 
 namespace mirabel {
 
-Result<EntryLook> lookAt(const MonitoredRoots& roots, const std::string& path) {
+Result<DiskEntry> lookAt(const MonitoredRoots& roots, const std::string& path) {
   const auto place = roots.locate(path);
   const bool isRoot = path == "/" || (place && place->relative.empty());
   const SplitPath split = isRoot ? SplitPath{path, ""} : splitPath(path);
@@ -14,7 +14,7 @@ Result<EntryLook> lookAt(const MonitoredRoots& roots, const std::string& path) {
   auto status = statusAt(folder->get(), split.name);
   if (!status) return fail(status.error());
   SeenObject seen{folder->get(), split.name, *status};
-  return EntryLook{std::move(*folder), std::move(seen)};
+  return DiskEntry{std::move(*folder), std::move(seen)};
 }
 
 }  // namespace mirabel

@@ -1,0 +1,60 @@
+#pragma once
+
+#include <chrono>
+#include <gtest/gtest.h>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "linux/kernel/MonitoredRoots.h"
+#include "linux/volume/VolumeIndex.h"
+
+namespace mirabel {
+
+/// A folder "Documents" on real disk, a state folder beside it, and the index over both. Folders
+/// named "*.package" are packages. Lies below $MIRABEL_TEST_DIR where that is set, and is removed
+/// at the end.
+class VolumeFixture : public testing::Test {
+ protected:
+  VolumeFixture();
+  ~VolumeFixture() override;
+
+  std::string path(std::string_view relative) const {
+    return documents_ + "/" + std::string(relative);
+  }
+  void write(std::string_view relative, std::string_view contents = "x") const;
+  void makeFolder(std::string_view relative) const;
+  void rename(std::string_view from, std::string_view to) const;
+  void exchange(std::string_view a, std::string_view b) const;
+  void remove(std::string_view relative) const;
+  void link(std::string_view from, std::string_view to) const;
+  std::uint64_t inode(std::string_view relative) const;
+
+  /// Closes the index in order; the next use opens it again.
+  void close() { index_.reset(); }
+  VolumeIndex& index();
+  Result<std::unique_ptr<VolumeIndex>> tryOpen(std::chrono::milliseconds timeout = {});
+
+  /// What the index makes of one name.
+  Sighting see(std::string_view relative);
+  std::uint32_t document(std::string_view relative) { return see(relative).documentID; }
+  std::uint64_t file(std::string_view relative) { return see(relative).fileID; }
+  /// What it makes of all names of a folder at once, as a listing does. In directory order.
+  std::vector<Sighting> list(std::string_view folder = "");
+
+  /// Relative path of a document or a file ID; empty when there is none.
+  std::string findDocument(std::uint32_t documentID);
+  std::string findFile(std::uint64_t fileID);
+
+  std::string base_;
+  std::string documents_;
+  std::string state_;
+  std::vector<std::string> notices_;
+
+ private:
+  std::unique_ptr<MonitoredRoots> roots_;
+  std::unique_ptr<VolumeIndex> index_;
+};
+
+}  // namespace mirabel

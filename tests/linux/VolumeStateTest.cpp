@@ -1,0 +1,204 @@
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <set>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "linux/VolumeFixture.h"
+#include "linux/volume/IdentityStore.h"
+
+namespace mirabel {
+namespace {
+
+class VolumeStateTest : public VolumeFixture {
+ protected:
+  std::string volumeFolder() const {
+    for (const auto& entry : std::filesystem::directory_iterator(state_))
+      return entry.path();
+    return "";
+  }
+  std::string database() const { return volumeFolder() + "/volume.db"; }
+};
+
+TEST_F(VolumeStateTest, OneProcessOwnsTheVolumeAndOthersAreTold) {
+  write("doc");
+  see("doc");
+  auto second = tryOpen(std::chrono::milliseconds(30));
+  ASSERT_FALSE(second);
+  EXPECT_TRUE(second.error().isPosix(EBUSY));
+  ASSERT_EQ(notices_.size(), 1u);
+  EXPECT_NE(notices_[0].find("waiting"), std::string::npos);
+  close();
+  EXPECT_TRUE(tryOpen());
+}
+
+TEST_F(VolumeStateTest, AStateFolderThatIsNotOursIsRefused) {
+  write("doc");
+  std::filesystem::create_directory(base_ + "/real");
+  std::filesystem::create_symlink(base_ + "/real", state_);
+  auto linked = tryOpen();
+  ASSERT_FALSE(linked);
+  EXPECT_TRUE(linked.error().isPosix(EPERM)) << linked.error().description();
+  EXPECT_TRUE(std::filesystem::is_empty(base_ + "/real"));
+  std::filesystem::remove(state_);
+
+  write("../state", "a file");
+  EXPECT_FALSE(tryOpen());
+  std::filesystem::remove(state_);
+
+  if (::geteuid() != 0) GTEST_SKIP() << "only root can give a folder away";
+  std::filesystem::create_directory(state_);
+  ASSERT_EQ(::chown(state_.c_str(), 65534, 65534), 0);
+  auto foreign = tryOpen();
+  ASSERT_FALSE(foreign);
+  EXPECT_TRUE(foreign.error().isPosix(EPERM));
+  EXPECT_TRUE(std::filesystem::is_empty(state_));
+}
+
+TEST_F(VolumeStateTest, TheStateIsForItsOwnerOnly) {
+  std::filesystem::create_directory(state_);
+  ASSERT_EQ(::chmod(state_.c_str(), 0755), 0);
+  write("doc");
+  see("doc");
+  for (const auto& entry : std::filesystem::recursive_directory_iterator(state_)) {
+    struct stat status {};
+    ASSERT_EQ(::lstat(entry.path().c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 0077, 0u) << entry.path();
+  }
+}
+
+struct Damage {
+  const char* name;
+  void (*make)(const std::string& database);
+};
+
+class DamagedState : public VolumeStateTest, public testing::WithParamInterface<Damage> {};
+
+// Whatever happened to the database, nothing that comes after gets an identity of before.
+TEST_P(DamagedState, NewIdentitiesAreNotMixedWithOld) {
+  std::set<std::uint64_t> files;
+  std::set<std::uint32_t> documents;
+  for (int i = 0; i < 40; ++i)
+    write("f" + std::to_string(i));
+  makeFolder("folder");
+  const UUID history = index().historyUUID();
+  for (const Sighting& sighting : list()) {
+    files.insert(sighting.fileID);
+    if (sighting.documentID != 0) documents.insert(sighting.documentID);
+  }
+  close();
+  GetParam().make(database());
+  for (int i = 0; i < 40; ++i)
+    remove("f" + std::to_string(i));
+  remove("folder");
+  for (int i = 0; i < 40; ++i)
+    write("g" + std::to_string(i));
+  makeFolder("another");
+  for (const Sighting& sighting : list()) {
+    EXPECT_FALSE(files.contains(sighting.fileID)) << sighting.name;
+    EXPECT_FALSE(documents.contains(sighting.documentID)) << sighting.name;
+  }
+  EXPECT_NE(index().historyUUID(), history);
+  // It is said once, and the next start finds everything in order.
+  const UUID renewed = index().historyUUID();
+  const std::uint32_t kept = document("g0");
+  notices_.clear();
+  close();
+  EXPECT_EQ(document("g0"), kept);
+  EXPECT_EQ(index().historyUUID(), renewed);
+  EXPECT_TRUE(notices_.empty());
+}
+
+void overwrite(const std::string& file, std::streamoff offset, std::string_view bytes) {
+  std::fstream stream(file, std::ios::in | std::ios::out | std::ios::binary);
+  stream.seekp(offset);
+  stream << bytes;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Each, DamagedState,
+    testing::Values(
+        Damage{"Header", [](const std::string& db) { overwrite(db, 0, "not a database"); }},
+        Damage{"Page",
+               [](const std::string& db) { overwrite(db, 4096, std::string(900, '\xee')); }},
+        Damage{"OneByteOfAName",
+               [](const std::string& db) {
+                 std::ifstream in(db, std::ios::binary);
+                 const std::string bytes((std::istreambuf_iterator<char>(in)), {});
+                 overwrite(db, static_cast<std::streamoff>(bytes.find("f17")) + 1, "9");
+               }},
+        Damage{"Truncated",
+               [](const std::string& db) {
+                 std::filesystem::resize_file(db, std::filesystem::file_size(db) / 2);
+               }},
+        Damage{"Empty", [](const std::string& db) { std::filesystem::resize_file(db, 0); }},
+        Damage{"Removed", [](const std::string& db) { std::filesystem::remove(db); }},
+        Damage{"WitnessGoneToo",
+               [](const std::string& db) {
+                 overwrite(db, 0, "not a database");
+                 std::filesystem::remove(std::filesystem::path(db).parent_path() / "witness");
+               }}),
+    [](const auto& test) { return test.param.name; });
+
+TEST_F(VolumeStateTest, AnOlderCopyPutBackGivesNoIdentityTwice) {
+  write("early");
+  const std::uint32_t early = document("early");
+  const UUID history = index().historyUUID();
+  close();
+  std::filesystem::copy_file(database(), base_ + "/copy");
+  write("late");
+  const Sighting late = see("late");
+  close();
+  std::filesystem::copy_file(base_ + "/copy", database(),
+                             std::filesystem::copy_options::overwrite_existing);
+  remove("late");
+  write("later");
+  const Sighting later = see("later");
+  EXPECT_NE(later.documentID, late.documentID);
+  EXPECT_NE(later.fileID, late.fileID);
+  EXPECT_EQ(document("early"), early);
+  EXPECT_NE(index().historyUUID(), history);
+}
+
+// SIGKILL while identities are being handed out: what a process was told stays true.
+TEST_F(VolumeStateTest, AKilledProcessLosesNothingThatItWasTold) {
+  for (int round = 0; round < 4; ++round) {
+    int channel[2];
+    ASSERT_EQ(::pipe(channel), 0);
+    const pid_t child = ::fork();
+    if (child == 0) {
+      for (int i = 0;; ++i) {
+        const std::string name = "r" + std::to_string(round) + "-" + std::to_string(i);
+        write(name);
+        const std::string line = name + " " + std::to_string(document(name)) + "\n";
+        if (::write(channel[1], line.data(), line.size()) < 0) ::_exit(1);
+      }
+    }
+    ::close(channel[1]);
+    std::string told;
+    char buffer[512];
+    while (told.size() < 200 + 150u * static_cast<unsigned>(round)) {
+      const ssize_t count = ::read(channel[0], buffer, sizeof buffer);
+      ASSERT_GT(count, 0);
+      told.append(buffer, static_cast<std::size_t>(count));
+    }
+    ::kill(child, SIGKILL);
+    while (const ssize_t count = ::read(channel[0], buffer, sizeof buffer)) {
+      told.append(buffer, static_cast<std::size_t>(count));
+    }
+    ::close(channel[0]);
+    ::waitpid(child, nullptr, 0);
+    std::istringstream lines(told.substr(0, told.rfind('\n') + 1));
+    std::string name;
+    std::uint32_t id = 0;
+    while (lines >> name >> id)
+      EXPECT_EQ(document(name), id) << name;
+    close();
+  }
+  EXPECT_TRUE(notices_.empty());
+}
+
+}  // namespace
+}  // namespace mirabel
