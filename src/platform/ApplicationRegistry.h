@@ -1,6 +1,5 @@
 #pragma once
 
-#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -20,17 +19,19 @@ struct BundleProxy {
 class ApplicationRegistry {
  public:
   virtual ~ApplicationRegistry() = default;
+  /// Nothing for an identifier that no application has, the empty one among them.
   [[nodiscard]] virtual std::optional<BundleProxy> proxyForBundleIdentifier(
       std::string_view identifier) = 0;
-  /// The application whose document folder (its data container's "Documents") is at `url`.
+  /// The application whose document folder (its data container's "Documents") is at `url`; both
+  /// are compared in canonical form, see `URL::properURL`.
   [[nodiscard]] virtual std::optional<BundleProxy> proxyAt(const URL& url) = 0;
 };
 
 /// A machine without applications that expose documents.
 class NoApplications final : public ApplicationRegistry {
  public:
-  std::optional<BundleProxy> proxyForBundleIdentifier(std::string_view) override { return {}; }
-  std::optional<BundleProxy> proxyAt(const URL&) override { return {}; }
+  std::optional<BundleProxy> proxyForBundleIdentifier(std::string_view identifier) override;
+  std::optional<BundleProxy> proxyAt(const URL& url) override;
 };
 
 }  // namespace mirabel

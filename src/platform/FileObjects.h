@@ -47,9 +47,9 @@ class FileObjects {
   /// Answers from the URL's resource cache what that already knows.
   [[nodiscard]] virtual Result<FileStatus> status(const URL& url) = 0;
   /// Where the object lies now, checked against the disk before it is answered. POSIX error
-  /// ENOENT when no object of that ID is to be found in the monitored folders.
-  [[nodiscard]] virtual Result<std::string> pathOfFileID(DeviceID device,
-                                                         std::uint64_t fileID) = 0;
+  /// ENOENT when no object of that ID is to be found in the monitored folders; no object has the
+  /// ID 0 or one of 2^63 and more.
+  [[nodiscard]] virtual Result<std::string> pathOfFileID(DeviceID device, std::uint64_t fileID) = 0;
 };
 
 }  // namespace mirabel

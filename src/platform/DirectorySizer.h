@@ -1,0 +1,18 @@
+#pragma once
+
+#include <cstdint>
+
+#include "foundation/Error.h"
+#include "foundation/URL.h"
+
+namespace mirabel {
+
+/// Adds up folders. Any thread may call it.
+class DirectorySizer {
+ public:
+  virtual ~DirectorySizer() = default;
+  /// How many bytes the files below the folder hold, links not followed. POSIX errors.
+  [[nodiscard]] virtual Result<std::uint64_t> directorySize(const URL& folder) = 0;
+};
+
+}  // namespace mirabel
