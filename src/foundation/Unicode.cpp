@@ -28,22 +28,6 @@ std::optional<Sequence> sequenceOf(unsigned char first) {
   return std::nullopt;
 }
 
-/// Takes the first character off `rest`, which is not empty.
-std::optional<char32_t> takeCharacter(std::string_view& rest) {
-  const auto sequence = sequenceOf(static_cast<unsigned char>(rest.front()));
-  if (!sequence || rest.size() < sequence->length) return std::nullopt;
-  char32_t character = sequence->firstBits;
-  for (const char c : rest.substr(1, sequence->length - 1)) {
-    const auto byte = static_cast<unsigned char>(c);
-    if ((byte & 0xC0) != 0x80) return std::nullopt;
-    character = character << 6 | (byte & 0x3Fu);
-  }
-  if (character < sequence->smallest || character > 0x10FFFF) return std::nullopt;
-  if (isSurrogate(character)) return std::nullopt;
-  rest.remove_prefix(sequence->length);
-  return character;
-}
-
 void appendUTF8(std::string& text, char32_t c) {
   const auto append = [&text](char32_t byte) { text.push_back(static_cast<char>(byte)); };
   if (c < 0x80) return append(c);
@@ -63,9 +47,24 @@ void appendUTF8(std::string& text, char32_t c) {
 
 }  // namespace
 
+std::optional<char32_t> takeUTF8Character(std::string_view& rest) {
+  const auto sequence = sequenceOf(static_cast<unsigned char>(rest.front()));
+  if (!sequence || rest.size() < sequence->length) return std::nullopt;
+  char32_t character = sequence->firstBits;
+  for (const char c : rest.substr(1, sequence->length - 1)) {
+    const auto byte = static_cast<unsigned char>(c);
+    if ((byte & 0xC0) != 0x80) return std::nullopt;
+    character = character << 6 | (byte & 0x3Fu);
+  }
+  if (character < sequence->smallest || character > 0x10FFFF) return std::nullopt;
+  if (isSurrogate(character)) return std::nullopt;
+  rest.remove_prefix(sequence->length);
+  return character;
+}
+
 bool isUTF8(std::string_view bytes) {
   while (!bytes.empty()) {
-    if (!takeCharacter(bytes)) return false;
+    if (!takeUTF8Character(bytes)) return false;
   }
   return true;
 }
@@ -74,7 +73,7 @@ std::optional<std::u16string> utf16FromUTF8(std::string_view bytes) {
   std::u16string units;
   units.reserve(bytes.size());
   while (!bytes.empty()) {
-    const auto character = takeCharacter(bytes);
+    const auto character = takeUTF8Character(bytes);
     if (!character) return std::nullopt;
     if (*character < 0x10000) {
       units.push_back(static_cast<char16_t>(*character));

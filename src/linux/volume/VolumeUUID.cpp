@@ -34,20 +34,36 @@ Result<UUID> uuidFromFileSystemID(int folder) {
   return uuid;
 }
 
-}  // namespace
+// A folder that may be searched but not read still tells its file system's ID.
+Result<UniqueFd> openFolder(const std::string& path) {
+  auto opened = openLongPath(AT_FDCWD, path, O_RDONLY | O_DIRECTORY);
+  if (!opened) opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
+  return opened;
+}
 
-Result<UUID> volumeUUID(const std::string& folder) {
-  auto opened = openLongPath(AT_FDCWD, folder, O_RDONLY | O_DIRECTORY);
-  // A folder that may be searched but not read still tells its file system's ID.
-  if (!opened) opened = openLongPath(AT_FDCWD, folder, O_PATH | O_DIRECTORY);
-  if (!opened) return fail(opened.error());
+std::optional<UUID> uuidFromKernel(int folder) {
   KernelUUID answer{};
   UUID uuid;
-  if (::ioctl(opened->get(), MIRABEL_IOC_GETFSUUID, &answer) == 0 &&
-      answer.length == uuid.bytes.size()) {
-    std::copy(std::begin(answer.bytes), std::end(answer.bytes), uuid.bytes.begin());
-    if (!uuid.isNil()) return uuid;
+  if (::ioctl(folder, MIRABEL_IOC_GETFSUUID, &answer) != 0 || answer.length != uuid.bytes.size()) {
+    return std::nullopt;
   }
+  std::copy(std::begin(answer.bytes), std::end(answer.bytes), uuid.bytes.begin());
+  if (uuid.isNil()) return std::nullopt;
+  return uuid;
+}
+
+}  // namespace
+
+std::optional<UUID> kernelVolumeUUID(const std::string& folder) {
+  auto opened = openFolder(folder);
+  if (!opened) return std::nullopt;
+  return uuidFromKernel(opened->get());
+}
+
+Result<UUID> volumeUUID(const std::string& folder) {
+  auto opened = openFolder(folder);
+  if (!opened) return fail(opened.error());
+  if (auto uuid = uuidFromKernel(opened->get())) return *uuid;
   return uuidFromFileSystemID(opened->get());
 }
 

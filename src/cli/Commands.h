@@ -1,0 +1,27 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "cli/Program.h"
+
+namespace mirabel {
+
+// One function a command; each reports its own failures and answers the code to end with.
+
+ExitCode runId(Program& program, const std::string& path);
+ExitCode runPath(Program& program, const std::string& item);
+ExitCode runInfo(Program& program, const std::string& item);
+
+struct ListOptions {
+  std::string item = "root";
+  std::optional<std::string> page;     ///< base64 of a cursor
+  std::optional<std::uint64_t> pages;  ///< absent: all
+};
+ExitCode runList(Program& program, const ListOptions& options);
+
+ExitCode runDoctor(Program& program);
+ExitCode runDemo(Program& program);
+
+}  // namespace mirabel

@@ -1,0 +1,166 @@
+#include <cerrno>
+#include <cstdlib>
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <ostream>
+#include <sstream>
+#include <unistd.h>
+
+#include "cli/Commands.h"
+#include "cli/Printing.h"
+#include "linux/kernel/UniqueFd.h"
+
+namespace mirabel {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// A home that is gone when the demonstration ends.
+class TemporaryHome {
+ public:
+  TemporaryHome() {
+    std::string pattern = fs::temp_directory_path() / "mirabel-demo-XXXXXX";
+    if (::mkdtemp(pattern.data()) != nullptr) path_ = pattern;
+  }
+  ~TemporaryHome() {
+    std::error_code ignored;
+    if (!path_.empty()) fs::remove_all(path_, ignored);
+  }
+  TemporaryHome(const TemporaryHome&) = delete;
+  TemporaryHome& operator=(const TemporaryHome&) = delete;
+
+  [[nodiscard]] const fs::path& path() const { return path_; }
+
+ private:
+  fs::path path_;
+};
+
+class Tour {
+ public:
+  Tour(Program& program, const fs::path& home)
+      : out_(program.out()), home_(home), documents_(home / "Documents") {}
+
+  bool run() {
+    say("A temporary home with a few documents.");
+    return makeDocuments() && list() && rename() && save() && moveAndReuse();
+  }
+
+ private:
+  void say(std::string_view text) { out_ << "\n# " << text << '\n'; }
+  void shell(std::string_view text) { out_ << "$ " << text << '\n'; }
+
+  bool write(const fs::path& file, std::string_view contents) {
+    fs::create_directories(file.parent_path());
+    std::ofstream stream(file, std::ios::binary);
+    stream << contents;
+    stream.close();
+    return stream.good();
+  }
+
+  // Runs one command as a process of its own would: the provider starts and stops each time, so
+  // whatever is found again was found on disk.
+  std::string command(const std::string& shown, ExitCode (*execute)(Program&, const std::string&),
+                      const std::string& argument) {
+    shell("mirabel " + shown);
+    std::ostringstream answer;
+    GlobalOptions options;
+    options.home = home_;
+    Program program(options, {answer, out_});
+    const ExitCode code = execute(program, argument);
+    out_ << answer.str();
+    std::string line = answer.str();
+    if (code == ExitCode::done && line.ends_with('\n')) line.pop_back();
+    return code == ExitCode::done ? line : std::string();
+  }
+
+  bool makeDocuments() {
+    const bool made = write(documents_ / "letter.txt", "Dear Aunt Mirabel,\n") &&
+                      write(documents_ / "budget.csv", "rent,900\nfood,350\n") &&
+                      write(documents_ / "Recipes/soup.md", "# Soup\n") &&
+                      write(documents_ / "Recipes/bread.md", "# Bread\n") &&
+                      write(documents_ / "Holiday.quill/text.xml", "<text>Sea and sun</text>\n");
+    if (!made) say("The documents can't be written.");
+    return made;
+  }
+
+  bool list() {
+    say("Every item has an identifier; a folder that is one document (Holiday.quill) has one too.");
+    const auto listing = [](Program& program, const std::string& item) {
+      ListOptions options;
+      options.item = item;
+      return runList(program, options);
+    };
+    const bool listed = !command("ls", listing, "root").empty();
+    letter_ = command("id ~/Documents/letter.txt", runId, documents_ / "letter.txt");
+    return listed && !letter_.empty();
+  }
+
+  bool rename() {
+    say("Rename it while nothing runs: the identifier leads to the new name.");
+    shell("mv ~/Documents/letter.txt ~/Documents/thanks.txt");
+    fs::rename(documents_ / "letter.txt", documents_ / "thanks.txt");
+    return expectAt("thanks.txt");
+  }
+
+  bool save() {
+    say("Save it as editors do: a new file, synced, renamed over the old one. The inode is "
+        "another, the document is the same.");
+    shell("echo 'Thank you!' > .thanks.tmp && sync .thanks.tmp && mv .thanks.tmp thanks.txt");
+    const fs::path temporary = documents_ / ".thanks.tmp";
+    if (!write(temporary, "Thank you!\n") || !sync(temporary)) return false;
+    fs::rename(temporary, documents_ / "thanks.txt");
+    return expectAt("thanks.txt");
+  }
+
+  bool moveAndReuse() {
+    say("Move it, and give its old name to something else: that is another document.");
+    shell("mv ~/Documents/thanks.txt ~/Documents/Recipes/ && echo new > ~/Documents/thanks.txt");
+    fs::rename(documents_ / "thanks.txt", documents_ / "Recipes/thanks.txt");
+    if (!write(documents_ / "thanks.txt", "new\n") || !expectAt("Recipes/thanks.txt")) return false;
+    const std::string other =
+        command("id ~/Documents/thanks.txt", runId, documents_ / "thanks.txt");
+    if (other.empty() || other == letter_) return false;
+    say("Everything that is known of it:");
+    return !command("info " + letter_, runInfo, letter_).empty();
+  }
+
+  static bool sync(const fs::path& file) {
+    const UniqueFd opened(::open(file.c_str(), O_RDONLY | O_CLOEXEC));
+    return opened && ::fsync(opened.get()) == 0;
+  }
+
+  bool expectAt(const fs::path& place) {
+    const std::string found = command("path " + letter_, runPath, letter_);
+    return found == (documents_ / place).native();
+  }
+
+  std::ostream& out_;
+  fs::path home_;
+  fs::path documents_;
+  std::string letter_;
+};
+
+}  // namespace
+
+ExitCode runDemo(Program& program) {
+  const TemporaryHome home;
+  if (home.path().empty()) {
+    return program.report(Error::posix(errno), "can't make a temporary home");
+  }
+  std::error_code failure;
+  const fs::path resolved = fs::canonical(home.path(), failure);
+  if (failure) return program.report(Error::posix(failure.value()), "can't make a temporary home");
+  try {
+    if (Tour(program, resolved).run()) {
+      program.out() << "\nThe home was temporary and is gone. Try it on your own: mirabel ls\n";
+      return ExitCode::done;
+    }
+  } catch (const fs::filesystem_error& error) {
+    return program.report(Error::posix(error.code().value(), error.what()), "the tour broke off");
+  }
+  program.note("the tour did not find what it expected; run \"mirabel doctor\"");
+  return ExitCode::failed;
+}
+
+}  // namespace mirabel

@@ -1,0 +1,143 @@
+#include <cerrno>
+#include <nlohmann/json.hpp>
+#include <ostream>
+#include <vector>
+
+#include "cli/Commands.h"
+#include "cli/ItemJSON.h"
+#include "cli/Printing.h"
+#include "linux/files/HomeLayout.h"
+#include "linux/volume/VolumeAbilities.h"
+
+namespace mirabel {
+namespace {
+
+enum class Health { good, limited, bad };
+
+/// One line: what was looked at, how it is, and how to mend it where it can be mended.
+struct Finding {
+  std::string subject;
+  Health health;
+  std::string text;
+  std::string remedy;
+};
+
+std::string_view nameOf(Health health) {
+  switch (health) {
+    case Health::good:
+      return "ok";
+    case Health::limited:
+      return "limited";
+    case Health::bad:
+      return "missing";
+  }
+  return "";
+}
+
+Finding attributesFinding(const Result<void>& tried) {
+  const std::string subject = "extended attributes";
+  if (tried) return {subject, Health::good, "the volume keeps user attributes", ""};
+  const Error& error = tried.error();
+  if (error.isPosix(EOPNOTSUPP) || error.isPosix(EPERM)) {
+    return {subject, Health::bad,
+            "the volume keeps no user attributes: tags, favourites, dates of use and where a "
+            "trashed item came from can't be kept; identities last all the same",
+            "use a file system that has them, and mount it without \"nouser_xattr\""};
+  }
+  return {subject, Health::limited, "could not be tried: " + error.description(),
+          "make the document storage writable"};
+}
+
+Finding birthTimeFinding(bool has) {
+  const std::string subject = "birth times";
+  if (has) return {subject, Health::good, "the volume tells when a file was made", ""};
+  return {subject, Health::limited, "the volume does not tell when a file was made",
+          "creation dates are absent; nothing else suffers"};
+}
+
+Finding handleFinding(bool has, bool hasBirthTimes) {
+  const std::string subject = "file handles";
+  if (has) {
+    return {subject, Health::good, "the volume tells a new file from one that had its number", ""};
+  }
+  return {subject, hasBirthTimes ? Health::limited : Health::bad,
+          "the volume gives no file handles: a new file with a used inode number is recognised by "
+          "its times alone",
+          "keep documents on ext4, xfs, btrfs or tmpfs"};
+}
+
+Finding uuidFinding(bool has) {
+  const std::string subject = "volume UUID";
+  if (has) return {subject, Health::good, "the volume has one of its own", ""};
+  return {subject, Health::limited,
+          "the volume has none, or the kernel does not tell it (6.9 and later do); one is made "
+          "from the file system's ID",
+          ""};
+}
+
+std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
+  std::vector<Finding> findings;
+  findings.push_back({"home", Health::good, layout.home, ""});
+  auto abilities = volumeAbilities(layout.documents);
+  const std::string* volume = &layout.documents;
+  if (!abilities) {
+    findings.push_back({"documents", Health::bad,
+                        layout.documents + ": " + abilities.error().description(),
+                        "make the folder; until then there is nothing to present"});
+    volume = &layout.home;
+    abilities = volumeAbilities(*volume);
+  } else {
+    findings.push_back({"documents", Health::good, layout.documents, ""});
+  }
+  if (abilities) {
+    findings.push_back(attributesFinding(abilities->userAttributes));
+    findings.push_back(birthTimeFinding(abilities->hasBirthTimes));
+    findings.push_back(handleFinding(abilities->hasHandles, abilities->hasBirthTimes));
+    findings.push_back(uuidFinding(abilities->hasUUID));
+  }
+  Session::Options options{program.options().home, program.options().timeout,
+                           [&](std::string_view text) { program.note(text); }};
+  auto session = Session::open(std::move(options));
+  if (session) {
+    findings.push_back({"state", Health::good, layout.stateFolder, ""});
+  } else {
+    findings.push_back({"state", Health::bad, session.error().description(),
+                        "identities can't be kept until this is mended"});
+  }
+  return findings;
+}
+
+void print(Program& program, const Finding& finding) {
+  if (program.options().json) {
+    nlohmann::json line = {{"subject", finding.subject}, {"health", nameOf(finding.health)}};
+    setText(line, "text", finding.text);
+    if (!finding.remedy.empty()) line["remedy"] = finding.remedy;
+    program.out() << line.dump() << '\n';
+    return;
+  }
+  std::string label(nameOf(finding.health));
+  label.resize(9, ' ');
+  program.out() << label << finding.subject << ": " << printable(finding.text);
+  if (!finding.remedy.empty()) program.out() << " (" << finding.remedy << ")";
+  program.out() << '\n';
+}
+
+}  // namespace
+
+ExitCode runDoctor(Program& program) {
+  HomeLayout::Choices choices;
+  choices.home = program.options().home;
+  auto layout = HomeLayout::resolve(choices);
+  if (!layout) {
+    static_cast<void>(program.report(layout.error(), "can't examine the home"));
+    return ExitCode::failed;
+  }
+  ExitCode result = ExitCode::done;
+  for (const Finding& finding : examine(program, *layout)) {
+    print(program, finding);
+    if (finding.health == Health::bad) result = ExitCode::failed;
+  }
+  return result;
+}
+
+}  // namespace mirabel

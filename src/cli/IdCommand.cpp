@@ -1,0 +1,26 @@
+#include <nlohmann/json.hpp>
+#include <ostream>
+
+#include "cli/Commands.h"
+#include "cli/ItemArgument.h"
+#include "cli/ItemJSON.h"
+#include "cli/Printing.h"
+
+namespace mirabel {
+
+ExitCode runId(Program& program, const std::string& path) {
+  Session* session = program.session();
+  if (session == nullptr) return program.exitCode();
+  auto identifier = ItemArgument(path).identifier(*session);
+  if (!identifier) return program.report(identifier.error(), "can't identify " + path);
+  if (program.options().json) {
+    nlohmann::json line;
+    setText(line, "itemIdentifier", *identifier);
+    program.out() << line.dump() << '\n';
+  } else {
+    program.out() << printable(*identifier) << '\n';
+  }
+  return ExitCode::done;
+}
+
+}  // namespace mirabel

@@ -1,0 +1,29 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "foundation/Values.h"
+
+namespace mirabel {
+
+/// Text that is safe to show: what is not UTF-8, and every control character, as "\xNN" or "\n".
+[[nodiscard]] std::string printable(std::string_view bytes);
+/// UTF-8, each byte that is none replaced by U+FFFD; control characters are kept.
+[[nodiscard]] std::string utf8Lossy(std::string_view bytes);
+
+[[nodiscard]] std::string base64(std::string_view bytes);
+/// Nothing for text that is no canonical base64.
+[[nodiscard]] std::optional<std::string> fromBase64(std::string_view text);
+
+/// "812 B", "14.2 kB", "3.0 GB": powers of a thousand.
+[[nodiscard]] std::string humanSize(std::uint64_t bytes);
+/// "2026-11-21 09:30" in the local time zone.
+[[nodiscard]] std::string humanDate(const Date& date);
+
+/// How many columns text takes on a terminal.
+[[nodiscard]] std::size_t displayWidth(std::string_view utf8);
+
+}  // namespace mirabel

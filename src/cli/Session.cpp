@@ -1,0 +1,21 @@
+#include "cli/Session.h"
+
+#include <utility>
+
+namespace mirabel {
+
+Result<std::unique_ptr<Session>> Session::open(Options options) {
+  LinuxPlatform::Options platformOptions;
+  platformOptions.home = std::move(options.home);
+  platformOptions.timeout = options.timeout;
+  platformOptions.notice = std::move(options.notice);
+  auto platform = LinuxPlatform::open(std::move(platformOptions));
+  if (!platform) return fail(platform.error());
+  std::unique_ptr<Session> session(new Session);
+  session->platform_ = std::move(*platform);
+  session->provider_ =
+      std::make_unique<LocalVessel>(session->platform(), session->roots_, session->owners_);
+  return session;
+}
+
+}  // namespace mirabel

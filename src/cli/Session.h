@@ -1,0 +1,40 @@
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "foundation/Error.h"
+#include "linux/files/LinuxPlatform.h"
+#include "provider/LocalVessel.h"
+
+namespace mirabel {
+
+/// The provider of one home, running inside this process. Owned by a command; holds the volume's
+/// state for as long as it lives.
+class Session {
+ public:
+  struct Options {
+    std::optional<std::string> home;
+    std::chrono::milliseconds timeout{30'000};
+    std::function<void(std::string_view)> notice;
+  };
+  /// Errors: those of `LinuxPlatform::open`.
+  [[nodiscard]] static Result<std::unique_ptr<Session>> open(Options options);
+
+  [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
+  [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
+  [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
+
+ private:
+  Session() = default;
+  std::unique_ptr<LinuxPlatform> platform_;
+  NoAppLibraryRoots roots_;
+  NoAppLibraryOwners owners_;
+  std::unique_ptr<LocalVessel> provider_;
+};
+
+}  // namespace mirabel
