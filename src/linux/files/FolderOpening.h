@@ -1,0 +1,23 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "foundation/Error.h"
+#include "linux/kernel/MonitoredRoots.h"
+
+namespace mirabel {
+
+/// A folder open for reading its entries, and the file system it is on.
+struct OpenedFolder {
+  UniqueFd descriptor;
+  std::uint64_t device = 0;
+};
+
+/// Opens the folder at `path` to be read. Below a root it is refused with EXDEV when it lies on
+/// another file system than the root: another mount, or a subvolume, which is no mount but gives
+/// out the same inode numbers again. POSIX errors.
+[[nodiscard]] Result<OpenedFolder> openFolderForReading(const MonitoredRoots& roots,
+                                                        const std::string& path);
+
+}  // namespace mirabel

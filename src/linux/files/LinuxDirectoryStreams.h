@@ -1,0 +1,20 @@
+#pragma once
+
+#include "linux/kernel/MonitoredRoots.h"
+#include "platform/DirectoryStreams.h"
+
+namespace mirabel {
+
+/// Directory streams read straight from the kernel, 32 KiB at a time.
+class LinuxDirectoryStreams final : public DirectoryStreams {
+ public:
+  /// `roots` outlives the streams.
+  explicit LinuxDirectoryStreams(const MonitoredRoots& roots) : roots_(roots) {}
+
+  Result<std::unique_ptr<DirectoryStream>> open(const URL& folder) override;
+
+ private:
+  const MonitoredRoots& roots_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,99 @@
+#include "linux/files/LinuxFileObjects.h"
+
+#include <cerrno>
+#include <fcntl.h>
+#include <limits>
+
+#include "foundation/URL.h"
+#include "linux/files/PackageTypes.h"
+#include "linux/kernel/RawDirectory.h"
+
+namespace mirabel {
+namespace {
+
+constexpr std::uint16_t linksOfEmptyFolder = 2;
+constexpr std::uint16_t mostLinks = std::numeric_limits<std::uint16_t>::max();
+
+class OpenObject final : public FileObject {
+ public:
+  OpenObject(VolumeIndex& index, std::uint64_t volume, const URL& url, UniqueFd object)
+      : index_(index), volume_(volume), url_(url), object_(std::move(object)) {}
+
+  Result<DeviceID> device() override {
+    const auto status = statusAt(object_.get(), "");
+    if (!status) return fail(status.error());
+    return status->device == volume_ ? index_.device() : static_cast<DeviceID>(status->device);
+  }
+
+  Result<ObjectAttributes> attributes() override {
+    const auto status = statusAt(object_.get(), "");
+    if (!status) return fail(status.error());
+    const bool isPackage =
+        status->kind == FileKind::folder && PackageTypes::isPackageName(url_.lastPathComponent());
+    const auto sighting = index_.learnPath(url_.path(), *status, isPackage);
+    if (!sighting) return fail(sighting.error());
+    return ObjectAttributes{status->kind, sighting->documentID, sighting->fileID};
+  }
+
+ private:
+  VolumeIndex& index_;
+  std::uint64_t volume_;
+  URL url_;
+  UniqueFd object_;
+};
+
+std::uint64_t deviceOfFirstRoot(const LookContext& context) {
+  const bool isThere = !context.roots.paths().empty() && context.roots.descriptor(0) >= 0;
+  const auto status = isThere ? statusAt(context.roots.descriptor(0), "")
+                              : Result<ObjectStatus>(fail(Error::posix(ENOENT)));
+  return status ? status->device : context.index.device();
+}
+
+}  // namespace
+
+LinuxFileObjects::LinuxFileObjects(const LookContext& context)
+    : context_(context), volume_(deviceOfFirstRoot(context)) {}
+
+Result<std::unique_ptr<FileObject>> LinuxFileObjects::open(const URL& url) {
+  auto place = placeOf(context_.roots, url);
+  if (!place) return fail(place.error());
+  auto object =
+      place->name.empty() ? Result<UniqueFd>(std::move(place->folder)) : openPlace(*place, O_PATH);
+  if (!object) return fail(object.error());
+  return std::make_unique<OpenObject>(context_.index, volume_, url, std::move(*object));
+}
+
+Result<FileStatus> LinuxFileObjects::status(const URL& url) {
+  auto values = url.resources().snapshot();
+  if (!values) {
+    auto looked = lookAtObject(context_, url);
+    if (!looked) return fail(looked.error());
+    values = std::move(*looked);
+  }
+  const bool isFolder = values->kind == FileKind::folder;
+  return FileStatus{values->fileID,
+                    isFolder ? linkCountOfFolder(url) : static_cast<std::uint16_t>(1)};
+}
+
+Result<std::string> LinuxFileObjects::pathOfFileID(DeviceID device, std::uint64_t fileID) {
+  if (device != context_.index.device()) return fail(Error::posix(ENOENT));
+  return context_.index.pathOfFileID(fileID);
+}
+
+// The kernel's own count of a folder's links tells the folders in it on some file systems and
+// nothing on others, so the entries are counted, as far as the answer can count.
+std::uint16_t LinuxFileObjects::linkCountOfFolder(const URL& url) const {
+  auto opened = context_.roots.open(url.path(), O_RDONLY | O_DIRECTORY);
+  if (!opened) return linksOfEmptyFolder;
+  RawDirectory directory(std::move(*opened));
+  std::uint16_t links = linksOfEmptyFolder;
+  while (links < mostLinks) {
+    auto entry = directory.next();
+    if (!entry || !*entry) break;
+    const std::string_view name = (*entry)->name;
+    if (name != "." && name != "..") ++links;
+  }
+  return links;
+}
+
+}  // namespace mirabel

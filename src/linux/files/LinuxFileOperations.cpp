@@ -1,0 +1,58 @@
+#include "linux/files/LinuxFileOperations.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <fcntl.h>
+#include <linux/openat2.h>
+#include <string>
+#include <string_view>
+#include <sys/stat.h>
+
+#include "linux/kernel/LongPath.h"
+
+namespace mirabel {
+namespace {
+
+constexpr mode_t permissions = 0777;
+constexpr unsigned long long beneath =
+    RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
+
+enum class Links { followed, refused };
+
+Result<UniqueFd> openStep(int folder, const std::string& name, Links links) {
+  if (links == Links::refused) return openLongPath(folder, name, O_PATH | O_DIRECTORY, beneath);
+  UniqueFd opened(::openat(folder, name.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!opened) return fail(Error::posix(errno));
+  return opened;
+}
+
+// Step by step on descriptors, so that a folder which is swapped meanwhile leads nowhere.
+Result<void> createBelow(UniqueFd folder, std::string_view relative, Links links) {
+  while (!relative.empty()) {
+    const std::string name(relative.substr(0, relative.find('/')));
+    relative.remove_prefix(std::min(relative.size(), name.size() + 1));
+    if (::mkdirat(folder.get(), name.c_str(), permissions) != 0 && errno != EEXIST) {
+      // A folder that may not be written can still hold the next one of the way.
+      const int failure = errno;
+      if (!openStep(folder.get(), name, links)) return fail(Error::posix(failure));
+    }
+    auto next = openStep(folder.get(), name, links);
+    if (!next) return fail(next.error());
+    folder = std::move(*next);
+  }
+  return {};
+}
+
+}  // namespace
+
+Result<void> LinuxFileOperations::createDirectory(const URL& url) {
+  const std::string& path = url.path();
+  if (path.empty()) return fail(Error::posix(EINVAL));
+  const auto place = roots_.locate(path);
+  auto start = roots_.open(place ? roots_.paths()[place->root] : "/", O_PATH | O_DIRECTORY);
+  if (!start) return fail(start.error());
+  return place ? createBelow(std::move(*start), place->relative, Links::refused)
+               : createBelow(std::move(*start), std::string_view(path).substr(1), Links::followed);
+}
+
+}  // namespace mirabel

@@ -1,0 +1,83 @@
+#include "linux/files/LinuxPlatform.h"
+
+#include "linux/files/HomeLayout.h"
+#include "linux/files/LinuxDirectorySizer.h"
+#include "linux/files/LinuxDirectoryStreams.h"
+#include "linux/files/LinuxExtendedAttributes.h"
+#include "linux/files/LinuxFileObjects.h"
+#include "linux/files/LinuxFileOperations.h"
+#include "linux/files/LinuxGenerationalStore.h"
+#include "linux/files/LinuxResourceValues.h"
+#include "linux/files/LinuxVesselManager.h"
+#include "linux/files/LinuxVolumeHistory.h"
+#include "linux/files/PackageTypes.h"
+#include "linux/files/SystemClock.h"
+
+namespace mirabel {
+
+// In the order in which they need each other.
+struct LinuxPlatform::Parts {
+  Parts(HomeLayout where, std::unique_ptr<MonitoredRoots> folders,
+        std::unique_ptr<VolumeIndex> volumeIndex)
+      : layout(std::move(where)), roots(std::move(folders)), index(std::move(volumeIndex)) {}
+
+  HomeLayout layout;
+  std::unique_ptr<MonitoredRoots> roots;
+  std::unique_ptr<VolumeIndex> index;
+  TypeTable types;
+  LookContext context{*roots, *index, types};
+  LinuxResourceValues resources{context};
+  LinuxExtendedAttributes attributes{*roots};
+  LinuxFileObjects objects{context};
+  LinuxGenerationalStore documents{context};
+  LinuxDirectoryStreams directories{*roots};
+  LinuxDirectorySizer sizes{*roots};
+  LinuxFileOperations operations{*roots};
+  NoApplications applications;
+  LinuxVesselManager manager{URL::fileURL(layout.documents)};
+  LinuxVolumeHistory history{*index};
+  SystemClock clock;
+  Platform platform{resources,  attributes,   objects, documents, directories, sizes,
+                    operations, applications, manager, history,   clock};
+};
+
+Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
+  auto layout = HomeLayout::resolve({options.home, options.documents, options.stateFolder});
+  if (!layout) return fail(layout.error());
+  std::vector<std::string> paths{layout->documents};
+  for (const std::string& path : options.furtherRoots) {
+    auto resolved = resolvedPath(path);
+    if (!resolved) return fail(resolved.error());
+    paths.push_back(std::move(*resolved));
+  }
+  auto roots = std::make_unique<MonitoredRoots>(std::move(paths));
+  VolumeIndex::Options indexOptions;
+  // A document storage that is missing belongs where it would be made.
+  indexOptions.volumePath = roots->descriptor(0) >= 0 ? layout->documents : layout->home;
+  indexOptions.stateFolder = layout->stateFolder;
+  indexOptions.isPackageName = PackageTypes::isPackageName;
+  indexOptions.timeout = options.timeout;
+  indexOptions.notice = std::move(options.notice);
+  auto index = VolumeIndex::open(*roots, std::move(indexOptions));
+  if (!index) return fail(index.error());
+  return std::unique_ptr<LinuxPlatform>(new LinuxPlatform(
+      std::make_unique<Parts>(std::move(*layout), std::move(roots), std::move(*index))));
+}
+
+LinuxPlatform::LinuxPlatform(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
+
+LinuxPlatform::~LinuxPlatform() = default;
+
+const Platform& LinuxPlatform::platform() const {
+  return parts_->platform;
+}
+
+const std::string& LinuxPlatform::home() const {
+  return parts_->layout.home;
+}
+
+const std::string& LinuxPlatform::stateFolder() const {
+  return parts_->layout.stateFolder;
+}
+
+}  // namespace mirabel

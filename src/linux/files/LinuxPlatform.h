@@ -1,0 +1,57 @@
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "platform/Platform.h"
+
+namespace mirabel {
+
+/// The platform on Linux for one home folder: resolves what it works on once, opens the volume's
+/// index, and owns every interface of `Platform`. Owned by the program; `platform()` may be used
+/// from any thread as long as this lives.
+class LinuxPlatform {
+ public:
+  struct Options {
+    /// The home folder. Absent: $HOME, or else what the user database says, and $XDG_STATE_HOME
+    /// counts. Given: everything hangs below it and no XDG variable counts.
+    std::optional<std::string> home{};
+    /// The document storage; absent: "Documents" in the home folder. It may be a symbolic link.
+    std::optional<std::string> documents{};
+    /// Further folders to present, such as the document folders of applications.
+    std::vector<std::string> furtherRoots{};
+    /// Where state is kept; absent: "mirabel" in the XDG state folder.
+    std::optional<std::string> stateFolder{};
+    /// How long to wait for another process that owns the volume.
+    std::chrono::milliseconds timeout{30'000};
+    /// Told what a person should know: that it has to wait, that a damaged database was set aside.
+    std::function<void(std::string_view)> notice{};
+  };
+
+  /// Makes nothing but the state folder. A document storage that is missing is empty. Errors, with
+  /// a detail for people: POSIX ENOENT and ENOTDIR for a home or a document storage that is none;
+  /// EINVAL for a document storage below another folder named "Documents", which would take its
+  /// trash; those of opening the volume's index.
+  [[nodiscard]] static Result<std::unique_ptr<LinuxPlatform>> open(Options options);
+  ~LinuxPlatform();
+  LinuxPlatform(const LinuxPlatform&) = delete;
+  LinuxPlatform& operator=(const LinuxPlatform&) = delete;
+
+  [[nodiscard]] const Platform& platform() const;
+  /// Absolute and resolved.
+  [[nodiscard]] const std::string& home() const;
+  [[nodiscard]] const std::string& stateFolder() const;
+
+ private:
+  struct Parts;
+  explicit LinuxPlatform(std::unique_ptr<Parts> parts);
+  std::unique_ptr<Parts> parts_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,17 @@
+#pragma once
+
+#include <span>
+
+#include "foundation/Error.h"
+#include "linux/files/ObjectLook.h"
+
+namespace mirabel {
+
+class URL;
+
+/// Looks at many objects and fills the resource caches of their URLs: per folder one open and one
+/// round of the index, per object one statx and one listxattr, the latter on two threads when
+/// there are many. A URL that cannot be looked at is passed over. Errors: those of the index.
+[[nodiscard]] Result<void> prefetchAll(const LookContext& context, std::span<const URL> urls);
+
+}  // namespace mirabel

@@ -1,0 +1,134 @@
+#include <algorithm>
+#include <sys/stat.h>
+#include <vector>
+
+#include "linux/FilesFixture.h"
+#include "support/OrdinaryUser.h"
+
+namespace mirabel::testing {
+namespace {
+
+class ResourceValuesOnDisk : public FilesTest {};
+
+TEST_F(ResourceValuesOnDisk, NamesOfAnyBytesAreReadAndFoundAgain) {
+  const std::string names[] = {
+      "\xff\xfe", "a\nb", "a=b", "#x",       "100%41", "...",   " ",
+      "-rf",      "~",    "\\",  "\x01\x7f", "a.txt",  "ﾅ.pdf", std::string(255, 'n')};
+  std::vector<URL> urls;
+  for (const std::string& name : names) {
+    home.writeFile(name, name);
+    urls.push_back(home.url().appendingPathComponent(name));
+  }
+  ASSERT_TRUE(platform().resources.prefetch(urls));
+  const DeviceID device = platform().objects.open(home.url()).value()->device().value();
+  for (const URL& url : urls) {
+    const auto cached = url.resources().snapshot();
+    ASSERT_TRUE(cached) << url.description();
+    EXPECT_EQ(cached->size, url.lastPathComponent().size()) << url.description();
+    EXPECT_EQ(cached->fileID, valuesOf(url.lastPathComponent()).fileID) << url.description();
+    EXPECT_EQ(platform().objects.pathOfFileID(device, cached->fileID), url.path());
+  }
+}
+
+TEST_F(ResourceValuesOnDisk, EachKindHasItsTypeAndNothingBlocks) {
+  home.makeFolder("folder");
+  home.makeFolder("Letter.QUILL");
+  home.makeFolder(".quill");
+  home.writeFile("picture.JPG");
+  home.writeFile("letter.quill");
+  home.makeSymlink("broken.txt", "nowhere");
+  home.makeFifo("fifo.txt");
+  home.makeSocket("socket");
+  const std::pair<std::string_view, std::string_view> cases[] = {
+      {"folder", "inode/directory"},
+      {"Letter.QUILL", "com.norvane.quillsuite.document"},
+      {".quill", "inode/directory"},
+      {"picture.JPG", "image/jpeg"},
+      {"letter.quill", "application/octet-stream"},
+      {"broken.txt", "inode/symlink"},
+      {"fifo.txt", "inode/fifo"},
+      {"socket", "inode/socket"}};
+  for (const auto& [name, type] : cases)
+    EXPECT_EQ(valuesOf(name).typeIdentifier, type) << name;
+  EXPECT_TRUE(valuesOf("Letter.QUILL").isPackage);
+  EXPECT_FALSE(valuesOf("letter.quill").isPackage);
+  EXPECT_NE(valuesOf("Letter.QUILL").documentID, 0U);
+  EXPECT_EQ(valuesOf("folder").documentID, 0U);
+  EXPECT_EQ(valuesOf("folder").size, 0U);
+}
+
+TEST_F(ResourceValuesOnDisk, ManyNamesOfSeveralFoldersAreReadTogetherPastMissingOnes) {
+  std::vector<URL> urls;
+  for (int i = 0; i < 300; ++i) {
+    const std::string folder = "f" + std::to_string(i % 3);
+    if (i < 3) home.makeFolder(folder);
+    const std::string name = folder + "/" + std::to_string(i);
+    if (i % 7 != 0) home.writeFile(name, std::string(static_cast<std::size_t>(i), 'x'));
+    urls.push_back(home.url(name));
+  }
+  urls.push_back(home.url());  // a root is no entry of a folder that is presented
+  urls.push_back(URL::fromString("https://example.org/"));
+  ASSERT_TRUE(platform().resources.prefetch(urls));
+  for (std::size_t i = 0; i < 300; ++i) {
+    const auto values = urls[i].resources().snapshot();
+    ASSERT_EQ(values.has_value(), i % 7 != 0) << i;
+    if (!values) continue;
+    EXPECT_EQ(values->size, i);
+    EXPECT_EQ(values->fileID, platform().resources.readValues(urls[i]).value().fileID);
+  }
+  EXPECT_TRUE(urls[300].resources().isFilled());
+  EXPECT_FALSE(urls[301].resources().isFilled());
+}
+
+TEST_F(ResourceValuesOnDisk, WhatIsNotThereIsNoSuchFile) {
+  home.writeFile("file");
+  for (const std::string_view name : {"missing", "missing/below", "file/below"}) {
+    const auto values = platform().resources.readValues(home.url(name));
+    ASSERT_FALSE(values) << name;
+    EXPECT_EQ(values.error(), Error::file(FileErrorCode::noSuchFile)) << name;
+  }
+  EXPECT_EQ(failureOf(platform().resources.readValues(URL::fromString("x:"))), EINVAL);
+}
+
+TEST_F(ResourceValuesOnDisk, WritableMeansThatThisUserMayWrite) {
+  struct Case {
+    std::string_view name;
+    mode_t mode;
+    bool isWritable;
+  };
+  const Case files[] = {{"plain", 0644, true},
+                        {"readOnly", 0444, false},
+                        {"writeOnly", 0200, true},
+                        {"groupOnly", 0060, false},
+                        {"nothing", 0, false}};
+  for (const Case& file : files)
+    home.writeFile(file.name, "1");
+  home.makeFolder("locked");
+  home.writeFile("locked/inside");
+  home.makeFolder("listed");
+  home.writeFile("theirs");
+  if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
+  for (const Case& file : files)
+    home.setMode(file.name, file.mode);
+  home.setMode("locked", 0);
+  home.setMode("listed", 0555);
+
+  const OrdinaryUser user;
+  std::vector<URL> urls;
+  for (const Case& file : files)
+    urls.push_back(home.url(file.name));
+  ASSERT_TRUE(platform().resources.prefetch(urls));
+  for (std::size_t i = 0; i < urls.size(); ++i) {
+    EXPECT_EQ(valuesOf(files[i].name).isWritable, files[i].isWritable) << files[i].name;
+    EXPECT_EQ(urls[i].resources().snapshot()->isWritable, files[i].isWritable) << files[i].name;
+  }
+  EXPECT_FALSE(valuesOf("listed").isWritable);
+  EXPECT_EQ(platform().objects.status(home.url("locked")).value().linkCount, 2);
+  EXPECT_EQ(failureOf(platform().resources.readValues(home.url("locked/inside"))), EACCES);
+  EXPECT_EQ(failureOf(platform().directories.open(home.url("locked"))), EACCES);
+  EXPECT_EQ(failureOf(platform().sizes.directorySize(home.url())), EACCES);
+  closePlatform();
+}
+
+}  // namespace
+}  // namespace mirabel::testing

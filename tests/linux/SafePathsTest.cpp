@@ -1,0 +1,107 @@
+#include <cstdlib>
+#include <filesystem>
+#include <sched.h>
+#include <sys/mount.h>
+
+#include "linux/FilesFixture.h"
+
+namespace mirabel::testing {
+namespace {
+
+class SafePaths : public FilesTest {
+ protected:
+  /// Every way of reaching an object by its URL must be refused.
+  void expectOutOfReach(std::string_view folder, std::string_view object) {
+    const URL inside = home.url(std::string(folder) + "/" + std::string(object));
+    const Platform& p = platform();
+    EXPECT_FALSE(p.resources.readValues(inside));
+    EXPECT_TRUE(p.resources.prefetch({&inside, 1}));
+    EXPECT_FALSE(inside.resources().isFilled());
+    EXPECT_FALSE(p.attributes.names(inside));
+    EXPECT_FALSE(p.attributes.size("com.norvane.test", inside));
+    EXPECT_FALSE(p.attributes.open(inside));
+    EXPECT_FALSE(p.objects.open(inside));
+    EXPECT_FALSE(p.objects.status(inside));
+    EXPECT_FALSE(p.documents.permanentStorageForItemAtURL(inside, Allocation::ifNone));
+    EXPECT_FALSE(p.directories.open(home.url(folder)));
+    EXPECT_FALSE(p.sizes.directorySize(home.url(folder)));
+    EXPECT_FALSE(p.operations.createDirectory(home.url(std::string(folder) + "/made")));
+  }
+};
+
+TEST_F(SafePaths, ASymlinkSwappedInForAFolderLeadsNowhere) {
+  const TempHome other;
+  other.writeFile("secret", "12345");
+  home.makeFolder("folder");
+  home.writeFile("folder/secret");
+  ASSERT_EQ(valuesOf("folder/secret").size, 0U);
+  const auto stream = platform().directories.open(home.url("folder"));
+  ASSERT_TRUE(stream);
+
+  for (const std::string& target : {other.documents(), std::string("..")}) {
+    home.remove("folder");
+    home.makeSymlink("folder", target);
+    expectOutOfReach("folder", "secret");
+    EXPECT_EQ(valuesOf("folder").kind, FileKind::symbolicLink);
+    EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 0U);
+  }
+  EXPECT_FALSE(std::filesystem::exists(other.at("made")));
+}
+
+TEST_F(SafePaths, DotDotDoesNotLeaveTheRoot) {
+  home.makeFolder("folder");
+  const URL outside = URL::fileURL(home.documents() + "/..");
+  EXPECT_EQ(failureOf(platform().resources.readValues(outside)), EXDEV);
+  EXPECT_FALSE(platform().objects.open(outside));
+  EXPECT_FALSE(platform().attributes.open(outside));
+  EXPECT_FALSE(platform().directories.open(outside));
+  EXPECT_FALSE(platform().operations.createDirectory(home.url("../made")));
+  EXPECT_FALSE(std::filesystem::exists(home.path() + "/made"));
+  EXPECT_TRUE(platform().resources.readValues(home.url("folder/..")));
+}
+
+TEST_F(SafePaths, PathsLongerThanTheKernelTakesWorkEverywhere) {
+  std::string deep;
+  for (int i = 0; i < 40; ++i)
+    deep += (i == 0 ? "" : "/") + std::string(200, 'd');
+  const URL url = home.url(deep);
+  ASSERT_TRUE(platform().operations.createDirectory(url));
+  ASSERT_TRUE(platform().operations.createDirectory(url.appendingPathComponent("letter.quill")));
+
+  const URL child = url.appendingPathComponent("letter.quill");
+  EXPECT_TRUE(platform().resources.readValues(child).value().isPackage);
+  ASSERT_TRUE(platform().resources.prefetch({&child, 1}));
+  EXPECT_EQ(child.resources().snapshot()->typeIdentifier, "com.norvane.quillsuite.document");
+  const auto object = platform().objects.open(child).value();
+  const auto attributes = object->attributes().value();
+  EXPECT_NE(attributes.documentID, 0U);
+  EXPECT_EQ(platform().objects.pathOfFileID(object->device().value(), attributes.fileID),
+            child.path());
+  EXPECT_EQ(platform().objects.status(url).value().linkCount, 3);
+  EXPECT_TRUE(platform().directories.open(url));
+  EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 0U);
+  if (!hasUserAttributes(home.path())) return;
+  ASSERT_TRUE((*platform().attributes.open(child))->set("com.norvane.test", {1}));
+  EXPECT_EQ(platform().attributes.read("com.norvane.test", child, 1).value(), Data{1});
+}
+
+TEST_F(SafePaths, AMountBelowARootIsListedAndNotEntered) {
+  home.makeFolder("mounted");
+  home.writeFile("beside", "123");
+  if (::unshare(CLONE_NEWNS) != 0 ||
+      ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
+      ::mount("none", home.at("mounted").c_str(), "tmpfs", 0, nullptr) != 0) {
+    GTEST_SKIP() << "mounting is not permitted here";
+  }
+  home.writeFile("mounted/inside", "12345");
+  const ResourceValues values = valuesOf("mounted");
+  EXPECT_EQ(values.kind, FileKind::folder);
+  EXPECT_TRUE(platform().objects.open(home.url("mounted")).value()->attributes());
+  EXPECT_EQ(platform().objects.status(home.url("mounted")).value().linkCount, 2);
+  expectOutOfReach("mounted", "inside");
+  EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 3U);
+  EXPECT_EQ(::umount(home.at("mounted").c_str()), 0);
+}
+
+}  // namespace
+}  // namespace mirabel::testing
