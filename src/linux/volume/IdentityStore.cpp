@@ -10,12 +10,15 @@ namespace {
 constexpr std::uint64_t schemaVersion = 1;
 
 // Names are blobs: bytes, compared as bytes. The columns that a listing compares come first, the
-// handle, which it seldom needs, last.
+// handle, which it seldom needs, last. Rows are appended; what is looked up by is in indexes of
+// small integers, so that a folder of 100,000 touches few pages: `place` is a hash of folder and
+// name. `file_id` is absent where it is the inode number.
 constexpr const char* schema = R"(
 CREATE TABLE IF NOT EXISTS meta(key TEXT PRIMARY KEY, value NOT NULL) WITHOUT ROWID;
 CREATE TABLE IF NOT EXISTS objects(
   slot INTEGER PRIMARY KEY,
-  file_id INTEGER NOT NULL,
+  inode INTEGER NOT NULL,
+  file_id INTEGER,
   document_id INTEGER,
   kind INTEGER NOT NULL,
   folder INTEGER,
@@ -25,16 +28,16 @@ CREATE TABLE IF NOT EXISTS objects(
   settled INTEGER NOT NULL,
   modification_time INTEGER NOT NULL,
   size INTEGER NOT NULL,
-  inode INTEGER,
+  place INTEGER,
   file_system INTEGER,
   handle BLOB);
-CREATE UNIQUE INDEX IF NOT EXISTS objects_place ON objects(folder, name)
-  WHERE folder IS NOT NULL;
-CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
-  WHERE document_id IS NOT NULL;
-CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id <> slot;
+CREATE UNIQUE INDEX IF NOT EXISTS objects_inode ON objects(inode) WHERE file_system IS NULL;
 CREATE UNIQUE INDEX IF NOT EXISTS objects_foreign ON objects(file_system, inode)
   WHERE file_system IS NOT NULL;
+CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id IS NOT NULL;
+CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
+  WHERE document_id IS NOT NULL;
+CREATE INDEX IF NOT EXISTS objects_place ON objects(place) WHERE place IS NOT NULL;
 CREATE TABLE IF NOT EXISTS links(
   folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
   PRIMARY KEY(folder, name)) WITHOUT ROWID;
@@ -45,9 +48,18 @@ CREATE TABLE IF NOT EXISTS handovers(
 CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
 )";
 
-#define OBJECT_COLUMNS                                                                 \
-  "slot, file_id, document_id, kind, folder, name, birth_time, change_time, settled, " \
-  "modification_time, size, inode, file_system, handle "
+#define OBJECT_COLUMNS                                                                        \
+  "slot, inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, " \
+  "modification_time, size, file_system, handle "
+
+// Kept in the database, so it must never change: FNV-1a over the folder's ID and the name.
+std::int64_t placeHash(std::uint64_t folder, std::string_view name) {
+  constexpr std::uint64_t prime = 0x100000001B3;
+  std::uint64_t hash = (0xCBF29CE484222325 ^ folder) * prime;
+  for (const char c : name)
+    hash = (hash ^ static_cast<unsigned char>(c)) * prime;
+  return static_cast<std::int64_t>(hash);
+}
 
 }  // namespace
 
@@ -55,23 +67,27 @@ CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
 struct IdentityStore::Statements {
   std::vector<Statement> all;
   Statement& bySlot = all[0];
-  Statement& byFileID = all[1];
-  Statement& byDocument = all[2];
-  Statement& byPlace = all[3];
-  Statement& byForeign = all[4];
-  Statement& unchanged = all[5];
-  Statement& occupied = all[6];
-  Statement& put = all[7];
-  Statement& remove = all[8];
-  Statement& linkAt = all[9];
-  Statement& linksOf = all[10];
-  Statement& addLink = all[11];
-  Statement& removeLink = all[12];
-  Statement& handoverAt = all[13];
-  Statement& addHandover = all[14];
-  Statement& removeHandovers = all[15];
-  Statement& meta = all[16];
-  Statement& setMeta = all[17];
+  Statement& byInode = all[1];
+  Statement& byFileID = all[2];
+  Statement& byDocument = all[3];
+  Statement& byPlace = all[4];
+  Statement& byForeign = all[5];
+  Statement& unchanged = all[6];
+  Statement& occupied = all[7];
+  Statement& insert = all[8];
+  Statement& update = all[9];
+  Statement& remove = all[10];
+  Statement& linkAt = all[11];
+  Statement& linksOf = all[12];
+  Statement& addLink = all[13];
+  Statement& removeLink = all[14];
+  Statement& anyLink = all[15];
+  Statement& handoverAt = all[16];
+  Statement& addHandover = all[17];
+  Statement& removeHandovers = all[18];
+  Statement& anyHandover = all[19];
+  Statement& meta = all[20];
+  Statement& setMeta = all[21];
 };
 
 Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
@@ -100,28 +116,29 @@ Result<void> IdentityStore::make() {
 Result<void> IdentityStore::prepare() {
   const char* const sql[] = {
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE slot = ?1",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1 AND file_id <> slot",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE inode = ?1 AND file_system IS NULL",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1 AND name = ?2",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_system = ?1 AND inode = ?2",
       "SELECT file_id, document_id, kind, folder, name, birth_time, change_time, settled "
-      "FROM objects WHERE slot = ?1",
-      "SELECT EXISTS(SELECT 1 FROM objects WHERE folder = ?1 AND name = ?2) OR "
-      "EXISTS(SELECT 1 FROM links WHERE folder = ?1 AND name = ?2) OR "
-      "EXISTS(SELECT 1 FROM handovers WHERE folder = ?1 AND name = ?2)",
-      // Not OR REPLACE: that would silently drop another object with the same place or document.
+      "FROM objects WHERE inode = ?1 AND file_system IS NULL",
+      "SELECT 1 FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
       "INSERT INTO objects(" OBJECT_COLUMNS
-      ") VALUES(?1,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14) ON CONFLICT(slot) DO UPDATE SET "
-      "file_id=?2, document_id=?3, kind=?4, folder=?5, name=?6, birth_time=?7, change_time=?8, "
-      "settled=?9, modification_time=?10, size=?11, inode=?12, file_system=?13, handle=?14",
+      ", place) VALUES(NULL,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14,?15) RETURNING slot",
+      "UPDATE objects SET inode=?2, file_id=?3, document_id=?4, kind=?5, folder=?6, name=?7, "
+      "birth_time=?8, change_time=?9, settled=?10, modification_time=?11, size=?12, "
+      "file_system=?13, handle=?14, place=?15 WHERE slot=?1",
       "DELETE FROM objects WHERE slot = ?1",
       "SELECT slot FROM links WHERE folder = ?1 AND name = ?2",
       "SELECT folder, name FROM links WHERE slot = ?1",
       "INSERT OR REPLACE INTO links(folder, name, slot) VALUES(?1,?2,?3)",
       "DELETE FROM links WHERE folder = ?1 AND name = ?2",
+      "SELECT EXISTS(SELECT 1 FROM links)",
       "SELECT document_id FROM handovers WHERE folder = ?1 AND name = ?2",
       "INSERT OR REPLACE INTO handovers(folder, name, document_id) VALUES(?1,?2,?3)",
       "DELETE FROM handovers WHERE document_id = ?1",
+      "SELECT EXISTS(SELECT 1 FROM handovers)",
       "SELECT value FROM meta WHERE key = CAST(?1 AS TEXT)",
       "INSERT OR REPLACE INTO meta(key, value) VALUES(CAST(?1 AS TEXT), ?2)",
   };
@@ -132,6 +149,18 @@ Result<void> IdentityStore::prepare() {
     made.push_back(std::move(*statement));
   }
   statements_ = std::shared_ptr<Statements>(new Statements{std::move(made)});
+  const auto any = [](Statement& statement) -> Result<bool> {
+    StatementScope scope(statement);
+    auto row = statement.step();
+    if (!row) return fail(row.error());
+    return statement.integer(0) != 0;
+  };
+  auto links = any(statements_->anyLink);
+  auto handovers = any(statements_->anyHandover);
+  if (!links) return fail(links.error());
+  if (!handovers) return fail(handovers.error());
+  mayHaveLinks_ = *links;
+  mayHaveHandovers_ = *handovers;
   return {};
 }
 
@@ -142,18 +171,18 @@ Result<std::optional<ObjectRow>> IdentityStore::readObject(Statement& statement)
   if (!*found) return std::nullopt;
   ObjectRow row;
   row.slot = statement.unsignedInteger(0);
-  row.fileID = statement.unsignedInteger(1);
-  row.documentID = static_cast<std::uint32_t>(statement.integer(2));
-  row.kind = static_cast<ObjectKind>(statement.integer(3));
-  if (!statement.isNull(4)) {
-    row.location = Location{statement.unsignedInteger(4), std::string(statement.blob(5))};
+  row.inode = statement.unsignedInteger(1);
+  row.fileID = statement.isNull(2) ? row.inode : statement.unsignedInteger(2);
+  row.documentID = static_cast<std::uint32_t>(statement.integer(3));
+  row.kind = static_cast<ObjectKind>(statement.integer(4));
+  if (!statement.isNull(5)) {
+    row.location = Location{statement.unsignedInteger(5), std::string(statement.blob(6))};
   }
-  row.birthTime = statement.integer(6);
-  row.changeTime = statement.integer(7);
-  row.isSettled = statement.integer(8) != 0;
-  row.modificationTime = statement.integer(9);
-  row.size = statement.unsignedInteger(10);
-  row.inode = statement.isNull(11) ? row.slot : statement.unsignedInteger(11);
+  row.birthTime = statement.integer(7);
+  row.changeTime = statement.integer(8);
+  row.isSettled = statement.integer(9) != 0;
+  row.modificationTime = statement.integer(10);
+  row.size = statement.unsignedInteger(11);
   row.fileSystem = statement.unsignedInteger(12);
   row.handle = statement.blob(13);
   return row;
@@ -163,10 +192,16 @@ Result<std::optional<ObjectRow>> IdentityStore::objectInSlot(std::uint64_t slot)
   return readObject(statements_->bySlot.bind(1, slot));
 }
 
+Result<std::optional<ObjectRow>> IdentityStore::objectByInode(std::uint64_t inode) {
+  return readObject(statements_->byInode.bind(1, inode));
+}
+
 Result<std::optional<ObjectRow>> IdentityStore::objectByFileID(std::uint64_t fileID) {
-  // Most objects have their file ID as key; the index holds the others only.
-  auto row = objectInSlot(fileID);
-  if (!row || (*row && (*row)->fileID == fileID)) return row;
+  // Most objects have their inode number as file ID; the index holds the others only.
+  if (fileID < upperFileIDs) {
+    auto row = objectByInode(fileID);
+    if (!row || (*row && (*row)->fileID == fileID)) return row;
+  }
   return readObject(statements_->byFileID.bind(1, fileID));
 }
 
@@ -176,7 +211,8 @@ Result<std::optional<ObjectRow>> IdentityStore::objectByDocumentID(std::uint32_t
 
 Result<std::optional<ObjectRow>> IdentityStore::objectAt(std::uint64_t folder,
                                                          std::string_view name) {
-  return readObject(statements_->byPlace.bind(1, folder).bindBlob(2, name));
+  return readObject(
+      statements_->byPlace.bind(1, folder).bindBlob(2, name).bind(3, placeHash(folder, name)));
 }
 
 Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t fileSystem,
@@ -185,9 +221,9 @@ Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t file
 }
 
 Result<std::optional<KnownObject>> IdentityStore::unchangedObject(
-    std::uint64_t slot, std::uint64_t folder, std::string_view name, ObjectKind kind,
+    std::uint64_t inode, std::uint64_t folder, std::string_view name, ObjectKind kind,
     std::int64_t birthTime, std::int64_t changeTime) {
-  Statement& statement = statements_->unchanged.bind(1, slot);
+  Statement& statement = statements_->unchanged.bind(1, inode);
   StatementScope scope(statement);
   auto found = statement.step();
   if (!found) return fail(found.error());
@@ -197,41 +233,53 @@ Result<std::optional<KnownObject>> IdentityStore::unchangedObject(
       statement.blob(4) != name) {
     return std::nullopt;
   }
-  return KnownObject{statement.unsignedInteger(0),
+  return KnownObject{statement.isNull(0) ? inode : statement.unsignedInteger(0),
                      static_cast<std::uint32_t>(statement.integer(1))};
 }
 
 Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view name) {
-  Statement& statement = statements_->occupied.bind(1, folder).bindBlob(2, name);
+  if (mayHaveLinks_) {
+    auto link = linkAt(folder, name);
+    if (!link) return fail(link.error());
+    if (*link) return true;
+  }
+  if (mayHaveHandovers_) {
+    auto handover = handoverAt(folder, name);
+    if (!handover) return fail(handover.error());
+    if (*handover) return true;
+  }
+  Statement& statement =
+      statements_->occupied.bind(1, folder).bindBlob(2, name).bind(3, placeHash(folder, name));
   StatementScope scope(statement);
-  auto found = statement.step();
-  if (!found) return fail(found.error());
-  return *found && statement.integer(0) != 0;
+  return statement.step();
 }
 
-Result<void> IdentityStore::put(const ObjectRow& row) {
-  Statement& statement = statements_->put;
-  statement.bind(1, row.slot).bind(2, row.fileID);
-  if (row.documentID != 0) {
-    statement.bind(3, std::int64_t{row.documentID});
-  } else {
-    statement.bindNull(3);
-  }
-  statement.bind(4, static_cast<std::int64_t>(row.kind));
+Result<void> IdentityStore::put(ObjectRow& row) {
+  Statement& statement = row.slot == 0 ? statements_->insert : statements_->update;
+  const auto bindUnless = [&](int index, bool absent, std::uint64_t value) {
+    absent ? statement.bindNull(index) : statement.bind(index, value);
+  };
+  bindUnless(1, row.slot == 0, row.slot);
+  statement.bind(2, row.inode);
+  bindUnless(3, row.fileSystem == 0 && row.fileID == row.inode, row.fileID);
+  bindUnless(4, row.documentID == 0, row.documentID);
+  statement.bind(5, static_cast<std::int64_t>(row.kind));
   if (row.location) {
-    statement.bind(5, row.location->folder).bindBlob(6, row.location->name);
+    statement.bind(6, row.location->folder).bindBlob(7, row.location->name);
+    statement.bind(15, placeHash(row.location->folder, row.location->name));
   } else {
-    statement.bindNull(5).bindNull(6);
+    statement.bindNull(6).bindNull(7).bindNull(15);
   }
-  statement.bind(7, row.birthTime).bind(8, row.changeTime).bind(9, std::int64_t{row.isSettled});
-  statement.bind(10, row.modificationTime).bind(11, row.size);
-  if (row.fileSystem != 0 || row.inode != row.slot) {
-    statement.bind(12, row.inode).bind(13, row.fileSystem);
-  } else {
-    statement.bindNull(12).bindNull(13);
-  }
+  statement.bind(8, row.birthTime).bind(9, row.changeTime).bind(10, std::int64_t{row.isSettled});
+  statement.bind(11, row.modificationTime).bind(12, row.size);
+  bindUnless(13, row.fileSystem == 0, row.fileSystem);
   statement.bindBlob(14, row.handle);
-  return statement.run();
+  if (row.slot != 0) return statement.run();
+  StatementScope scope(statement);
+  auto inserted = statement.step();
+  if (!inserted) return fail(inserted.error());
+  row.slot = statement.unsignedInteger(0);
+  return {};
 }
 
 Result<void> IdentityStore::remove(std::uint64_t slot) {
@@ -249,6 +297,7 @@ Result<std::optional<std::uint64_t>> IdentityStore::linkAt(std::uint64_t folder,
 }
 
 Result<std::vector<Location>> IdentityStore::links(std::uint64_t slot) {
+  if (!mayHaveLinks_) return std::vector<Location>();
   Statement& statement = statements_->linksOf.bind(1, slot);
   StatementScope scope(statement);
   std::vector<Location> result;
@@ -261,6 +310,7 @@ Result<std::vector<Location>> IdentityStore::links(std::uint64_t slot) {
 }
 
 Result<void> IdentityStore::addLink(const Location& location, std::uint64_t slot) {
+  mayHaveLinks_ = true;
   return statements_->addLink.bind(1, location.folder)
       .bindBlob(2, location.name)
       .bind(3, slot)
@@ -282,6 +332,7 @@ Result<std::optional<std::uint32_t>> IdentityStore::handoverAt(std::uint64_t fol
 }
 
 Result<void> IdentityStore::addHandover(const Location& location, std::uint32_t documentID) {
+  mayHaveHandovers_ = true;
   return statements_->addHandover.bind(1, location.folder)
       .bindBlob(2, location.name)
       .bind(3, std::int64_t{documentID})
@@ -289,6 +340,7 @@ Result<void> IdentityStore::addHandover(const Location& location, std::uint32_t 
 }
 
 Result<void> IdentityStore::removeHandovers(std::uint32_t documentID) {
+  if (!mayHaveHandovers_) return {};
   return statements_->removeHandovers.bind(1, std::int64_t{documentID}).run();
 }
 

@@ -37,7 +37,8 @@ struct Location {
 
 /// One object that the volume has, or had: a row of the table `objects`.
 struct ObjectRow {
-  /// Key: the inode number where that can be a key, see `slotOf`, else the file ID.
+  /// Key: rows are numbered as they come, so that a folder's lie together in the order in which it
+  /// is read. 0: not in the table yet.
   std::uint64_t slot = 0;
   std::uint64_t fileID = 0;
   std::uint32_t documentID = 0;
@@ -74,6 +75,8 @@ class IdentityStore {
   [[nodiscard]] static Result<std::unique_ptr<IdentityStore>> open(Database& database);
 
   [[nodiscard]] Result<std::optional<ObjectRow>> objectInSlot(std::uint64_t slot);
+  /// The object that has, or had last, an inode number of the volume itself.
+  [[nodiscard]] Result<std::optional<ObjectRow>> objectByInode(std::uint64_t inode);
   [[nodiscard]] Result<std::optional<ObjectRow>> objectByFileID(std::uint64_t fileID);
   [[nodiscard]] Result<std::optional<ObjectRow>> objectByDocumentID(std::uint32_t documentID);
   [[nodiscard]] Result<std::optional<ObjectRow>> objectAt(std::uint64_t folder,
@@ -86,8 +89,8 @@ class IdentityStore {
       std::int64_t birthTime, std::int64_t changeTime);
   /// Whether the index has anything under that name: an object, a link or a handover.
   [[nodiscard]] Result<bool> isOccupied(std::uint64_t folder, std::string_view name);
-  /// Inserts, or replaces what the slot held. Fails when another object has its place or document.
-  [[nodiscard]] Result<void> put(const ObjectRow& row);
+  /// Writes the row; a new one gets its slot. Fails when another object has its document.
+  [[nodiscard]] Result<void> put(ObjectRow& row);
   [[nodiscard]] Result<void> remove(std::uint64_t slot);
 
   /// Further names of hard-linked objects.
@@ -118,6 +121,9 @@ class IdentityStore {
   struct Statements;
   Database& database_;
   std::shared_ptr<Statements> statements_;
+  // Most homes have neither; then nobody needs to ask.
+  bool mayHaveLinks_ = true;
+  bool mayHaveHandovers_ = true;
 };
 
 }  // namespace mirabel

@@ -79,7 +79,7 @@ Result<void> Learner::learn(const std::string& folderPath, int folder,
     Sighting& sighting = sightings[i];
     const ObjectStatus& status = sighting.status;
     const ObjectKind kind = objectKind(status.kind, sighting.isPackage);
-    if (status.device == device_ && status.inode < upperFileIDs) {
+    if (status.device == device_) {
       auto known = store_.unchangedObject(status.inode, *id, sighting.name, kind, status.birthTime,
                                           status.changeTime);
       if (!known) return fail(known.error());

@@ -57,18 +57,16 @@ Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinde
 
 Result<Slot> Placer::slotOf(const SeenObject& seen) {
   Slot slot;
-  if (seen.status.device == device_ && seen.status.inode < upperFileIDs) {
-    slot.number = seen.status.inode;
-    auto row = store_.objectInSlot(slot.number);
+  if (seen.status.device == device_) {
+    auto row = store_.objectByInode(seen.status.inode);
     if (!row) return fail(row.error());
     slot.row = std::move(*row);
     return slot;
   }
-  if (seen.status.device != device_) slot.fileSystem = fileSystemID(seen);
+  slot.fileSystem = fileSystemID(seen);
   auto row = store_.foreignObject(slot.fileSystem, seen.status.inode);
   if (!row) return fail(row.error());
   slot.row = std::move(*row);
-  if (slot.row) slot.number = slot.row->slot;
   return slot;
 }
 
@@ -198,7 +196,7 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
   }
   if (!document) {
-    auto inherited = vacate(arrival, slot.number);
+    auto inherited = vacate(arrival, 0);
     if (inherited && !*inherited) inherited = takeHandover(arrival, 0);
     if (!inherited) return fail(inherited.error());
     document = *inherited;
@@ -218,7 +216,6 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     if (!next) return fail(next.error());
     row.fileID = *next;
   }
-  row.slot = ownNumber ? row.inode : row.fileID;
   row.documentID = document.value_or(0);
   if (document) {
     if (auto ended = store_.removeHandovers(*document); !ended) return fail(ended.error());

@@ -23,9 +23,8 @@ struct Arrival {
   bool isOccupied = true;  ///< false: the index surely has nothing under that name
 };
 
-/// Which row of the index is an object's, or would be.
+/// The row that the index has for an inode number, which may be another generation's.
 struct Slot {
-  std::uint64_t number = 0;      ///< 0: it needs one of its own
   std::uint64_t fileSystem = 0;  ///< 0: the volume itself
   std::optional<ObjectRow> row;
 };
