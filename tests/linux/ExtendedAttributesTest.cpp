@@ -37,9 +37,12 @@ TEST_F(ExtendedAttributesOnDisk, ManyNamesAreListedAloneAndTogether) {
   std::vector<std::string> names;
   const auto target = platform().attributes.open(home.url("file")).value();
   for (char c = 'a'; c < 'm'; ++c) {
-    names.push_back(std::string(120, c));  // together more than fits the first buffer
-    ASSERT_TRUE(target->set(names.back(), {1}));
+    // Together more than fits the first buffer, and than some file systems have room for.
+    const std::string name(120, c);
+    if (!target->set(name, {1})) break;
+    names.push_back(name);
   }
+  ASSERT_GT(names.size(), 4U);
   EXPECT_THAT(platform().attributes.names(home.url("file")).value(),
               ::testing::UnorderedElementsAreArray(names));
   const URL url = home.url("file");

@@ -5,6 +5,7 @@
 #include <limits>
 
 #include "foundation/URL.h"
+#include "linux/files/FolderOpening.h"
 #include "linux/files/PackageTypes.h"
 #include "linux/kernel/RawDirectory.h"
 
@@ -83,9 +84,9 @@ Result<std::string> LinuxFileObjects::pathOfFileID(DeviceID device, std::uint64_
 // The kernel's own count of a folder's links tells the folders in it on some file systems and
 // nothing on others, so the entries are counted, as far as the answer can count.
 std::uint16_t LinuxFileObjects::linkCountOfFolder(const URL& url) const {
-  auto opened = context_.roots.open(url.path(), O_RDONLY | O_DIRECTORY);
+  auto opened = openFolderForReading(context_.roots, url.path());
   if (!opened) return linksOfEmptyFolder;
-  RawDirectory directory(std::move(*opened));
+  RawDirectory directory(std::move(opened->descriptor));
   std::uint16_t links = linksOfEmptyFolder;
   while (links < mostLinks) {
     auto entry = directory.next();
