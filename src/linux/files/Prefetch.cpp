@@ -13,7 +13,7 @@
 #include "foundation/URL.h"
 #include "linux/files/AttributeCalls.h"
 #include "linux/files/PackageTypes.h"
-#include "linux/files/SplitWork.h"
+#include "foundation/SplitWork.h"
 
 namespace mirabel {
 namespace {

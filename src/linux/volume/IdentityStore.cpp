@@ -72,7 +72,7 @@ struct IdentityStore::Statements {
   Statement& byDocument = all[3];
   Statement& byPlace = all[4];
   Statement& byForeign = all[5];
-  Statement& unchanged = all[6];
+  Statement& compare = all[6];
   Statement& occupied = all[7];
   Statement& insert = all[8];
   Statement& update = all[9];
@@ -220,20 +220,21 @@ Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t file
   return readObject(statements_->byForeign.bind(1, fileSystem).bind(2, inode));
 }
 
-Result<std::optional<KnownObject>> IdentityStore::unchangedObject(
-    std::uint64_t inode, std::uint64_t folder, std::string_view name, ObjectKind kind,
-    std::int64_t birthTime, std::int64_t changeTime) {
-  Statement& statement = statements_->unchanged.bind(1, inode);
+Result<KnownObject> IdentityStore::compareEntry(std::uint64_t inode, std::uint64_t folder,
+                                                std::string_view name, ObjectKind kind,
+                                                std::int64_t birthTime, std::int64_t changeTime) {
+  Statement& statement = statements_->compare.bind(1, inode);
   StatementScope scope(statement);
   auto found = statement.step();
   if (!found) return fail(found.error());
-  if (!*found || statement.unsignedInteger(3) != folder ||
-      statement.integer(2) != static_cast<int>(kind) || statement.integer(5) != birthTime ||
-      statement.integer(6) != changeTime || statement.integer(7) == 0 ||
-      statement.blob(4) != name) {
-    return std::nullopt;
+  if (!*found) return KnownObject{};
+  if (statement.unsignedInteger(3) != folder || statement.integer(2) != static_cast<int>(kind) ||
+      statement.integer(5) != birthTime || statement.integer(6) != changeTime ||
+      statement.integer(7) == 0 || statement.blob(4) != name) {
+    return KnownObject{Knowledge::different};
   }
-  return KnownObject{statement.isNull(0) ? inode : statement.unsignedInteger(0),
+  return KnownObject{Knowledge::unchanged,
+                     statement.isNull(0) ? inode : statement.unsignedInteger(0),
                      static_cast<std::uint32_t>(statement.integer(1))};
 }
 

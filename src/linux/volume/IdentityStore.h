@@ -58,10 +58,13 @@ struct ObjectRow {
   std::string handle;            ///< empty: the file system has none
 };
 
-/// What the quick look-up of a listing compares and answers.
+/// What the quick look-up of a listing answers: nothing is known of the inode number, or something
+/// else than what is seen, or just that.
+enum class Knowledge { none, different, unchanged };
 struct KnownObject {
-  std::uint64_t fileID;
-  std::uint32_t documentID;
+  Knowledge knowledge = Knowledge::none;
+  std::uint64_t fileID = 0;  ///< this and the next only when unchanged
+  std::uint32_t documentID = 0;
 };
 
 /// File IDs at and above this are given to objects whose inode number cannot be theirs.
@@ -83,10 +86,11 @@ class IdentityStore {
                                                           std::string_view name);
   [[nodiscard]] Result<std::optional<ObjectRow>> foreignObject(std::uint64_t fileSystem,
                                                                std::uint64_t inode);
-  /// The object in `slot` if it was last seen under this very name, with these times, for sure.
-  [[nodiscard]] Result<std::optional<KnownObject>> unchangedObject(
-      std::uint64_t slot, std::uint64_t folder, std::string_view name, ObjectKind kind,
-      std::int64_t birthTime, std::int64_t changeTime);
+  /// Compares the volume's object of that inode number with an entry: unchanged when it was last
+  /// seen under this very name, with these times, and is that object for sure.
+  [[nodiscard]] Result<KnownObject> compareEntry(std::uint64_t inode, std::uint64_t folder,
+                                                 std::string_view name, ObjectKind kind,
+                                                 std::int64_t birthTime, std::int64_t changeTime);
   /// Whether the index has anything under that name: an object, a link or a handover.
   [[nodiscard]] Result<bool> isOccupied(std::uint64_t folder, std::string_view name);
   /// Writes the row; a new one gets its slot. Fails when another object has its document.

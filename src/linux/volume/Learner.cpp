@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "foundation/SplitWork.h"
 #include "linux/volume/DiskEntry.h"
 
 namespace mirabel {
@@ -75,32 +76,77 @@ Result<void> Learner::learn(const std::string& folderPath, int folder,
   finder_.forget();
   auto id = folderID(folderPath, folder);
   if (!id) return fail(id.error());
+  // First what nothing has happened to, which is nearly all, then the rest.
+  std::vector<Unsettled> rest;
   for (std::size_t i = 0; i < sightings.size(); ++i) {
-    Sighting& sighting = sightings[i];
-    const ObjectStatus& status = sighting.status;
-    const ObjectKind kind = objectKind(status.kind, sighting.isPackage);
-    if (status.device == device_) {
-      auto known = store_.unchangedObject(status.inode, *id, sighting.name, kind, status.birthTime,
-                                          status.changeTime);
-      if (!known) return fail(known.error());
-      if (*known && ((*known)->documentID != 0 || !isDocumentKind(kind))) {
-        sighting.fileID = (*known)->fileID;
-        sighting.documentID = isDocumentKind(kind) ? (*known)->documentID : 0;
-        continue;
-      }
+    auto knowledge = recognise(*id, sightings[i]);
+    if (!knowledge) return fail(knowledge.error());
+    if (*knowledge != Knowledge::unchanged) {
+      rest.push_back({i, *knowledge == Knowledge::none && isOnVolume(sightings[i]), ""});
     }
-    auto occupied = store_.isOccupied(*id, sighting.name);
-    if (!occupied) return fail(occupied.error());
-    placer_.setOthers(
-        [&] { return occupants(*id, sightings.subspan(i)).value_or(std::vector<ObjectRow>()); });
-    auto row = placer_.place(
-        {{folder, sighting.name, status}, folderPath, {*id, sighting.name}, kind, *occupied});
-    placer_.setOthers([] { return std::vector<ObjectRow>(); });
-    if (!row && row.error().isPosix(ESTALE)) continue;
-    if (!row) return fail(row.error());
-    sighting.fileID = row->fileID;
-    sighting.documentID = isDocumentKind(row->kind) ? row->documentID : 0;
   }
+  readHandles(folder, sightings, rest);
+  for (Unsettled& entry : rest) {
+    placer_.setOthers([&] {
+      return occupants(*id, sightings.subspan(entry.index)).value_or(std::vector<ObjectRow>());
+    });
+    Sighting& sighting = sightings[entry.index];
+    auto placed = placeEntry({folderPath, folder, *id}, sighting, std::move(entry));
+    placer_.setOthers([] { return std::vector<ObjectRow>(); });
+    if (!placed) return placed;
+  }
+  return {};
+}
+
+bool Learner::isOnVolume(const Sighting& sighting) const {
+  return sighting.status.device == device_;
+}
+
+Result<Knowledge> Learner::recognise(std::uint64_t folder, Sighting& sighting) {
+  if (!isOnVolume(sighting)) return Knowledge::none;
+  const ObjectStatus& status = sighting.status;
+  const ObjectKind kind = objectKind(status.kind, sighting.isPackage);
+  auto known = store_.compareEntry(status.inode, folder, sighting.name, kind, status.birthTime,
+                                   status.changeTime);
+  if (!known) return fail(known.error());
+  if (known->knowledge != Knowledge::unchanged) return known->knowledge;
+  if (isDocumentKind(kind) && known->documentID == 0) return Knowledge::different;
+  sighting.fileID = known->fileID;
+  sighting.documentID = isDocumentKind(kind) ? known->documentID : 0;
+  return Knowledge::unchanged;
+}
+
+void Learner::readHandles(int folder, std::span<const Sighting> sightings,
+                          std::vector<Unsettled>& entries) {
+  constexpr std::size_t piece = 64;
+  splitWork(entries.size(), piece, [&](std::size_t begin, std::size_t end) {
+    for (std::size_t i = begin; i < end; ++i) {
+      if (!entries[i].isNew) continue;
+      entries[i].handle = handleAt(folder, sightings[entries[i].index].name).value_or("");
+    }
+  });
+}
+
+Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry) {
+  auto occupied = store_.isOccupied(folder.id, sighting.name);
+  if (!occupied) return fail(occupied.error());
+  Arrival arrival{{folder.descriptor, sighting.name, sighting.status},
+                  folder.path,
+                  {folder.id, sighting.name},
+                  objectKind(sighting.status.kind, sighting.isPackage),
+                  *occupied};
+  // Whoever is placed under a free name moves nobody, so what was new when the batch began is new
+  // still, unless the same inode number stands in it twice: a further link, or a fresh reuse.
+  if (entry.isNew && !*occupied && sighting.status.linkCount == 1) {
+    auto row = store_.objectByInode(sighting.status.inode);
+    if (!row) return fail(row.error());
+    if (!*row) arrival.newHandle = std::move(entry.handle);
+  }
+  auto row = placer_.place(std::move(arrival));
+  if (!row && row.error().isPosix(ESTALE)) return {};
+  if (!row) return fail(row.error());
+  sighting.fileID = row->fileID;
+  sighting.documentID = isDocumentKind(row->kind) ? row->documentID : 0;
   return {};
 }
 

@@ -6,6 +6,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
@@ -40,6 +41,25 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] Result<std::optional<std::string>> find(std::uint64_t fileID);
 
  private:
+  /// An entry of a batch that is not just as the index has it.
+  struct Unsettled {
+    std::size_t index;
+    bool isNew;  ///< the index had nothing under its inode number
+    std::string handle;
+  };
+  struct Folder {
+    const std::string& path;
+    int descriptor;
+    std::uint64_t id;
+  };
+  [[nodiscard]] bool isOnVolume(const Sighting& sighting) const;
+  /// Answers the identity where nothing has happened to the entry.
+  [[nodiscard]] Result<Knowledge> recognise(std::uint64_t folder, Sighting& sighting);
+  /// Reads the handles of new entries, on two threads.
+  static void readHandles(int folder, std::span<const Sighting> sightings,
+                          std::vector<Unsettled>& entries);
+  [[nodiscard]] Result<void> placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry);
+
   /// Whether the object is at the path that the index gives; the path if so.
   [[nodiscard]] Result<std::optional<std::string>> verify(const ObjectRow& row);
   /// Learns what is at the object's place instead of it.

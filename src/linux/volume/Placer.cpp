@@ -71,6 +71,7 @@ Result<Slot> Placer::slotOf(const SeenObject& seen) {
 }
 
 Result<ObjectRow> Placer::place(Arrival arrival) {
+  if (arrival.newHandle) return placeNew(arrival, Slot{}, std::move(*arrival.newHandle));
   auto slot = slotOf(arrival.seen);
   if (!slot) return fail(slot.error());
   if (slot->row && compare(*slot->row, arrival.seen) == Match::same) {

@@ -21,6 +21,9 @@ struct Arrival {
   Location location;
   ObjectKind kind = ObjectKind::other;
   bool isOccupied = true;  ///< false: the index surely has nothing under that name
+  /// Set when the index surely has nothing under the inode number: the handle of what is seen,
+  /// empty where the file system has none.
+  std::optional<std::string> newHandle = std::nullopt;
 };
 
 /// The row that the index has for an inode number, which may be another generation's.

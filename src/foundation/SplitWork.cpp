@@ -1,4 +1,4 @@
-#include "linux/files/SplitWork.h"
+#include "foundation/SplitWork.h"
 
 #include <algorithm>
 #include <atomic>
