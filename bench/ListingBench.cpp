@@ -14,6 +14,7 @@
 
 #include "BenchHome.h"
 #include "fs/FSDirectoryEnumerator.h"
+#include "items/ItemBatch.h"
 #include "linux/files/LinuxPlatform.h"
 #include "provider/LocalVessel.h"
 
@@ -84,9 +85,9 @@ class Provider {
     std::size_t items = 0;
     std::vector<URL> batch;
     const auto flush = [&] {
-      require(platform_->platform().resources.prefetch(batch).has_value(), "entries are read");
-      for (const URL& url : batch) {
-        const auto item = LocalItem::create(vessel_->itemContext(), url);
+      const auto made = makeItems(vessel_->itemContext(), batch);
+      require(made.has_value(), "entries are read");
+      for (const auto& item : *made) {
         require(item != nullptr && item->docID().has_value(), "each entry is an item");
         ++items;
       }
