@@ -19,12 +19,15 @@ Result<IdentifierAllocator> IdentifierAllocator::open(IdentityStore& store, Witn
   IdentifierAllocator allocator(store, witness, folder);
   auto document = store.number("next_document_id");
   auto file = store.number("next_file_id");
+  auto slot = store.number("next_slot");
   auto spent = store.number("inode_numbers_spent");
-  for (const auto* number : {&document, &file, &spent}) {
+  for (const auto* number : {&document, &file, &slot, &spent}) {
     if (!*number) return fail(number->error());
   }
   allocator.savedDocument_ = document->value_or(0);
   allocator.savedFile_ = file->value_or(0);
+  allocator.savedSlot_ = slot->value_or(0);
+  allocator.nextSlot_ = std::max(upperSlots, allocator.savedSlot_);
   allocator.nextDocument_ = std::max<std::uint64_t>(1, allocator.savedDocument_);
   allocator.nextFile_ = std::max(upperFileIDs, allocator.savedFile_);
   allocator.inodesSpent_ = spent->value_or(0) != 0;
@@ -62,6 +65,10 @@ Result<void> IdentifierAllocator::save() {
   if (nextFile_ != savedFile_) {
     if (auto set = store_->setNumber("next_file_id", nextFile_); !set) return set;
     savedFile_ = nextFile_;
+  }
+  if (nextSlot_ != savedSlot_) {
+    if (auto set = store_->setNumber("next_slot", nextSlot_); !set) return set;
+    savedSlot_ = nextSlot_;
   }
   return {};
 }

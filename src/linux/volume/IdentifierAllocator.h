@@ -21,6 +21,8 @@ class IdentifierAllocator {
   /// the witness.
   [[nodiscard]] Result<std::uint32_t> nextDocumentID();
   [[nodiscard]] Result<std::uint64_t> nextFileID();
+  /// A slot for a row that has no document ID of its own; see `ObjectRow::slot`.
+  [[nodiscard]] std::uint64_t nextUpperSlot() { return nextSlot_++; }
 
   /// Writes the counters into the transaction under way, when they have moved.
   [[nodiscard]] Result<void> save();
@@ -39,8 +41,10 @@ class IdentifierAllocator {
   const StateFolder* folder_;
   std::uint64_t nextDocument_ = 1;
   std::uint64_t nextFile_ = upperFileIDs;
+  std::uint64_t nextSlot_ = upperSlots;
   std::uint64_t savedDocument_ = 0;
   std::uint64_t savedFile_ = 0;
+  std::uint64_t savedSlot_ = 0;
   bool inodesSpent_ = false;
 };
 

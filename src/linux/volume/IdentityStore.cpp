@@ -36,7 +36,7 @@ CREATE UNIQUE INDEX IF NOT EXISTS objects_foreign ON objects(file_system, inode)
   WHERE file_system IS NOT NULL;
 CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id IS NOT NULL;
 CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
-  WHERE document_id IS NOT NULL;
+  WHERE document_id IS NOT NULL AND document_id <> slot;
 CREATE INDEX IF NOT EXISTS objects_place ON objects(place) WHERE place IS NOT NULL;
 CREATE TABLE IF NOT EXISTS links(
   folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
@@ -72,22 +72,23 @@ struct IdentityStore::Statements {
   Statement& byDocument = all[3];
   Statement& byPlace = all[4];
   Statement& byForeign = all[5];
-  Statement& compare = all[6];
-  Statement& occupied = all[7];
-  Statement& insert = all[8];
-  Statement& update = all[9];
-  Statement& remove = all[10];
-  Statement& linkAt = all[11];
-  Statement& linksOf = all[12];
-  Statement& addLink = all[13];
-  Statement& removeLink = all[14];
-  Statement& anyLink = all[15];
-  Statement& handoverAt = all[16];
-  Statement& addHandover = all[17];
-  Statement& removeHandovers = all[18];
-  Statement& anyHandover = all[19];
-  Statement& meta = all[20];
-  Statement& setMeta = all[21];
+  Statement& slotOfInode = all[6];
+  Statement& following = all[7];
+  Statement& occupied = all[8];
+  Statement& insert = all[9];
+  Statement& update = all[10];
+  Statement& remove = all[11];
+  Statement& linkAt = all[12];
+  Statement& linksOf = all[13];
+  Statement& addLink = all[14];
+  Statement& removeLink = all[15];
+  Statement& anyLink = all[16];
+  Statement& handoverAt = all[17];
+  Statement& addHandover = all[18];
+  Statement& removeHandovers = all[19];
+  Statement& anyHandover = all[20];
+  Statement& meta = all[21];
+  Statement& setMeta = all[22];
 };
 
 Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
@@ -118,14 +119,15 @@ Result<void> IdentityStore::prepare() {
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE slot = ?1",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE inode = ?1 AND file_system IS NULL",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1 AND document_id <> slot",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_system = ?1 AND inode = ?2",
-      "SELECT file_id, document_id, kind, folder, name, birth_time, change_time, settled "
-      "FROM objects WHERE inode = ?1 AND file_system IS NULL",
+      "SELECT slot FROM objects WHERE inode = ?1 AND file_system IS NULL",
+      "SELECT inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, "
+      "file_system FROM objects WHERE slot >= ?1",
       "SELECT 1 FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
       "INSERT INTO objects(" OBJECT_COLUMNS
-      ", place) VALUES(NULL,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14,?15) RETURNING slot",
+      ", place) VALUES(?1,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14,?15)",
       "UPDATE objects SET inode=?2, file_id=?3, document_id=?4, kind=?5, folder=?6, name=?7, "
       "birth_time=?8, change_time=?9, settled=?10, modification_time=?11, size=?12, "
       "file_system=?13, handle=?14, place=?15 WHERE slot=?1",
@@ -206,6 +208,9 @@ Result<std::optional<ObjectRow>> IdentityStore::objectByFileID(std::uint64_t fil
 }
 
 Result<std::optional<ObjectRow>> IdentityStore::objectByDocumentID(std::uint32_t documentID) {
+  // Most documents are the slot's own; the index holds those that were handed on.
+  auto row = objectInSlot(documentID);
+  if (!row || (*row && (*row)->documentID == documentID)) return row;
   return readObject(statements_->byDocument.bind(1, std::int64_t{documentID}));
 }
 
@@ -220,22 +225,48 @@ Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t file
   return readObject(statements_->byForeign.bind(1, fileSystem).bind(2, inode));
 }
 
+// Entries that were met one after the other have rows that follow each other, and a listing comes
+// in the same order again: mostly the next row is the one, and costs no search.
+Result<bool> IdentityStore::stepTo(std::uint64_t inode) {
+  Statement& following = statements_->following;
+  const auto isIt = [&] { return following.unsignedInteger(0) == inode && following.isNull(9); };
+  if (isComparing_) {
+    auto next = following.step();
+    if (!next) return fail(next.error());
+    isComparing_ = *next;
+    if (*next && isIt()) return true;
+  }
+  Statement& search = statements_->slotOfInode.bind(1, inode);
+  const StatementScope scope(search);
+  auto found = search.step();
+  if (!found || !*found) return found;
+  following.reset();
+  isComparing_ = false;
+  auto row = following.bind(1, search.unsignedInteger(0)).step();
+  if (!row) return fail(row.error());
+  isComparing_ = *row;
+  return *row && isIt();
+}
+
+void IdentityStore::endComparing() {
+  statements_->following.reset();
+  isComparing_ = false;
+}
+
 Result<KnownObject> IdentityStore::compareEntry(std::uint64_t inode, std::uint64_t folder,
                                                 std::string_view name, ObjectKind kind,
                                                 std::int64_t birthTime, std::int64_t changeTime) {
-  Statement& statement = statements_->compare.bind(1, inode);
-  StatementScope scope(statement);
-  auto found = statement.step();
+  auto found = stepTo(inode);
   if (!found) return fail(found.error());
   if (!*found) return KnownObject{};
-  if (statement.unsignedInteger(3) != folder || statement.integer(2) != static_cast<int>(kind) ||
-      statement.integer(5) != birthTime || statement.integer(6) != changeTime ||
-      statement.integer(7) == 0 || statement.blob(4) != name) {
+  const Statement& row = statements_->following;
+  if (row.unsignedInteger(4) != folder || row.integer(3) != static_cast<int>(kind) ||
+      row.integer(6) != birthTime || row.integer(7) != changeTime || row.integer(8) == 0 ||
+      row.blob(5) != name) {
     return KnownObject{Knowledge::different};
   }
-  return KnownObject{Knowledge::unchanged,
-                     statement.isNull(0) ? inode : statement.unsignedInteger(0),
-                     static_cast<std::uint32_t>(statement.integer(1))};
+  return KnownObject{Knowledge::unchanged, row.isNull(1) ? inode : row.unsignedInteger(1),
+                     static_cast<std::uint32_t>(row.integer(2))};
 }
 
 Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view name) {
@@ -255,13 +286,19 @@ Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view na
   return statement.step();
 }
 
-Result<void> IdentityStore::put(ObjectRow& row) {
-  Statement& statement = row.slot == 0 ? statements_->insert : statements_->update;
+Result<void> IdentityStore::insert(const ObjectRow& row) {
+  return write(statements_->insert, row);
+}
+
+Result<void> IdentityStore::put(const ObjectRow& row) {
+  return write(statements_->update, row);
+}
+
+Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
   const auto bindUnless = [&](int index, bool absent, std::uint64_t value) {
     absent ? statement.bindNull(index) : statement.bind(index, value);
   };
-  bindUnless(1, row.slot == 0, row.slot);
-  statement.bind(2, row.inode);
+  statement.bind(1, row.slot).bind(2, row.inode);
   bindUnless(3, row.fileSystem == 0 && row.fileID == row.inode, row.fileID);
   bindUnless(4, row.documentID == 0, row.documentID);
   statement.bind(5, static_cast<std::int64_t>(row.kind));
@@ -275,12 +312,7 @@ Result<void> IdentityStore::put(ObjectRow& row) {
   statement.bind(11, row.modificationTime).bind(12, row.size);
   bindUnless(13, row.fileSystem == 0, row.fileSystem);
   statement.bindBlob(14, row.handle);
-  if (row.slot != 0) return statement.run();
-  StatementScope scope(statement);
-  auto inserted = statement.step();
-  if (!inserted) return fail(inserted.error());
-  row.slot = statement.unsignedInteger(0);
-  return {};
+  return statement.run();
 }
 
 Result<void> IdentityStore::remove(std::uint64_t slot) {

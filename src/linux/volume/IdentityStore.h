@@ -37,8 +37,9 @@ struct Location {
 
 /// One object that the volume has, or had: a row of the table `objects`.
 struct ObjectRow {
-  /// Key: rows are numbered as they come, so that a folder's lie together in the order in which it
-  /// is read. 0: not in the table yet.
+  /// Key, never used twice. A document that was given its own ID has that as its slot; anything
+  /// else has one from `upperSlots` on. Numbers are given as things are met, so a folder's rows lie
+  /// together in the order in which it is read. 0: not in the table yet.
   std::uint64_t slot = 0;
   std::uint64_t fileID = 0;
   std::uint32_t documentID = 0;
@@ -67,6 +68,9 @@ struct KnownObject {
   std::uint32_t documentID = 0;
 };
 
+/// Slots of rows that are not named by their document ID.
+inline constexpr std::uint64_t upperSlots = std::uint64_t{1} << 32;
+
 /// File IDs at and above this are given to objects whose inode number cannot be theirs.
 inline constexpr std::uint64_t upperFileIDs = std::uint64_t{1} << 62;
 
@@ -91,10 +95,13 @@ class IdentityStore {
   [[nodiscard]] Result<KnownObject> compareEntry(std::uint64_t inode, std::uint64_t folder,
                                                  std::string_view name, ObjectKind kind,
                                                  std::int64_t birthTime, std::int64_t changeTime);
+  /// Ends the run of comparisons; to be called before the transaction ends or rows are written.
+  void endComparing();
   /// Whether the index has anything under that name: an object, a link or a handover.
   [[nodiscard]] Result<bool> isOccupied(std::uint64_t folder, std::string_view name);
-  /// Writes the row; a new one gets its slot. Fails when another object has its document.
-  [[nodiscard]] Result<void> put(ObjectRow& row);
+  /// Writes a row that has its slot. Fails when another object has its document or its inode.
+  [[nodiscard]] Result<void> insert(const ObjectRow& row);
+  [[nodiscard]] Result<void> put(const ObjectRow& row);
   [[nodiscard]] Result<void> remove(std::uint64_t slot);
 
   /// Further names of hard-linked objects.
@@ -121,6 +128,8 @@ class IdentityStore {
   [[nodiscard]] Result<void> make();
   [[nodiscard]] Result<void> prepare();
   [[nodiscard]] Result<std::optional<ObjectRow>> readObject(Statement& statement);
+  [[nodiscard]] Result<bool> stepTo(std::uint64_t inode);
+  [[nodiscard]] Result<void> write(Statement& statement, const ObjectRow& row);
 
   struct Statements;
   Database& database_;
@@ -128,6 +137,7 @@ class IdentityStore {
   // Most homes have neither; then nobody needs to ask.
   bool mayHaveLinks_ = true;
   bool mayHaveHandovers_ = true;
+  bool isComparing_ = false;  ///< the statement `following` stands on a row
 };
 
 }  // namespace mirabel

@@ -80,11 +80,15 @@ Result<void> Learner::learn(const std::string& folderPath, int folder,
   std::vector<Unsettled> rest;
   for (std::size_t i = 0; i < sightings.size(); ++i) {
     auto knowledge = recognise(*id, sightings[i]);
-    if (!knowledge) return fail(knowledge.error());
+    if (!knowledge) {
+      store_.endComparing();
+      return fail(knowledge.error());
+    }
     if (*knowledge != Knowledge::unchanged) {
       rest.push_back({i, *knowledge == Knowledge::none && isOnVolume(sightings[i]), ""});
     }
   }
+  store_.endComparing();
   readHandles(folder, sightings, rest);
   for (Unsettled& entry : rest) {
     placer_.setOthers([&] {

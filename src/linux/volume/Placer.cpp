@@ -222,7 +222,10 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     if (auto ended = store_.removeHandovers(*document); !ended) return fail(ended.error());
   }
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
-  return put(std::move(row));
+  const bool isOwnDocument = !document && row.documentID != 0;
+  row.slot = isOwnDocument ? row.documentID : allocator_.nextUpperSlot();
+  if (auto inserted = store_.insert(row); !inserted) return fail(inserted.error());
+  return row;
 }
 
 // What was there before -------------------------------------------------------------------------
