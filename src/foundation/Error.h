@@ -27,10 +27,10 @@ enum class FileErrorCode : std::int64_t {
 
 /// Codes of `ErrorDomain::vessel`.
 enum class VesselErrorCode : std::int64_t {
-  collision = -1001,            ///< `errorkey::collidingItem` names the item in the way
-  syncAnchorExpired = -1002,    ///< also a page that expired: start over
-  noSuchItem = -1005,           ///< `errorkey::itemIdentifier` names it
-  invalidParameter = -1010,     ///< `errorkey::parameter` and `errorkey::value`
+  collision = -1001,          ///< `errorkey::collidingItem` names the item in the way
+  syncAnchorExpired = -1002,  ///< also a page that expired: start over
+  noSuchItem = -1005,         ///< `errorkey::itemIdentifier` names it
+  invalidParameter = -1010,   ///< `errorkey::parameter` and `errorkey::value`
 };
 
 /// Codes of `ErrorDomain::localVessel`, in the order that hosts know.

@@ -3,7 +3,7 @@
 #include <mutex>
 #include <utility>
 
-#include "foundation/LogSinks.h"
+#include "foundation/StandardErrorSink.h"
 
 namespace mirabel {
 namespace {

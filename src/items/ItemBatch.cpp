@@ -17,7 +17,8 @@ Result<std::vector<std::shared_ptr<LocalItem>>> makeItems(const ItemContext& con
   }
   std::vector<std::shared_ptr<LocalItem>> items(urls.size());
   splitWork(urls.size(), pieceSize, [&](std::size_t begin, std::size_t end) {
-    for (std::size_t i = begin; i < end; ++i) items[i] = LocalItem::create(context, urls[i]);
+    for (std::size_t i = begin; i < end; ++i)
+      items[i] = LocalItem::create(context, urls[i]);
   });
   return items;
 }

@@ -26,7 +26,7 @@ inline Data binaryList(const std::vector<Data>& objects, const ListShape& shape 
   Data list = dataFromString(shape.header);
   const auto append = [&list](std::uint64_t value, int size) {
     while (size-- > 0) {
-      list.push_back(size < 8 ? static_cast<std::uint8_t>(value >> (8 * size)) : 0);
+      list.push_back(size < 8 ? static_cast<std::uint8_t>(value >> (8 * size)) : std::uint8_t{0});
     }
   };
   std::vector<std::uint64_t> offsets;

@@ -12,7 +12,7 @@
 #include <unistd.h>
 
 #include "foundation/LogSectionCounter.h"
-#include "foundation/LogSinks.h"
+#include "foundation/StandardErrorSink.h"
 #include "support/LogCapture.h"
 
 namespace mirabel {
@@ -72,14 +72,15 @@ TEST(Log, SinksLearnSubsystemAndCategory) {
 TEST(StandardErrorSink, WritesEachLineInOneCall) {
   std::array<int, 2> ends{};
   ASSERT_EQ(::pipe2(ends.data(), O_DIRECT), 0) << "a pipe that keeps writes apart";
-  StandardErrorSink sink(ends[1]);
+  std::FILE* const file = ::fdopen(ends[1], "w");
+  StandardErrorSink sink(file);
   sink.write(LogLevel::info, "s", "c", "first");
   sink.write(LogLevel::info, "s", "c", "second");
   std::array<char, 64> buffer{};
   EXPECT_EQ(std::string(buffer.data(), ::read(ends[0], buffer.data(), buffer.size())), "first\n");
   EXPECT_EQ(std::string(buffer.data(), ::read(ends[0], buffer.data(), buffer.size())), "second\n");
   ::close(ends[0]);
-  ::close(ends[1]);
+  std::fclose(file);
 }
 
 /// Runs in a process of its own, whose first sections these are.

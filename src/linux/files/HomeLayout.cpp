@@ -87,9 +87,10 @@ Result<std::string> resolvedPath(const std::string& path) {
     return fail(Error::posix(error.value()));
   }
   // What is missing keeps its name, below a parent that is resolved where it exists.
-  if (error)
+  if (error) {
     resolved =
         std::filesystem::weakly_canonical(absolute.parent_path(), error) / absolute.filename();
+  }
   if (error) return fail(Error::posix(error.value()));
   return resolved.string();
 }

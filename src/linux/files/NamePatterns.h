@@ -17,7 +17,7 @@ class NamePatterns {
   /// Takes in the patterns of one "globs2" file: lines "weight:type:pattern[:flags]".
   void read(const std::string& path);
   /// Takes in one pattern, such as "*.txt", "*.tar.gz", "makefile" or "readme*".
-  void add(std::string_view pattern);
+  void add(std::string_view given);
 
   /// The name from its last dot on, empty without a dot.
   [[nodiscard]] static std::string_view endingOf(std::string_view name);

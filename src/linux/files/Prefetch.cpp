@@ -10,10 +10,10 @@
 #include <unordered_map>
 #include <vector>
 
+#include "foundation/SplitWork.h"
 #include "foundation/URL.h"
 #include "linux/files/AttributeCalls.h"
 #include "linux/files/PackageTypes.h"
-#include "foundation/SplitWork.h"
 
 namespace mirabel {
 namespace {

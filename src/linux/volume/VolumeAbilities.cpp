@@ -23,16 +23,16 @@ Result<void> tryUserAttributes(int folder) {
 
 }  // namespace
 
-Result<VolumeAbilities> volumeAbilities(const std::string& path) {
-  auto folder = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
-  if (!folder) return fail(folder.error());
-  auto status = statusAt(folder->get(), "");
+Result<VolumeAbilities> volumeAbilities(const std::string& folder) {
+  auto opened = openLongPath(AT_FDCWD, folder, O_PATH | O_DIRECTORY);
+  if (!opened) return fail(opened.error());
+  auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
   VolumeAbilities abilities;
-  abilities.userAttributes = tryUserAttributes(folder->get());
+  abilities.userAttributes = tryUserAttributes(opened->get());
   abilities.hasBirthTimes = status->hasBirthTime;
-  abilities.hasHandles = handleAt(folder->get(), "").has_value();
-  const auto uuid = kernelVolumeUUID(path);
+  abilities.hasHandles = handleAt(opened->get(), "").has_value();
+  const auto uuid = kernelVolumeUUID(folder);
   abilities.hasUUID = uuid.has_value();
   return abilities;
 }

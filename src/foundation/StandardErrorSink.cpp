@@ -1,8 +1,7 @@
-#include "foundation/LogSinks.h"
+#include "foundation/StandardErrorSink.h"
 
 #include <cerrno>
 #include <string>
-#include <unistd.h>
 
 namespace mirabel {
 
@@ -13,13 +12,8 @@ void StandardErrorSink::write(LogLevel, std::string_view, std::string_view, std:
 
   // Logging between a failed call and the look at its errno must not change what is seen there.
   const int savedErrno = errno;
-  std::string_view rest = whole;
-  while (!rest.empty()) {
-    const ssize_t written = ::write(descriptor_, rest.data(), rest.size());
-    if (written < 0 && errno == EINTR) continue;
-    if (written <= 0) break;
-    rest.remove_prefix(static_cast<std::size_t>(written));
-  }
+  std::fwrite(whole.data(), 1, whole.size(), file_);
+  std::fflush(file_);
   errno = savedErrno;
 }
 
