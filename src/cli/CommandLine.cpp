@@ -5,7 +5,7 @@
 
 #include "cli/Commands.h"
 #include "foundation/Log.h"
-#include "foundation/LogSinks.h"
+#include "foundation/StandardErrorSink.h"
 #include "linux/log/JournalSink.h"
 
 namespace mirabel {
