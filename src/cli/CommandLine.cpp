@@ -13,16 +13,16 @@ namespace mirabel {
 namespace {
 
 constexpr const char* purpose =
-    "Gives every file and folder of a person's documents an identity that lasts: through renames, "
-    "moves, atomic saves and restarts.";
+    "Gives every file and folder of a person's documents an identity that lasts: through\n"
+    "renames, moves, atomic saves and restarts.";
 constexpr const char* itemHelp =
-    "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has no "
-    "/ in it is an identifier: fid=N for a folder, did=N for a document, #bundle for the documents "
-    "of an application. Everything else is a path, relative or absolute; ./fid=3 is one.";
+    "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has\n"
+    "no / in it is an identifier: did=N for a document, fid=N for a folder, #bundle for the\n"
+    "documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
 constexpr const char* pathHelp =
-    "PATH is relative or absolute; links on its way are followed, one at its end is not.";
+    "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
 constexpr const char* exitCodeHelp =
-    "Exit codes: 0 done, 1 failed, 2 usage, 3 no such item, 4 start over, 5 not permitted, "
+    "Exit codes: 0 done, 1 failed, 2 usage, 3 no such item, 4 start over, 5 not permitted,\n"
     "6 name taken, 7 busy.";
 constexpr double longestTimeout = 86'400;
 
@@ -38,8 +38,7 @@ struct Arguments {
 
 void addGlobalOptions(CLI::App& app, Arguments& arguments) {
   app.add_option("--home", arguments.global.home,
-                 "Work on the documents of this home instead of $HOME; nothing outside of it is "
-                 "used then")
+                 "Work on the documents of this home, not of $HOME")
       ->type_name("DIR");
   app.add_flag("--json", arguments.global.json, "Print JSON Lines, for programs");
   app.add_flag("--embedded", arguments.global.embedded,
@@ -54,7 +53,7 @@ void addGlobalOptions(CLI::App& app, Arguments& arguments) {
 CLI::App* addCommand(CLI::App& app, const char* name, const char* description,
                      const char* argumentHelp) {
   CLI::App* command = app.add_subcommand(name, description);
-  command->footer(std::string(argumentHelp) + "\n\nGlobal options: see mirabel --help.");
+  command->footer(std::string(argumentHelp) + "Global options: see mirabel --help.");
   return command;
 }
 
@@ -128,7 +127,7 @@ int runCommandLine(const std::vector<std::string>& arguments, Streams streams) {
   app.fallthrough();
   addGlobalOptions(app, parsed);
   addCommands(app, parsed);
-  app.footer(std::string(itemHelp) + "\n\n" + exitCodeHelp);
+  app.footer(std::string(itemHelp) + exitCodeHelp);
   app.require_subcommand(0, 1);
   try {
     // The parser takes its arguments from the back.

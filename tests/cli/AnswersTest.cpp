@@ -7,7 +7,6 @@ namespace {
 
 using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
-using ::testing::Not;
 using Answers = CommandLineFixture;
 
 std::set<std::string> keysOf(const nlohmann::json& object) {

@@ -30,6 +30,7 @@ class Running {
   explicit Running(std::vector<std::string> arguments) {
     arguments.insert(arguments.begin(), MIRABEL_PROGRAM);
     std::vector<char*> words;
+    words.reserve(arguments.size() + 1);
     for (std::string& argument : arguments)
       words.push_back(argument.data());
     words.push_back(nullptr);

@@ -1,10 +1,12 @@
+#include <fstream>
+#include <regex>
+
 #include "cli/CommandLineFixture.h"
 
 namespace mirabel::testing {
 namespace {
 
 using ::testing::HasSubstr;
-using ::testing::Not;
 using Usage = CommandLineFixture;
 
 TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
@@ -52,6 +54,21 @@ TEST_F(Usage, HelpAndVersionAreAnswers) {
   EXPECT_EQ(list.code, 0);
   EXPECT_THAT(list.out, HasSubstr("--pages"));
   EXPECT_THAT(run({"--version"}).out, HasSubstr("mirabel "));
+}
+
+TEST_F(Usage, TheManualKnowsEveryOptionAndCommandOfTheHelp) {
+  std::ifstream file(MIRABEL_MANUAL);
+  const std::string manual(std::istreambuf_iterator<char>(file), {});
+  const std::regex word("--[a-z]+|\\n  ([a-z]+) ");
+  int count = 0;
+  for (const char* command : {"", "id", "path", "info", "ls", "doctor", "demo"}) {
+    const std::string help = *command == '\0' ? run({"--help"}).out : run({command, "--help"}).out;
+    for (std::sregex_iterator it(help.begin(), help.end(), word), end; it != end; ++it, ++count) {
+      const std::string found = (*it)[1].matched ? (*it)[1].str() : it->str();
+      EXPECT_THAT(manual, HasSubstr("*" + found + "*")) << command;
+    }
+  }
+  EXPECT_GT(count, 20);
 }
 
 TEST_F(Usage, GlobalOptionsMayFollowTheCommandAndPathsMayLookLikeOptions) {
