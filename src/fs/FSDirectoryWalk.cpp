@@ -69,9 +69,8 @@ bool FSDirectoryWalk::resume() {
 /// The next entry that counts; nothing at the end of the walk.
 Result<std::optional<URL>> FSDirectoryWalk::nextEntry() {
   for (;;) {
-    if (const auto descent = std::exchange(descent_, {}); descent && descends(*descent)) {
-      if (auto entered = enter(descent->url); !entered) return fail(entered.error());
-      continue;
+    if (const auto descent = std::exchange(descent_, {})) {
+      if (auto descended = descend(*descent); !descended) return fail(descended.error());
     }
     if (levels_.empty()) {
       if (nextRoot_ == plan_.urls.size()) return std::nullopt;
@@ -128,16 +127,21 @@ EnumeratorOptions FSDirectoryWalk::optionsFor(const URL& directory) const {
   return plan_.recursively ? visible : visible.unionWith(Options::skipsSubdirectoryDescendants);
 }
 
-bool FSDirectoryWalk::descends(const Descent& descent) const {
+/// Enters the folder if the options of the one that holds it say so.
+Result<void> FSDirectoryWalk::descend(const Descent& descent) {
   using Options = EnumeratorOptions;
   constexpr Options nothing{Options::skipsPackageDescendants,
                             Options::skipsSubdirectoryDescendants};
-  if (descent.options.contains(nothing)) return false;
+  if (descent.options.contains(nothing)) return {};
   const auto value = reader_.value(ResourceKey::isPackage, descent.url);
+  if (!value && plan_.leavesOut && !plan_.leavesOut(descent.url, value.error())) {
+    return fail(value.error());
+  }
   const bool* isPackage = value ? std::get_if<bool>(&*value) : nullptr;
-  if (isPackage == nullptr) return false;
-  return !descent.options.contains(*isPackage ? Options::skipsPackageDescendants
-                                              : Options::skipsSubdirectoryDescendants);
+  if (isPackage == nullptr) return {};
+  const Options skips =
+      *isPackage ? Options::skipsPackageDescendants : Options::skipsSubdirectoryDescendants;
+  return descent.options.contains(skips) ? Result<void>{} : enter(descent.url);
 }
 
 std::optional<ResourceValue> FSDirectoryWalk::fileIDAt(const URL& directory) const {

@@ -27,8 +27,9 @@ class FSDirectoryWalk {
     bool recursively = false;
     /// See `FSDirectoryEnumerator`.
     std::function<std::optional<EnumeratorOptions>(const URL&)> directoryEnumerationOptionsFor{};
-    /// Asked when a directory cannot be opened: true leaves its contents out, false, or no
-    /// function, ends the walk with the error.
+    /// Asked when a directory cannot be opened, or not be looked at to see whether it is to be:
+    /// true leaves its contents out, false ends the walk with the error. Without a function the
+    /// former ends the walk and the latter does not.
     std::function<bool(const URL&, const Error&)> leavesOut{};
   };
 
@@ -71,7 +72,7 @@ class FSDirectoryWalk {
   [[nodiscard]] Result<void> enter(const URL& directory);
   [[nodiscard]] Result<void> leave();
   [[nodiscard]] EnumeratorOptions optionsFor(const URL& directory) const;
-  [[nodiscard]] bool descends(const Descent& descent) const;
+  [[nodiscard]] Result<void> descend(const Descent& descent);
   [[nodiscard]] std::optional<ResourceValue> fileIDAt(const URL& directory) const;
 
   Plan plan_;
