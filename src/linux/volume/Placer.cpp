@@ -1,34 +1,19 @@
 #include "linux/volume/Placer.h"
 
+#include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <fcntl.h>
-#include <sys/vfs.h>
 #include <utility>
-
-#include "linux/kernel/LongPath.h"
-#include "linux/volume/DiskEntry.h"
 
 namespace mirabel {
 namespace {
 
-// More folders above each other than any path has; a longer chain is a damaged index.
-constexpr int deepestFolder = 1 << 20;
 // Moves that uncover moves. Each detaches a row first, so this is only reached when names change
 // faster than they are read.
 constexpr int deepestChain = 64;
 
-// The kernel's own ID of the file system mounted at an entry, which outlasts device numbers.
-std::uint64_t fileSystemID(const SeenObject& seen) {
-  UniqueFd object(::openat(seen.directory, seen.name.empty() ? "." : seen.name.c_str(),
-                           O_PATH | O_NOFOLLOW | O_CLOEXEC));
-  struct statfs info;
-  std::uint64_t id = 0;
-  if (object && ::fstatfs(object.get(), &info) == 0) {
-    static_assert(sizeof(info.f_fsid) == sizeof(id));
-    std::memcpy(&id, &info.f_fsid, sizeof(id));
-  }
-  return id != 0 ? id : seen.status.device;
+bool isBackupOf(const Location& place, const Location& original) {
+  return place.folder == original.folder && isBackupName(place.name, original.name);
 }
 
 class Deeper {
@@ -45,29 +30,23 @@ class Deeper {
 }  // namespace
 
 Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
-               const MonitoredRoots& roots, FolderIdentities& folders, std::uint64_t device,
-               std::function<bool(std::string_view)> isPackageName)
+               const MonitoredRoots& roots, const IndexedPaths& paths, FolderIdentities& folders,
+               std::uint64_t device, std::function<bool(std::string_view)> isPackageName)
     : store_(store),
       allocator_(allocator),
       finder_(finder),
       roots_(roots),
+      paths_(paths),
       folders_(folders),
       device_(device),
       isPackageName_(std::move(isPackageName)) {}
 
 Result<Slot> Placer::slotOf(const SeenObject& seen) {
-  Slot slot;
-  if (seen.status.device == device_) {
-    auto row = store_.objectByInode(seen.status.inode);
-    if (!row) return fail(row.error());
-    slot.row = std::move(*row);
-    return slot;
-  }
-  slot.fileSystem = fileSystemID(seen);
-  auto row = store_.foreignObject(slot.fileSystem, seen.status.inode);
+  const std::uint64_t fileSystem = fileSystemOf(seen, device_);
+  auto row = fileSystem == 0 ? store_.objectByInode(seen.status.inode)
+                             : store_.foreignObject(fileSystem, seen.status.inode);
   if (!row) return fail(row.error());
-  slot.row = std::move(*row);
-  return slot;
+  return Slot{fileSystem, std::move(*row)};
 }
 
 Result<ObjectRow> Placer::place(Arrival arrival) {
@@ -103,14 +82,13 @@ Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
   refresh(row, arrival.seen.status);
   const std::uint32_t before = row.documentID;
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
-  if (row.location == arrival.location) {
-    if (!changed && row.documentID == before) return row;
-    return put(std::move(row));
+  if (row.location != arrival.location) {
+    auto further = isFurtherLink(arrival, row);
+    if (!further) return fail(further.error());
+    if (!*further) return moveTo(arrival, std::move(row));
   }
-  auto further = isFurtherLink(arrival, row);
-  if (!further) return fail(further.error());
-  if (*further) return put(std::move(row));
-  return moveTo(arrival, std::move(row));
+  if (!changed && row.documentID == before) return row;
+  return put(std::move(row));
 }
 
 Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row) {
@@ -121,21 +99,13 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
   if (!link) return fail(link.error());
   if (*link == row.slot) return true;
   if (!row.location) return false;
-  auto still = isStillAt(row, *row.location);
+  auto still = paths_.isAt(row, *row.location);
   if (!still || !*still) return still;
   // Linking over a document ends it: the object that arrives is shown under its other names too,
   // and keeps the identity that it has there.
   if (auto vacated = vacate(arrival, row.slot); !vacated) return fail(vacated.error());
   if (auto added = store_.addLink(arrival.location, row.slot); !added) return fail(added.error());
   return true;
-}
-
-Result<bool> Placer::isStillAt(const ObjectRow& row, const Location& location) {
-  auto path = pathOf(location);
-  if (!path) return fail(path.error());
-  if (!*path) return false;
-  const auto look = lookAt(roots_, **path);
-  return look && look->seen.status.inode == row.inode && compare(row, look->seen) == Match::same;
 }
 
 Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
@@ -145,26 +115,23 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
   if (arrival.seen.status.linkCount < 2) {
     if (auto dropped = dropLinks(row.slot); !dropped) return fail(dropped.error());
   }
-  auto inherited = vacate(arrival, row.slot);
-  if (inherited && !*inherited) inherited = takeHandover(arrival, row.documentID);
+  auto inherited = inherit(arrival, row.slot, row.documentID);
   if (!inherited) return fail(inherited.error());
   // Making room may have touched this row too.
   auto current = store_.objectInSlot(row.slot);
   if (!current) return fail(current.error());
   if (*current) row.documentID = (*current)->documentID;
-  if (*inherited) {
-    if (auto ended = store_.removeHandovers(row.documentID); !ended) return fail(ended.error());
-    row.documentID = **inherited;
-  }
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
+  const std::uint32_t own = row.documentID;
+  row.documentID = inherited->value_or(own);
   row.location = arrival.location;
-  if (row.documentID != 0) {
-    if (auto ended = store_.removeHandovers(row.documentID); !ended) return fail(ended.error());
-    if (from && from->folder == arrival.location.folder &&
-        isBackupName(arrival.location.name, from->name)) {
-      auto noted = store_.addHandover(*from, row.documentID);
-      if (!noted) return fail(noted.error());
-    }
+  for (const std::uint32_t document : {own, row.documentID}) {
+    if (auto ended = store_.removeHandovers(document); !ended) return fail(ended.error());
+  }
+  // Also when this took the place, and the document, of an older backup.
+  if (from && isBackupOf(arrival.location, *from) && isDocumentKind(row.kind)) {
+    auto noted = store_.addHandover(*from, {own, row.kind});
+    if (!noted) return fail(noted.error());
   }
   return put(std::move(row));
 }
@@ -173,6 +140,8 @@ Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& f
   auto folder = roots_.open(found.folderPath, O_PATH | O_DIRECTORY);
   if (!folder) return row;
   auto id = folders_.folderID(found.folderPath, folder->get());
+  // The way there is changing right now: whoever looks next finds out.
+  if (!id && id.error().domain == ErrorDomain::posix) return row;
   if (!id) return fail(id.error());
   // Learning the way there may have moved the row itself.
   auto current = store_.objectInSlot(row.slot);
@@ -188,19 +157,19 @@ Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& f
 // New objects -----------------------------------------------------------------------------------
 
 Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std::string handle) {
-  std::optional<std::uint32_t> document;
-  if (slot.row) {
-    // The number's former holder is gone. Where it had this very name, this is its save.
-    const bool isSave = slot.row->location == arrival.location && slot.row->kind == arrival.kind;
-    if (isSave && slot.row->documentID != 0) document = slot.row->documentID;
-    if (auto dropped = dropLinks(slot.row->slot); !dropped) return fail(dropped.error());
-    if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
+  auto document = slot.row ? retire(*slot.row, arrival) : std::nullopt;
+  if (document && !*document && arrival.isOccupied) {
+    document = inherit(arrival, 0, 0);
+    // What made room may have gone into this very folder, and have put it into the index.
+    auto again = slotOf(arrival.seen);
+    if (!again) return fail(again.error());
+    if (again->row && compare(*again->row, arrival.seen) == Match::same) {
+      return placeKnown(arrival, std::move(*again->row));
+    }
   }
-  if (!document) {
-    auto inherited = vacate(arrival, 0);
-    if (inherited && !*inherited) inherited = takeHandover(arrival, 0);
-    if (!inherited) return fail(inherited.error());
-    document = *inherited;
+  if (!document) return fail(document.error());
+  if (slot.row) {
+    if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
   }
   ObjectRow row;
   row.kind = arrival.kind;
@@ -217,12 +186,12 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     if (!next) return fail(next.error());
     row.fileID = *next;
   }
-  row.documentID = document.value_or(0);
-  if (document) {
-    if (auto ended = store_.removeHandovers(*document); !ended) return fail(ended.error());
+  row.documentID = document->value_or(0);
+  if (*document) {
+    if (auto ended = store_.removeHandovers(**document); !ended) return fail(ended.error());
   }
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
-  const bool isOwnDocument = !document && row.documentID != 0;
+  const bool isOwnDocument = !*document && row.documentID != 0;
   row.slot = isOwnDocument ? row.documentID : allocator_.nextUpperSlot();
   if (auto inserted = store_.insert(row); !inserted) return fail(inserted.error());
   return row;
@@ -230,26 +199,71 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
 
 // What was there before -------------------------------------------------------------------------
 
+// The number's former holder is gone for sure, and its document waits under every name that it had.
+Placer::Inheritance Placer::retire(ObjectRow former, const Arrival& arrival) {
+  auto names = store_.links(former.slot);
+  if (!names) return fail(names.error());
+  if (auto dropped = dropLinks(former.slot); !dropped) return fail(dropped.error());
+  if (former.location) names->push_back(std::move(*former.location));
+  former.location.reset();
+  const std::uint32_t document = take(former);
+  if (auto written = store_.put(former); !written) return fail(written.error());
+  if (document == 0 || !isDocumentKind(former.kind)) return std::nullopt;
+  const bool hadThisName = std::ranges::find(*names, arrival.location) != names->end();
+  if (hadThisName && former.kind == arrival.kind) return document;
+  for (const Location& name : *names) {
+    auto noted = store_.addHandover(name, {document, former.kind});
+    if (!noted) return fail(noted.error());
+  }
+  return std::nullopt;
+}
+
+Placer::Inheritance Placer::inherit(const Arrival& arrival, std::uint64_t arrivingSlot,
+                                    std::uint32_t ownDocument) {
+  auto inherited = vacate(arrival, arrivingSlot);
+  if (!inherited || *inherited) return inherited;
+  return takeHandover(arrival, ownDocument);
+}
+
 Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivingSlot) {
-  if (!arrival.isOccupied) return std::nullopt;
-  auto link = store_.linkAt(arrival.location.folder, arrival.location.name);
+  const auto& [folder, name] = arrival.location;
+  auto link = store_.linkAt(folder, name);
   if (!link) return fail(link.error());
   if (*link) {
-    auto removed = store_.removeLink(arrival.location.folder, arrival.location.name);
-    if (!removed) return fail(removed.error());
-    return std::nullopt;
+    if (auto removed = store_.removeLink(folder, name); !removed) return fail(removed.error());
   }
-  auto occupant = store_.objectAt(arrival.location.folder, arrival.location.name);
+  auto occupant = *link ? store_.objectInSlot(**link) : store_.objectAt(folder, name);
   if (!occupant) return fail(occupant.error());
-  if (!*occupant || (arrivingSlot != 0 && (*occupant)->slot == arrivingSlot)) return std::nullopt;
-  auto elsewhere = promoteLink(**occupant);
+  if (!*occupant || (*occupant)->slot == arrivingSlot) return std::nullopt;
+  auto elsewhere = hasOtherName(**occupant, arrival.location);
   if (!elsewhere) return fail(elsewhere.error());
-  if (*elsewhere) return std::nullopt;
+  const bool isDocument = (*occupant)->documentID != 0 && isDocumentKind((*occupant)->kind);
+  if (*elsewhere) {
+    const bool isBackup = isDocument && (*occupant)->kind == arrival.kind &&
+                          isBackupOf(*(*occupant)->location, arrival.location);
+    return isBackup ? handOver(std::move(**occupant)) : std::nullopt;
+  }
   (*occupant)->location.reset();
   if (auto detached = store_.put(**occupant); !detached) return fail(detached.error());
   // Where a folder or a link went is found out when somebody asks; whose a document is, now.
-  if ((*occupant)->documentID == 0 || !isDocumentKind((*occupant)->kind)) return std::nullopt;
-  return vacateDocument(arrival, std::move(**occupant));
+  return isDocument ? vacateDocument(arrival, std::move(**occupant)) : std::nullopt;
+}
+
+Result<bool> Placer::hasOtherName(ObjectRow& row, const Location& lost) {
+  if (row.location && *row.location != lost) {
+    auto still = paths_.isAt(row, *row.location);
+    if (!still || *still) return still;
+  }
+  return promoteLink(row);
+}
+
+Placer::Inheritance Placer::handOver(ObjectRow backup) {
+  auto own = allocator_.nextDocumentID();
+  if (!own) return fail(own.error());
+  const std::uint32_t document = take(backup);
+  backup.documentID = *own;
+  if (auto written = store_.put(backup); !written) return fail(written.error());
+  return document;
 }
 
 Placer::Inheritance Placer::vacateDocument(const Arrival& arrival, ObjectRow occupant) {
@@ -259,15 +273,18 @@ Placer::Inheritance Placer::vacateDocument(const Arrival& arrival, ObjectRow occ
   const auto found = finder_.find(occupant, arrival.folderPath, others_);
   if (!found) {
     if (!canInherit) return std::nullopt;
-    const std::uint32_t document = std::exchange(occupant.documentID, 0);
+    const std::uint32_t document = take(occupant);
     if (auto written = store_.put(occupant); !written) return fail(written.error());
     return document;
   }
-  const bool isBackup =
-      found->folderPath == arrival.folderPath && isBackupName(found->name, arrival.location.name);
+  const bool isInSameFolder = found->folderPath == arrival.folderPath;
+  // Whoever arrives was seen there a moment ago: names are changing hands faster than they are
+  // read, and the next look will tell.
+  if (isInSameFolder && found->name == arrival.location.name) return fail(Error::posix(ESTALE));
+  const bool isBackup = isInSameFolder && isBackupName(found->name, arrival.location.name);
   std::optional<std::uint32_t> inherited;
   if (isBackup && canInherit) {
-    inherited = std::exchange(occupant.documentID, 0);
+    inherited = take(occupant);
     if (auto written = store_.put(occupant); !written) return fail(written.error());
   }
   auto moved = placeFound(std::move(occupant), *found);
@@ -276,28 +293,29 @@ Placer::Inheritance Placer::vacateDocument(const Arrival& arrival, ObjectRow occ
 }
 
 Placer::Inheritance Placer::takeHandover(const Arrival& arrival, std::uint32_t ownDocument) {
-  if (!arrival.isOccupied || !isDocumentKind(arrival.kind)) return std::nullopt;
-  auto document = store_.handoverAt(arrival.location.folder, arrival.location.name);
-  if (!document) return fail(document.error());
-  if (!*document || **document == ownDocument) return std::nullopt;
-  if (auto ended = store_.removeHandovers(**document); !ended) return fail(ended.error());
-  auto holder = store_.objectByDocumentID(**document);
+  auto waiting = store_.handoverAt(arrival.location.folder, arrival.location.name);
+  if (!waiting) return fail(waiting.error());
+  if (!*waiting || (*waiting)->kind != arrival.kind) return std::nullopt;
+  const std::uint32_t document = (*waiting)->documentID;
+  if (document == ownDocument) return std::nullopt;
+  if (auto ended = store_.removeHandovers(document); !ended) return fail(ended.error());
+  auto holder = store_.objectByDocumentID(document);
   if (!holder) return fail(holder.error());
-  if (!*holder) return *document;
+  if (!*holder) return document;
   ObjectRow& backup = **holder;
-  const bool stands =
-      backup.kind == arrival.kind &&
-      (!backup.location || (backup.location->folder == arrival.location.folder &&
-                            isBackupName(backup.location->name, arrival.location.name)));
-  if (!stands) return std::nullopt;
-  backup.documentID = 0;
+  if (backup.kind != arrival.kind) return std::nullopt;
   if (backup.location) {
-    auto own = allocator_.nextDocumentID();
-    if (!own) return fail(own.error());
-    backup.documentID = *own;
+    if (!isBackupOf(*backup.location, arrival.location)) return std::nullopt;
+    return handOver(std::move(backup));
   }
+  take(backup);
   if (auto written = store_.put(backup); !written) return fail(written.error());
-  return *document;
+  return document;
+}
+
+std::uint32_t Placer::take(ObjectRow& holder) {
+  if (holder.documentID != 0) takenDocuments_.insert(holder.documentID);
+  return std::exchange(holder.documentID, 0);
 }
 
 Result<bool> Placer::promoteLink(ObjectRow& row) {
@@ -307,7 +325,7 @@ Result<bool> Placer::promoteLink(ObjectRow& row) {
     if (auto removed = store_.removeLink(name.folder, name.name); !removed) {
       return fail(removed.error());
     }
-    auto still = isStillAt(row, name);
+    auto still = paths_.isAt(row, name);
     if (!still) return still;
     if (!*still) continue;
     row.location = name;
@@ -337,22 +355,6 @@ Result<void> Placer::ensureDocument(ObjectRow& row) {
 Result<ObjectRow> Placer::put(ObjectRow row) {
   if (auto written = store_.put(row); !written) return fail(written.error());
   return row;
-}
-
-Result<std::optional<std::string>> Placer::pathOf(const Location& location) {
-  std::vector<std::string> names{location.name};
-  std::uint64_t folder = location.folder;
-  for (int depth = 0; folder != 0; ++depth) {
-    auto above = store_.objectByFileID(folder);
-    if (!above) return fail(above.error());
-    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
-    names.push_back((*above)->location->name);
-    folder = (*above)->location->folder;
-  }
-  std::string path = std::move(names.back());
-  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
-    path.append("/").append(*name);
-  return path;
 }
 
 }  // namespace mirabel

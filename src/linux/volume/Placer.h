@@ -3,12 +3,15 @@
 #include <cstdint>
 #include <functional>
 #include <optional>
+#include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "foundation/Error.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
+#include "linux/volume/IndexedPaths.h"
 #include "linux/volume/ObjectFinder.h"
 #include "linux/volume/ObjectMatcher.h"
 
@@ -53,8 +56,8 @@ class Placer {
  public:
   /// References outlive it. `device` is the number of the volume's own file system.
   Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
-         const MonitoredRoots& roots, FolderIdentities& folders, std::uint64_t device,
-         std::function<bool(std::string_view)> isPackageName);
+         const MonitoredRoots& roots, const IndexedPaths& paths, FolderIdentities& folders,
+         std::uint64_t device, std::function<bool(std::string_view)> isPackageName);
 
   /// The row as it is afterwards. POSIX error ESTALE when the entry went away meanwhile.
   [[nodiscard]] Result<ObjectRow> place(Arrival arrival);
@@ -64,15 +67,15 @@ class Placer {
   /// Asked for before the whole tree is looked through, so that one search serves a batch.
   void setOthers(ObjectFinder::Others others) { others_ = std::move(others); }
 
+  /// Documents that were taken from the objects which had them, since the last call.
+  [[nodiscard]] std::set<std::uint32_t> takenDocuments() {
+    return std::exchange(takenDocuments_, {});
+  }
+
   /// Puts an object that is not at its place where the finder has found it.
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
   /// Moves the row to one of the object's other names that still stands; false when none does.
   [[nodiscard]] Result<bool> promoteLink(ObjectRow& row);
-  /// Whether the disk has the object under that name.
-  [[nodiscard]] Result<bool> isStillAt(const ObjectRow& row, const Location& location);
-
-  /// Where the index believes a place to be; nothing when a folder above it is detached.
-  [[nodiscard]] Result<std::optional<std::string>> pathOf(const Location& location);
 
  private:
   [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
@@ -83,10 +86,20 @@ class Placer {
 
   /// A document ID that an arrival takes over; nothing when it takes none.
   using Inheritance = Result<std::optional<std::uint32_t>>;
-  /// Takes whatever the index has under the arrival's name away from there.
+  /// Takes names and document from the former holder of the arrival's inode number.
+  [[nodiscard]] Inheritance retire(ObjectRow former, const Arrival& arrival);
+  /// The document of what the index has under the arrival's name, which is free afterwards, or
+  /// else the one that waits there.
+  [[nodiscard]] Inheritance inherit(const Arrival& arrival, std::uint64_t arrivingSlot,
+                                    std::uint32_t ownDocument);
   [[nodiscard]] Inheritance vacate(const Arrival& arrival, std::uint64_t arrivingSlot);
   [[nodiscard]] Inheritance vacateDocument(const Arrival& arrival, ObjectRow occupant);
   [[nodiscard]] Inheritance takeHandover(const Arrival& arrival, std::uint32_t ownDocument);
+  std::uint32_t take(ObjectRow& holder);
+  /// Takes the document from a backup, which gets one of its own.
+  [[nodiscard]] Inheritance handOver(ObjectRow backup);
+  /// Whether the object stands under another name than the one it lost; its row then has that.
+  [[nodiscard]] Result<bool> hasOtherName(ObjectRow& row, const Location& lost);
   [[nodiscard]] Result<void> dropLinks(std::uint64_t slot);
   [[nodiscard]] Result<void> ensureDocument(ObjectRow& row);
   /// Writes the row and answers it.
@@ -96,10 +109,12 @@ class Placer {
   IdentifierAllocator& allocator_;
   ObjectFinder& finder_;
   const MonitoredRoots& roots_;
+  const IndexedPaths& paths_;
   FolderIdentities& folders_;
   std::uint64_t device_;
   std::function<bool(std::string_view)> isPackageName_;
   ObjectFinder::Others others_;
+  std::set<std::uint32_t> takenDocuments_;
   int depth_ = 0;
 };
 
