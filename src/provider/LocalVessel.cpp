@@ -114,7 +114,7 @@ Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerIte
   if (!changes_) return fail(Error::posix(ENOTSUP, "this provider follows no changes"));
   auto folders = foldersOf(identifier);
   if (!folders) return fail(folders.error());
-  const auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
+  auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
                                                       std::string(identifier), *std::move(folders));
   enumerator->startNotifier();
   return enumerator;
