@@ -162,6 +162,61 @@ TEST_F(VolumeStateTest, AnOlderCopyPutBackGivesNoIdentityTwice) {
   EXPECT_NE(index().historyUUID(), history);
 }
 
+// After a crash the last identities are in the log alone.
+TEST_F(VolumeStateTest, ALogThatIsMissingGivesNoIdentityTwice) {
+  write("early");
+  const std::uint32_t early = document("early");
+  const UUID history = index().historyUUID();
+  const auto copy = [this](const std::string& from, const std::string& to) {
+    std::filesystem::copy_file(from, to, std::filesystem::copy_options::overwrite_existing);
+  };
+  copy(volumeFolder() + "/witness", base_ + "/witness");
+  close();
+  copy(database(), base_ + "/database");
+  write("late");
+  const Sighting late = see("late");
+  close();
+  copy(base_ + "/witness", volumeFolder() + "/witness");
+  copy(base_ + "/database", database());
+  std::filesystem::remove(database() + "-wal");
+  remove("late");
+  write("later");
+  EXPECT_NE(document("later"), late.documentID);
+  EXPECT_NE(file("later"), late.fileID);
+  EXPECT_EQ(document("early"), early);
+  EXPECT_NE(index().historyUUID(), history);
+  EXPECT_EQ(notices_.size(), 1u);
+}
+
+TEST_F(VolumeStateTest, AWitnessThatIsOlderOrMissingCostsNoIdentity) {
+  write("doc");
+  const std::uint32_t document = this->document("doc");
+  const UUID history = index().historyUUID();
+  close();
+  const std::string witness = volumeFolder() + "/witness";
+  std::filesystem::copy_file(witness, base_ + "/witness");
+  write("another");
+  see("another");
+  close();
+  std::filesystem::rename(base_ + "/witness", witness);
+  for (int round = 0; round < 2; ++round) {
+    EXPECT_EQ(this->document("doc"), document);
+    EXPECT_EQ(index().historyUUID(), history);
+    close();
+    std::filesystem::remove(witness);
+  }
+  EXPECT_TRUE(notices_.empty());
+}
+
+TEST_F(VolumeStateTest, ALockThatWasRemovedLetsNobodyIn) {
+  write("doc");
+  see("doc");
+  std::filesystem::remove(volumeFolder() + "/lock");
+  const auto second = tryOpen();
+  ASSERT_FALSE(second);
+  EXPECT_TRUE(second.error().isPosix(EBUSY)) << second.error().description();
+}
+
 // SIGKILL while identities are being handed out: what a process was told stays true.
 TEST_F(VolumeStateTest, AKilledProcessLosesNothingThatItWasTold) {
   for (int round = 0; round < 4; ++round) {

@@ -19,12 +19,16 @@ constexpr const char* settings =
     "PRAGMA cell_size_check=ON;"
     "PRAGMA wal_autocheckpoint=4000;";
 
-// A full disk is an ordinary failure, and told as one.
+// A full disk is an ordinary failure, and told as one. So is another process that has the database
+// although the lock on its folder was free, because somebody removed the lock's file.
 Error lastErrorOf(sqlite3* database) {
   const int code = sqlite3_extended_errcode(database);
   if (code == SQLITE_FULL) {
     const char* path = sqlite3_db_filename(database, nullptr);
     return Error::posix(ENOSPC, path == nullptr ? "" : path);
+  }
+  if ((code & 0xFF) == SQLITE_BUSY) {
+    return Error::posix(EBUSY, "another process is using this volume's state");
   }
   return Error::store(code, sqlite3_errmsg(database));
 }
@@ -41,6 +45,8 @@ Result<std::unique_ptr<Database>> Database::open(const std::string& path) {
   std::unique_ptr<Database> database(new Database(handle));
   if (code != SQLITE_OK) return fail(database->lastError());
   sqlite3_extended_result_codes(handle, 1);
+  int persists = 1;
+  sqlite3_file_control(handle, "main", SQLITE_FCNTL_PERSIST_WAL, &persists);
   if (auto set = database->execute(settings); !set) return fail(set.error());
   return database;
 }
@@ -49,9 +55,10 @@ Database::~Database() {
   sqlite3_close_v2(handle_);
 }
 
-Result<void> Database::close() {
-  if (sqlite3_close(handle_) != SQLITE_OK) return fail(lastError());
-  handle_ = nullptr;
+Result<void> Database::checkpoint() {
+  const int code =
+      sqlite3_wal_checkpoint_v2(handle_, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
+  if (code != SQLITE_OK) return fail(lastError());
   return {};
 }
 

@@ -17,7 +17,8 @@ namespace mirabel {
 class Statement;
 
 /// A connection to one SQLite database in WAL mode, fully synchronous, locked for this process
-/// alone. Used under the lock of its owner.
+/// alone. The write-ahead log stays beside the database when that is closed. Used under the lock of
+/// its owner.
 class Database {
  public:
   /// Opens or creates. Errors: `ErrorDomain::store` with SQLite's result code.
@@ -32,8 +33,8 @@ class Database {
   [[nodiscard]] Error lastError() const;
   /// How many rows were written since it was opened.
   [[nodiscard]] std::int64_t changeCount() const;
-  /// Checkpoints, closes and removes the write-ahead log. The destructor does it too, silently.
-  [[nodiscard]] Result<void> close();
+  /// Moves what the write-ahead log holds into the database, and empties it.
+  [[nodiscard]] Result<void> checkpoint();
 
  private:
   explicit Database(sqlite3* handle) : handle_(handle) {}

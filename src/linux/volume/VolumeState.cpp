@@ -14,6 +14,7 @@ namespace mirabel {
 namespace {
 
 constexpr std::string_view databaseName = "volume.db";
+constexpr std::string_view logName = "volume.db-wal";
 // Left behind by a process that met damage while it ran, for the next one to act on.
 constexpr std::string_view damageMark = "damaged";
 
@@ -75,7 +76,9 @@ Result<std::unique_ptr<VolumeState>> VolumeState::open(StateFolder folder, const
     opened = state->openDatabase(Trust::asClosed);
   }
   if (!opened) return fail(opened.error());
-  if (auto adopted = state->adoptHistory(isNew, notice); !adopted) return fail(adopted.error());
+  if (auto adopted = state->adoptHistory(isNew, trust, notice); !adopted) {
+    return fail(adopted.error());
+  }
   return state;
 }
 
@@ -87,7 +90,11 @@ VolumeState::~VolumeState() {
 
 VolumeState::Trust VolumeState::assess() const {
   if (exists(folder_, damageMark)) return Trust::damaged;
-  if (!hasWitness_ || witness_.closedDigest == 0) return Trust::notClosed;
+  if (!hasWitness_) return Trust::notClosed;
+  // Without the log, what was written last may be missing.
+  if (witness_.closedDigest == 0) {
+    return exists(folder_, logName) ? Trust::notClosed : Trust::logLost;
+  }
   const std::string path = folder_.file(databaseName);
   const auto stamp = stampOf(path);
   if (stamp && stamp->size == witness_.closedSize && stamp->time == witness_.closedTime) {
@@ -135,11 +142,11 @@ Result<void> VolumeState::openDatabase(Trust trust) {
   auto store = IdentityStore::open(**database);
   if (!store) return fail(store.error());
   if (trust == Trust::changed) {
-    // Sound, but not what was closed last: an older copy has an older session, anything else was
-    // changed where the check does not look.
+    // Sound, but not what was closed last: an older copy has an older session, beside an older
+    // witness it is newer, and anything else was changed where the check does not look.
     auto session = (*store)->number("session");
     if (!session) return fail(session.error());
-    if (session->value_or(0) >= witness_.session) {
+    if (session->value_or(0) == witness_.session) {
       return fail(Error::store(SQLITE_CORRUPT, "the database was changed from outside"));
     }
   }
@@ -148,18 +155,24 @@ Result<void> VolumeState::openDatabase(Trust trust) {
   return {};
 }
 
-Result<void> VolumeState::adoptHistory(bool isNew, const Notice& notice) {
+bool VolumeState::isOutdated(const std::optional<UUID>& history, std::uint64_t session,
+                             Trust trust) const {
+  if (!hasWitness_) return false;
+  return !history || *history != witness_.history || session < witness_.session ||
+         trust == Trust::logLost;
+}
+
+Result<void> VolumeState::adoptHistory(bool isNew, Trust trust, const Notice& notice) {
   auto history = store_->historyUUID();
   if (!history) return fail(history.error());
   auto session = store_->number("session");
   if (!session) return fail(session.error());
   const bool isFirst = isNew && !hasWitness_ && !exists(folder_, "volume.db.damaged-1");
-  const bool isOlder =
-      !isNew && hasWitness_ &&
-      (!*history || **history != witness_.history || session->value_or(0) < witness_.session);
+  const bool isOlder = !isNew && isOutdated(*history, session->value_or(0), trust);
   const bool isLost = isNew && !isFirst;
   if (!isNew && !isOlder && *history) {
-    if (!hasWitness_) witness_ = Witness{**history, session->value_or(0)};
+    if (!hasWitness_) witness_ = Witness{**history};
+    witness_.session = std::max(witness_.session, session->value_or(0));
     auto allocator = IdentifierAllocator::open(*store_, witness_, folder_);
     if (!allocator) return fail(allocator.error());
     allocator_ = std::make_unique<IdentifierAllocator>(*allocator);
@@ -237,8 +250,7 @@ void VolumeState::closeInOrder() {
   allocator_.reset();
   store_.reset();
   if (!database_ || !hasWritten_) return;
-  const bool closed = database_->close().has_value();
-  if (!closed || broken_) return;
+  if (broken_ || !database_->checkpoint()) return;
   const std::string path = folder_.file(databaseName);
   const auto stamp = stampOf(path);
   const auto digest = digestOfFile(path);

@@ -19,9 +19,10 @@ namespace mirabel {
 /// the index.
 ///
 /// A database that does not check out is renamed to "volume.db.damaged-N" and a new one begun; so
-/// is one that was lost. One that turns out to be an older copy is kept. In all three cases the
-/// history gets a new UUID, document IDs go on behind the last that may have been given, and
-/// inode numbers no longer serve as file IDs: no identity of before is given to another thing.
+/// is one that was lost. One that turns out to be an older copy, or to have lost its log, is kept.
+/// In all these cases the history gets a new UUID, document IDs go on behind the last that may have
+/// been given, and inode numbers no longer serve as file IDs: no identity of before is given to
+/// another thing.
 class VolumeState {
  public:
   using Notice = std::function<void(std::string_view)>;
@@ -45,11 +46,13 @@ class VolumeState {
   explicit VolumeState(StateFolder folder) : folder_(std::move(folder)) {}
 
   /// What the witness says of the database file before it is opened.
-  enum class Trust { asClosed, notClosed, changed, damaged };
+  enum class Trust { asClosed, notClosed, logLost, changed, damaged };
   [[nodiscard]] Trust assess() const;
   [[nodiscard]] Result<void> setAside(const Notice& notice);
   [[nodiscard]] Result<void> openDatabase(Trust trust);
-  [[nodiscard]] Result<void> adoptHistory(bool isNew, const Notice& notice);
+  [[nodiscard]] bool isOutdated(const std::optional<UUID>& history, std::uint64_t session,
+                                Trust trust) const;
+  [[nodiscard]] Result<void> adoptHistory(bool isNew, Trust trust, const Notice& notice);
   [[nodiscard]] Result<void> beginSession();
   [[nodiscard]] Result<void> commit(std::int64_t changesBefore);
   void noteFailure(const Error& error);
