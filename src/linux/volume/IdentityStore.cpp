@@ -8,11 +8,13 @@ namespace mirabel {
 namespace {
 
 constexpr std::uint64_t schemaVersion = 1;
+// More folders above each other than any path has; a longer chain is a damaged index.
+constexpr int deepestFolder = 1 << 20;
 
 // Names are blobs: bytes, compared as bytes. The columns that a listing compares come first, the
 // handle, which it seldom needs, last. Rows are appended; what is looked up by is in indexes of
-// small integers, so that a folder of 100,000 touches few pages: `place` is a hash of folder and
-// name. `file_id` is absent where it is the inode number.
+// small integers, so that a folder of 100,000 touches few pages: `place` is a hash of the name.
+// `file_id` is absent where it is the inode number.
 constexpr const char* schema = R"(
 CREATE TABLE IF NOT EXISTS meta(key TEXT PRIMARY KEY, value NOT NULL) WITHOUT ROWID;
 CREATE TABLE IF NOT EXISTS objects(
@@ -37,7 +39,7 @@ CREATE UNIQUE INDEX IF NOT EXISTS objects_foreign ON objects(file_system, inode)
 CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id IS NOT NULL;
 CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
   WHERE document_id IS NOT NULL AND document_id <> slot;
-CREATE INDEX IF NOT EXISTS objects_place ON objects(place) WHERE place IS NOT NULL;
+CREATE INDEX IF NOT EXISTS objects_place ON objects(folder, place) WHERE folder IS NOT NULL;
 CREATE TABLE IF NOT EXISTS links(
   folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
   PRIMARY KEY(folder, name)) WITHOUT ROWID;
@@ -52,13 +54,12 @@ CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
   "slot, inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, " \
   "modification_time, size, file_system, handle "
 
-// Kept in the database, so it must never change: FNV-1a over the folder's ID and the name.
-std::int64_t placeHash(std::uint64_t folder, std::string_view name) {
-  constexpr std::uint64_t prime = 0x100000001B3;
-  std::uint64_t hash = (0xCBF29CE484222325 ^ folder) * prime;
+// Kept in the database, so it must never change: FNV-1a, folded to 31 bits.
+std::int64_t placeHash(std::string_view name) {
+  std::uint64_t hash = 0xCBF29CE484222325;
   for (const char c : name)
-    hash = (hash ^ static_cast<unsigned char>(c)) * prime;
-  return static_cast<std::int64_t>(hash);
+    hash = (hash ^ static_cast<unsigned char>(c)) * 0x100000001B3;
+  return static_cast<std::int64_t>((hash ^ (hash >> 32)) & 0x7FFFFFFF);
 }
 
 }  // namespace
@@ -87,8 +88,11 @@ struct IdentityStore::Statements {
   Statement& addHandover = all[18];
   Statement& removeHandovers = all[19];
   Statement& anyHandover = all[20];
-  Statement& meta = all[21];
-  Statement& setMeta = all[22];
+  Statement& children = all[21];
+  Statement& nameCount = all[22];
+  Statement& linksIn = all[23];
+  Statement& meta = all[24];
+  Statement& setMeta = all[25];
 };
 
 Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
@@ -120,12 +124,12 @@ Result<void> IdentityStore::prepare() {
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE inode = ?1 AND file_system IS NULL",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1 AND document_id <> slot",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1 AND place = ?3 AND name = ?2",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_system = ?1 AND inode = ?2",
       "SELECT slot FROM objects WHERE inode = ?1 AND file_system IS NULL",
       "SELECT inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, "
       "file_system FROM objects WHERE slot >= ?1",
-      "SELECT 1 FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
+      "SELECT 1 FROM objects WHERE folder = ?1 AND place = ?3 AND name = ?2",
       "INSERT INTO objects(" OBJECT_COLUMNS
       ", place) VALUES(?1,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14,?15)",
       "UPDATE objects SET inode=?2, file_id=?3, document_id=?4, kind=?5, folder=?6, name=?7, "
@@ -141,6 +145,10 @@ Result<void> IdentityStore::prepare() {
       "INSERT OR REPLACE INTO handovers(folder, name, document_id) VALUES(?1,?2,?3)",
       "DELETE FROM handovers WHERE document_id = ?1",
       "SELECT EXISTS(SELECT 1 FROM handovers)",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1",
+      "SELECT (SELECT count(*) FROM objects WHERE folder = ?1) + "
+      "(SELECT count(*) FROM links WHERE folder = ?1)",
+      "SELECT name, slot FROM links WHERE folder = ?1",
       "SELECT value FROM meta WHERE key = CAST(?1 AS TEXT)",
       "INSERT OR REPLACE INTO meta(key, value) VALUES(CAST(?1 AS TEXT), ?2)",
   };
@@ -171,6 +179,10 @@ Result<std::optional<ObjectRow>> IdentityStore::readObject(Statement& statement)
   auto found = statement.step();
   if (!found) return fail(found.error());
   if (!*found) return std::nullopt;
+  return objectIn(statement);
+}
+
+ObjectRow IdentityStore::objectIn(const Statement& statement) {
   ObjectRow row;
   row.slot = statement.unsignedInteger(0);
   row.inode = statement.unsignedInteger(1);
@@ -217,7 +229,7 @@ Result<std::optional<ObjectRow>> IdentityStore::objectByDocumentID(std::uint32_t
 Result<std::optional<ObjectRow>> IdentityStore::objectAt(std::uint64_t folder,
                                                          std::string_view name) {
   return readObject(
-      statements_->byPlace.bind(1, folder).bindBlob(2, name).bind(3, placeHash(folder, name)));
+      statements_->byPlace.bind(1, folder).bindBlob(2, name).bind(3, placeHash(name)));
 }
 
 Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t fileSystem,
@@ -281,7 +293,7 @@ Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view na
     if (*handover) return true;
   }
   Statement& statement =
-      statements_->occupied.bind(1, folder).bindBlob(2, name).bind(3, placeHash(folder, name));
+      statements_->occupied.bind(1, folder).bindBlob(2, name).bind(3, placeHash(name));
   StatementScope scope(statement);
   return statement.step();
 }
@@ -304,7 +316,7 @@ Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
   statement.bind(5, static_cast<std::int64_t>(row.kind));
   if (row.location) {
     statement.bind(6, row.location->folder).bindBlob(7, row.location->name);
-    statement.bind(15, placeHash(row.location->folder, row.location->name));
+    statement.bind(15, placeHash(row.location->name));
   } else {
     statement.bindNull(6).bindNull(7).bindNull(15);
   }
@@ -317,6 +329,55 @@ Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
 
 Result<void> IdentityStore::remove(std::uint64_t slot) {
   return statements_->remove.bind(1, slot).run();
+}
+
+Result<std::optional<std::string>> IdentityStore::pathOf(const Location& location) {
+  std::vector<std::string> names{location.name};
+  std::uint64_t folder = location.folder;
+  for (int depth = 0; folder != 0; ++depth) {
+    auto above = objectByFileID(folder);
+    if (!above) return fail(above.error());
+    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
+    names.push_back((*above)->location->name);
+    folder = (*above)->location->folder;
+  }
+  std::string path = std::move(names.back());
+  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
+    path.append("/").append(*name);
+  return path;
+}
+
+Result<std::vector<ObjectRow>> IdentityStore::childrenOf(std::uint64_t folder) {
+  Statement& statement = statements_->children.bind(1, folder);
+  StatementScope scope(statement);
+  std::vector<ObjectRow> result;
+  while (true) {
+    auto found = statement.step();
+    if (!found) return fail(found.error());
+    if (!*found) return result;
+    result.push_back(objectIn(statement));
+  }
+}
+
+Result<std::uint64_t> IdentityStore::nameCount(std::uint64_t folder) {
+  Statement& statement = statements_->nameCount.bind(1, folder);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  return statement.unsignedInteger(0);
+}
+
+Result<std::vector<std::pair<std::string, std::uint64_t>>> IdentityStore::linksIn(
+    std::uint64_t folder) {
+  Statement& statement = statements_->linksIn.bind(1, folder);
+  StatementScope scope(statement);
+  std::vector<std::pair<std::string, std::uint64_t>> result;
+  while (true) {
+    auto found = statement.step();
+    if (!found) return fail(found.error());
+    if (!*found) return result;
+    result.emplace_back(std::string(statement.blob(0)), statement.unsignedInteger(1));
+  }
 }
 
 Result<std::optional<std::uint64_t>> IdentityStore::linkAt(std::uint64_t folder,

@@ -11,14 +11,15 @@
 
 namespace mirabel {
 
-Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, const MonitoredRoots& roots,
-                 std::uint64_t device, PackageNames isPackageName)
+Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+                 const MonitoredRoots& roots, std::uint64_t device, PackageNames isPackageName)
     : store_(store),
+      recorder_(recorder),
       roots_(roots),
       device_(device),
       isPackageName_(std::move(isPackageName)),
       finder_(roots),
-      placer_(store, allocator, finder_, roots, *this, device, isPackageName_) {
+      placer_(store, allocator, recorder, finder_, roots, *this, device, isPackageName_) {
   placer_.setOthers([] { return std::vector<ObjectRow>(); });
 }
 
@@ -42,7 +43,7 @@ Result<std::uint64_t> Learner::folderID(const std::string& path, int folder) {
   auto slot = placer_.slotOf(seen);
   if (!slot) return fail(slot.error());
   if (slot->row && slot->row->location && compare(*slot->row, seen) == Match::same) {
-    auto known = placer_.pathOf(*slot->row->location);
+    auto known = store_.pathOf(*slot->row->location);
     if (!known) return fail(known.error());
     if (*known == path) return slot->row->fileID;
   }
@@ -189,11 +190,21 @@ Result<Sighting> Learner::learnPath(const std::string& path, const ObjectStatus&
                   isDocumentKind(row->kind) ? row->documentID : 0};
 }
 
+Result<void> Learner::leave(ObjectRow row) {
+  const Location from = *row.location;
+  auto promoted = placer_.promoteLink(row);
+  if (!promoted) return fail(promoted.error());
+  if (*promoted) return recorder_.moved(row, from, *row.location);
+  row.location.reset();
+  if (auto told = recorder_.gone(row, from); !told) return told;
+  return store_.put(row);
+}
+
 // Finding again ---------------------------------------------------------------------------------
 
 Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
   if (!row.location) return std::nullopt;
-  auto path = placer_.pathOf(*row.location);
+  auto path = store_.pathOf(*row.location);
   if (!path) return fail(path.error());
   if (!*path) return std::nullopt;
   const auto look = lookAt(roots_, **path);
@@ -205,7 +216,7 @@ Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
 
 Result<void> Learner::learnSuccessor(const ObjectRow& row) {
   if (!row.location) return {};
-  auto path = placer_.pathOf(*row.location);
+  auto path = store_.pathOf(*row.location);
   if (!path) return fail(path.error());
   if (!*path) return {};
   const auto look = lookAt(roots_, **path);
@@ -219,15 +230,15 @@ Result<void> Learner::learnSuccessor(const ObjectRow& row) {
 Result<std::optional<std::string>> Learner::search(ObjectRow row) {
   std::optional<std::string> hint;
   if (row.location) {
-    auto path = placer_.pathOf(*row.location);
+    auto path = store_.pathOf(*row.location);
     if (!path) return fail(path.error());
     if (*path) hint = splitPath(**path).parent;
   }
   const auto found = finder_.find(row, hint.value_or(roots_.paths().front()),
                                   [] { return std::vector<ObjectRow>(); });
   if (!found) {
-    row.location.reset();
-    if (auto written = store_.put(row); !written) return fail(written.error());
+    if (!row.location) return std::nullopt;
+    if (auto left = leave(std::move(row)); !left) return fail(left.error());
     return std::nullopt;
   }
   auto placed = placer_.placeFound(std::move(row), *found);

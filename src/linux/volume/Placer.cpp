@@ -12,8 +12,6 @@
 namespace mirabel {
 namespace {
 
-// More folders above each other than any path has; a longer chain is a damaged index.
-constexpr int deepestFolder = 1 << 20;
 // Moves that uncover moves. Each detaches a row first, so this is only reached when names change
 // faster than they are read.
 constexpr int deepestChain = 64;
@@ -44,11 +42,12 @@ class Deeper {
 
 }  // namespace
 
-Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
-               const MonitoredRoots& roots, FolderIdentities& folders, std::uint64_t device,
-               std::function<bool(std::string_view)> isPackageName)
+Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+               ObjectFinder& finder, const MonitoredRoots& roots, FolderIdentities& folders,
+               std::uint64_t device, std::function<bool(std::string_view)> isPackageName)
     : store_(store),
       allocator_(allocator),
+      recorder_(recorder),
       finder_(finder),
       roots_(roots),
       folders_(folders),
@@ -98,19 +97,45 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
 // Known objects ---------------------------------------------------------------------------------
 
 Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
-  const bool changed = row.kind != arrival.kind || isStale(row, arrival.seen.status);
+  const bool changedKind = row.kind != arrival.kind;
+  const bool changed = changedKind || row.changeTime != arrival.seen.status.changeTime;
+  const bool stale = changed || isStale(row, arrival.seen.status);
   row.kind = arrival.kind;
   refresh(row, arrival.seen.status);
   const std::uint32_t before = row.documentID;
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
   if (row.location == arrival.location) {
-    if (!changed && row.documentID == before) return row;
-    return put(std::move(row));
+    if (!stale && row.documentID == before) return row;
+    auto written = put(std::move(row));
+    if (!written || !changed) return written;
+    auto told = tellChange(*written, arrival.location, changedKind);
+    if (!told) return fail(told.error());
+    return written;
   }
   auto further = isFurtherLink(arrival, row);
   if (!further) return fail(further.error());
-  if (*further) return put(std::move(row));
-  return moveTo(arrival, std::move(row));
+  if (!*further) return moveTo(arrival, std::move(row), changedKind);
+  auto written = put(std::move(row));
+  if (!written) return written;
+  auto told = tellChange(*written, arrival.location, changedKind);
+  if (!told) return fail(told.error());
+  return written;
+}
+
+// An object that changed is told under each of its names.
+Result<void> Placer::tellChange(const ObjectRow& row, const Location& location, bool changedKind) {
+  if (!recorder_.isActive()) return {};
+  if (auto told = recorder_.changed(row, location, changedKind); !told) return told;
+  if (row.location && !(*row.location == location)) {
+    if (auto told = recorder_.changed(row, *row.location, changedKind); !told) return told;
+  }
+  auto names = store_.links(row.slot);
+  if (!names) return fail(names.error());
+  for (const Location& name : *names) {
+    if (name == location) continue;
+    if (auto told = recorder_.changed(row, name, changedKind); !told) return told;
+  }
+  return changedKind ? recorder_.contents(row.fileID) : Result<void>();
 }
 
 Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row) {
@@ -131,14 +156,14 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
 }
 
 Result<bool> Placer::isStillAt(const ObjectRow& row, const Location& location) {
-  auto path = pathOf(location);
+  auto path = store_.pathOf(location);
   if (!path) return fail(path.error());
   if (!*path) return false;
   const auto look = lookAt(roots_, **path);
   return look && look->seen.status.inode == row.inode && compare(row, look->seen) == Match::same;
 }
 
-Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
+Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool changedKind) {
   const std::optional<Location> from = std::exchange(row.location, std::nullopt);
   // Off its old name first: what is found to lie there now can then be put there.
   if (auto detached = store_.put(row); !detached) return fail(detached.error());
@@ -153,8 +178,13 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
   if (!current) return fail(current.error());
   if (*current) row.documentID = (*current)->documentID;
   if (*inherited) {
-    if (auto ended = store_.removeHandovers(row.documentID); !ended) return fail(ended.error());
-    row.documentID = **inherited;
+    // Its own document ends here: the name's goes on.
+    const std::uint32_t own = std::exchange(row.documentID, **inherited);
+    if (auto ended = store_.removeHandovers(own); !ended) return fail(ended.error());
+    if (auto told = recorder_.handedOn(own, row.fileID, 0); !told) return fail(told.error());
+    if (auto told = recorder_.handedOn(row.documentID, 0, row.fileID); !told) {
+      return fail(told.error());
+    }
   }
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
   row.location = arrival.location;
@@ -166,7 +196,16 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
       if (!noted) return fail(noted.error());
     }
   }
-  return put(std::move(row));
+  auto written = put(std::move(row));
+  if (!written) return written;
+  if (auto told = recorder_.moved(*written, from, arrival.location); !told) {
+    return fail(told.error());
+  }
+  if (changedKind) {
+    auto told = tellChange(*written, arrival.location, true);
+    if (!told) return fail(told.error());
+  }
+  return written;
 }
 
 Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& found) {
@@ -191,8 +230,12 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
   std::optional<std::uint32_t> document;
   if (slot.row) {
     // The number's former holder is gone. Where it had this very name, this is its save.
-    const bool isSave = slot.row->location == arrival.location && slot.row->kind == arrival.kind;
-    if (isSave && slot.row->documentID != 0) document = slot.row->documentID;
+    ObjectRow former = *slot.row;
+    const bool isSave = former.location == arrival.location && former.kind == arrival.kind;
+    if (isSave && former.documentID != 0) document = std::exchange(former.documentID, 0);
+    if (former.location) {
+      if (auto told = recorder_.gone(former, *former.location); !told) return fail(told.error());
+    }
     if (auto dropped = dropLinks(slot.row->slot); !dropped) return fail(dropped.error());
     if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
   }
@@ -225,6 +268,11 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
   const bool isOwnDocument = !document && row.documentID != 0;
   row.slot = isOwnDocument ? row.documentID : allocator_.nextUpperSlot();
   if (auto inserted = store_.insert(row); !inserted) return fail(inserted.error());
+  if (document) {
+    auto told = recorder_.handedOn(*document, 0, row.fileID);
+    if (!told) return fail(told.error());
+  }
+  if (auto told = recorder_.changed(row, arrival.location); !told) return fail(told.error());
   return row;
 }
 
@@ -245,33 +293,40 @@ Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivin
   auto elsewhere = promoteLink(**occupant);
   if (!elsewhere) return fail(elsewhere.error());
   if (*elsewhere) return std::nullopt;
+  // Where a folder or a link went is found out when somebody asks, unless there is a history to
+  // tell of it; whose a document is, now.
+  const bool isDocument = (*occupant)->documentID != 0 && isDocumentKind((*occupant)->kind);
+  if (isDocument || recorder_.isActive()) return settleOccupant(arrival, std::move(**occupant));
   (*occupant)->location.reset();
   if (auto detached = store_.put(**occupant); !detached) return fail(detached.error());
-  // Where a folder or a link went is found out when somebody asks; whose a document is, now.
-  if ((*occupant)->documentID == 0 || !isDocumentKind((*occupant)->kind)) return std::nullopt;
-  return vacateDocument(arrival, std::move(**occupant));
+  return std::nullopt;
 }
 
-Placer::Inheritance Placer::vacateDocument(const Arrival& arrival, ObjectRow occupant) {
+Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occupant) {
   const Deeper deeper(depth_);
+  const ObjectRow before = occupant;
+  occupant.location.reset();
+  if (auto detached = store_.put(occupant); !detached) return fail(detached.error());
   if (depth_ > deepestChain) return std::nullopt;
-  const bool canInherit = occupant.kind == arrival.kind;
+  const bool canInherit =
+      occupant.kind == arrival.kind && isDocumentKind(occupant.kind) && occupant.documentID != 0;
   const auto found = finder_.find(occupant, arrival.folderPath, others_);
-  if (!found) {
-    if (!canInherit) return std::nullopt;
-    const std::uint32_t document = std::exchange(occupant.documentID, 0);
-    if (auto written = store_.put(occupant); !written) return fail(written.error());
-    return document;
-  }
-  const bool isBackup =
-      found->folderPath == arrival.folderPath && isBackupName(found->name, arrival.location.name);
+  const bool isBackup = found && found->folderPath == arrival.folderPath &&
+                        isBackupName(found->name, arrival.location.name);
   std::optional<std::uint32_t> inherited;
-  if (isBackup && canInherit) {
+  if (canInherit && (!found || isBackup)) {
     inherited = std::exchange(occupant.documentID, 0);
     if (auto written = store_.put(occupant); !written) return fail(written.error());
   }
-  auto moved = placeFound(std::move(occupant), *found);
-  if (!moved) return fail(moved.error());
+  if (found) {
+    auto told = recorder_.changed(before, *before.location);
+    if (!told) return fail(told.error());
+    auto moved = placeFound(std::move(occupant), *found);
+    if (!moved) return fail(moved.error());
+    return inherited;
+  }
+  // The document may go on; the object, and what lay in it, does not.
+  if (auto told = recorder_.gone(occupant, *before.location); !told) return fail(told.error());
   return inherited;
 }
 
@@ -337,22 +392,6 @@ Result<void> Placer::ensureDocument(ObjectRow& row) {
 Result<ObjectRow> Placer::put(ObjectRow row) {
   if (auto written = store_.put(row); !written) return fail(written.error());
   return row;
-}
-
-Result<std::optional<std::string>> Placer::pathOf(const Location& location) {
-  std::vector<std::string> names{location.name};
-  std::uint64_t folder = location.folder;
-  for (int depth = 0; folder != 0; ++depth) {
-    auto above = store_.objectByFileID(folder);
-    if (!above) return fail(above.error());
-    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
-    names.push_back((*above)->location->name);
-    folder = (*above)->location->folder;
-  }
-  std::string path = std::move(names.back());
-  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
-    path.append("/").append(*name);
-  return path;
 }
 
 }  // namespace mirabel

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "linux/volume/ChangeRecorder.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/ObjectFinder.h"
@@ -52,9 +53,9 @@ class FolderIdentities {
 class Placer {
  public:
   /// References outlive it. `device` is the number of the volume's own file system.
-  Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
-         const MonitoredRoots& roots, FolderIdentities& folders, std::uint64_t device,
-         std::function<bool(std::string_view)> isPackageName);
+  Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+         ObjectFinder& finder, const MonitoredRoots& roots, FolderIdentities& folders,
+         std::uint64_t device, std::function<bool(std::string_view)> isPackageName);
 
   /// The row as it is afterwards. POSIX error ESTALE when the entry went away meanwhile.
   [[nodiscard]] Result<ObjectRow> place(Arrival arrival);
@@ -71,21 +72,20 @@ class Placer {
   /// Whether the disk has the object under that name.
   [[nodiscard]] Result<bool> isStillAt(const ObjectRow& row, const Location& location);
 
-  /// Where the index believes a place to be; nothing when a folder above it is detached.
-  [[nodiscard]] Result<std::optional<std::string>> pathOf(const Location& location);
-
  private:
   [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
   [[nodiscard]] Result<ObjectRow> placeNew(const Arrival& arrival, const Slot& slot,
                                            std::string handle);
-  [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row);
+  [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row, bool changedKind);
+  [[nodiscard]] Result<void> tellChange(const ObjectRow& row, const Location& location,
+                                        bool changedKind);
   [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, const ObjectRow& row);
 
   /// A document ID that an arrival takes over; nothing when it takes none.
   using Inheritance = Result<std::optional<std::uint32_t>>;
   /// Takes whatever the index has under the arrival's name away from there.
   [[nodiscard]] Inheritance vacate(const Arrival& arrival, std::uint64_t arrivingSlot);
-  [[nodiscard]] Inheritance vacateDocument(const Arrival& arrival, ObjectRow occupant);
+  [[nodiscard]] Inheritance settleOccupant(const Arrival& arrival, ObjectRow occupant);
   [[nodiscard]] Inheritance takeHandover(const Arrival& arrival, std::uint32_t ownDocument);
   [[nodiscard]] Result<void> dropLinks(std::uint64_t slot);
   [[nodiscard]] Result<void> ensureDocument(ObjectRow& row);
@@ -94,6 +94,7 @@ class Placer {
 
   IdentityStore& store_;
   IdentifierAllocator& allocator_;
+  ChangeRecorder& recorder_;
   ObjectFinder& finder_;
   const MonitoredRoots& roots_;
   FolderIdentities& folders_;
