@@ -1,5 +1,6 @@
 #include "linux/volume/ChangeRecorder.h"
 
+#include <map>
 #include <utility>
 #include <vector>
 
@@ -78,25 +79,47 @@ Result<void> ChangeRecorder::gone(const ObjectRow& row, const Location& from) {
 }
 
 Result<void> ChangeRecorder::goneContents(std::uint64_t folder, std::string path) {
-  std::vector<std::pair<std::uint64_t, std::string>> pending{{folder, std::move(path)}};
+  // The folders first, so that it is known which further links went with them.
+  std::map<std::uint64_t, std::string> folders{{folder, std::move(path)}};
+  std::vector<ObjectRow> things;
+  std::vector<std::uint64_t> pending{folder};
   while (!pending.empty()) {
-    const auto [id, folderPath] = std::move(pending.back());
+    const std::uint64_t id = pending.back();
     pending.pop_back();
     auto children = store_.childrenOf(id);
     if (!children) return fail(children.error());
     for (ObjectRow& child : *children) {
-      std::string childPath = folderPath + "/" + child.location->name;
-      if (auto told = append(child, *child.location, childPath, false); !told) return told;
-      if (child.documentID != 0) {
-        auto ended = handedOn(child.documentID, child.fileID, 0);
-        if (!ended) return ended;
+      if (holdsThings(child)) {
+        folders[child.fileID] = folders[id] + "/" + child.location->name;
+        pending.push_back(child.fileID);
       }
-      if (holdsThings(child)) pending.emplace_back(child.fileID, std::move(childPath));
-      child.location.reset();
-      if (auto detached = store_.put(child); !detached) return detached;
+      things.push_back(std::move(child));
     }
   }
+  for (ObjectRow& thing : things) {
+    const std::string& folderPath = folders[thing.location->folder];
+    auto told = append(thing, *thing.location, folderPath + "/" + thing.location->name, false);
+    if (told) told = goneThing(std::move(thing), folders);
+    if (!told) return told;
+  }
   return {};
+}
+
+Result<void> ChangeRecorder::goneThing(ObjectRow thing,
+                                       const std::map<std::uint64_t, std::string>& folders) {
+  thing.location.reset();
+  auto links = store_.links(thing.slot);
+  if (!links) return fail(links.error());
+  for (Location& link : *links) {
+    if (auto removed = store_.removeLink(link.folder, link.name); !removed) return removed;
+    if (folders.contains(link.folder)) continue;
+    // It lives on under this name.
+    thing.location = std::move(link);
+    if (auto kept = store_.put(thing); !kept) return kept;
+    return changed(thing, *thing.location);
+  }
+  if (auto detached = store_.put(thing); !detached) return detached;
+  return thing.documentID == 0 ? Result<void>() : handedOn(thing.documentID, thing.fileID, 0);
 }
 
 Result<void> ChangeRecorder::contents(std::uint64_t folder) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -50,6 +51,9 @@ class ChangeRecorder {
   [[nodiscard]] Result<void> append(const ObjectRow& row, const Location& location,
                                     std::string path, bool changedKind);
   [[nodiscard]] Result<void> goneContents(std::uint64_t folder, std::string path);
+  /// `folders` are those that are gone.
+  [[nodiscard]] Result<void> goneThing(ObjectRow thing,
+                                       const std::map<std::uint64_t, std::string>& folders);
 
   IdentityStore& store_;
   EventJournal& journal_;

@@ -150,7 +150,11 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
   if (!still || !*still) return still;
   // Linking over a document ends it: the object that arrives is shown under its other names too,
   // and keeps the identity that it has there.
-  if (auto vacated = vacate(arrival, row.slot); !vacated) return fail(vacated.error());
+  auto vacated = vacate(arrival, row.slot);
+  if (!vacated) return fail(vacated.error());
+  if (*vacated) {
+    if (auto told = recorder_.handedOn(**vacated, 0, 0); !told) return fail(told.error());
+  }
   if (auto added = store_.addLink(arrival.location, row.slot); !added) return fail(added.error());
   return true;
 }
@@ -181,7 +185,9 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
     // Its own document ends here: the name's goes on.
     const std::uint32_t own = std::exchange(row.documentID, **inherited);
     if (auto ended = store_.removeHandovers(own); !ended) return fail(ended.error());
-    if (auto told = recorder_.handedOn(own, row.fileID, 0); !told) return fail(told.error());
+    if (own != 0) {
+      if (auto told = recorder_.handedOn(own, row.fileID, 0); !told) return fail(told.error());
+    }
     if (auto told = recorder_.handedOn(row.documentID, 0, row.fileID); !told) {
       return fail(told.error());
     }
@@ -352,6 +358,10 @@ Placer::Inheritance Placer::takeHandover(const Arrival& arrival, std::uint32_t o
     backup.documentID = *own;
   }
   if (auto written = store_.put(backup); !written) return fail(written.error());
+  if (backup.location) {
+    auto told = tellChange(backup, *backup.location, false);
+    if (!told) return fail(told.error());
+  }
   return *document;
 }
 
