@@ -1,6 +1,7 @@
 #include "cli/CommandLine.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <memory>
 
 #include "cli/Commands.h"
@@ -12,13 +13,18 @@ namespace mirabel {
 namespace {
 
 constexpr const char* purpose =
-    "Gives every file and folder of a person's documents an identity that lasts: through renames, "
-    "moves, atomic saves and restarts.";
+    "Gives every file and folder of a person's documents an identity that lasts: through\n"
+    "renames, moves, atomic saves and restarts.";
 constexpr const char* itemHelp =
-    "ITEM is an identifier (fid=N, did=N, #bundle), the word root, or else a path "
-    "(./fid=3 is a path).\n\n"
-    "Exit codes: 0 done, 1 failed, 2 usage, 3 no such item, 4 start over, 5 not permitted, "
+    "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has\n"
+    "no / in it is an identifier: did=N for a document, fid=N for a folder, #bundle for the\n"
+    "documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
+constexpr const char* pathHelp =
+    "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
+constexpr const char* exitCodeHelp =
+    "Exit codes: 0 done, 1 failed, 2 usage, 3 no such item, 4 start over, 5 not permitted,\n"
     "6 name taken, 7 busy.";
+constexpr double longestTimeout = 86'400;
 
 /// Everything that the command line may say.
 struct Arguments {
@@ -32,8 +38,7 @@ struct Arguments {
 
 void addGlobalOptions(CLI::App& app, Arguments& arguments) {
   app.add_option("--home", arguments.global.home,
-                 "Work on the documents of this home instead of $HOME; nothing outside of it is "
-                 "used then")
+                 "Work on the documents of this home, not of $HOME")
       ->type_name("DIR");
   app.add_flag("--json", arguments.global.json, "Print JSON Lines, for programs");
   app.add_flag("--embedded", arguments.global.embedded,
@@ -41,26 +46,43 @@ void addGlobalOptions(CLI::App& app, Arguments& arguments) {
   app.add_flag("--verbose", arguments.global.verbose, "Write the log to standard error");
   app.add_option("--timeout", arguments.timeoutSeconds,
                  "Seconds to wait for another process that is using the volume (30)")
-      ->type_name("SECONDS")
-      ->check(CLI::Range(0.0, 86'400.0));
+      ->type_name("SECONDS");
   app.add_flag("--version", arguments.showVersion, "Print the version");
 }
 
+CLI::App* addCommand(CLI::App& app, const char* name, const char* description,
+                     const char* argumentHelp) {
+  CLI::App* command = app.add_subcommand(name, description);
+  command->footer(std::string(argumentHelp) + "Global options: see mirabel --help.");
+  return command;
+}
+
+void addItem(CLI::App& command, std::string& item) {
+  command.add_option("ITEM", item, "root, an identifier or a path")->required()->type_name("");
+}
+
+// The library's own check for positive numbers names their upper end in 300 digits.
+std::string isPageCount(const std::string& text) {
+  const bool isCount = text.find_first_not_of("0123456789") == std::string::npos &&
+                       text.find_first_not_of('0') != std::string::npos;
+  return isCount ? "" : "takes a number from 1";
+}
+
 void addCommands(CLI::App& app, Arguments& arguments) {
-  auto* id = app.add_subcommand("id", "Print the identifier of what lies at a path");
-  id->add_option("PATH", arguments.path, "A path, relative or absolute")->required();
-  auto* path = app.add_subcommand("path", "Print where an item lies now");
-  path->add_option("ITEM", arguments.item, "An identifier")->required();
-  auto* info = app.add_subcommand("info", "Print everything that is known of an item");
-  info->add_option("ITEM", arguments.item, "An identifier or a path")->required();
-  auto* list = app.add_subcommand("ls", "List a folder, 200 items a page");
-  list->add_option("ITEM", arguments.list.item, "An identifier or a path (root)");
+  auto* id = addCommand(app, "id", "Print the identifier of what lies at a path", pathHelp);
+  id->add_option("PATH", arguments.path, "What to identify")->required()->type_name("");
+  addItem(*addCommand(app, "path", "Print where an item lies now", itemHelp), arguments.item);
+  addItem(*addCommand(app, "info", "Print everything that is known of an item", itemHelp),
+          arguments.item);
+  auto* list = addCommand(app, "ls", "List a folder, 200 items a page", itemHelp);
+  list->add_option("ITEM", arguments.list.item, "What to list (root)")->type_name("");
   list->add_option("--page", arguments.list.page, "Go on at this page of an earlier listing")
       ->type_name("PAGE");
   list->add_option("--pages", arguments.list.pages, "Stop after so many pages (all)")
-      ->type_name("N");
-  app.add_subcommand("doctor", "Say what of this machine is in the way, and how to mend it");
-  app.add_subcommand("demo", "A guided tour in a temporary home");
+      ->type_name("N")
+      ->check(isPageCount);
+  addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
+  addCommand(app, "demo", "A guided tour in a temporary home", "");
 }
 
 ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& arguments) {
@@ -82,22 +104,38 @@ void setUpLog(bool verbose) {
   }
 }
 
+// One line, with exit code 2; the parser's own codes start at 100.
+int wrongUsage(const CLI::App& app, const std::vector<std::string>& arguments, std::string message,
+               Streams streams) {
+  const auto commands = app.get_subcommands();
+  const std::string command = commands.empty() ? "" : commands.front()->get_name() + " ";
+  message += "; see mirabel " + command + "--help";
+  // Where parsing failed, options that it did not come to are not set.
+  const auto end = std::find(arguments.begin(), arguments.end(), "--");
+  const bool asJSON = std::find(arguments.begin(), end, "--json") != end;
+  constexpr auto code = static_cast<int>(ExitCode::usage);
+  reportFailure(streams.err, asJSON, "usage", code, message);
+  return code;
+}
+
 }  // namespace
 
 int runCommandLine(const std::vector<std::string>& arguments, Streams streams) {
   CLI::App app(purpose, "mirabel");
   Arguments parsed;
+  // Before the commands are added, for they inherit it: global options may follow the command.
+  app.fallthrough();
   addGlobalOptions(app, parsed);
   addCommands(app, parsed);
-  app.fallthrough();
-  app.footer(itemHelp);
+  app.footer(std::string(itemHelp) + exitCodeHelp);
   app.require_subcommand(0, 1);
   try {
     // The parser takes its arguments from the back.
     app.parse(std::vector<std::string>(arguments.rbegin(), arguments.rend()));
   } catch (const CLI::ParseError& error) {
-    const int code = app.exit(error, streams.out, streams.err);
-    return code == 0 ? 0 : static_cast<int>(ExitCode::usage);
+    // Help was asked for; it is that of the command, if one was named.
+    if (error.get_exit_code() == 0) return app.exit(error, streams.out, streams.err);
+    return wrongUsage(app, arguments, error.what(), streams);
   }
   if (parsed.showVersion) {
     streams.out << "mirabel " MIRABEL_VERSION "\n";
@@ -106,6 +144,10 @@ int runCommandLine(const std::vector<std::string>& arguments, Streams streams) {
   if (app.get_subcommands().empty()) {
     streams.err << app.help();
     return static_cast<int>(ExitCode::usage);
+  }
+  // Written so that what is no number is refused too.
+  if (!(parsed.timeoutSeconds >= 0 && parsed.timeoutSeconds <= longestTimeout)) {
+    return wrongUsage(app, arguments, "--timeout takes 0 to 86400 seconds", streams);
   }
   parsed.global.timeout =
       std::chrono::milliseconds(static_cast<long>(parsed.timeoutSeconds * 1000));

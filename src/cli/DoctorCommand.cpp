@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "cli/Commands.h"
+#include "cli/ErrorText.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
 #include "linux/files/HomeLayout.h"
@@ -44,7 +45,7 @@ Finding attributesFinding(const Result<void>& tried) {
             "trashed item came from can't be kept; identities last all the same",
             "use a file system that has them, and mount it without \"nouser_xattr\""};
   }
-  return {subject, Health::limited, "could not be tried: " + error.description(),
+  return {subject, Health::limited, "could not be tried: " + explanation(error),
           "make the document storage writable"};
 }
 
@@ -75,6 +76,14 @@ Finding uuidFinding(bool has) {
           ""};
 }
 
+Finding stateFinding(const Result<void>& opened, const HomeLayout& layout) {
+  const std::string subject = "state";
+  if (opened) return {subject, Health::good, layout.stateFolder, ""};
+  const std::string text = explanation(opened.error());
+  if (opened.error().isPosix(EBUSY)) return {subject, Health::limited, text, ""};
+  return {subject, Health::bad, text, "identities can't be kept until this is mended"};
+}
+
 std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
   std::vector<Finding> findings;
   findings.push_back({"home", Health::good, layout.home, ""});
@@ -82,7 +91,7 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
   const std::string* volume = &layout.documents;
   if (!abilities) {
     findings.push_back({"documents", Health::bad,
-                        layout.documents + ": " + abilities.error().description(),
+                        layout.documents + ": " + explanation(abilities.error()),
                         "make the folder; until then there is nothing to present"});
     volume = &layout.home;
     abilities = volumeAbilities(*volume);
@@ -98,12 +107,7 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
   Session::Options options{program.options().home, program.options().timeout,
                            [&](std::string_view text) { program.note(text); }};
   auto session = Session::open(std::move(options));
-  if (session) {
-    findings.push_back({"state", Health::good, layout.stateFolder, ""});
-  } else {
-    findings.push_back({"state", Health::bad, session.error().description(),
-                        "identities can't be kept until this is mended"});
-  }
+  findings.push_back(stateFinding(session ? Result<void>() : fail(session.error()), layout));
   return findings;
 }
 

@@ -11,14 +11,15 @@ namespace mirabel {
 ExitCode runId(Program& program, const std::string& path) {
   Session* session = program.session();
   if (session == nullptr) return program.exitCode();
-  auto identifier = ItemArgument(path).identifier(*session);
-  if (!identifier) return program.report(identifier.error(), "can't identify " + path);
+  const auto item = ItemArgument::itemAtPath(*session, path);
+  if (!item) return program.report(item.error(), "can't identify " + path);
+  const std::string& identifier = (*item)->itemIdentifier();
   if (program.options().json) {
     nlohmann::json line;
-    setText(line, "itemIdentifier", *identifier);
+    setText(line, "itemIdentifier", identifier);
     program.out() << line.dump() << '\n';
   } else {
-    program.out() << printable(*identifier) << '\n';
+    program.out() << printable(identifier) << '\n';
   }
   return ExitCode::done;
 }

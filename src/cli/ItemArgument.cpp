@@ -1,86 +1,127 @@
 #include "cli/ItemArgument.h"
 
 #include <cerrno>
-#include <cstdlib>
+#include <charconv>
+#include <climits>
+#include <cstdint>
 #include <filesystem>
-#include <memory>
 #include <system_error>
-
-#include "cli/Printing.h"
 
 namespace mirabel {
 namespace {
 
-std::optional<std::string_view> identifierOfWord(std::string_view word) {
-  if (word == "root") return VesselRootContainerItemIdentifier;
-  if (word == "workingset") return VesselWorkingSetContainerItemIdentifier;
-  if (word == "alldirs") return VesselAllDirectoriesContainerItemIdentifier;
-  return std::nullopt;
+namespace fs = std::filesystem;
+
+constexpr std::string_view rootWord = "root";
+
+Error withDetail(Error error, std::string detail) {
+  error.userInfo[std::string(errorkey::detail)] = std::move(detail);
+  return error;
 }
 
-Error outside(std::string_view path) {
-  Error error = Error::local(LocalVesselError::itemNotFound);
-  error.userInfo[std::string(errorkey::detail)] =
-      "\"" + std::string(path) + "\" is not among the documents";
-  return error;
+bool isNumber(std::string_view text) {
+  std::int64_t number = 0;
+  const auto [end, failure] = std::from_chars(text.begin(), text.end(), number);
+  return failure == std::errc() && end == text.end() && text[0] != '-';
+}
+
+bool hasForm(std::string_view identifier) {
+  if (identifier.starts_with('#')) return identifier.size() > 1;
+  if (identifier.starts_with("fid=") || identifier.starts_with("did=")) {
+    return isNumber(identifier.substr(4));
+  }
+  return true;
+}
+
+// On the way to a name, what is no folder and what is missing are the same: nothing is there.
+Error placeError(const std::error_code& failure) {
+  return Error::posix(failure.value() == ENOTDIR ? ENOENT : failure.value());
+}
+
+// The kernel resolves what is shorter than PATH_MAX in one go; of a longer path, as much as that.
+// Beyond it there may be no links anyway: nothing below the documents is reached through one.
+Result<fs::path> resolvedFolder(const fs::path& folder) {
+  const std::string& text = folder.native();
+  const std::size_t end = text.size() < PATH_MAX ? text.size() : text.rfind('/', PATH_MAX - 1);
+  std::error_code failure;
+  const fs::path resolved = fs::canonical(text.substr(0, end), failure);
+  if (failure) return fail(placeError(failure));
+  return fs::path(resolved.native() + text.substr(end));
+}
+
+Result<std::string> resolved(const std::string& path) {
+  if (path.empty()) return fail(Error::posix(ENOENT));
+  std::error_code failure;
+  fs::path absolute = fs::absolute(path, failure);
+  if (failure) return fail(placeError(failure));
+  // Of a path that ends with a slash, the folder before it is meant.
+  while (!absolute.has_filename() && absolute != absolute.root_path()) {
+    absolute = absolute.parent_path();
+  }
+  const fs::path name = absolute.filename();
+  const bool isName = absolute.has_filename() && name != "." && name != "..";
+  auto folder = resolvedFolder(isName ? absolute.parent_path() : absolute);
+  if (!folder) return fail(folder.error());
+  return (isName ? *folder / name : *folder).native();
+}
+
+bool isWithin(const std::string& path, const std::string& folder) {
+  return path == folder || (path.starts_with(folder) && path[folder.size()] == '/');
+}
+
+// The document storage may be named by a link to it, "~/Documents" for one.
+bool leadsTo(const std::string& path, const std::string& folder) {
+  std::error_code failure;
+  const fs::path target = fs::canonical(path, failure);
+  return !failure && target.native() == folder;
 }
 
 }  // namespace
 
 bool ItemArgument::isIdentifier() const {
-  return identifierOfWord(text_) || text_.starts_with("fid=") || text_.starts_with("did=") ||
+  if (text_.find('/') != std::string::npos) return false;
+  return text_ == rootWord || text_.starts_with("fid=") || text_.starts_with("did=") ||
          text_.starts_with('#') || text_ == VesselRootContainerItemIdentifier ||
          text_ == VesselTemporaryLocalFolderItemIdentifier;
 }
 
-Result<URL> ItemArgument::url(const std::string& path) {
-  if (path.empty()) return fail(Error::posix(ENOENT, "an empty path"));
-  std::error_code failure;
-  std::filesystem::path absolute = std::filesystem::absolute(path, failure);
-  if (failure) return fail(Error::posix(failure.value(), path));
-  if (!absolute.has_filename()) absolute = absolute.parent_path();
-  const std::filesystem::path name = absolute.filename();
-  if (name == "." || name == ".." || absolute == absolute.root_path()) {
-    const auto resolved = std::filesystem::canonical(absolute, failure);
-    if (failure) return fail(Error::posix(failure.value(), path));
-    return URL::fileURL(resolved.native());
-  }
-  // A path longer than the kernel takes in one go can't be resolved; it stands as it is.
-  if (absolute.native().size() >= PATH_MAX) return URL::fileURL(absolute.native());
-  const auto parent = std::filesystem::canonical(absolute.parent_path(), failure);
-  if (failure) return fail(Error::posix(failure.value(), path));
-  return URL::fileURL((parent / name).native());
-}
-
 Result<std::shared_ptr<LocalItem>> ItemArgument::item(const Session& session) const {
-  const LocalVessel& provider = session.provider();
-  if (isIdentifier()) {
-    const auto word = identifierOfWord(text_);
-    auto item = provider.itemForIdentifier(word ? *word : std::string_view(text_));
-    if (!item) return fail(Error::nonExistentItem(text_));
-    return item;
-  }
-  auto place = url(text_);
-  if (!place) return fail(place.error());
-  // The document storage may be named by a link, "~/Documents" for one.
-  std::error_code failure;
-  const auto resolved = std::filesystem::canonical(place->path(), failure);
-  const URL& storage = session.platform().manager.documentStorageURL();
-  if (!failure && resolved.native() == storage.path()) place = storage;
-  if (auto values = session.platform().resources.readValues(*place); !values) {
-    Error error = values.error();
-    error.userInfo.try_emplace(std::string(errorkey::detail), text_);
-    return fail(std::move(error));
-  }
-  auto item = provider._propertiesForItemAtURL(*place);
-  if (!item) return fail(outside(text_));
-  return item;
+  return isIdentifier() ? itemByIdentifier(session) : itemAtPath(session, text_);
 }
 
-Result<std::string> ItemArgument::identifier(const Session& session) const {
-  auto found = item(session);
-  if (!found) return fail(found.error());
-  return (*found)->itemIdentifier();
+Result<std::shared_ptr<LocalItem>> ItemArgument::itemByIdentifier(const Session& session) const {
+  if (!hasForm(text_)) {
+    return fail(withDetail(Error::local(LocalVesselError::invalidItemIdentifier),
+                           "identifiers are fid=N, did=N and #bundle; a file of this name is "
+                           "./" +
+                               text_));
+  }
+  const std::string_view identifier = text_ == rootWord ? VesselRootContainerItemIdentifier : text_;
+  if (auto item = session.provider().itemForIdentifier(identifier)) return item;
+  const URL& storage = session.platform().manager.documentStorageURL();
+  const bool isRoot = identifier == VesselRootContainerItemIdentifier;
+  if (isRoot && !session.platform().resources.readValues(storage)) {
+    return fail(Error::posix(ENOENT, "the document storage \"" + storage.path() + "\""));
+  }
+  return fail(Error::nonExistentItem(identifier));
+}
+
+Result<std::shared_ptr<LocalItem>> ItemArgument::itemAtPath(const Session& session,
+                                                            const std::string& path) {
+  auto place = resolved(path);
+  if (!place) return fail(place.error());
+  const std::string& storage = session.platform().manager.documentStorageURL().path();
+  if (leadsTo(*place, storage)) place = storage;
+  const URL url = URL::fileURL(*place);
+  if (auto values = session.platform().resources.readValues(url); !values) {
+    return fail(values.error());
+  }
+  const Error unknown = Error::local(LocalVesselError::itemNotFound);
+  if (!isWithin(*place, storage)) {
+    return fail(withDetail(unknown, "it is not below the document storage \"" + storage + "\""));
+  }
+  if (auto item = session.provider()._propertiesForItemAtURL(url)) return item;
+  return fail(withDetail(unknown, "it is not shown as an item"));
 }
 
 }  // namespace mirabel

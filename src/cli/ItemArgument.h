@@ -8,23 +8,26 @@
 
 namespace mirabel {
 
-/// How a person names an item: an identifier ("fid=…", "did=…", "#bundle"), one of the words
-/// "root", "workingset" and "alldirs", or else a path ("./fid=3" is a path).
+/// How a person names an item: the word "root", an identifier, or else a path. What begins with
+/// "fid=", "did=" or "#" and has no "/" in it is an identifier, so that "./fid=3" is a path. Errors
+/// of the lookups: `LocalVesselError::invalidItemIdentifier` for an identifier that no form fits,
+/// `itemNotFound` for a path outside the documents, the host's no-such-item error, POSIX and file
+/// errors for a path that leads nowhere.
 class ItemArgument {
  public:
   explicit ItemArgument(std::string text) : text_(std::move(text)) {}
 
   [[nodiscard]] bool isIdentifier() const;
-  /// The identifier it stands for; of a path, that of the object there. Errors: the host's
-  /// no-such-item error, and POSIX errors for a path that can't be resolved.
-  [[nodiscard]] Result<std::string> identifier(const Session& session) const;
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> item(const Session& session) const;
 
-  /// The URL of a path as a person writes it: relative to the working folder, the links on the
+  /// What lies at a path, whatever it is called: relative to the working folder, the links on the
   /// way followed, the last component not.
-  [[nodiscard]] static Result<URL> url(const std::string& path);
+  [[nodiscard]] static Result<std::shared_ptr<LocalItem>> itemAtPath(const Session& session,
+                                                                     const std::string& path);
 
  private:
+  [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemByIdentifier(const Session& session) const;
+
   std::string text_;
 };
 

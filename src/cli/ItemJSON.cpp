@@ -31,8 +31,12 @@ void setTags(nlohmann::json& object, const std::optional<Data>& tagData) {
 }  // namespace
 
 void setText(nlohmann::json& object, const std::string& key, std::string_view bytes) {
+  if (isUTF8(bytes)) {
+    object[key] = bytes;
+    return;
+  }
   object[key] = utf8Lossy(bytes);
-  if (!isUTF8(bytes)) object[key + "Bytes"] = base64(bytes);
+  object[key + "Bytes"] = base64(bytes);
 }
 
 nlohmann::json itemJSON(const LocalItem& item) {

@@ -11,6 +11,7 @@
 #include "cli/Printing.h"
 #include "fs/FSChangeToken.h"
 #include "fs/FSDirectoryEnumerator.h"
+#include "items/ItemBatch.h"
 
 namespace mirabel {
 namespace {
@@ -26,9 +27,13 @@ class PagePrinter {
 
   /// Makes items of the entries, in order, and prints each page as it fills.
   Result<void> add(const std::vector<URL>& entries) {
-    if (auto fetched = session_.platform().resources.prefetch(entries); !fetched) return fetched;
-    for (const URL& url : entries) {
-      addEntry(url);
+    // The rest of a long folder is not read for nobody.
+    if (!program_.canWrite()) return fail(Error::posix(EPIPE));
+    const auto items = makeItems(session_.provider().itemContext(), entries);
+    if (!items) return fail(items.error());
+    for (const auto& item : *items) {
+      // An entry that went away meanwhile, or is not shown, counts and makes no item.
+      if (item) addItem(*item);
       if (++counted_ == pageSize) finishPage(true);
     }
     return {};
@@ -36,16 +41,14 @@ class PagePrinter {
 
   /// Prints the last page of the listing, which may be empty.
   void finish() { finishPage(false); }
+  [[nodiscard]] std::string nextPage() const { return base64(stringView(cursor_.encode())); }
 
  private:
-  void addEntry(const URL& url) {
-    // An entry that went away meanwhile, or is not shown, counts and makes no item.
-    const auto item = LocalItem::create(session_.provider().itemContext(), url);
-    if (!item) return;
+  void addItem(const LocalItem& item) {
     if (program_.options().json) {
-      items_.push_back(itemJSON(*item));
+      items_.push_back(itemJSON(item));
     } else {
-      printRow(*item);
+      printRow(item);
     }
   }
 
@@ -76,7 +79,7 @@ class PagePrinter {
     nlohmann::json line;
     line["items"] = std::exchange(items_, nlohmann::json::array());
     line["nextPage"] = nullptr;
-    if (more) line["nextPage"] = base64(stringView(cursor_.encode()));
+    if (more) line["nextPage"] = nextPage();
     program_.out() << line.dump() << '\n';
   }
 
@@ -129,8 +132,12 @@ Result<void> list(Program& program, const Session& session, const ListOptions& o
       walker.enumerate(session.platform().directories, session.platform().resources, visit);
   if (!counted) return fail(counted.error());
   if (auto added = printer.add(batch); !added) return added;
-  // A listing that stopped because it had its pages has printed its last one already.
-  if (seen < walker.limit) printer.finish();
+  if (seen < walker.limit) {
+    printer.finish();
+    return {};
+  }
+  // It stopped because it had its pages, and has printed the last one already.
+  if (!program.options().json) program.note("it goes on with --page " + printer.nextPage());
   return {};
 }
 
@@ -148,6 +155,7 @@ ExitCode runList(Program& program, const ListOptions& options) {
     return program.report(Error::posix(ENOTDIR), "can't list " + options.item);
   }
   if (auto listed = list(program, *session, options, folder); !listed) {
+    if (!program.canWrite()) return ExitCode::failed;
     return program.report(listed.error(), "can't list " + options.item);
   }
   return ExitCode::done;

@@ -1,5 +1,6 @@
 #include "cli/Printing.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <ctime>
@@ -13,9 +14,13 @@ namespace {
 
 // Controls, and what reorders or hides the text around it.
 bool isUnsafe(char32_t point) {
-  return point < 0x20 || (point >= 0x7F && point < 0xA0) || (point >= 0x200B && point <= 0x200F) ||
-         (point >= 0x2028 && point <= 0x202E) || (point >= 0x2066 && point <= 0x2069) ||
-         point == 0xFEFF;
+  static constexpr struct {
+    char32_t first, last;
+  } ranges[] = {{0, 0x1F},        {0x7F, 0x9F},     {0xAD, 0xAD},      {0x61C, 0x61C},
+                {0x180E, 0x180E}, {0x200B, 0x200F}, {0x2028, 0x202E},  {0x2060, 0x206F},
+                {0xFEFF, 0xFEFF}, {0xFFF9, 0xFFFB}, {0xE0000, 0xE007F}};
+  return std::ranges::any_of(
+      ranges, [&](const auto& range) { return point >= range.first && point <= range.last; });
 }
 
 void appendEscaped(std::string& text, std::string_view bytes) {

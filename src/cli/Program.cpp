@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 #include <ostream>
 
+#include "cli/ErrorText.h"
 #include "cli/Printing.h"
 
 namespace mirabel {
@@ -24,24 +25,33 @@ Session* Program::session() {
   return session_.get();
 }
 
+bool Program::canWrite() const {
+  return streams_.out.good();
+}
+
 void Program::note(std::string_view text) const {
-  streams_.err << "mirabel: " << printable(text) << '\n';
+  if (options_.json) {
+    streams_.err << nlohmann::json{{"notice", utf8Lossy(text)}}.dump() << '\n';
+  } else {
+    streams_.err << "mirabel: " << printable(text) << '\n';
+  }
 }
 
 ExitCode Program::report(const Error& error, std::string_view what) {
-  std::string message(what);
-  if (!message.empty()) message += "; ";
-  message += error.description();
-  if (options_.json) {
-    const nlohmann::json line = {{"error",
-                                  {{"domain", domainName(error.domain)},
-                                   {"code", error.code},
-                                   {"message", utf8Lossy(message)}}}};
-    streams_.err << line.dump() << '\n';
-  } else {
-    streams_.err << "mirabel: " << printable(message) << '\n';
-  }
+  const std::string message = std::string(what) + "; " + explanation(error);
+  reportFailure(streams_.err, options_.json, domainName(error.domain), error.code, message);
   return exitCodeFor(error);
+}
+
+void reportFailure(std::ostream& err, bool asJSON, std::string_view domain, std::int64_t code,
+                   std::string_view message) {
+  if (!asJSON) {
+    err << "mirabel: " << printable(message) << '\n';
+    return;
+  }
+  const nlohmann::json line = {
+      {"error", {{"domain", domain}, {"code", code}, {"message", utf8Lossy(message)}}}};
+  err << line.dump() << '\n';
 }
 
 }  // namespace mirabel

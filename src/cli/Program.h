@@ -37,17 +37,19 @@ class Program {
 
   [[nodiscard]] const GlobalOptions& options() const { return options_; }
   [[nodiscard]] std::ostream& out() const { return streams_.out; }
+  /// False once nobody reads the answer any more, or it can't be written: time to end.
+  [[nodiscard]] bool canWrite() const;
   [[nodiscard]] bool isTerminal() const { return streams_.isTerminal; }
 
   /// Null after a failure that was reported; `exitCode` tells with what to end.
   [[nodiscard]] Session* session();
   [[nodiscard]] ExitCode exitCode() const { return exitCode_; }
 
-  /// Tells people something beside the answer, on standard error.
+  /// Tells something beside the answer, on standard error; with --json as {"notice":…}.
   void note(std::string_view text) const;
   /// Reports on standard error, for people or, with --json, for programs. `what` says what was
   /// tried, in lower case without a full stop. Answers the code to end with.
-  ExitCode report(const Error& error, std::string_view what = {});
+  ExitCode report(const Error& error, std::string_view what);
 
  private:
   GlobalOptions options_;
@@ -55,5 +57,9 @@ class Program {
   std::unique_ptr<Session> session_;
   ExitCode exitCode_ = ExitCode::done;
 };
+
+/// Writes the one line that a failure gets: for people, or as {"error":{…}}.
+void reportFailure(std::ostream& err, bool asJSON, std::string_view domain, std::int64_t code,
+                   std::string_view message);
 
 }  // namespace mirabel

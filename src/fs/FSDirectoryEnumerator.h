@@ -2,53 +2,16 @@
 
 #include <cstdint>
 #include <functional>
-#include <initializer_list>
 #include <optional>
 #include <vector>
 
 #include "foundation/ResourceValues.h"
 #include "foundation/URL.h"
+#include "fs/EnumeratorOptions.h"
+#include "fs/FSDirectoryWalk.h"
 #include "platform/DirectoryStreams.h"
 
 namespace mirabel {
-
-/// Which entries a walk leaves out: a set of bits.
-struct EnumeratorOptions {
-  std::int64_t rawValue = 0;
-
-  static const EnumeratorOptions skipsHiddenFiles;              // 1
-  static const EnumeratorOptions skipsPackageDescendants;       // 2
-  static const EnumeratorOptions skipsSubdirectoryDescendants;  // 4
-
-  constexpr EnumeratorOptions() = default;
-  constexpr explicit EnumeratorOptions(std::int64_t raw) : rawValue(raw) {}
-  constexpr EnumeratorOptions(std::initializer_list<EnumeratorOptions> options) {
-    for (const EnumeratorOptions& option : options)
-      rawValue |= option.rawValue;
-  }
-
-  [[nodiscard]] constexpr bool contains(EnumeratorOptions o) const {
-    return (rawValue & o.rawValue) == o.rawValue;
-  }
-  [[nodiscard]] constexpr bool isEmpty() const { return rawValue == 0; }
-  [[nodiscard]] constexpr EnumeratorOptions unionWith(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue | o.rawValue);
-  }
-  [[nodiscard]] constexpr EnumeratorOptions intersection(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue & o.rawValue);
-  }
-  [[nodiscard]] constexpr EnumeratorOptions symmetricDifference(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue ^ o.rawValue);
-  }
-  [[nodiscard]] constexpr EnumeratorOptions subtracting(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue & ~o.rawValue);
-  }
-  friend constexpr bool operator==(EnumeratorOptions, EnumeratorOptions) = default;
-};
-
-inline constexpr EnumeratorOptions EnumeratorOptions::skipsHiddenFiles{1};
-inline constexpr EnumeratorOptions EnumeratorOptions::skipsPackageDescendants{2};
-inline constexpr EnumeratorOptions EnumeratorOptions::skipsSubdirectoryDescendants{4};
 
 /// Walks the entries of directories in the file system's order, a directory before its contents,
 /// and hands each entry's URL to a visitor. Entries are counted in one flat sequence over the
@@ -62,7 +25,7 @@ struct FSDirectoryEnumerator {
   /// left out, packages not entered, and folders entered only when `recursively`.
   std::function<std::optional<EnumeratorOptions>(const URL&)> directoryEnumerationOptionsFor;
 
-  using Visitor = std::function<Result<void>(const URL&)>;
+  using Visitor = FSDirectoryWalk::Visitor;
 
   /// Walks and answers how many entries were counted, passed over or visited. A failing visitor
   /// ends the walk with its error; a directory that cannot be opened or closed ends it with a

@@ -1,7 +1,10 @@
 #pragma once
 
+#include <functional>
+#include <optional>
 #include <string_view>
 
+#include "foundation/Error.h"
 #include "foundation/URL.h"
 #include "platform/DirectorySizer.h"
 #include "platform/VolumeHistory.h"
@@ -25,6 +28,13 @@ class VesselManager {
   /// The folder of the device's own documents: absolute, without symbolic links, the same for
   /// the life of the process.
   [[nodiscard]] virtual const URL& documentStorageURL() const = 0;
+
+  using SignalHandler = std::function<void(std::optional<Error>)>;
+  /// Tells the host that the container changed, so that it asks for the changes. The handler is
+  /// called once, on any thread, perhaps before this returns, when the host has taken notice or
+  /// refused.
+  virtual void signalEnumeratorForContainerItemIdentifier(std::string_view container,
+                                                          SignalHandler completionHandler) = 0;
 };
 
 }  // namespace mirabel

@@ -1,7 +1,10 @@
 #include "provider/LocalVessel.h"
 
+#include <cerrno>
 #include <string>
+#include <utility>
 
+#include "enumeration/LocalFileEnumerator.h"
 #include "foundation/Log.h"
 #include "identity/MRBFileObjectIdentifier.h"
 #include "items/LocalAppLibraryItem.h"
@@ -18,8 +21,12 @@ std::string quoted(std::string_view text) {
 }  // namespace
 
 LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
-                         const AppLibraryOwners& owners)
-    : platform_(platform), identity_(platform_, roots), context_{platform_, identity_, owners} {}
+                         const AppLibraryOwners& owners, std::optional<ChangeServices> changes)
+    : platform_(platform),
+      roots_(roots),
+      identity_(platform_, roots),
+      context_{platform_, identity_, owners},
+      changes_(std::move(changes)) {}
 
 std::optional<URL> LocalVessel::URLForItemWithPersistentIdentifier(
     std::string_view identifier) const {
@@ -94,6 +101,33 @@ Result<std::shared_ptr<LocalItem>> LocalVessel::_propertiesForItemAtURL(const UR
     return fail(Error::local(LocalVesselError::invalidItemIdentifier));
   }
   return item;
+}
+
+Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerItemIdentifier(
+    std::string_view identifier) {
+  const LogSection section("enumerator for " + std::string(identifier));
+  if (!changes_) return fail(Error::posix(ENOTSUP, "this provider follows no changes"));
+  auto folders = foldersOf(identifier);
+  if (!folders) return fail(folders.error());
+  const auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
+                                                      std::string(identifier), *std::move(folders));
+  enumerator->startNotifier();
+  return enumerator;
+}
+
+/// What an enumerator of the container walks.
+Result<std::vector<URL>> LocalVessel::foldersOf(std::string_view container) const {
+  const bool isEverything = container == VesselWorkingSetContainerItemIdentifier ||
+                            container == VesselAllDirectoriesContainerItemIdentifier;
+  if (!isEverything) {
+    auto url = urlForIdentifier(container);
+    if (!url) return fail(url.error());
+    return std::vector{*std::move(url)};
+  }
+  std::vector<URL> folders{platform_.manager.documentStorageURL()};
+  const auto libraries = roots_.rootURLsForAppLibraries();
+  folders.insert(folders.end(), libraries->begin(), libraries->end());
+  return folders;
 }
 
 void LocalVessel::providePlaceholderAtURL(const URL& url,

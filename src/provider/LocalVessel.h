@@ -5,9 +5,12 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
+#include "enumeration/EnumerationServices.h"
 #include "identity/FileObjectURLs.h"
 #include "items/LocalItem.h"
+#include "platform/EnumerationObservers.h"
 #include "platform/Platform.h"
 
 namespace mirabel {
@@ -16,9 +19,9 @@ namespace mirabel {
 /// lookups hold no lock and keep no cache.
 class LocalVessel {
  public:
-  /// Everything passed in outlives the provider.
+  /// Everything passed in outlives the provider. Without `changes` it has no enumerators.
   LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
-              const AppLibraryOwners& owners);
+              const AppLibraryOwners& owners, std::optional<ChangeServices> changes = {});
   LocalVessel(const LocalVessel&) = delete;
   LocalVessel& operator=(const LocalVessel&) = delete;
 
@@ -35,6 +38,11 @@ class LocalVessel {
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemForIdentifier(
       std::string_view identifier) const;
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> _propertiesForItemAtURL(const URL& url) const;
+
+  /// The enumerator of a container, with its live updates started. It must not outlive the
+  /// provider. Errors: those of `urlForIdentifier`; POSIX ENOTSUP for a provider without changes.
+  [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumeratorForContainerItemIdentifier(
+      std::string_view identifier);
 
   /// All content is local: these complete at once, without an error.
   void providePlaceholderAtURL(const URL& url, const ErrorHandler& completionHandler) const;
@@ -54,10 +62,14 @@ class LocalVessel {
  private:
   [[nodiscard]] std::shared_ptr<LocalItem> temporaryLocalFolder() const;
   [[nodiscard]] std::optional<std::string> identifierForURL(const URL& url) const;
+  [[nodiscard]] Result<std::vector<URL>> foldersOf(std::string_view container) const;
 
   Platform platform_;
+  const AppLibraryRoots& roots_;
   FileObjectURLs identity_;
   ItemContext context_;
+  std::optional<ChangeServices> changes_;
+  OpenWalks walks_;
 };
 
 }  // namespace mirabel

@@ -305,11 +305,22 @@ class Operations final : public FileOperations {
 
 class Manager final : public VesselManager {
  public:
-  explicit Manager(URL documentStorage) : documentStorage_(std::move(documentStorage)) {}
+  Manager(URL documentStorage, FakeSignals& signals)
+      : documentStorage_(std::move(documentStorage)), signals_(signals) {}
   const URL& documentStorageURL() const override { return documentStorage_; }
+
+  void signalEnumeratorForContainerItemIdentifier(std::string_view container,
+                                                  SignalHandler completionHandler) override {
+    signals_.containers.emplace_back(container);
+    if (!signals_.answers) return signals_.waiting.push_back(std::move(completionHandler));
+    const auto refusal = signals_.refusals.find(container);
+    completionHandler(refusal == signals_.refusals.end() ? std::nullopt
+                                                         : std::optional(refusal->second));
+  }
 
  private:
   URL documentStorage_;
+  FakeSignals& signals_;
 };
 
 class History final : public VolumeHistory {
@@ -346,7 +357,7 @@ std::optional<BundleProxy> FakeApplications::proxyAt(const URL& url) {
 struct FakePlatform::Interfaces {
   Interfaces(FakePlatform& owner, URL documentStorage)
       : core{owner.volume, owner.faults, {}},
-        manager(std::move(documentStorage)),
+        manager(std::move(documentStorage), owner.signals),
         history(core, owner.historyUUID) {}
 
   Core core;

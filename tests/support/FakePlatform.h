@@ -1,12 +1,15 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "platform/DiagnosticReporter.h"
 #include "platform/Platform.h"
 #include "support/FakeVolume.h"
 #include "support/FaultScript.h"
@@ -32,6 +35,24 @@ class FakeClock final : public Clock {
   std::vector<std::chrono::milliseconds> sleeps;
 };
 
+/// The host's ear: what it was told to ask about, and how it answers. Used by one thread at a time.
+struct FakeSignals {
+  std::vector<std::string> containers;
+  /// What it answers, by container.
+  std::map<std::string, Error, std::less<>> refusals;
+  bool answers = true;
+  /// The handlers of signals that were not answered.
+  std::vector<VesselManager::SignalHandler> waiting;
+};
+
+/// Writes the reports down.
+class FakeDiagnostics final : public DiagnosticReporter {
+ public:
+  void report(std::string_view text) override { reports.emplace_back(text); }
+
+  std::vector<std::string> reports;
+};
+
 /// Every interface of the platform over a volume in memory: what the Linux layer promises, kept
 /// without a disk, with failures as scripted. The interfaces may be called from any thread; the
 /// volume is set up while nothing else runs.
@@ -54,6 +75,8 @@ class FakePlatform {
   FaultScript faults;
   FakeApplications applications;
   FakeClock clock;
+  FakeSignals signals;
+  FakeDiagnostics diagnostics;
   UUID historyUUID = UUID::fromString("11111111-2222-3333-4444-555555555555").value();
 
  private:

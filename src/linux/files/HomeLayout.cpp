@@ -47,6 +47,9 @@ Result<std::string> existingFolder(const std::string& path, const std::string& w
     const int code = static_cast<int>(status.error().code);
     return fail(Error::posix(code, what + " " + inQuotes(path) + " cannot be reached"));
   }
+  if (status->kind == FileKind::symbolicLink) {
+    return fail(Error::posix(ENOTDIR, what + " " + inQuotes(path) + " is a link to nothing"));
+  }
   if (status->kind != FileKind::folder) {
     return fail(Error::posix(ENOTDIR, what + " " + inQuotes(path) + " is not a folder"));
   }
@@ -103,10 +106,13 @@ Result<HomeLayout> HomeLayout::resolve(const Choices& choices) {
   auto documents =
       documentFolder(choices.documents.value_or(*home + "/" + std::string(documentsName)));
   if (!documents) return fail(documents.error());
-  auto state = resolvedPath(
-      choices.stateFolder.value_or(stateHome(*home, !choices.home.has_value()) + "/mirabel"));
-  if (!state) return fail(state.error());
-  return HomeLayout{std::move(*home), std::move(*documents), std::move(*state)};
+  // The folder itself stays unresolved: whether it is a link must still be seen when it is opened.
+  const std::filesystem::path state =
+      choices.stateFolder.value_or(stateHome(*home, !choices.home.has_value()) + "/mirabel");
+  auto above = resolvedPath(state.parent_path());
+  if (!above) return fail(above.error());
+  return HomeLayout{std::move(*home), std::move(*documents),
+                    std::filesystem::path(*above) / state.filename()};
 }
 
 }  // namespace mirabel

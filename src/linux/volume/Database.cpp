@@ -1,5 +1,6 @@
 #include "linux/volume/Database.h"
 
+#include <cerrno>
 #include <sqlite3.h>
 #include <utility>
 
@@ -17,6 +18,16 @@ constexpr const char* settings =
     "PRAGMA trusted_schema=OFF;"
     "PRAGMA cell_size_check=ON;"
     "PRAGMA wal_autocheckpoint=4000;";
+
+// A full disk is an ordinary failure, and told as one.
+Error lastErrorOf(sqlite3* database) {
+  const int code = sqlite3_extended_errcode(database);
+  if (code == SQLITE_FULL) {
+    const char* path = sqlite3_db_filename(database, nullptr);
+    return Error::posix(ENOSPC, path == nullptr ? "" : path);
+  }
+  return Error::store(code, sqlite3_errmsg(database));
+}
 
 }  // namespace
 
@@ -58,7 +69,7 @@ Result<Statement> Database::prepare(std::string_view sql) {
 }
 
 Error Database::lastError() const {
-  return Error::store(sqlite3_extended_errcode(handle_), sqlite3_errmsg(handle_));
+  return lastErrorOf(handle_);
 }
 
 std::int64_t Database::changeCount() const {
@@ -90,8 +101,7 @@ Result<bool> Statement::step() {
   const int code = sqlite3_step(handle_);
   if (code == SQLITE_ROW) return true;
   if (code == SQLITE_DONE) return false;
-  sqlite3* database = sqlite3_db_handle(handle_);
-  return fail(Error::store(sqlite3_extended_errcode(database), sqlite3_errmsg(database)));
+  return fail(lastErrorOf(sqlite3_db_handle(handle_)));
 }
 
 Result<void> Statement::run() {

@@ -22,7 +22,8 @@ Result<UniqueFd> openFolder(const std::string& path) {
   if (errno == ELOOP || errno == ENOTDIR) {
     struct stat status {};
     if (::lstat(path.c_str(), &status) != 0) return fail(Error::posix(ENOTDIR, path));
-    return fail(refused(path, S_ISLNK(status.st_mode) ? "is a symbolic link" : "is no folder"));
+    return fail(refused(
+        path, S_ISLNK(status.st_mode) ? "is a symbolic link; move it away" : "is no folder"));
   }
   if (errno != ENOENT) return fail(Error::posix(errno, path));
   const std::size_t slash = path.rfind('/');
@@ -44,7 +45,8 @@ Result<UniqueFd> openOwnFolder(const std::string& path) {
   if (!folder) return folder;
   struct stat status {};
   if (::fstat(folder->get(), &status) != 0) return fail(Error::posix(errno, path));
-  if (status.st_uid != ::geteuid()) return fail(refused(path, "belongs to somebody else"));
+  if (status.st_uid != ::geteuid())
+    return fail(refused(path, "belongs to somebody else; have it given back, or move it away"));
   if ((status.st_mode & 077) != 0 && ::fchmod(folder->get(), 0700) != 0) {
     return fail(Error::posix(errno, path));
   }

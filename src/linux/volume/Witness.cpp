@@ -103,12 +103,12 @@ Result<void> Witness::write(const StateFolder& folder) const {
   const int directory = folder.descriptor();
   UniqueFd file(::openat(directory, "witness.new",
                          O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0600));
-  if (!file) return fail(Error::posix(errno));
+  if (!file) return fail(Error::posix(errno, folder.file("witness")));
   errno = EIO;
   if (::write(file.get(), bytes.data(), bytes.size()) != static_cast<ssize_t>(bytes.size()) ||
       ::fsync(file.get()) != 0 || ::close(file.release()) != 0 ||
       ::renameat(directory, "witness.new", directory, "witness") != 0 || ::fsync(directory) != 0) {
-    return fail(Error::posix(errno));
+    return fail(Error::posix(errno, folder.file("witness")));
   }
   return {};
 }

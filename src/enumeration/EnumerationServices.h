@@ -1,0 +1,25 @@
+#pragma once
+
+#include "enumeration/OpenWalks.h"
+#include "fs/ChangesEnumeration.h"
+#include "items/LocalItem.h"
+#include "platform/DiagnosticReporter.h"
+#include "platform/EventStreams.h"
+
+namespace mirabel {
+
+/// What following changes needs beyond the items: references that outlive who gets it.
+struct ChangeServices {
+  EventStreams& events;
+  DiagnosticReporter& diagnostics;
+  ChangesEnumerations& changes;
+};
+
+/// What the enumerators of one provider share; what it refers to outlives every enumerator.
+struct EnumerationServices {
+  ItemContext items;
+  ChangeServices changes;
+  OpenWalks& walks;
+};
+
+}  // namespace mirabel

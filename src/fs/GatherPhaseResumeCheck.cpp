@@ -1,0 +1,112 @@
+#include "fs/GatherPhaseResumeCheck.h"
+
+#include <mutex>
+#include <semaphore>
+
+#include "fs/FSEventReader.h"
+
+namespace mirabel {
+namespace {
+
+using Case = FSEventReaderGatherPhaseResumeStatus::Case;
+
+constexpr std::string_view folderType = "inode/directory";
+
+/// The reader's delegate for the time of the check. Written on the reader's queue and read by the
+/// caller, who may do so while the rest of a batch is still coming in.
+class FSEventChecker final : public FSEventReaderDelegate {
+ public:
+  explicit FSEventChecker(std::uint64_t previousEventID) {
+    check_.lastProcessedFSEventID = previousEventID;
+  }
+
+  GatherPhaseResumeCheck wait() {
+    sema_.acquire();
+    const std::lock_guard lock(mutex_);
+    return check_;
+  }
+
+  void didUpdateItem(FSEventReader& reader, const std::shared_ptr<LocalItem>& item,
+                     const URL& url) override {
+    reader.streamQueue().assertOnQueue();
+    if (item->url().properURL() == url.properURL()) return;
+    note(item->typeIdentifier() == folderType);
+  }
+
+  void didDeleteItem(FSEventReader& reader, const std::string& identifier,
+                     const std::optional<URL>& url) override {
+    const std::string place = url ? ", path:'" + url->path() + "'" : "";
+    decide(reader, {Case::deletionOccurred, "[" + identifier + place + "]"});
+  }
+
+  void didFinishHistory(FSEventReader& reader) override { decide(reader, {}); }
+
+  void mustRestart(FSEventReader& reader) override {
+    decide(reader, {Case::cantReplayHistoricalFSEvents, {}});
+  }
+
+  void didProcessEvents(FSEventReader& reader) override { reader.streamQueue().assertOnQueue(); }
+
+  void didDropEvent(FSEventReader& reader, const FileSystemEvent&, const std::optional<URL>&,
+                    DropReason reason) override {
+    reader.streamQueue().assertOnQueue();
+    if (reason == DropReason::noObject) note(false);
+    if (reason == DropReason::lookFailed || reason == DropReason::noPath) note(true);
+  }
+
+  /// Nothing will come: the answer must not wait for it.
+  void didNotStart() {
+    {
+      const std::lock_guard lock(mutex_);
+      check_.status.status = Case::cantReplayHistoricalFSEvents;
+    }
+    sema_.release();
+  }
+
+ private:
+  void note(bool isFolder) {
+    const std::lock_guard lock(mutex_);
+    check_.hasNameLeft = true;
+    check_.hasFolderMoved = check_.hasFolderMoved || isFolder;
+  }
+
+  /// The end of the history keeps what was found so far; the other answers replace it.
+  void decide(FSEventReader& reader, FSEventReaderGatherPhaseResumeStatus status) {
+    reader.streamQueue().assertOnQueue();
+    {
+      const std::lock_guard lock(mutex_);
+      if (status.status != Case::canResume) check_.status = std::move(status);
+      check_.lastProcessedFSEventID = reader.lastProcessedFSEventID();
+    }
+    // Submitted, so that the rest of the batch still comes here; the block keeps the reader.
+    SerialQueue queue = reader.streamQueue();
+    queue.async([stopped = reader.shared_from_this()] { stopped->stop(); });
+    sema_.release();
+  }
+
+  std::mutex mutex_;
+  GatherPhaseResumeCheck check_;
+  std::counting_semaphore<> sema_{0};
+};
+
+}  // namespace
+
+GatherPhaseResumeCheck canResumeGatherPhase(const ItemContext& context, EventStreams& events,
+                                            const std::vector<URL>& on,
+                                            std::uint64_t previousEventID) {
+  const auto reader = FSEventReader::create(context, events, on, previousEventID,
+                                            FSEventReaderMode::pathBased, Verbosity::quiet);
+  const auto checker = std::make_shared<FSEventChecker>(previousEventID);
+  reader->setDelegate(checker);
+  SerialQueue queue = reader->streamQueue();
+  queue.async([reader, checker] {
+    reader->start();
+    if (!reader->isRunning()) checker->didNotStart();
+  });
+  GatherPhaseResumeCheck check = checker->wait();
+  // Nothing of the check goes on behind the caller's back: the stop that was submitted is done.
+  queue.sync([] {});
+  return check;
+}
+
+}  // namespace mirabel

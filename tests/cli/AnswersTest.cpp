@@ -1,0 +1,121 @@
+#include <set>
+
+#include "cli/CommandLineFixture.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::MatchesRegex;
+using Answers = CommandLineFixture;
+
+std::set<std::string> keysOf(const nlohmann::json& object) {
+  std::set<std::string> keys;
+  for (const auto& entry : object.items())
+    keys.insert(entry.key());
+  return keys;
+}
+
+TEST_F(Answers, AreOneValueForPeopleAndOneObjectForPrograms) {
+  home.writeFile("doc");
+  EXPECT_EQ(run({"id", home.at("doc")}).out, "did=1\n");
+  EXPECT_EQ(run({"--json", "id", home.at("doc")}).json(),
+            nlohmann::json({{"itemIdentifier", "did=1"}}));
+  EXPECT_EQ(run({"path", "did=1"}).out, home.at("doc") + "\n");
+  EXPECT_EQ(run({"--json", "path", "did=1"}).json(), nlohmann::json({{"path", home.at("doc")}}));
+}
+
+TEST_F(Answers, AnItemHasTheKeysOfWhatItHas) {
+  home.writeFile("letter.txt", "Dear Aunt");
+  home.makeFolder("folder");
+  const nlohmann::json document = run({"--json", "info", home.at("letter.txt")}).json();
+  std::set<std::string> keys = {"capabilities",   "contentModificationDate",
+                                "creationDate",   "docID",
+                                "documentSize",   "fileID",
+                                "filename",       "isTrashed",
+                                "itemIdentifier", "parentItemIdentifier",
+                                "path",           "typeIdentifier"};
+  EXPECT_EQ(keysOf(document), keys);
+  EXPECT_EQ(document.at("documentSize"), "9");
+  EXPECT_EQ(document.at("docID"), "1");
+  EXPECT_EQ(document.at("isTrashed"), false);
+  EXPECT_EQ(document.at("parentItemIdentifier"), "VesselRootContainerItemIdentifier");
+  EXPECT_TRUE(document.at("fileID").is_string());
+  EXPECT_TRUE(document.at("capabilities").is_string());
+  EXPECT_THAT(document.at("creationDate").get<std::string>(),
+              MatchesRegex("[0-9]+-[0-9]+-[0-9]+T[0-9:.]+Z"));
+  const nlohmann::json folder = run({"--json", "info", home.at("folder")}).json();
+  keys.erase("docID");
+  keys.erase("documentSize");
+  keys.insert("childItemCount");
+  EXPECT_EQ(keysOf(folder), keys);
+  EXPECT_EQ(folder.at("childItemCount"), 0);
+  EXPECT_EQ(run({"--json", "ls"}).json().at("items").size(), 2u);
+  for (const nlohmann::json& item : run({"--json", "ls"}).json().at("items")) {
+    EXPECT_EQ(item, item.at("filename") == "folder" ? folder : document);
+  }
+}
+
+TEST_F(Answers, ForPeopleAreRowsWithReadableSizes) {
+  home.writeFile("letter.txt", std::string(14'200, 'x'));
+  home.makeFolder("folder");
+  const std::string info = run({"info", home.at("letter.txt")}).out;
+  EXPECT_THAT(info, HasSubstr("size          14.2 kB\n"));
+  EXPECT_THAT(info, HasSubstr("identifier    did=1\n"));
+  EXPECT_THAT(info, HasSubstr("path          " + home.at("letter.txt") + "\n"));
+  const std::string rows = run({"ls"}).out;
+  EXPECT_THAT(rows, HasSubstr("     14.2 kB  "));
+  EXPECT_THAT(rows, HasSubstr("  folder/\n"));
+  EXPECT_THAT(run({"ls"}, Output::terminal).out, HasSubstr("\033[1;34mfolder\033[0m/"));
+}
+
+TEST_F(Answers, NamesAreMadeSafeForPeopleAndKeptForPrograms) {
+  const std::string escape = "a\n\033[31m";
+  const std::string bytes = "caf\xe9";
+  home.writeFile(escape);
+  home.writeFile(bytes);
+  for (const char* command : {"ls", "info"}) {
+    const std::string item = *command == 'l' ? "root" : home.at(escape);
+    EXPECT_THAT(run({command, item}).out, HasSubstr("a\\n\\x1b[31m"));
+  }
+  EXPECT_EQ(run({"path", home.at(bytes)}).out, home.at(bytes) + "\n");
+  EXPECT_EQ(run({"path", home.at(bytes)}, Output::terminal).out, home.at("caf\\xe9\n"));
+  EXPECT_EQ(run({"--json", "info", home.at(escape)}).json().at("filename"), escape);
+  const nlohmann::json item = run({"--json", "info", home.at(bytes)}).json();
+  EXPECT_EQ(item.at("filename"), "caf\xEF\xBF\xBD");
+  EXPECT_EQ(item.at("filenameBytes"), "Y2Fm6Q==");
+  EXPECT_TRUE(item.contains("pathBytes"));
+  const Answer failure = run({"id", home.at("\033[2J")});
+  expectFailure(failure, 3, "\\x1b[2J");
+}
+
+TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
+  const Answer healthy = run({"doctor"});
+  EXPECT_THAT(healthy.out, HasSubstr("ok       documents: " + home.documents() + "\n"));
+  EXPECT_THAT(healthy.out, HasSubstr("ok       state: "));
+  std::istringstream lines(run({"--json", "doctor"}).out);
+  std::set<std::string> subjects;
+  for (std::string line; std::getline(lines, line);) {
+    const nlohmann::json finding = nlohmann::json::parse(line);
+    subjects.insert(finding.at("subject"));
+    EXPECT_THAT(finding.at("health").get<std::string>(), MatchesRegex("ok|limited|missing"));
+  }
+  EXPECT_EQ(subjects,
+            (std::set<std::string>{"home", "documents", "extended attributes", "birth times",
+                                   "file handles", "volume UUID", "state"}));
+  home.remove("");
+  const Answer missing = run({"doctor"});
+  EXPECT_EQ(missing.code, 1);
+  EXPECT_THAT(missing.out, HasSubstr("missing  documents: "));
+  EXPECT_THAT(missing.out, HasSubstr("(make the folder"));
+}
+
+TEST_F(Answers, TheDemonstrationFindsItsDocumentToTheEnd) {
+  const Answer answer = run({"demo"});
+  EXPECT_EQ(answer.code, 0) << answer.out << answer.err;
+  EXPECT_THAT(answer.out, HasSubstr("/Documents/Recipes/thanks.txt\n"));
+  EXPECT_THAT(answer.out, HasSubstr("The home was temporary and is gone."));
+}
+
+}  // namespace
+}  // namespace mirabel::testing

@@ -1,0 +1,86 @@
+#include <fstream>
+#include <regex>
+
+#include "cli/CommandLineFixture.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::HasSubstr;
+using Usage = CommandLineFixture;
+
+TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
+  const std::vector<std::vector<std::string>> cases = {
+      {"unknown"},
+      {"id"},
+      {"id", "a", "b"},
+      {"path"},
+      {"--bogus"},
+      {"ls", "--bogus"},
+      {"ls", "--page"},
+      {"ls", "--pages", "0"},
+      {"ls", "--pages", "-1"},
+      {"ls", "--pages", "1.5"},
+      {"ls", "--pages", "many"},
+      {"--timeout", "soon", "ls"},
+      {"--timeout", "nan", "ls"},
+      {"--timeout", "-1", "ls"},
+      {"--timeout", "1e9", "ls"},
+      {"--home", "/", "ls"},  // said twice
+      {"doctor", "argument"},
+      {"ls", "a", "doctor", "b"},
+  };
+  for (const auto& arguments : cases) {
+    const std::string shown = ::testing::PrintToString(arguments);
+    const Answer people = run(arguments);
+    expectFailure(people, 2, "--help");
+    auto withJSON = arguments;
+    withJSON.insert(withJSON.begin(), "--json");
+    const Answer programs = run(withJSON);
+    EXPECT_EQ(programs.code, 2) << shown;
+    EXPECT_EQ(programs.error().at("domain"), "usage") << shown;
+    EXPECT_EQ(programs.error().at("code"), 2) << shown;
+  }
+  EXPECT_EQ(run({}).code, 2);
+}
+
+TEST_F(Usage, HelpAndVersionAreAnswers) {
+  const Answer help = run({"--help"});
+  EXPECT_EQ(help.code, 0);
+  for (const char* word : {"id", "path", "info", "ls", "doctor", "demo", "--json", "./fid=3"}) {
+    EXPECT_THAT(help.out, HasSubstr(word));
+  }
+  const Answer list = run({"ls", "--help"});
+  EXPECT_EQ(list.code, 0);
+  EXPECT_THAT(list.out, HasSubstr("--pages"));
+  EXPECT_THAT(run({"--version"}).out, HasSubstr("mirabel "));
+}
+
+TEST_F(Usage, TheManualKnowsEveryOptionAndCommandOfTheHelp) {
+  std::ifstream file(MIRABEL_MANUAL);
+  const std::string manual(std::istreambuf_iterator<char>(file), {});
+  const std::regex word("--[a-z]+|\\n  ([a-z]+) ");
+  int count = 0;
+  for (const char* command : {"", "id", "path", "info", "ls", "doctor", "demo"}) {
+    const std::string help = *command == '\0' ? run({"--help"}).out : run({command, "--help"}).out;
+    for (std::sregex_iterator it(help.begin(), help.end(), word), end; it != end; ++it, ++count) {
+      const std::string found = (*it)[1].matched ? (*it)[1].str() : it->str();
+      EXPECT_THAT(manual, HasSubstr("*" + found + "*")) << command;
+    }
+  }
+  EXPECT_GT(count, 20);
+}
+
+TEST_F(Usage, GlobalOptionsMayFollowTheCommandAndPathsMayLookLikeOptions) {
+  for (const char* name : {"-x", "--json", "ls", "[a]", "\"b\"", "{c}", "a=b", "%%", "@"}) {
+    home.writeFile(name);
+    EXPECT_EQ(run({"info", "--json", "--", home.at(name)}).json().at("filename"), name);
+  }
+  const Answer relative = shell("cd \"$documents\" && \"$mirabel\" --home \"$home\" id -- --json");
+  EXPECT_THAT(relative.out, HasSubstr("did=")) << relative.err;
+  EXPECT_THAT(shell("cd \"$documents\" && \"$mirabel\" --home \"$home\" id ls").out,
+              HasSubstr("did="));
+}
+
+}  // namespace
+}  // namespace mirabel::testing

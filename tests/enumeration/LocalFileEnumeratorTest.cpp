@@ -1,0 +1,332 @@
+#include <algorithm>
+#include <cerrno>
+#include <gmock/gmock.h>
+#include <set>
+
+#include "enumeration/EnumerationFixture.h"
+#include "enumeration/LocalFileEnumerator.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+const Error startOver = Error::syncAnchorExpired();
+
+class LocalFileEnumeratorTest : public EnumerationTest {
+ protected:
+  std::string description(const Data& cursor) {
+    return FSChangeToken::decode(cursor)->description();
+  }
+  std::string folderID(std::string_view name) {
+    return "fid=" + std::to_string(fake.volume.at(fake.path(name)).fileID);
+  }
+};
+
+TEST_F(LocalFileEnumeratorTest, PagesOfTwoHundredEndWithAPageThatIsNotFull) {
+  struct Case {
+    int children;
+    std::vector<std::size_t> pages;
+  };
+  const Case cases[] = {{0, {0}}, {1, {1}}, {199, {199}}, {200, {200, 0}}, {201, {200, 1}}};
+  for (const Case& c : cases) {
+    for (const bool keepsWalks : {true, false}) {
+      const std::string name = std::to_string(c.children) + (keepsWalks ? "k" : "f");
+      fake.volume.makeFolder(fake.path(name));
+      addFiles(name + "/", c.children);
+      const auto listing = LocalFileEnumerator::create(services, folderID(name), {fake.url(name)});
+      std::vector<std::size_t> sizes;
+      std::set<std::string> names;
+      std::optional<Data> page = firstPage();
+      while (page && sizes.size() < 5) {
+        if (!keepsWalks) forgetWalks();
+        const ListedPage listed = list(*listing, *page);
+        ASSERT_FALSE(listed.error) << listed.error->description();
+        sizes.push_back(listed.names.size());
+        names.insert(listed.names.begin(), listed.names.end());
+        page = listed.next;
+      }
+      EXPECT_EQ(sizes, c.pages);
+      EXPECT_EQ(names.size(), static_cast<std::size_t>(c.children));
+    }
+  }
+}
+
+TEST_F(LocalFileEnumeratorTest, CursorHoldsTheHistoryTheEventAndTheOffset) {
+  addFiles("", 201);
+  events.append(fake.path("0"));
+  const auto listing = enumerator();
+  log.clear();
+  const ListedPage first = list(*listing);
+  EXPECT_EQ(FSChangeToken::decode(first.next.value()),
+            (FSChangeToken{0, fake.historyUUID, 1, 200, 0}));
+  EXPECT_THAT(log.sectionLabels(),
+              ElementsAre("enumerate items for fid=1 with page initialPageSortedByName"));
+  EXPECT_THAT(log.messages(),
+              ElementsAre(debug("start gather phase"), debug("discovered 200 items for fid=1")));
+
+  events.append(fake.path("0"));
+  log.clear();
+  const ListedPage second = list(*listing, *first.next);
+  EXPECT_FALSE(second.next);
+  EXPECT_THAT(log.sectionLabels(),
+              ElementsAre("enumerate items for fid=1 with page " + description(*first.next)));
+  EXPECT_THAT(log.messages(),
+              ElementsAre(debug("resume gather phase at offset 200"),
+                          debug("safe to resume gather phase from FSEventID 1"),
+                          debug("discovered 1 items for fid=1"),
+                          debug("gather phase finished for [\"" + fake.path("") + "\"]")));
+  log.clear();
+  static_cast<void>(list(*listing, dataFromString(VesselInitialPageSortedByDate)));
+  EXPECT_THAT(log.sectionLabels(),
+              ElementsAre("enumerate items for fid=1 with page initialPageSortedByDate"));
+}
+
+TEST_F(LocalFileEnumeratorTest, NextCursorStartsAtTheEventThatTheCheckReached) {
+  addFiles("", 401);
+  const auto listing = enumerator();
+  const ListedPage first = list(*listing);
+  events.append(fake.path("0"), fake.volume.at(fake.path("0")).fileID);
+  const ListedPage second = list(*listing, first.next.value());
+  EXPECT_EQ(FSChangeToken::decode(second.next.value()),
+            (FSChangeToken{0, fake.historyUUID, 1, 400, 0}));
+}
+
+TEST_F(LocalFileEnumeratorTest, UnusableCursorStartsTheListingOver) {
+  addFiles("", 201);
+  const auto listing = enumerator();
+  const FSChangeToken good = FSChangeToken::decode(list(*listing).next.value()).value();
+  FSChangeToken other = good;
+  other.deviceUUID = UUID{};
+  FSChangeToken far = good;
+  far.offset = 500;
+  FSChangeToken future = good;
+  future.streamEventID = 99;
+  const std::pair<Data, LogLine> cases[] = {
+      {dataFromString("junk"), error("can't create change token from anchor data, resetting")},
+      {{}, error("can't create change token from anchor data, resetting")},
+      {other.encode(), info("device UUID changed (" + UUID{}.description() + " -> " +
+                            fake.historyUUID.description() + ")")},
+      {far.encode(),
+       info("enumerator returned an offset (201) smaller than the initial offset 500")},
+      {future.encode(),
+       info("can't replay historical FSEvents, need to re-start gather phase from scratch")},
+  };
+  for (const auto& [page, line] : cases) {
+    log.clear();
+    fake.faults.reset();
+    const ListedPage listed = list(*listing, page);
+    EXPECT_EQ(listed.error, startOver);
+    EXPECT_THAT(listed.names, IsEmpty());
+    EXPECT_THAT(log.messages(), Contains(line));
+  }
+  fake.faults.fail(Op::historyUUID, Error::posix(EIO));
+  log.clear();
+  EXPECT_EQ(list(*listing).error, Error::local(LocalVesselError::unableToGetDeviceUUID));
+  EXPECT_THAT(log.messages(), ElementsAre(error("can't get volume UUID for " + fake.path(""))));
+}
+
+TEST_F(LocalFileEnumeratorTest, DeletionBetweenPagesStartsTheListingOver) {
+  addFiles("", 201);
+  const auto listing = enumerator();
+  const ListedPage first = list(*listing);
+  events.append(fake.path("gone"), 4711);
+  log.clear();
+  EXPECT_EQ(list(*listing, *first.next).error, startOver);
+  EXPECT_EQ(log.messages().back(), info("deletion of [fid=4711, path:'" + fake.path("gone") +
+                                        "'] requires to re-gather from scratch"));
+}
+
+TEST_F(LocalFileEnumeratorTest, MovesBetweenPagesSkipNoNeighbour) {
+  fake.volume.makeFolder(fake.path("elsewhere"));
+  addFiles("folder/", 400);
+  const auto listing =
+      LocalFileEnumerator::create(services, folderID("folder"), {fake.url("folder")});
+  // The walk that stands open gives what is left of the folder as if nothing had happened.
+  ListedPage first = list(*listing);
+  rename("folder/0", "elsewhere/0");
+  ListedPage second = list(*listing, *first.next);
+  ASSERT_FALSE(second.error);
+  EXPECT_EQ(second.names.front(), "200");
+  // Counted from the start, the 200th entry is another one by now.
+  first = list(*listing);
+  rename("folder/1", "elsewhere/1");
+  forgetWalks();
+  EXPECT_EQ(list(*listing, *first.next).error, startOver);
+  // What changes in its place lets both go on.
+  first = list(*listing);
+  events.append(fake.path("folder/2"), fake.volume.at(fake.path("folder/2")).fileID);
+  forgetWalks();
+  second = list(*listing, *first.next);
+  ASSERT_FALSE(second.error);
+  EXPECT_EQ(second.names.front(), "202");
+}
+
+TEST_F(LocalFileEnumeratorTest, FolderThatIsMovedWhileListedStartsTheListingOver) {
+  addFiles("a/", 150);
+  addFiles("b/", 150);
+  const auto everything = enumerator(workingSet);
+  const ListedPage first = list(*everything);
+  ASSERT_TRUE(first.next);
+  rename("b", "c");
+  EXPECT_EQ(list(*everything, *first.next).error, startOver);
+
+  // The folder of an ordinary container, by a move further up, that no event tells of.
+  addFiles("x/y/", 201);
+  const auto inner = LocalFileEnumerator::create(services, folderID("x/y"), {fake.url("x/y")});
+  const ListedPage opened = list(*inner);
+  fake.volume.rename(fake.path("x"), fake.path("z"));
+  EXPECT_EQ(list(*inner, *opened.next).error, startOver);
+  forgetWalks();
+  EXPECT_TRUE(list(*inner, *opened.next).error);
+}
+
+TEST_F(LocalFileEnumeratorTest, WhatIsNotShownMakesNoItems) {
+  for (const char* file : {"a", ".hidden/h", "Inbox/i", "sub/Inbox/i", "p.bundle/in", "sub/s",
+                           ".Trash/t/deep", ".Trash/u", ".Trash/.v", "sub/.Trash/w"}) {
+    addFile(file);
+  }
+  EXPECT_THAT(list(*enumerator()).names, ElementsAre("a", "sub", "p.bundle"));
+  EXPECT_THAT(list(*enumerator(workingSet)).names,
+              ElementsAre("a", "sub", "s", "p.bundle", "t", "u"));
+  EXPECT_THAT(list(*enumerator(allDirectories)).names, ElementsAre("sub"));
+  const auto trash =
+      LocalFileEnumerator::create(services, folderID(".Trash"), {fake.url(".Trash")});
+  EXPECT_THAT(list(*trash).names, ElementsAre("t", "u"));
+}
+
+TEST_F(LocalFileEnumeratorTest, WorkingSetListsTheTrashAfterAllRoots) {
+  fake.install("org.example.draw", "/apps/draw", "Draw");
+  fake.volume.writeFile("/apps/draw/Documents/drawn");
+  fake.volume.makeFolder("/apps/draw/Documents/.Trash");
+  fake.volume.writeFile("/apps/draw/Documents/.Trash/erased");
+  addFile("written");
+  addFile(".Trash/torn");
+  const auto listing = LocalFileEnumerator::create(
+      services, workingSet, {fake.url(), URL::fileURL("/apps/draw/Documents")});
+  log.clear();
+  const ListedPage page = list(*listing);
+  EXPECT_THAT(page.names, ElementsAre("written", "drawn", "torn", "erased"));
+  const auto lines = log.messages();
+  EXPECT_EQ(std::ranges::count_if(lines,
+                                  [](const LogLine& line) {
+                                    return line.text.starts_with(
+                                        "[DEBUG] updating fileID in palimpsest for <LocalItem ");
+                                  }),
+            4);
+  EXPECT_EQ(fake.faults.calls(Op::permanentStorageForItemAtURL), 4U);
+  EXPECT_EQ(lines.back(), debug("gather phase finished for [\"" + fake.path("") +
+                                "\", \"/apps/draw/Documents\", \"" + fake.path(".Trash") +
+                                "\", \"/apps/draw/Documents/.Trash\"]"));
+}
+
+TEST_F(LocalFileEnumeratorTest, FilesCountTowardsTheOffsetOfAllDirectories) {
+  addFiles("a/", 250);
+  addFile("b/file");
+  const auto listing = enumerator(allDirectories);
+  const ListedPage first = list(*listing);
+  EXPECT_THAT(first.names, ElementsAre("a"));
+  EXPECT_EQ(FSChangeToken::decode(first.next.value())->offset, 200U);
+  EXPECT_THAT(list(*listing, *first.next).names, ElementsAre("b"));
+  EXPECT_EQ(fake.faults.calls(Op::permanentStorage), 0U);
+}
+
+TEST_F(LocalFileEnumeratorTest, FolderThatCannotBeReadIsAnErrorOnlyAsTheContainerItself) {
+  addFile("a/1");
+  addFile("b");
+  for (const int code : {EACCES, ENOENT, EXDEV}) {
+    fake.faults.reset();
+    fake.faults.fail(Op::openDirectory, Error::posix(code), 2);
+    EXPECT_THAT(list(*enumerator(workingSet)).names, ElementsAre("a", "b")) << code;
+    fake.faults.reset();
+    fake.faults.fail(Op::openDirectory, Error::posix(code));
+    EXPECT_THAT(list(*enumerator(allDirectories)).names, IsEmpty()) << code;
+    fake.faults.reset();
+    fake.faults.fail(Op::openDirectory, Error::posix(code));
+    EXPECT_EQ(list(*enumerator()).error, Error::posix(code));
+  }
+  for (const Op op : {Op::openDirectory, Op::closeDirectory, Op::prefetch}) {
+    fake.faults.reset();
+    fake.faults.fail(op, Error::posix(EMFILE));
+    EXPECT_EQ(list(*enumerator(workingSet)).error, Error::posix(EMFILE));
+  }
+}
+
+TEST_F(LocalFileEnumeratorTest, NothingThatIsThereIsLeftOutForAFailure) {
+  addFiles("folder/", 3);
+  const std::set<std::string> expected{"folder", "0", "1", "2"};
+  for (int number = 0; number <= static_cast<int>(Op::historyUUID); ++number) {
+    const Op op = static_cast<Op>(number);
+    if (op == Op::nextEntry) continue;  // a stream that cannot be read any further has ended
+    for (std::size_t n = 1;; ++n) {
+      const auto listing = enumerator(workingSet);
+      fake.faults.reset();
+      fake.faults.fail(op, Error::posix(EMFILE), n);
+      const ListedPage page = list(*listing);
+      if (fake.faults.calls(op) < n) break;
+      if (page.error) continue;
+      EXPECT_EQ(std::set(page.names.begin(), page.names.end()), expected) << number << " " << n;
+    }
+  }
+}
+
+TEST_F(LocalFileEnumeratorTest, EntriesOfAPageAreLookedAtInOneGo) {
+  addFiles("", 200);
+  const auto listing = enumerator();
+  fake.faults.reset();
+  EXPECT_THAT(list(*listing).names, SizeIs(200));
+  EXPECT_EQ(fake.faults.calls(Op::prefetch), 1U);
+  EXPECT_EQ(fake.faults.calls(Op::readValues), 1U);  // the folder
+}
+
+TEST_F(LocalFileEnumeratorTest, EachPageCostsAPage) {
+  addFiles("", 1000);
+  const auto listing = enumerator();
+  std::optional<Data> page = firstPage();
+  fake.faults.reset();
+  while (page)
+    page = list(*listing, *page).next;
+  EXPECT_EQ(fake.faults.calls(Op::openDirectory), 1U);
+  EXPECT_EQ(fake.faults.calls(Op::nextEntry), 1003U);
+}
+
+TEST_F(LocalFileEnumeratorTest, EnumeratorWithoutANotifierStillLists) {
+  addFile("a");
+  EXPECT_EQ(enumerator(workingSet)->notifier(), nullptr);
+  EXPECT_NE(enumerator(allDirectories)->notifier(), nullptr);
+  fake.faults.fail(Op::historyUUID, Error::posix(EIO));
+  log.clear();
+  const auto listing = enumerator();
+  EXPECT_EQ(listing->notifier(), nullptr);
+  EXPECT_EQ(log.messages().back(), error("can't create notifier for \"" + fake.path("") +
+                                         "\"; enumeration will have no live update"));
+  listing->startNotifier();
+  EXPECT_THAT(list(*listing).names, ElementsAre("a"));
+  EXPECT_DEATH(
+      {
+        Log::shared().setSink(nullptr, LogLevel::error);
+        static_cast<void>(LocalFileEnumerator::create(services, "fid=1", {}));
+      },
+      "can't create enumerator for an empty list of URLs");
+}
+
+TEST_F(LocalFileEnumeratorTest, NotifierRunsUntilTheEnumeratorGoes) {
+  addFile("a");
+  auto listing = enumerator();
+  SerialQueue queue = listing->notifier()->reader()->streamQueue();
+  listing->startNotifier();
+  queue.sync([] {});
+  events.append(fake.path("a"));
+  events.deliver();
+  EXPECT_THAT(fake.signals.containers, SizeIs(2));
+  listing.reset();
+  EXPECT_EQ(events.runningStreams(), 0U);
+  for (const LogLine& line : log.lines())
+    EXPECT_NE(line.level, LogLevel::error) << line;
+}
+
+}  // namespace
+}  // namespace mirabel::testing
