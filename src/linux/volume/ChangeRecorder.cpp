@@ -40,18 +40,18 @@ Result<void> ChangeRecorder::append(const ObjectRow& row, const Location& locati
 }
 
 Result<void> ChangeRecorder::moved(const ObjectRow& row, const std::optional<Location>& from,
-                                   const Location& to) {
+                                   const Location& to, bool changedKind) {
   if (!isActive()) return {};
   bool sightChanges = true;
   if (from) {
-    if (auto told = changed(row, *from); !told) return told;
+    if (auto told = changed(row, *from, changedKind); !told) return told;
     auto before = store_.pathOf(*from);
     auto after = store_.pathOf(to);
     if (!before) return fail(before.error());
     if (!after) return fail(after.error());
     sightChanges = !*before || !*after || !(sightOf(**before) == sightOf(**after));
   }
-  if (auto told = changed(row, to); !told) return told;
+  if (auto told = changed(row, to, changedKind); !told) return told;
   return sightChanges && holdsThings(row) ? contents(row.fileID) : Result<void>();
 }
 

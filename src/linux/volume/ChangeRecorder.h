@@ -28,7 +28,7 @@ class ChangeRecorder {
   /// The object got another name. What lies in it is told too where that comes into sight, leaves
   /// it, or crosses into or out of the trash or another root.
   [[nodiscard]] Result<void> moved(const ObjectRow& row, const std::optional<Location>& from,
-                                   const Location& to);
+                                   const Location& to, bool changedKind = false);
   [[nodiscard]] Result<void> handedOn(std::uint32_t documentID, std::uint64_t source,
                                       std::uint64_t destination);
   /// The object is nowhere: so is its document, if it still has it, and everything in it, which is

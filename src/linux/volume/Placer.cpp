@@ -204,7 +204,7 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
   }
   auto written = put(std::move(row));
   if (!written) return written;
-  if (auto told = recorder_.moved(*written, from, arrival.location); !told) {
+  if (auto told = recorder_.moved(*written, from, arrival.location, changedKind); !told) {
     return fail(told.error());
   }
   if (changedKind) {
@@ -250,6 +250,12 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     if (inherited && !*inherited) inherited = takeHandover(arrival, 0);
     if (!inherited) return fail(inherited.error());
     document = *inherited;
+    // What made room may have been found inside the very folder that arrives, which is known then.
+    auto now = slotOf(arrival.seen);
+    if (!now) return fail(now.error());
+    if (now->row && compare(*now->row, arrival.seen) == Match::same) {
+      return adopt(arrival, std::move(*now->row), document);
+    }
   }
   ObjectRow row;
   row.kind = arrival.kind;
@@ -280,6 +286,20 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
   }
   if (auto told = recorder_.changed(row, arrival.location); !told) return fail(told.error());
   return row;
+}
+
+Result<ObjectRow> Placer::adopt(const Arrival& arrival, ObjectRow row,
+                                std::optional<std::uint32_t> document) {
+  if (document) {
+    const std::uint32_t own = std::exchange(row.documentID, *document);
+    if (auto written = store_.put(row); !written) return fail(written.error());
+    for (const auto& [id, holder] :
+         {std::pair(own, std::uint64_t{0}), std::pair(*document, row.fileID)}) {
+      if (id == 0) continue;
+      if (auto told = recorder_.handedOn(id, 0, holder); !told) return fail(told.error());
+    }
+  }
+  return placeKnown(arrival, std::move(row));
 }
 
 // What was there before -------------------------------------------------------------------------

@@ -76,6 +76,10 @@ class Placer {
   [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
   [[nodiscard]] Result<ObjectRow> placeNew(const Arrival& arrival, const Slot& slot,
                                            std::string handle);
+  /// Takes over a row that came to be while its arrival was under way, with the document that the
+  /// arrival inherited.
+  [[nodiscard]] Result<ObjectRow> adopt(const Arrival& arrival, ObjectRow row,
+                                        std::optional<std::uint32_t> document);
   [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row, bool changedKind);
   [[nodiscard]] Result<void> tellChange(const ObjectRow& row, const Location& location,
                                         bool changedKind);
