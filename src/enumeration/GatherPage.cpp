@@ -32,6 +32,7 @@ bool GatherScope::isAllDirectories() const {
 std::vector<URL> GatherScope::roots() const {
   if (!isRecursive()) return {URL::fileURL(urls.front().path())};
   std::vector<URL> roots;
+  roots.reserve(2 * urls.size());
   for (const URL& url : urls)
     roots.push_back(URL::fileURL(url.path()));
   if (!isWorkingSet()) return roots;

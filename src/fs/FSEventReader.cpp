@@ -98,6 +98,7 @@ Result<std::unique_ptr<EventStream>> FSEventReader::createStream() {
                                           creationFlags, std::move(callback));
   }
   std::vector<std::string> paths;
+  paths.reserve(urls_.size());
   for (const URL& url : urls_)
     paths.push_back(url.path());
   return events_.createForPaths(std::move(paths), lastProcessedFSEventID_, latency, creationFlags,

@@ -18,6 +18,11 @@ std::string quoted(std::string_view text) {
   return "\"" + std::string(text) + "\"";
 }
 
+/// The caller may have kept its URL for long, and with it what was cached of the file.
+URL uncached(const URL& url) {
+  return url.isFileURL() ? URL::fileURL(url.path()) : url;
+}
+
 }  // namespace
 
 LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
@@ -69,7 +74,7 @@ std::optional<std::string> LocalVessel::identifierForURL(const URL& url) const {
         MRBFileObjectIdentifier::fromAppLibraryDataContainerURL(platform_.applications, url);
     if (identifier) return identifier;
   }
-  const auto item = LocalItem::create(context_, url);
+  const auto item = LocalItem::create(context_, uncached(url));
   if (!item) return {};
   return item->itemIdentifier();
 }
@@ -95,7 +100,7 @@ Result<std::shared_ptr<LocalItem>> LocalVessel::_propertiesForItemAtURL(const UR
   if (identifier->starts_with('#') || *identifier == VesselTemporaryLocalFolderItemIdentifier) {
     return itemForIdentifier(*identifier);
   }
-  auto item = LocalItem::create(context_, url);
+  auto item = LocalItem::create(context_, uncached(url));
   if (!item) {
     logError("can't create item for URL " + quoted(url.path()));
     return fail(Error::local(LocalVesselError::invalidItemIdentifier));
@@ -109,7 +114,7 @@ Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerIte
   if (!changes_) return fail(Error::posix(ENOTSUP, "this provider follows no changes"));
   auto folders = foldersOf(identifier);
   if (!folders) return fail(folders.error());
-  const auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
+  auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
                                                       std::string(identifier), *std::move(folders));
   enumerator->startNotifier();
   return enumerator;

@@ -68,7 +68,8 @@ class ReconcilerTest : public VolumeFixture {
     for (const JournalRecord& record : *records) {
       ASSERT_EQ(record.id, ++since) << "events have consecutive IDs";
       if (record.isDocument) {
-        if (record.destination == 0) replicas.erase("did=" + std::to_string(record.documentID));
+        const auto holder = index().fileIDOfDocument(record.documentID);
+        if (!holder) replicas.erase("did=" + std::to_string(record.documentID));
         continue;
       }
       replicas.erase("fid=" + std::to_string(record.fileID));

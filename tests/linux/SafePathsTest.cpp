@@ -1,9 +1,13 @@
 #include <cstdlib>
+#include <fcntl.h>
 #include <filesystem>
+#include <linux/btrfs.h>
 #include <sched.h>
+#include <sys/ioctl.h>
 #include <sys/mount.h>
 
 #include "linux/FilesFixture.h"
+#include "linux/kernel/UniqueFd.h"
 
 namespace mirabel::testing {
 namespace {
@@ -101,6 +105,27 @@ TEST_F(SafePaths, AMountBelowARootIsListedAndNotEntered) {
   expectOutOfReach("mounted", "inside");
   EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 3U);
   EXPECT_EQ(::umount(home.at("mounted").c_str()), 0);
+}
+
+// A subvolume is no mount to the kernel. Its objects bear the numbers of the root's own.
+TEST_F(SafePaths, ASubvolumeBelowARootIsListedAndNotEntered) {
+  home.writeFile("beside", "123");
+  btrfs_ioctl_vol_args arguments{};
+  std::string_view("subvolume").copy(arguments.name, BTRFS_PATH_NAME_MAX);
+  const UniqueFd documents(::open(home.documents().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (::ioctl(documents.get(), BTRFS_IOC_SUBVOL_CREATE, &arguments) != 0) {
+    GTEST_SKIP() << "this file system has no subvolumes";
+  }
+  home.makeFolder("subvolume/folder");
+  home.writeFile("subvolume/inside", "12345");
+  home.writeFile("subvolume/folder/inside", "12345");
+  EXPECT_EQ(valuesOf("subvolume").kind, FileKind::folder);
+  EXPECT_TRUE(platform().objects.open(home.url("subvolume")).value()->attributes());
+  EXPECT_EQ(platform().objects.status(home.url("subvolume")).value().linkCount, 2);
+  EXPECT_EQ(failureOf(platform().directories.open(home.url("subvolume"))), EXDEV);
+  expectOutOfReach("subvolume", "inside");
+  expectOutOfReach("subvolume/folder", "inside");
+  EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 3U);
 }
 
 }  // namespace

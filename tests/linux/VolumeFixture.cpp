@@ -59,7 +59,13 @@ void VolumeFixture::link(std::string_view from, std::string_view to) const {
 }
 
 std::uint64_t VolumeFixture::inode(std::string_view relative) const {
-  return statusOf(path(relative)).value().inode;
+  return status(relative).inode;
+}
+
+ObjectStatus VolumeFixture::status(std::string_view relative) const {
+  ObjectStatus seen = statusOf(path(relative)).value();
+  seen.seenAt += age_;
+  return seen;
 }
 
 Result<std::unique_ptr<VolumeIndex>> VolumeFixture::tryOpen(std::chrono::milliseconds timeout) {
@@ -81,7 +87,7 @@ VolumeIndex& VolumeFixture::index() {
 Sighting VolumeFixture::see(std::string_view relative) {
   VolumeIndex& opened = index();
   const std::string full = path(relative);
-  auto seen = opened.learnPath(full, statusOf(full).value(), relative.ends_with(".package"));
+  auto seen = opened.learnPath(full, status(relative), relative.ends_with(".package"));
   EXPECT_TRUE(seen) << relative << ": " << (seen ? "" : seen.error().description());
   return seen.value_or(Sighting{});
 }
@@ -96,6 +102,7 @@ std::vector<Sighting> VolumeFixture::list(std::string_view folder) {
     const std::string name(entry->name);
     result.push_back(
         {name, statusAt(directory.descriptor(), name).value(), name.ends_with(".package")});
+    result.back().status.seenAt += age_;
   }
   auto learned = opened.learn(full, directory.descriptor(), result);
   EXPECT_TRUE(learned) << (learned ? "" : learned.error().description());

@@ -30,6 +30,7 @@ class VolumeFixture : public testing::Test {
   void remove(std::string_view relative) const;
   void link(std::string_view from, std::string_view to) const;
   std::uint64_t inode(std::string_view relative) const;
+  ObjectStatus status(std::string_view relative) const;
 
   /// Closes the index in order; the next use opens it again.
   void close() { index_.reset(); }
@@ -51,6 +52,9 @@ class VolumeFixture : public testing::Test {
   std::string documents_;
   std::string state_;
   std::vector<std::string> notices_;
+  /// What `see` and `list` add to the time of each look, in nanoseconds: as if what they see had
+  /// not changed for that long.
+  std::int64_t age_ = 0;
 
  private:
   std::unique_ptr<MonitoredRoots> roots_;

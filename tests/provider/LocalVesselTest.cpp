@@ -64,6 +64,19 @@ TEST_F(LocalVesselTest, IdentifierLeadsToItsItemAndURL) {
   }
 }
 
+TEST_F(LocalVesselTest, EachLookAtAURLIsAFreshOne) {
+  const URL url = URL::fileURL(fake.path("folder/file"));
+  const auto before = vessel._propertiesForItemAtURL(url).value();
+  fake.volume.writeFile(fake.path("folder/other"), "longer");
+  fake.volume.remove(fake.path("folder/file"));
+  EXPECT_EQ(vessel._propertiesForItemAtURL(url).error(), invalidIdentifier);
+  fake.volume.rename(fake.path("folder/other"), fake.path("folder/file"));
+  const auto after = vessel._propertiesForItemAtURL(url).value();
+  EXPECT_EQ(after->documentSize(), Number::of(std::int64_t{6}));
+  EXPECT_NE(after->itemIdentifier(), before->itemIdentifier());
+  EXPECT_EQ(vessel.persistentIdentifierForItemAtURL(url), after->itemIdentifier());
+}
+
 TEST_F(LocalVesselTest, UnknownIdentifierIsNoItemAndNoURL) {
   const std::string working(VesselWorkingSetContainerItemIdentifier);
   for (const std::string& identifier :

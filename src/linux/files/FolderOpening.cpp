@@ -13,12 +13,6 @@ Result<OpenedFolder> openFolderForReading(const MonitoredRoots& roots, const std
   if (!folder) return fail(folder.error());
   const auto status = statusAt(folder->get(), "");
   if (!status) return fail(status.error());
-  const auto place = roots.locate(path);
-  if (place && !place->relative.empty()) {
-    const auto root = statusAt(roots.descriptor(place->root), "");
-    if (!root) return fail(root.error());
-    if (root->device != status->device) return fail(Error::posix(EXDEV));
-  }
   return OpenedFolder{std::move(*folder), status->device};
 }
 

@@ -14,9 +14,7 @@ struct OpenedFolder {
   std::uint64_t device = 0;
 };
 
-/// Opens the folder at `path` to be read. Below a root it is refused with EXDEV when it lies on
-/// another file system than the root: another mount, or a subvolume, which is no mount but gives
-/// out the same inode numbers again. POSIX errors.
+/// Opens the folder at `path` to be read. POSIX errors, those of `MonitoredRoots::open` among them.
 [[nodiscard]] Result<OpenedFolder> openFolderForReading(const MonitoredRoots& roots,
                                                         const std::string& path);
 

@@ -33,7 +33,8 @@ class OpenObject final : public FileObject {
         status->kind == FileKind::folder && PackageTypes::isPackageName(url_.lastPathComponent());
     const auto sighting = index_.learnPath(url_.path(), *status, isPackage);
     if (!sighting) return fail(sighting.error());
-    return ObjectAttributes{status->kind, sighting->documentID, sighting->fileID};
+    // What has the name by now is told of, not half of each.
+    return ObjectAttributes{sighting->status.kind, sighting->documentID, sighting->fileID};
   }
 
  private:

@@ -9,6 +9,7 @@
 #include <sys/stat.h>
 
 #include "linux/kernel/LongPath.h"
+#include "linux/kernel/ObjectStatus.h"
 
 namespace mirabel {
 namespace {
@@ -26,6 +27,13 @@ Result<UniqueFd> openStep(int folder, const std::string& name, Links links) {
   return opened;
 }
 
+// A subvolume is no mount, and still not a place of the root's.
+bool isSameFileSystem(int folder, int next) {
+  const auto above = statusAt(folder, "");
+  const auto below = statusAt(next, "");
+  return above && below && above->device == below->device;
+}
+
 // Step by step on descriptors, so that a folder which is swapped meanwhile leads nowhere.
 Result<void> createBelow(UniqueFd folder, std::string_view relative, Links links) {
   while (!relative.empty()) {
@@ -38,6 +46,9 @@ Result<void> createBelow(UniqueFd folder, std::string_view relative, Links links
     }
     auto next = openStep(folder.get(), name, links);
     if (!next) return fail(next.error());
+    if (links == Links::refused && !isSameFileSystem(folder.get(), next->get())) {
+      return fail(Error::posix(EXDEV));
+    }
     folder = std::move(*next);
   }
   return {};

@@ -1,5 +1,6 @@
 #include "linux/files/ObjectLook.h"
 
+#include <cerrno>
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -16,7 +17,20 @@ Result<Sighting> identify(VolumeIndex& index, const URL& url, const EntryPlace& 
   Sighting sighting{place.name, status, isPackage};
   auto learned = index.learn(place.folderPath, place.folder.get(), {&sighting, 1});
   if (!learned) return fail(learned.error());
+  if (sighting.fileID == 0) return fail(Error::posix(ESTALE));
   return sighting;
+}
+
+Result<ResourceValues> lookOnce(const LookContext& context, const URL& url) {
+  const auto place = placeOf(context.roots, url);
+  if (!place) return fail(place.error());
+  const auto status = statusAt(place->folder.get(), place->name);
+  if (!status) return fail(status.error());
+  const std::string_view name = url.lastPathComponent();
+  const bool isPackage = status->kind == FileKind::folder && PackageTypes::isPackageName(name);
+  const auto sighting = identify(context.index, url, *place, *status, isPackage);
+  if (!sighting) return fail(sighting.error());
+  return valuesOf(context.types, name, *sighting, mayWrite(place->folder.get(), place->name));
 }
 
 }  // namespace
@@ -45,15 +59,12 @@ ResourceValues valuesOf(TypeTable& types, std::string_view name, const Sighting&
 }
 
 Result<ResourceValues> lookAtObject(const LookContext& context, const URL& url) {
-  const auto place = placeOf(context.roots, url);
-  if (!place) return fail(place.error());
-  const auto status = statusAt(place->folder.get(), place->name);
-  if (!status) return fail(status.error());
-  const std::string_view name = url.lastPathComponent();
-  const bool isPackage = status->kind == FileKind::folder && PackageTypes::isPackageName(name);
-  const auto sighting = identify(context.index, url, *place, *status, isPackage);
-  if (!sighting) return fail(sighting.error());
-  return valuesOf(context.types, name, *sighting, mayWrite(place->folder.get(), place->name));
+  // A name that changed hands while it was looked at is there all the same.
+  constexpr int mostLooks = 8;
+  for (int look = 1;; ++look) {
+    auto values = lookOnce(context, url);
+    if (values || !values.error().isPosix(ESTALE) || look == mostLooks) return values;
+  }
 }
 
 }  // namespace mirabel

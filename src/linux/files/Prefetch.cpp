@@ -1,6 +1,7 @@
 #include "linux/files/Prefetch.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <fcntl.h>
 #include <string>
 #include <string_view>
@@ -35,6 +36,7 @@ struct Folder {
 struct Look {
   const URL* url = nullptr;
   bool isThere = false;
+  std::int64_t changeTime = 0;
   bool isWritable = false;
   bool hasAttributeNames = false;
   std::vector<std::string> attributeNames;
@@ -86,6 +88,13 @@ bool openFolder(const MonitoredRoots& roots, Folder& folder) {
   return true;
 }
 
+// It moved, or something came in its way, since it was opened: its entries are looked at one by
+// one, and each tells.
+bool concernsThisFolder(const Error& error) {
+  constexpr int codes[] = {ENOENT, ENOTDIR, ELOOP, EXDEV, ESTALE, EACCES};
+  return std::ranges::any_of(codes, [&](int code) { return error.isPosix(code); });
+}
+
 // The owner's permission bit decides alone in the usual case, which saves a system call.
 bool isWritable(const Folder& folder, const Sighting& sighting, uid_t user) {
   constexpr std::uint64_t fixed = STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND;
@@ -116,6 +125,7 @@ class FolderPrefetch {
     dropMissing();
     auto learned =
         context_.index.learn(std::string(folder_.path), folder_.descriptor.get(), sightings_);
+    if (!learned && concernsThisFolder(learned.error())) return {};
     if (!learned) return learned;
     fillCaches();
     return {};
@@ -138,6 +148,7 @@ class FolderPrefetch {
     auto status = statusAt(folder, sighting.name);
     if (!status) return;
     look.isThere = true;
+    look.changeTime = status->changeTime;
     sighting.status = *status;
     sighting.isPackage =
         status->kind == FileKind::folder && PackageTypes::isPackageName(sighting.name);
@@ -166,6 +177,8 @@ class FolderPrefetch {
     for (std::size_t i = 0; i < looks_.size(); ++i) {
       ResourceCache& cache = looks_[i].url->resources();
       const Sighting& sighting = sightings_[i];
+      // Gone or changed meanwhile: the next read of it looks again.
+      if (sighting.fileID == 0 || sighting.status.changeTime != looks_[i].changeTime) continue;
       cache.fill(valuesOf(context_.types, sighting.name, sighting, looks_[i].isWritable));
       if (looks_[i].hasAttributeNames) {
         cache.setAttributeNames(std::move(looks_[i].attributeNames));

@@ -1,8 +1,10 @@
 #include "linux/kernel/LongPath.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
 #include <linux/openat2.h>
+#include <string_view>
 #include <sys/syscall.h>
 
 namespace mirabel {
@@ -28,6 +30,22 @@ SplitPath splitPath(const std::string& path) {
   if (slash == std::string::npos) return {"", path};
   if (slash == 0) return {"/", path.substr(1)};
   return {path.substr(0, slash), path.substr(slash + 1)};
+}
+
+std::string withoutDots(const std::string& path) {
+  if (path.find("/.") == std::string::npos) return path;
+  std::string result;
+  for (std::size_t start = 1; start <= path.size();) {
+    const std::size_t end = std::min(path.find('/', start), path.size());
+    const std::string_view component = std::string_view(path).substr(start, end - start);
+    if (component == "..") {
+      result.resize(result.empty() ? 0 : result.rfind('/'));
+    } else if (!component.empty() && component != ".") {
+      result.append(1, '/').append(component);
+    }
+    start = end + 1;
+  }
+  return result.empty() ? "/" : result;
 }
 
 Result<UniqueFd> openLongPath(int directory, const std::string& path, int flags,

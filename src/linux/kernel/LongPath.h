@@ -19,6 +19,10 @@ struct SplitPath {
 };
 [[nodiscard]] SplitPath splitPath(const std::string& path);
 
+/// An absolute path with "." and ".." taken out of it, as text: right where no component of it is
+/// a symbolic link.
+[[nodiscard]] std::string withoutDots(const std::string& path);
+
 /// Opens `path`, relative to `directory` unless it is absolute, in as many steps as its length
 /// asks for. `resolve` holds RESOLVE_… bits that every step obeys. O_NOFOLLOW and O_CLOEXEC are
 /// added. An empty path opens `directory` itself again. POSIX errors.

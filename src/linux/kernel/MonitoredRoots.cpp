@@ -5,6 +5,8 @@
 #include <fcntl.h>
 #include <linux/openat2.h>
 
+#include "linux/kernel/ObjectStatus.h"
+
 namespace mirabel {
 namespace {
 
@@ -23,6 +25,8 @@ bool holds(const std::string& root, std::string_view path) {
 MonitoredRoots::MonitoredRoots(std::vector<std::string> paths) : paths_(std::move(paths)) {
   for (const std::string& path : paths_) {
     auto opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
+    const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
+    devices_.push_back(status ? status->device : 0);
     descriptors_.push_back(std::make_shared<UniqueFd>(opened ? std::move(*opened) : UniqueFd()));
   }
 }
@@ -51,7 +55,13 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
   if (!place) return openLongPath(AT_FDCWD, path, allFlags);
   const int root = descriptor(place->root);
   if (root < 0) return fail(Error::posix(ENOENT));
-  return openLongPath(root, std::string(place->relative), allFlags, beneath);
+  auto opened = openLongPath(root, std::string(place->relative), allFlags, beneath);
+  if (!opened || place->relative.empty()) return opened;
+  // A subvolume is no mount to the kernel, and gives out inode numbers of the root's once more.
+  const auto status = statusAt(opened->get(), "");
+  if (!status) return fail(status.error());
+  if (status->device != devices_[place->root]) return fail(Error::posix(EXDEV));
+  return opened;
 }
 
 }  // namespace mirabel

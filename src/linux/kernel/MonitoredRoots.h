@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <string>
@@ -14,8 +15,8 @@ namespace mirabel {
 
 /// The folders that are presented, open for the life of the process. Everything below them is
 /// reached through their descriptors, without following a symbolic link and without crossing onto
-/// another mount, so that nothing put in the way can lead out of the tree. Paths may be of any
-/// length. Immutable once made; any thread may call it.
+/// another file system, so that nothing put in the way can lead out of the tree. Paths may be of
+/// any length. Immutable once made; any thread may call it.
 class MonitoredRoots {
  public:
   /// Paths are absolute and resolved. One that does not exist is kept and is simply empty.
@@ -34,12 +35,13 @@ class MonitoredRoots {
   /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
   /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its
   /// final link not followed. POSIX errors: ELOOP for a symbolic link on the way, EXDEV for
-  /// another mount, ENOENT.
+  /// another mount and for a subvolume, ENOENT.
   [[nodiscard]] Result<UniqueFd> open(const std::string& path, int flags) const;
 
  private:
   std::vector<std::string> paths_;
   std::vector<std::shared_ptr<UniqueFd>> descriptors_;
+  std::vector<std::uint64_t> devices_;  // of the file system that each root is on
 };
 
 }  // namespace mirabel

@@ -56,13 +56,23 @@ ObjectStatus statusFrom(const struct statx& from) {
   return status;
 }
 
+// Nanoseconds since 1970 on the clock that stamps files.
+std::int64_t coarseNow() {
+  timespec now{};
+  ::clock_gettime(CLOCK_REALTIME_COARSE, &now);
+  return now.tv_sec * nanosecondsPerSecond + now.tv_nsec;
+}
+
 Result<ObjectStatus> look(int directory, const char* name) {
+  const std::int64_t now = coarseNow();
   struct statx buffer;
   const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | (*name == '\0' ? AT_EMPTY_PATH : 0);
   if (::statx(directory, name, flags, STATX_BASIC_STATS | STATX_BTIME, &buffer) != 0) {
     return fail(Error::posix(errno));
   }
-  return statusFrom(buffer);
+  ObjectStatus status = statusFrom(buffer);
+  status.seenAt = now;
+  return status;
 }
 
 // Room for the kernel's largest handle, laid out as the kernel fills it.
@@ -104,12 +114,6 @@ std::optional<std::string> handleAt(int directory, const std::string& name) {
   std::memcpy(result.data(), &handle.handle_type, sizeof(handle.handle_type));
   std::memcpy(result.data() + sizeof(handle.handle_type), handle.f_handle, handle.handle_bytes);
   return result;
-}
-
-std::int64_t coarseNow() {
-  timespec now{};
-  ::clock_gettime(CLOCK_REALTIME_COARSE, &now);
-  return now.tv_sec * nanosecondsPerSecond + now.tv_nsec;
 }
 
 Date dateFromNanoseconds(std::int64_t nanosecondsSince1970) {

@@ -26,6 +26,8 @@ struct ObjectStatus {
   std::int64_t birthTime = 0;
   std::int64_t changeTime = 0;
   std::int64_t modificationTime = 0;
+  /// When it was looked at, on the clock that stamps files and not later than the look.
+  std::int64_t seenAt = 0;
 };
 
 /// Looks at `name` in the folder `directory`; an empty name looks at the descriptor itself. A
@@ -37,9 +39,6 @@ struct ObjectStatus {
 /// The kernel's handle of an object: bytes that name it among all objects, of now and of before,
 /// on its file system. Starts with the handle's type. Nothing where the file system has none.
 [[nodiscard]] std::optional<std::string> handleAt(int directory, const std::string& name);
-
-/// Nanoseconds since 1970 on the clock that stamps files.
-[[nodiscard]] std::int64_t coarseNow();
 
 Date dateFromNanoseconds(std::int64_t nanoseconds);
 

@@ -71,7 +71,11 @@ Result<void> ChangeRecorder::gone(const ObjectRow& row, const Location& from) {
   if (!path) return fail(path.error());
   // Where the folder above is nowhere either, it has told of all that was in it.
   if (!*path) return {};
-  if (auto told = append(row, from, **path, false); !told) return told;
+  // Of a document that goes on in another object, nothing but that is told.
+  const bool goesOn = isDocumentKind(row.kind) && row.documentID == 0;
+  if (!goesOn) {
+    if (auto told = append(row, from, **path, false); !told) return told;
+  }
   if (row.documentID != 0) {
     if (auto ended = handedOn(row.documentID, row.fileID, 0); !ended) return ended;
   }

@@ -4,55 +4,15 @@
 #include <cstring>
 #include <utility>
 
+#include "linux/volume/IdentityStatements.h"
+
 namespace mirabel {
 namespace {
 
 constexpr std::uint64_t schemaVersion = 1;
+
 // More folders above each other than any path has; a longer chain is a damaged index.
 constexpr int deepestFolder = 1 << 20;
-
-// Names are blobs: bytes, compared as bytes. The columns that a listing compares come first, the
-// handle, which it seldom needs, last. Rows are appended; what is looked up by is in indexes of
-// small integers, so that a folder of 100,000 touches few pages: `place` is a hash of the name.
-// `file_id` is absent where it is the inode number.
-constexpr const char* schema = R"(
-CREATE TABLE IF NOT EXISTS meta(key TEXT PRIMARY KEY, value NOT NULL) WITHOUT ROWID;
-CREATE TABLE IF NOT EXISTS objects(
-  slot INTEGER PRIMARY KEY,
-  inode INTEGER NOT NULL,
-  file_id INTEGER,
-  document_id INTEGER,
-  kind INTEGER NOT NULL,
-  folder INTEGER,
-  name BLOB,
-  birth_time INTEGER NOT NULL,
-  change_time INTEGER NOT NULL,
-  settled INTEGER NOT NULL,
-  modification_time INTEGER NOT NULL,
-  size INTEGER NOT NULL,
-  place INTEGER,
-  file_system INTEGER,
-  handle BLOB);
-CREATE UNIQUE INDEX IF NOT EXISTS objects_inode ON objects(inode) WHERE file_system IS NULL;
-CREATE UNIQUE INDEX IF NOT EXISTS objects_foreign ON objects(file_system, inode)
-  WHERE file_system IS NOT NULL;
-CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id IS NOT NULL;
-CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
-  WHERE document_id IS NOT NULL AND document_id <> slot;
-CREATE INDEX IF NOT EXISTS objects_place ON objects(folder, place) WHERE folder IS NOT NULL;
-CREATE TABLE IF NOT EXISTS links(
-  folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
-  PRIMARY KEY(folder, name)) WITHOUT ROWID;
-CREATE INDEX IF NOT EXISTS links_slot ON links(slot);
-CREATE TABLE IF NOT EXISTS handovers(
-  folder INTEGER NOT NULL, name BLOB NOT NULL, document_id INTEGER NOT NULL,
-  PRIMARY KEY(folder, name)) WITHOUT ROWID;
-CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
-)";
-
-#define OBJECT_COLUMNS                                                                        \
-  "slot, inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, " \
-  "modification_time, size, file_system, handle "
 
 // Kept in the database, so it must never change: FNV-1a, folded to 31 bits.
 std::int64_t placeHash(std::string_view name) {
@@ -63,37 +23,6 @@ std::int64_t placeHash(std::string_view name) {
 }
 
 }  // namespace
-
-// In the order of the texts in `prepare`.
-struct IdentityStore::Statements {
-  std::vector<Statement> all;
-  Statement& bySlot = all[0];
-  Statement& byInode = all[1];
-  Statement& byFileID = all[2];
-  Statement& byDocument = all[3];
-  Statement& byPlace = all[4];
-  Statement& byForeign = all[5];
-  Statement& slotOfInode = all[6];
-  Statement& following = all[7];
-  Statement& occupied = all[8];
-  Statement& insert = all[9];
-  Statement& update = all[10];
-  Statement& remove = all[11];
-  Statement& linkAt = all[12];
-  Statement& linksOf = all[13];
-  Statement& addLink = all[14];
-  Statement& removeLink = all[15];
-  Statement& anyLink = all[16];
-  Statement& handoverAt = all[17];
-  Statement& addHandover = all[18];
-  Statement& removeHandovers = all[19];
-  Statement& anyHandover = all[20];
-  Statement& children = all[21];
-  Statement& nameCount = all[22];
-  Statement& linksIn = all[23];
-  Statement& meta = all[24];
-  Statement& setMeta = all[25];
-};
 
 Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
   std::unique_ptr<IdentityStore> store(new IdentityStore(database));
@@ -108,8 +37,12 @@ Result<std::unique_ptr<IdentityStore>> IdentityStore::open(Database& database) {
   return store;
 }
 
+IdentityStore::IdentityStore(Database& database) : database_(database) {}
+
+IdentityStore::~IdentityStore() = default;
+
 Result<void> IdentityStore::make() {
-  if (auto tables = database_.execute(schema); !tables) return tables;
+  if (auto tables = database_.execute(IdentityStatements::schema); !tables) return tables;
   if (auto prepared = prepare(); !prepared) return prepared;
   auto version = number("schema");
   if (!version) return fail(version.error());
@@ -119,46 +52,9 @@ Result<void> IdentityStore::make() {
 }
 
 Result<void> IdentityStore::prepare() {
-  const char* const sql[] = {
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE slot = ?1",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE inode = ?1 AND file_system IS NULL",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1 AND document_id <> slot",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1 AND place = ?3 AND name = ?2",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_system = ?1 AND inode = ?2",
-      "SELECT slot FROM objects WHERE inode = ?1 AND file_system IS NULL",
-      "SELECT inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, "
-      "file_system FROM objects WHERE slot >= ?1",
-      "SELECT 1 FROM objects WHERE folder = ?1 AND place = ?3 AND name = ?2",
-      "INSERT INTO objects(" OBJECT_COLUMNS
-      ", place) VALUES(?1,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14,?15)",
-      "UPDATE objects SET inode=?2, file_id=?3, document_id=?4, kind=?5, folder=?6, name=?7, "
-      "birth_time=?8, change_time=?9, settled=?10, modification_time=?11, size=?12, "
-      "file_system=?13, handle=?14, place=?15 WHERE slot=?1",
-      "DELETE FROM objects WHERE slot = ?1",
-      "SELECT slot FROM links WHERE folder = ?1 AND name = ?2",
-      "SELECT folder, name FROM links WHERE slot = ?1",
-      "INSERT OR REPLACE INTO links(folder, name, slot) VALUES(?1,?2,?3)",
-      "DELETE FROM links WHERE folder = ?1 AND name = ?2",
-      "SELECT EXISTS(SELECT 1 FROM links)",
-      "SELECT document_id FROM handovers WHERE folder = ?1 AND name = ?2",
-      "INSERT OR REPLACE INTO handovers(folder, name, document_id) VALUES(?1,?2,?3)",
-      "DELETE FROM handovers WHERE document_id = ?1",
-      "SELECT EXISTS(SELECT 1 FROM handovers)",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1",
-      "SELECT (SELECT count(*) FROM objects WHERE folder = ?1) + "
-      "(SELECT count(*) FROM links WHERE folder = ?1)",
-      "SELECT name, slot FROM links WHERE folder = ?1",
-      "SELECT value FROM meta WHERE key = CAST(?1 AS TEXT)",
-      "INSERT OR REPLACE INTO meta(key, value) VALUES(CAST(?1 AS TEXT), ?2)",
-  };
-  std::vector<Statement> made;
-  for (const char* text : sql) {
-    auto statement = database_.prepare(text);
-    if (!statement) return fail(statement.error());
-    made.push_back(std::move(*statement));
-  }
-  statements_ = std::shared_ptr<Statements>(new Statements{std::move(made)});
+  auto statements = IdentityStatements::prepare(database_);
+  if (!statements) return fail(statements.error());
+  statements_ = std::move(*statements);
   const auto any = [](Statement& statement) -> Result<bool> {
     StatementScope scope(statement);
     auto row = statement.step();
@@ -382,6 +278,7 @@ Result<std::vector<std::pair<std::string, std::uint64_t>>> IdentityStore::linksI
 
 Result<std::optional<std::uint64_t>> IdentityStore::linkAt(std::uint64_t folder,
                                                            std::string_view name) {
+  if (!mayHaveLinks_) return std::nullopt;
   Statement& statement = statements_->linkAt.bind(1, folder).bindBlob(2, name);
   StatementScope scope(statement);
   auto found = statement.step();
@@ -392,7 +289,10 @@ Result<std::optional<std::uint64_t>> IdentityStore::linkAt(std::uint64_t folder,
 
 Result<std::vector<Location>> IdentityStore::links(std::uint64_t slot) {
   if (!mayHaveLinks_) return std::vector<Location>();
-  Statement& statement = statements_->linksOf.bind(1, slot);
+  return readLocations(statements_->linksOf.bind(1, slot));
+}
+
+Result<std::vector<Location>> IdentityStore::readLocations(Statement& statement) {
   StatementScope scope(statement);
   std::vector<Location> result;
   while (true) {
@@ -415,21 +315,29 @@ Result<void> IdentityStore::removeLink(std::uint64_t folder, std::string_view na
   return statements_->removeLink.bind(1, folder).bindBlob(2, name).run();
 }
 
-Result<std::optional<std::uint32_t>> IdentityStore::handoverAt(std::uint64_t folder,
-                                                               std::string_view name) {
+Result<std::optional<Handover>> IdentityStore::handoverAt(std::uint64_t folder,
+                                                          std::string_view name) {
+  if (!mayHaveHandovers_) return std::nullopt;
   Statement& statement = statements_->handoverAt.bind(1, folder).bindBlob(2, name);
   StatementScope scope(statement);
   auto found = statement.step();
   if (!found) return fail(found.error());
   if (!*found) return std::nullopt;
-  return static_cast<std::uint32_t>(statement.integer(0));
+  return Handover{static_cast<std::uint32_t>(statement.integer(0)),
+                  static_cast<ObjectKind>(statement.integer(1))};
 }
 
-Result<void> IdentityStore::addHandover(const Location& location, std::uint32_t documentID) {
+Result<std::vector<Location>> IdentityStore::handoversOf(std::uint32_t documentID) {
+  if (!mayHaveHandovers_) return std::vector<Location>();
+  return readLocations(statements_->handoversOf.bind(1, std::int64_t{documentID}));
+}
+
+Result<void> IdentityStore::addHandover(const Location& location, const Handover& handover) {
   mayHaveHandovers_ = true;
   return statements_->addHandover.bind(1, location.folder)
       .bindBlob(2, location.name)
-      .bind(3, std::int64_t{documentID})
+      .bind(3, std::int64_t{handover.documentID})
+      .bind(4, static_cast<std::int64_t>(handover.kind))
       .run();
 }
 

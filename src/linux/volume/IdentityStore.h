@@ -14,6 +14,8 @@
 
 namespace mirabel {
 
+struct IdentityStatements;
+
 /// Sorts of objects as the database numbers them.
 enum class ObjectKind : std::uint8_t {
   regular = 0,
@@ -68,6 +70,13 @@ struct KnownObject {
   std::uint32_t documentID = 0;
 };
 
+/// A document that waits under a name for the next file, or package, to come: its own was renamed
+/// to a backup of itself, or is gone.
+struct Handover {
+  std::uint32_t documentID = 0;
+  ObjectKind kind = ObjectKind::regular;
+};
+
 /// Slots of rows that are not named by their document ID.
 inline constexpr std::uint64_t upperSlots = std::uint64_t{1} << 32;
 
@@ -80,6 +89,7 @@ class IdentityStore {
  public:
   /// Makes the tables where they are missing. Fails on a database of a later schema.
   [[nodiscard]] static Result<std::unique_ptr<IdentityStore>> open(Database& database);
+  ~IdentityStore();
 
   [[nodiscard]] Result<std::optional<ObjectRow>> objectInSlot(std::uint64_t slot);
   /// The object that has, or had last, an inode number of the volume itself.
@@ -121,11 +131,11 @@ class IdentityStore {
   [[nodiscard]] Result<void> addLink(const Location& location, std::uint64_t slot);
   [[nodiscard]] Result<void> removeLink(std::uint64_t folder, std::string_view name);
 
-  /// Documents whose file was renamed to a backup of itself: the next file under the old name
-  /// takes the document over.
-  [[nodiscard]] Result<std::optional<std::uint32_t>> handoverAt(std::uint64_t folder,
-                                                                std::string_view name);
-  [[nodiscard]] Result<void> addHandover(const Location& location, std::uint32_t documentID);
+  [[nodiscard]] Result<std::optional<Handover>> handoverAt(std::uint64_t folder,
+                                                           std::string_view name);
+  [[nodiscard]] Result<std::vector<Location>> handoversOf(std::uint32_t documentID);
+  /// In place of whatever was noted at the location before.
+  [[nodiscard]] Result<void> addHandover(const Location& location, const Handover& handover);
   [[nodiscard]] Result<void> removeHandovers(std::uint32_t documentID);
 
   [[nodiscard]] Result<std::optional<std::uint64_t>> number(std::string_view key);
@@ -134,7 +144,7 @@ class IdentityStore {
   [[nodiscard]] Result<void> setHistoryUUID(const UUID& uuid);
 
  private:
-  explicit IdentityStore(Database& database) : database_(database) {}
+  explicit IdentityStore(Database& database);
   [[nodiscard]] Result<void> make();
   [[nodiscard]] Result<void> prepare();
   [[nodiscard]] Result<std::optional<ObjectRow>> readObject(Statement& statement);
@@ -142,9 +152,10 @@ class IdentityStore {
   [[nodiscard]] Result<bool> stepTo(std::uint64_t inode);
   [[nodiscard]] Result<void> write(Statement& statement, const ObjectRow& row);
 
-  struct Statements;
+  [[nodiscard]] static Result<std::vector<Location>> readLocations(Statement& statement);
+
   Database& database_;
-  std::shared_ptr<Statements> statements_;
+  std::unique_ptr<IdentityStatements> statements_;
   // Most homes have neither; then nobody needs to ask.
   bool mayHaveLinks_ = true;
   bool mayHaveHandovers_ = true;

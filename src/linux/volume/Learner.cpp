@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
+#include <set>
 #include <utility>
 #include <vector>
 
@@ -18,7 +19,7 @@ Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRec
       roots_(roots),
       device_(device),
       isPackageName_(std::move(isPackageName)),
-      finder_(roots),
+      finder_(roots, device),
       placer_(store, allocator, recorder, finder_, roots, *this, device, isPackageName_) {
   placer_.setOthers([] { return std::vector<ObjectRow>(); });
 }
@@ -66,6 +67,9 @@ Result<std::uint64_t> Learner::folderID(const std::string& path, int folder) {
     auto row = placer_.place({look->seen, path.substr(0, start - 1), {*id, name}, kind});
     if (!row) return fail(row.error());
     id = row->fileID;
+    // Another folder has come to the path since `folder` was opened by it.
+    const bool isLast = end == path.size();
+    if (isLast && look->seen.status.inode != status->inode) return fail(Error::posix(ESTALE));
   }
   return id;
 }
@@ -77,6 +81,7 @@ Result<void> Learner::learn(const std::string& folderPath, int folder,
   finder_.forget();
   auto id = folderID(folderPath, folder);
   if (!id) return fail(id.error());
+  static_cast<void>(placer_.takenDocuments());
   // First what nothing has happened to, which is nearly all, then the rest.
   std::vector<Unsettled> rest;
   for (std::size_t i = 0; i < sightings.size(); ++i) {
@@ -99,6 +104,19 @@ Result<void> Learner::learn(const std::string& folderPath, int folder,
     auto placed = placeEntry({folderPath, folder, *id}, sighting, std::move(entry));
     placer_.setOthers([] { return std::vector<ObjectRow>(); });
     if (!placed) return placed;
+  }
+  return correctDocuments(sightings);
+}
+
+// A document that was answered for a backup may have gone to a name that came later.
+Result<void> Learner::correctDocuments(std::span<Sighting> sightings) {
+  const std::set<std::uint32_t> taken = placer_.takenDocuments();
+  if (taken.empty()) return {};
+  for (Sighting& sighting : sightings) {
+    if (!taken.contains(sighting.documentID)) continue;
+    auto row = store_.objectByFileID(sighting.fileID);
+    if (!row) return fail(row.error());
+    if (*row) sighting.documentID = (*row)->documentID;
   }
   return {};
 }
@@ -127,12 +145,25 @@ void Learner::readHandles(int folder, std::span<const Sighting> sightings,
   splitWork(entries.size(), piece, [&](std::size_t begin, std::size_t end) {
     for (std::size_t i = begin; i < end; ++i) {
       if (!entries[i].isNew) continue;
-      entries[i].handle = handleAt(folder, sightings[entries[i].index].name).value_or("");
+      const Sighting& sighting = sightings[entries[i].index];
+      entries[i].handle = handleAt(folder, sighting.name).value_or("");
+      // The handle must be that of the object whose status was read a while ago.
+      const auto now = statusAt(folder, sighting.name);
+      entries[i].isNew =
+          now && now->inode == sighting.status.inode && now->birthTime == sighting.status.birthTime;
     }
   });
 }
 
 Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry) {
+  if (!entry.isNew) {
+    // Since it was seen, others may have looked later and told the index more: what is placed now
+    // must be what is there now.
+    auto status = statusAt(folder.descriptor, sighting.name);
+    if (!status) return {};
+    sighting.status = *status;
+    sighting.isPackage = status->kind == FileKind::folder && isPackageName_(sighting.name);
+  }
   auto occupied = store_.isOccupied(folder.id, sighting.name);
   if (!occupied) return fail(occupied.error());
   Arrival arrival{{folder.descriptor, sighting.name, sighting.status},
@@ -170,24 +201,45 @@ Result<std::vector<ObjectRow>> Learner::occupants(std::uint64_t folder,
 
 Result<Sighting> Learner::learnPath(const std::string& path, const ObjectStatus& status,
                                     bool isPackage) {
+  const auto place = roots_.locate(path);
+  if (!place || place->relative.empty()) return learnWhole(path, isPackage);
+  const SplitPath split = splitPath(path);
+  Sighting sighting{split.name, status, isPackage};
+  // A name that changed hands while it was looked at is looked at again.
+  constexpr int mostLooks = 8;
+  for (int look = 0; look < mostLooks; ++look) {
+    auto entry = lookAt(roots_, path);
+    if (!entry) return fail(entry.error());
+    auto learned = learn(split.parent, entry->folder.get(), {&sighting, 1});
+    if (!learned) return fail(learned.error());
+    if (sighting.fileID != 0) return sighting;
+  }
+  return fail(Error::posix(ESTALE));
+}
+
+Result<Sighting> Learner::learnWhole(const std::string& path, bool isPackage) {
   auto look = lookAt(roots_, path);
   if (!look) return fail(look.error());
-  const auto place = roots_.locate(path);
-  if (place && !place->relative.empty()) {
-    const SplitPath split = splitPath(path);
-    Sighting sighting{split.name, status, isPackage};
-    auto learned = learn(split.parent, look->folder.get(), {&sighting, 1});
-    if (!learned) return fail(learned.error());
-    if (sighting.fileID == 0) return fail(Error::posix(ENOENT));
-    return sighting;
-  }
   finder_.forget();
-  // A root, or something outside of all: known by its whole path.
-  const ObjectKind kind = objectKind(status.kind, isPackage);
-  auto row = placer_.place({look->seen, splitPath(path).parent, {0, path}, kind});
+  const ObjectStatus& status = look->seen.status;
+  auto row = objectInPlace(look->seen);
+  if (row && !*row) {
+    row = placer_.place(
+        {look->seen, splitPath(path).parent, {0, path}, objectKind(status.kind, isPackage)});
+  }
   if (!row) return fail(row.error());
-  return Sighting{path, status, isPackage, row->fileID,
-                  isDocumentKind(row->kind) ? row->documentID : 0};
+  return Sighting{path, status, isPackage, (*row)->fileID,
+                  isDocumentKind((*row)->kind) ? (*row)->documentID : 0};
+}
+
+Result<std::optional<ObjectRow>> Learner::objectInPlace(const SeenObject& seen) {
+  auto slot = placer_.slotOf(seen);
+  if (!slot) return fail(slot.error());
+  const std::optional<ObjectRow>& row = slot->row;
+  if (!row || !row->location || compare(*row, seen) != Match::same) return std::nullopt;
+  auto standing = placer_.standingPath(*row, *row->location);
+  if (!standing) return fail(standing.error());
+  return *standing ? row : std::nullopt;
 }
 
 Result<void> Learner::leave(ObjectRow row) {
@@ -204,26 +256,38 @@ Result<void> Learner::leave(ObjectRow row) {
 
 Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
   if (!row.location) return std::nullopt;
-  auto path = store_.pathOf(*row.location);
-  if (!path) return fail(path.error());
-  if (!*path) return std::nullopt;
-  const auto look = lookAt(roots_, **path);
-  if (!look || look->seen.status.inode != row.inode || compare(row, look->seen) != Match::same) {
-    return std::nullopt;
-  }
-  return path;
+  return placer_.standingPath(row, *row.location);
 }
 
-Result<void> Learner::learnSuccessor(const ObjectRow& row) {
-  if (!row.location) return {};
-  auto path = store_.pathOf(*row.location);
+Result<void> Learner::settleFoldersAbove(const Location& location) {
+  for (std::size_t root = 0; root < roots_.paths().size(); ++root) {
+    if (roots_.descriptor(root) < 0) continue;
+    if (auto id = rootID(root); !id) return fail(id.error());
+  }
+  auto folders = placer_.foldersAbove(location);
+  if (!folders) return fail(folders.error());
+  for (const std::uint64_t id : *folders) {
+    auto folder = store_.objectByFileID(id);
+    if (!folder) return fail(folder.error());
+    if (!*folder) return {};
+    auto path = verify(**folder);
+    if (path && !*path) path = search(std::move(**folder));
+    if (!path) return fail(path.error());
+    if (!*path) return {};
+  }
+  return {};
+}
+
+Result<void> Learner::learnAt(const Location& location) {
+  if (auto settled = settleFoldersAbove(location); !settled) return settled;
+  auto path = store_.pathOf(location);
   if (!path) return fail(path.error());
   if (!*path) return {};
   const auto look = lookAt(roots_, **path);
   if (!look) return {};
   const std::string name = splitPath(**path).name;
   auto learned = learnPath(**path, look->seen.status, isPackageName_(name));
-  if (!learned && !learned.error().isPosix(ENOENT)) return fail(learned.error());
+  if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
   return {};
 }
 
@@ -254,7 +318,11 @@ Result<std::optional<std::string>> Learner::find(std::uint64_t fileID) {
   auto path = verify(**row);
   if (!path || *path) return path;
 
-  if (auto learned = learnSuccessor(**row); !learned) return fail(learned.error());
+  // What is at its place instead of it, in folders that may have moved themselves, may be its
+  // successor.
+  if ((*row)->location) {
+    if (auto learned = learnAt(*(*row)->location); !learned) return fail(learned.error());
+  }
   row = store_.objectByFileID(fileID);
   if (!row) return fail(row.error());
   if (!*row) return std::nullopt;
@@ -265,6 +333,23 @@ Result<std::optional<std::string>> Learner::find(std::uint64_t fileID) {
   if (!promoted) return fail(promoted.error());
   if (*promoted) return verify(**row);
   return search(std::move(**row));
+}
+
+Result<std::optional<std::uint64_t>> Learner::holderOf(std::uint32_t documentID) {
+  auto waiting = store_.handoversOf(documentID);
+  if (!waiting) return fail(waiting.error());
+  for (const Location& location : *waiting) {
+    if (auto learned = learnAt(location); !learned) return fail(learned.error());
+  }
+  auto holder = store_.objectByDocumentID(documentID);
+  if (!holder) return fail(holder.error());
+  if (!*holder) return std::nullopt;
+  // Looking for the holder may find that another object has saved over it since.
+  if (auto found = find((*holder)->fileID); !found) return fail(found.error());
+  holder = store_.objectByDocumentID(documentID);
+  if (!holder) return fail(holder.error());
+  const bool isHeld = *holder && (*holder)->location && isDocumentKind((*holder)->kind);
+  return isHeld ? std::optional((*holder)->fileID) : std::nullopt;
 }
 
 }  // namespace mirabel

@@ -30,7 +30,7 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] Result<std::uint64_t> folderID(const std::string& path, int folder) override;
 
   /// Fills in the identities of names seen in that folder. A name that went away meanwhile is
-  /// left with the file ID 0.
+  /// left with the file ID 0; of one that another object has taken, status and kind are renewed.
   [[nodiscard]] Result<void> learn(const std::string& folderPath, int folder,
                                    std::span<Sighting> sightings);
   [[nodiscard]] Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
@@ -39,10 +39,11 @@ class Learner final : private FolderIdentities {
   /// Where the object lies now, the disk being right; nothing when it is not to be found. What
   /// was found out is in the index then, a save of the document by another object included.
   [[nodiscard]] Result<std::optional<std::string>> find(std::uint64_t fileID);
-
   /// Takes in that the object is not at its place, nor anywhere that was looked at: it goes on
   /// under another of its names, or is detached.
   [[nodiscard]] Result<void> leave(ObjectRow row);
+  /// File ID of the object that holds the document now.
+  [[nodiscard]] Result<std::optional<std::uint64_t>> holderOf(std::uint32_t documentID);
 
  private:
   /// An entry of a batch that is not just as the index has it.
@@ -64,10 +65,19 @@ class Learner final : private FolderIdentities {
                           std::vector<Unsettled>& entries);
   [[nodiscard]] Result<void> placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry);
 
+  [[nodiscard]] Result<void> correctDocuments(std::span<Sighting> sightings);
+
   /// Whether the object is at the path that the index gives; the path if so.
   [[nodiscard]] Result<std::optional<std::string>> verify(const ObjectRow& row);
-  /// Learns what is at the object's place instead of it.
-  [[nodiscard]] Result<void> learnSuccessor(const ObjectRow& row);
+  /// Finds the folders above again that have moved.
+  [[nodiscard]] Result<void> settleFoldersAbove(const Location& location);
+  /// Learns what is at that place now.
+  [[nodiscard]] Result<void> learnAt(const Location& location);
+  /// Learns a root, or something outside of all: known by its whole path, unless that is another
+  /// way to something which lies below a root.
+  [[nodiscard]] Result<Sighting> learnWhole(const std::string& path, bool isPackage);
+  /// The row of what is seen, if that stands where the index has it.
+  [[nodiscard]] Result<std::optional<ObjectRow>> objectInPlace(const SeenObject& seen);
   [[nodiscard]] Result<std::optional<std::string>> search(ObjectRow row);
   [[nodiscard]] Result<std::uint64_t> rootID(std::size_t root);
   [[nodiscard]] Result<std::vector<ObjectRow>> occupants(std::uint64_t folder,

@@ -3,9 +3,15 @@
 #include <set>
 #include <utility>
 
-#include "linux/volume/TreeSearch.h"
-
 namespace mirabel {
+
+// Two roots may be copies of each other on two file systems, with equal numbers and times.
+bool ObjectFinder::isObject(const ObjectRow& row, const Candidate& candidate,
+                            const PreciseLook& look) const {
+  return look.status.inode == row.inode &&
+         fileSystemOf({candidate.folder, candidate.name, look.status}, device_) == row.fileSystem &&
+         compare(row, look) == Match::same;
+}
 
 std::optional<ObjectFinder::Found> ObjectFinder::find(const ObjectRow& row,
                                                       const std::string& folderPath,
@@ -17,9 +23,7 @@ std::optional<ObjectFinder::Found> ObjectFinder::find(const ObjectRow& row,
   const auto visitor = [&](const Candidate& candidate) {
     const ObjectRow& sought = lost.at(candidate.inode);
     const auto look = lookPrecisely(candidate.folder, candidate.name);
-    if (!look || look->status.inode != sought.inode || compare(sought, *look) != Match::same) {
-      return false;
-    }
+    if (!look || !isObject(sought, candidate, *look)) return false;
     answers_[sought.slot] = Found{candidate.folderPath, candidate.name, look->status};
     return true;
   };

@@ -9,6 +9,7 @@
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/ObjectMatcher.h"
+#include "linux/volume/TreeSearch.h"
 
 namespace mirabel {
 
@@ -16,7 +17,9 @@ namespace mirabel {
 /// the roots answers for many: what it learned is kept until `forget`.
 class ObjectFinder {
  public:
-  explicit ObjectFinder(const MonitoredRoots& roots) : roots_(roots) {}
+  /// `roots` outlives it. `device` is the number of the volume's own file system.
+  ObjectFinder(const MonitoredRoots& roots, std::uint64_t device)
+      : roots_(roots), device_(device) {}
 
   struct Found {
     std::string folderPath;
@@ -32,7 +35,11 @@ class ObjectFinder {
   void forget() { answers_.clear(); }
 
  private:
+  [[nodiscard]] bool isObject(const ObjectRow& row, const Candidate& candidate,
+                              const PreciseLook& look) const;
+
   const MonitoredRoots& roots_;
+  std::uint64_t device_;
   std::map<std::uint64_t, std::optional<Found>> answers_;  // by slot
 };
 

@@ -3,7 +3,9 @@
 #include <algorithm>
 #include <array>
 #include <cctype>
+#include <cstring>
 #include <fcntl.h>
+#include <sys/vfs.h>
 
 #include "linux/kernel/LongPath.h"
 
@@ -13,8 +15,8 @@ namespace {
 // Clocks that stamp files step by up to 10 ms; ten steps leave no doubt.
 constexpr std::int64_t settlingTime = 100'000'000;
 
-bool isSettledAt(std::int64_t changeTime, std::int64_t now) {
-  return changeTime < now - settlingTime;
+bool isSettledAt(std::int64_t changeTime, std::int64_t seenAt) {
+  return changeTime < seenAt - settlingTime;
 }
 
 bool isOfKind(ObjectKind kind, FileKind seen) {
@@ -71,17 +73,30 @@ std::optional<PreciseLook> lookPrecisely(int directory, const std::string& name)
   return PreciseLook{*status, handleAt(object.get(), "").value_or("")};
 }
 
+std::uint64_t fileSystemOf(const SeenObject& seen, std::uint64_t volume) {
+  if (seen.status.device == volume) return 0;
+  const UniqueFd object(::openat(seen.directory, seen.name.empty() ? "." : seen.name.c_str(),
+                                 O_PATH | O_NOFOLLOW | O_CLOEXEC));
+  struct statfs info;
+  std::uint64_t id = 0;
+  if (object && ::fstatfs(object.get(), &info) == 0) {
+    static_assert(sizeof(info.f_fsid) == sizeof(id));
+    std::memcpy(&id, &info.f_fsid, sizeof(id));
+  }
+  return id != 0 ? id : seen.status.device;
+}
+
 void refresh(ObjectRow& row, const ObjectStatus& status) {
   row.birthTime = status.birthTime;
   row.changeTime = status.changeTime;
-  row.isSettled = isSettledAt(status.changeTime, coarseNow());
+  row.isSettled = isSettledAt(status.changeTime, status.seenAt);
   row.modificationTime = status.modificationTime;
   row.size = status.size;
 }
 
 bool isStale(const ObjectRow& row, const ObjectStatus& status) {
   return row.changeTime != status.changeTime ||
-         (!row.isSettled && isSettledAt(status.changeTime, coarseNow()));
+         (!row.isSettled && isSettledAt(status.changeTime, status.seenAt));
 }
 
 ObjectKind objectKind(FileKind kind, bool isPackage) {

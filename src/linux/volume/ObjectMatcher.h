@@ -23,6 +23,10 @@ enum class Match { same, different };
 /// otherwise the kernel's handle decides, and where there are none, birth and change time.
 [[nodiscard]] Match compare(const ObjectRow& row, const SeenObject& seen);
 
+/// The file system of what is seen as rows note it: 0 for the volume itself, whose device number
+/// is `volume`; else the kernel's own ID of what is mounted there, which outlasts device numbers.
+[[nodiscard]] std::uint64_t fileSystemOf(const SeenObject& seen, std::uint64_t volume);
+
 /// Looks again through a descriptor of the object itself, so that status and handle are surely
 /// those of one object. Nothing when it has gone.
 struct PreciseLook {

@@ -1,9 +1,8 @@
 #include "linux/volume/Placer.h"
 
+#include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <fcntl.h>
-#include <sys/vfs.h>
 #include <utility>
 
 #include "linux/kernel/LongPath.h"
@@ -12,21 +11,14 @@
 namespace mirabel {
 namespace {
 
+// More folders above each other than any path has; a longer chain is a damaged index.
+constexpr int deepestFolder = 1 << 20;
 // Moves that uncover moves. Each detaches a row first, so this is only reached when names change
 // faster than they are read.
 constexpr int deepestChain = 64;
 
-// The kernel's own ID of the file system mounted at an entry, which outlasts device numbers.
-std::uint64_t fileSystemID(const SeenObject& seen) {
-  UniqueFd object(::openat(seen.directory, seen.name.empty() ? "." : seen.name.c_str(),
-                           O_PATH | O_NOFOLLOW | O_CLOEXEC));
-  struct statfs info;
-  std::uint64_t id = 0;
-  if (object && ::fstatfs(object.get(), &info) == 0) {
-    static_assert(sizeof(info.f_fsid) == sizeof(id));
-    std::memcpy(&id, &info.f_fsid, sizeof(id));
-  }
-  return id != 0 ? id : seen.status.device;
+bool isBackupOf(const Location& place, const Location& original) {
+  return place.folder == original.folder && isBackupName(place.name, original.name);
 }
 
 class Deeper {
@@ -55,18 +47,11 @@ Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecor
       isPackageName_(std::move(isPackageName)) {}
 
 Result<Slot> Placer::slotOf(const SeenObject& seen) {
-  Slot slot;
-  if (seen.status.device == device_) {
-    auto row = store_.objectByInode(seen.status.inode);
-    if (!row) return fail(row.error());
-    slot.row = std::move(*row);
-    return slot;
-  }
-  slot.fileSystem = fileSystemID(seen);
-  auto row = store_.foreignObject(slot.fileSystem, seen.status.inode);
+  const std::uint64_t fileSystem = fileSystemOf(seen, device_);
+  auto row = fileSystem == 0 ? store_.objectByInode(seen.status.inode)
+                             : store_.foreignObject(fileSystem, seen.status.inode);
   if (!row) return fail(row.error());
-  slot.row = std::move(*row);
-  return slot;
+  return Slot{fileSystem, std::move(*row)};
 }
 
 Result<ObjectRow> Placer::place(Arrival arrival) {
@@ -98,41 +83,38 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
 
 Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
   const bool changedKind = row.kind != arrival.kind;
+  bool isKnownName = row.location == arrival.location;
   const bool changed = changedKind || row.changeTime != arrival.seen.status.changeTime;
   const bool stale = changed || isStale(row, arrival.seen.status);
   row.kind = arrival.kind;
   refresh(row, arrival.seen.status);
   const std::uint32_t before = row.documentID;
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
-  if (row.location == arrival.location) {
-    if (!stale && row.documentID == before) return row;
-    auto written = put(std::move(row));
-    if (!written || !changed) return written;
-    auto told = tellChange(*written, arrival.location, changedKind);
-    if (!told) return fail(told.error());
-    return written;
+  if (!isKnownName) {
+    auto link = store_.linkAt(arrival.location.folder, arrival.location.name);
+    if (!link) return fail(link.error());
+    isKnownName = *link == row.slot;
+    auto further = isFurtherLink(arrival, row);
+    if (!further) return fail(further.error());
+    if (!*further) return moveTo(arrival, std::move(row), changedKind);
   }
-  auto further = isFurtherLink(arrival, row);
-  if (!further) return fail(further.error());
-  if (!*further) return moveTo(arrival, std::move(row), changedKind);
+  if (isKnownName && !stale && row.documentID == before) return row;
   auto written = put(std::move(row));
-  if (!written) return written;
-  auto told = tellChange(*written, arrival.location, changedKind);
-  if (!told) return fail(told.error());
+  if (!written || (isKnownName && !changed)) return written;
+  if (auto told = tellChange(*written, arrival.location, changedKind); !told) {
+    return fail(told.error());
+  }
   return written;
 }
 
 // An object that changed is told under each of its names.
 Result<void> Placer::tellChange(const ObjectRow& row, const Location& location, bool changedKind) {
   if (!recorder_.isActive()) return {};
-  if (auto told = recorder_.changed(row, location, changedKind); !told) return told;
-  if (row.location && !(*row.location == location)) {
-    if (auto told = recorder_.changed(row, *row.location, changedKind); !told) return told;
-  }
   auto names = store_.links(row.slot);
   if (!names) return fail(names.error());
+  if (row.location) names->push_back(*row.location);
+  if (std::ranges::find(*names, location) == names->end()) names->push_back(location);
   for (const Location& name : *names) {
-    if (name == location) continue;
     if (auto told = recorder_.changed(row, name, changedKind); !told) return told;
   }
   return changedKind ? recorder_.contents(row.fileID) : Result<void>();
@@ -150,21 +132,27 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
   if (!still || !*still) return still;
   // Linking over a document ends it: the object that arrives is shown under its other names too,
   // and keeps the identity that it has there.
-  auto vacated = vacate(arrival, row.slot);
-  if (!vacated) return fail(vacated.error());
-  if (*vacated) {
-    if (auto told = recorder_.handedOn(**vacated, 0, 0); !told) return fail(told.error());
-  }
+  if (auto vacated = vacate(arrival, row.slot); !vacated) return fail(vacated.error());
   if (auto added = store_.addLink(arrival.location, row.slot); !added) return fail(added.error());
   return true;
 }
 
-Result<bool> Placer::isStillAt(const ObjectRow& row, const Location& location) {
+Result<std::optional<std::string>> Placer::standingPath(const ObjectRow& row,
+                                                        const Location& location) {
   auto path = store_.pathOf(location);
-  if (!path) return fail(path.error());
-  if (!*path) return false;
+  if (!path || !*path) return path;
   const auto look = lookAt(roots_, **path);
-  return look && look->seen.status.inode == row.inode && compare(row, look->seen) == Match::same;
+  const bool stands = look && look->seen.status.inode == row.inode &&
+                      fileSystemOf(look->seen, device_) == row.fileSystem &&
+                      compare(row, look->seen) == Match::same;
+  if (!stands) return std::nullopt;
+  return path;
+}
+
+Result<bool> Placer::isStillAt(const ObjectRow& row, const Location& location) {
+  auto path = standingPath(row, location);
+  if (!path) return fail(path.error());
+  return path->has_value();
 }
 
 Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool changedKind) {
@@ -174,43 +162,35 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
   if (arrival.seen.status.linkCount < 2) {
     if (auto dropped = dropLinks(row.slot); !dropped) return fail(dropped.error());
   }
-  auto inherited = vacate(arrival, row.slot);
-  if (inherited && !*inherited) inherited = takeHandover(arrival, row.documentID);
+  auto inherited = inherit(arrival, row.slot, row.documentID);
   if (!inherited) return fail(inherited.error());
   // Making room may have touched this row too.
   auto current = store_.objectInSlot(row.slot);
   if (!current) return fail(current.error());
   if (*current) row.documentID = (*current)->documentID;
-  if (*inherited) {
-    // Its own document ends here: the name's goes on.
-    const std::uint32_t own = std::exchange(row.documentID, **inherited);
-    if (auto ended = store_.removeHandovers(own); !ended) return fail(ended.error());
-    if (own != 0) {
-      if (auto told = recorder_.handedOn(own, row.fileID, 0); !told) return fail(told.error());
-    }
-    if (auto told = recorder_.handedOn(row.documentID, 0, row.fileID); !told) {
-      return fail(told.error());
-    }
-  }
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
+  const std::uint32_t own = row.documentID;
+  row.documentID = inherited->value_or(own);
   row.location = arrival.location;
-  if (row.documentID != 0) {
-    if (auto ended = store_.removeHandovers(row.documentID); !ended) return fail(ended.error());
-    if (from && from->folder == arrival.location.folder &&
-        isBackupName(arrival.location.name, from->name)) {
-      auto noted = store_.addHandover(*from, row.documentID);
-      if (!noted) return fail(noted.error());
-    }
+  for (const std::uint32_t document : {own, row.documentID}) {
+    if (auto ended = store_.removeHandovers(document); !ended) return fail(ended.error());
+  }
+  // Also when this took the place, and the document, of an older backup.
+  if (from && isBackupOf(arrival.location, *from) && isDocumentKind(row.kind)) {
+    auto noted = store_.addHandover(*from, {own, row.kind});
+    if (!noted) return fail(noted.error());
   }
   auto written = put(std::move(row));
   if (!written) return written;
-  if (auto told = recorder_.moved(*written, from, arrival.location, changedKind); !told) {
-    return fail(told.error());
-  }
-  if (changedKind) {
-    auto told = tellChange(*written, arrival.location, true);
+  if (*inherited) {
+    // Its own document ends here, at least for now: the name's goes on.
+    auto told = recorder_.handedOn(own, written->fileID, 0);
+    if (told) told = recorder_.handedOn(**inherited, 0, written->fileID);
     if (!told) return fail(told.error());
   }
+  auto told = recorder_.moved(*written, from, arrival.location, changedKind);
+  if (told && changedKind) told = tellChange(*written, arrival.location, true);
+  if (!told) return fail(told.error());
   return written;
 }
 
@@ -218,6 +198,8 @@ Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& f
   auto folder = roots_.open(found.folderPath, O_PATH | O_DIRECTORY);
   if (!folder) return row;
   auto id = folders_.folderID(found.folderPath, folder->get());
+  // The way there is changing right now: whoever looks next finds out.
+  if (!id && id.error().domain == ErrorDomain::posix) return row;
   if (!id) return fail(id.error());
   // Learning the way there may have moved the row itself.
   auto current = store_.objectInSlot(row.slot);
@@ -233,29 +215,20 @@ Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& f
 // New objects -----------------------------------------------------------------------------------
 
 Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std::string handle) {
-  std::optional<std::uint32_t> document;
-  if (slot.row) {
-    // The number's former holder is gone. Where it had this very name, this is its save.
-    ObjectRow former = *slot.row;
-    const bool isSave = former.location == arrival.location && former.kind == arrival.kind;
-    if (isSave && former.documentID != 0) document = std::exchange(former.documentID, 0);
-    if (former.location) {
-      if (auto told = recorder_.gone(former, *former.location); !told) return fail(told.error());
+  auto document = slot.row ? retire(*slot.row, arrival) : std::nullopt;
+  if (document && !*document && arrival.isOccupied) {
+    document = inherit(arrival, 0, 0);
+    // What made room may have gone into this very folder, and have put it into the index.
+    auto again = slotOf(arrival.seen);
+    if (!again) return fail(again.error());
+    if (again->row && compare(*again->row, arrival.seen) == Match::same) {
+      return document ? adopt(arrival, std::move(*again->row), *document)
+                      : Result<ObjectRow>(fail(document.error()));
     }
-    if (auto dropped = dropLinks(slot.row->slot); !dropped) return fail(dropped.error());
-    if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
   }
-  if (!document) {
-    auto inherited = vacate(arrival, 0);
-    if (inherited && !*inherited) inherited = takeHandover(arrival, 0);
-    if (!inherited) return fail(inherited.error());
-    document = *inherited;
-    // What made room may have been found inside the very folder that arrives, which is known then.
-    auto now = slotOf(arrival.seen);
-    if (!now) return fail(now.error());
-    if (now->row && compare(*now->row, arrival.seen) == Match::same) {
-      return adopt(arrival, std::move(*now->row), document);
-    }
+  if (!document) return fail(document.error());
+  if (slot.row) {
+    if (auto removed = store_.remove(slot.row->slot); !removed) return fail(removed.error());
   }
   ObjectRow row;
   row.kind = arrival.kind;
@@ -272,117 +245,171 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     if (!next) return fail(next.error());
     row.fileID = *next;
   }
-  row.documentID = document.value_or(0);
-  if (document) {
-    if (auto ended = store_.removeHandovers(*document); !ended) return fail(ended.error());
+  row.documentID = document->value_or(0);
+  if (*document) {
+    if (auto ended = store_.removeHandovers(**document); !ended) return fail(ended.error());
   }
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
-  const bool isOwnDocument = !document && row.documentID != 0;
+  const bool isOwnDocument = !*document && row.documentID != 0;
   row.slot = isOwnDocument ? row.documentID : allocator_.nextUpperSlot();
   if (auto inserted = store_.insert(row); !inserted) return fail(inserted.error());
-  if (document) {
-    auto told = recorder_.handedOn(*document, 0, row.fileID);
-    if (!told) return fail(told.error());
-  }
-  if (auto told = recorder_.changed(row, arrival.location); !told) return fail(told.error());
+  Result<void> told;
+  if (*document) told = recorder_.handedOn(**document, 0, row.fileID);
+  if (told) told = recorder_.changed(row, arrival.location);
+  if (!told) return fail(told.error());
   return row;
 }
 
 Result<ObjectRow> Placer::adopt(const Arrival& arrival, ObjectRow row,
                                 std::optional<std::uint32_t> document) {
-  if (document) {
-    const std::uint32_t own = std::exchange(row.documentID, *document);
-    if (auto written = store_.put(row); !written) return fail(written.error());
-    for (const auto& [id, holder] :
-         {std::pair(own, std::uint64_t{0}), std::pair(*document, row.fileID)}) {
-      if (id == 0) continue;
-      if (auto told = recorder_.handedOn(id, 0, holder); !told) return fail(told.error());
-    }
-  }
+  if (!document || !isDocumentKind(row.kind)) return placeKnown(arrival, std::move(row));
+  if (auto own = take(row); !own) return fail(own.error());
+  row.documentID = *document;
+  if (auto written = store_.put(row); !written) return fail(written.error());
+  if (auto told = recorder_.handedOn(*document, 0, row.fileID); !told) return fail(told.error());
   return placeKnown(arrival, std::move(row));
 }
 
 // What was there before -------------------------------------------------------------------------
 
+// The number's former holder is gone for sure, and its document waits under every name that it had.
+Placer::Inheritance Placer::retire(ObjectRow former, const Arrival& arrival) {
+  auto names = store_.links(former.slot);
+  if (!names) return fail(names.error());
+  if (auto dropped = dropLinks(former.slot); !dropped) return fail(dropped.error());
+  if (former.location) names->push_back(std::move(*former.location));
+  former.location.reset();
+  for (const Location& name : *names) {
+    if (auto told = recorder_.gone(former, name); !told) return fail(told.error());
+  }
+  auto taken = take(former);
+  if (!taken) return fail(taken.error());
+  const std::uint32_t document = *taken;
+  if (auto written = store_.put(former); !written) return fail(written.error());
+  if (document == 0 || !isDocumentKind(former.kind)) return std::nullopt;
+  const bool hadThisName = std::ranges::find(*names, arrival.location) != names->end();
+  if (hadThisName && former.kind == arrival.kind) return document;
+  for (const Location& name : *names) {
+    auto noted = store_.addHandover(name, {document, former.kind});
+    if (!noted) return fail(noted.error());
+  }
+  return std::nullopt;
+}
+
+Placer::Inheritance Placer::inherit(const Arrival& arrival, std::uint64_t arrivingSlot,
+                                    std::uint32_t ownDocument) {
+  auto inherited = vacate(arrival, arrivingSlot);
+  if (!inherited || *inherited) return inherited;
+  return takeHandover(arrival, ownDocument);
+}
+
 Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivingSlot) {
-  if (!arrival.isOccupied) return std::nullopt;
-  auto link = store_.linkAt(arrival.location.folder, arrival.location.name);
+  const auto& [folder, name] = arrival.location;
+  auto link = store_.linkAt(folder, name);
   if (!link) return fail(link.error());
   if (*link) {
-    auto removed = store_.removeLink(arrival.location.folder, arrival.location.name);
-    if (!removed) return fail(removed.error());
-    return std::nullopt;
+    if (auto removed = store_.removeLink(folder, name); !removed) return fail(removed.error());
   }
-  auto occupant = store_.objectAt(arrival.location.folder, arrival.location.name);
+  auto occupant = *link ? store_.objectInSlot(**link) : store_.objectAt(folder, name);
   if (!occupant) return fail(occupant.error());
-  if (!*occupant || (arrivingSlot != 0 && (*occupant)->slot == arrivingSlot)) return std::nullopt;
-  auto elsewhere = promoteLink(**occupant);
+  if (!*occupant || (*occupant)->slot == arrivingSlot) return std::nullopt;
+  auto elsewhere = hasOtherName(**occupant, arrival.location);
   if (!elsewhere) return fail(elsewhere.error());
-  if (*elsewhere) return std::nullopt;
+  const bool isDocument = (*occupant)->documentID != 0 && isDocumentKind((*occupant)->kind);
+  if (*elsewhere) {
+    const bool isBackup = isDocument && (*occupant)->kind == arrival.kind &&
+                          isBackupOf(*(*occupant)->location, arrival.location);
+    return isBackup ? handOver(std::move(**occupant)) : std::nullopt;
+  }
   // Where a folder or a link went is found out when somebody asks, unless there is a history to
   // tell of it; whose a document is, now.
-  const bool isDocument = (*occupant)->documentID != 0 && isDocumentKind((*occupant)->kind);
   if (isDocument || recorder_.isActive()) return settleOccupant(arrival, std::move(**occupant));
   (*occupant)->location.reset();
   if (auto detached = store_.put(**occupant); !detached) return fail(detached.error());
   return std::nullopt;
 }
 
+Result<bool> Placer::hasOtherName(ObjectRow& row, const Location& lost) {
+  if (row.location && *row.location != lost) {
+    auto still = isStillAt(row, *row.location);
+    if (!still || *still) return still;
+  }
+  return promoteLink(row);
+}
+
+Placer::Inheritance Placer::handOver(ObjectRow backup) {
+  auto own = allocator_.nextDocumentID();
+  if (!own) return fail(own.error());
+  auto document = take(backup);
+  if (!document) return fail(document.error());
+  backup.documentID = *own;
+  if (auto written = store_.put(backup); !written) return fail(written.error());
+  if (auto told = tellChange(backup, *backup.location, false); !told) return fail(told.error());
+  return *document;
+}
+
 Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occupant) {
   const Deeper deeper(depth_);
   const ObjectRow before = occupant;
+  // One of which only a further link was known had this name, too.
+  const Location from = occupant.location.value_or(arrival.location);
   occupant.location.reset();
   if (auto detached = store_.put(occupant); !detached) return fail(detached.error());
   if (depth_ > deepestChain) return std::nullopt;
+  const auto found = finder_.find(occupant, arrival.folderPath, others_);
+  const bool isInSameFolder = found && found->folderPath == arrival.folderPath;
+  // Whoever arrives was seen there a moment ago: names are changing hands faster than they are
+  // read, and the next look will tell.
+  if (isInSameFolder && found->name == arrival.location.name) return fail(Error::posix(ESTALE));
+  const bool isBackup = isInSameFolder && isBackupName(found->name, arrival.location.name);
   const bool canInherit =
       occupant.kind == arrival.kind && isDocumentKind(occupant.kind) && occupant.documentID != 0;
-  const auto found = finder_.find(occupant, arrival.folderPath, others_);
-  const bool isBackup = found && found->folderPath == arrival.folderPath &&
-                        isBackupName(found->name, arrival.location.name);
   std::optional<std::uint32_t> inherited;
   if (canInherit && (!found || isBackup)) {
-    inherited = std::exchange(occupant.documentID, 0);
+    auto taken = take(occupant);
+    if (!taken) return fail(taken.error());
+    inherited = *taken;
     if (auto written = store_.put(occupant); !written) return fail(written.error());
   }
-  if (found) {
-    auto told = recorder_.changed(before, *before.location);
-    if (!told) return fail(told.error());
-    auto moved = placeFound(std::move(occupant), *found);
-    if (!moved) return fail(moved.error());
+  if (!found) {
+    // The document may go on; the object, and what lay in it, does not.
+    if (auto told = recorder_.gone(occupant, from); !told) return fail(told.error());
     return inherited;
   }
-  // The document may go on; the object, and what lay in it, does not.
-  if (auto told = recorder_.gone(occupant, *before.location); !told) return fail(told.error());
+  if (auto told = recorder_.changed(before, from); !told) return fail(told.error());
+  auto moved = placeFound(std::move(occupant), *found);
+  if (!moved) return fail(moved.error());
   return inherited;
 }
 
 Placer::Inheritance Placer::takeHandover(const Arrival& arrival, std::uint32_t ownDocument) {
-  if (!arrival.isOccupied || !isDocumentKind(arrival.kind)) return std::nullopt;
-  auto document = store_.handoverAt(arrival.location.folder, arrival.location.name);
-  if (!document) return fail(document.error());
-  if (!*document || **document == ownDocument) return std::nullopt;
-  if (auto ended = store_.removeHandovers(**document); !ended) return fail(ended.error());
-  auto holder = store_.objectByDocumentID(**document);
+  auto waiting = store_.handoverAt(arrival.location.folder, arrival.location.name);
+  if (!waiting) return fail(waiting.error());
+  if (!*waiting || (*waiting)->kind != arrival.kind) return std::nullopt;
+  const std::uint32_t document = (*waiting)->documentID;
+  if (document == ownDocument) return std::nullopt;
+  if (auto ended = store_.removeHandovers(document); !ended) return fail(ended.error());
+  auto holder = store_.objectByDocumentID(document);
   if (!holder) return fail(holder.error());
-  if (!*holder) return *document;
+  if (!*holder) return document;
   ObjectRow& backup = **holder;
-  const bool stands =
-      backup.kind == arrival.kind &&
-      (!backup.location || (backup.location->folder == arrival.location.folder &&
-                            isBackupName(backup.location->name, arrival.location.name)));
-  if (!stands) return std::nullopt;
-  backup.documentID = 0;
+  if (backup.kind != arrival.kind) return std::nullopt;
   if (backup.location) {
-    auto own = allocator_.nextDocumentID();
-    if (!own) return fail(own.error());
-    backup.documentID = *own;
+    if (!isBackupOf(*backup.location, arrival.location)) return std::nullopt;
+    return handOver(std::move(backup));
   }
+  if (auto taken = take(backup); !taken) return fail(taken.error());
   if (auto written = store_.put(backup); !written) return fail(written.error());
-  if (backup.location) {
-    auto told = tellChange(backup, *backup.location, false);
-    if (!told) return fail(told.error());
-  }
-  return *document;
+  return document;
+}
+
+Result<std::uint32_t> Placer::take(ObjectRow& holder) {
+  const std::uint32_t document = std::exchange(holder.documentID, 0);
+  if (document == 0) return document;
+  takenDocuments_.insert(document);
+  auto told = recorder_.handedOn(document, holder.fileID, 0);
+  if (!told) return fail(told.error());
+  return document;
 }
 
 Result<bool> Placer::promoteLink(ObjectRow& row) {
@@ -422,6 +449,19 @@ Result<void> Placer::ensureDocument(ObjectRow& row) {
 Result<ObjectRow> Placer::put(ObjectRow row) {
   if (auto written = store_.put(row); !written) return fail(written.error());
   return row;
+}
+
+Result<std::vector<std::uint64_t>> Placer::foldersAbove(const Location& location) {
+  std::vector<std::uint64_t> folders;
+  for (std::uint64_t folder = location.folder; folder != 0 && folders.size() < deepestFolder;) {
+    folders.push_back(folder);
+    auto row = store_.objectByFileID(folder);
+    if (!row) return fail(row.error());
+    if (!*row || !(*row)->location) break;
+    folder = (*row)->location->folder;
+  }
+  std::ranges::reverse(folders);
+  return folders;
 }
 
 }  // namespace mirabel

@@ -3,7 +3,9 @@
 #include <cstdint>
 #include <functional>
 #include <optional>
+#include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "foundation/Error.h"
@@ -65,12 +67,20 @@ class Placer {
   /// Asked for before the whole tree is looked through, so that one search serves a batch.
   void setOthers(ObjectFinder::Others others) { others_ = std::move(others); }
 
+  /// Documents that were taken from the objects which had them, since the last call.
+  [[nodiscard]] std::set<std::uint32_t> takenDocuments() {
+    return std::exchange(takenDocuments_, {});
+  }
+
   /// Puts an object that is not at its place where the finder has found it.
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
   /// Moves the row to one of the object's other names that still stands; false when none does.
   [[nodiscard]] Result<bool> promoteLink(ObjectRow& row);
-  /// Whether the disk has the object under that name.
-  [[nodiscard]] Result<bool> isStillAt(const ObjectRow& row, const Location& location);
+  /// The path of that name, if the disk has the object under it.
+  [[nodiscard]] Result<std::optional<std::string>> standingPath(const ObjectRow& row,
+                                                                const Location& location);
+  /// File IDs of the folders above a place as the index has them, the outermost first.
+  [[nodiscard]] Result<std::vector<std::uint64_t>> foldersAbove(const Location& location);
 
  private:
   [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
@@ -85,12 +95,25 @@ class Placer {
                                         bool changedKind);
   [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, const ObjectRow& row);
 
+  [[nodiscard]] Result<bool> isStillAt(const ObjectRow& row, const Location& location);
+
   /// A document ID that an arrival takes over; nothing when it takes none.
   using Inheritance = Result<std::optional<std::uint32_t>>;
-  /// Takes whatever the index has under the arrival's name away from there.
+  /// Takes names and document from the former holder of the arrival's inode number.
+  [[nodiscard]] Inheritance retire(ObjectRow former, const Arrival& arrival);
+  /// The document of what the index has under the arrival's name, which is free afterwards, or
+  /// else the one that waits there.
+  [[nodiscard]] Inheritance inherit(const Arrival& arrival, std::uint64_t arrivingSlot,
+                                    std::uint32_t ownDocument);
   [[nodiscard]] Inheritance vacate(const Arrival& arrival, std::uint64_t arrivingSlot);
   [[nodiscard]] Inheritance settleOccupant(const Arrival& arrival, ObjectRow occupant);
   [[nodiscard]] Inheritance takeHandover(const Arrival& arrival, std::uint32_t ownDocument);
+  /// Takes the holder's document, 0 where it has none, and tells that it did.
+  [[nodiscard]] Result<std::uint32_t> take(ObjectRow& holder);
+  /// Takes the document from a backup, which gets one of its own.
+  [[nodiscard]] Inheritance handOver(ObjectRow backup);
+  /// Whether the object stands under another name than the one it lost; its row then has that.
+  [[nodiscard]] Result<bool> hasOtherName(ObjectRow& row, const Location& lost);
   [[nodiscard]] Result<void> dropLinks(std::uint64_t slot);
   [[nodiscard]] Result<void> ensureDocument(ObjectRow& row);
   /// Writes the row and answers it.
@@ -105,6 +128,7 @@ class Placer {
   std::uint64_t device_;
   std::function<bool(std::string_view)> isPackageName_;
   ObjectFinder::Others others_;
+  std::set<std::uint32_t> takenDocuments_;
   int depth_ = 0;
 };
 

@@ -5,6 +5,7 @@
 #include <mutex>
 #include <utility>
 
+#include "linux/kernel/LongPath.h"
 #include "linux/volume/Learner.h"
 #include "linux/volume/Reconciler.h"
 #include "linux/volume/VolumeState.h"
@@ -19,6 +20,7 @@ class StoredVolumeIndex final : public VolumeIndex {
                     std::uint64_t device,
                     const std::function<bool(std::string_view)>& isPackageName)
       : state_(std::move(state)),
+        roots_(roots),
         recorder_(state_->store(), state_->journal(), roots, isPackageName),
         learner_(state_->store(), state_->allocator(), recorder_, roots, device, isPackageName),
         reconciler_(learner_, state_->store(), recorder_, roots, device, isPackageName),
@@ -27,7 +29,8 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<void> learn(const std::string& folderPath, int folder,
                      std::span<Sighting> sightings) override {
     const std::scoped_lock lock(mutex_);
-    return state_->transaction([&] { return learner_.learn(folderPath, folder, sightings); });
+    const std::string path = plainPath(folderPath);
+    return state_->transaction([&] { return learner_.learn(path, folder, sightings); });
   }
 
   Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
@@ -35,7 +38,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     const std::scoped_lock lock(mutex_);
     Result<Sighting> answer = fail(Error::posix(ENOENT));
     auto done = state_->transaction([&]() -> Result<void> {
-      answer = learner_.learnPath(path, status, isPackage);
+      answer = learner_.learnPath(plainPath(path), status, isPackage);
       if (!answer) return fail(answer.error());
       return {};
     });
@@ -55,7 +58,12 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) override {
     const std::scoped_lock lock(mutex_);
     std::optional<std::uint64_t> fileID;
-    auto done = state_->transaction([&] { return findHolder(documentID, fileID); });
+    auto done = state_->transaction([&]() -> Result<void> {
+      auto holder = learner_.holderOf(documentID);
+      if (!holder) return fail(holder.error());
+      fileID = *holder;
+      return {};
+    });
     if (!done) return fail(done.error());
     if (!fileID) return fail(Error::posix(ENOENT));
     return *fileID;
@@ -99,23 +107,15 @@ class StoredVolumeIndex final : public VolumeIndex {
     return {};
   }
 
-  // Looking for the holder may find that another object has saved over it since.
-  Result<void> findHolder(std::uint32_t documentID, std::optional<std::uint64_t>& fileID) {
-    auto holder = state_->store().objectByDocumentID(documentID);
-    if (!holder) return fail(holder.error());
-    if (!*holder) return {};
-    std::optional<std::string> path;
-    if (auto found = find((*holder)->fileID, path); !found) return found;
-    holder = state_->store().objectByDocumentID(documentID);
-    if (!holder) return fail(holder.error());
-    if (*holder && (*holder)->location && isDocumentKind((*holder)->kind)) {
-      fileID = (*holder)->fileID;
-    }
-    return {};
+  // Names are kept by their place, so each place must have one path. Below a root no component is
+  // a symbolic link, or the folder would not have been opened.
+  std::string plainPath(const std::string& path) const {
+    return roots_.locate(path) ? withoutDots(path) : path;
   }
 
   std::mutex mutex_;
   std::unique_ptr<VolumeState> state_;
+  const MonitoredRoots& roots_;
   ChangeRecorder recorder_;
   Learner learner_;
   Reconciler reconciler_;
