@@ -28,14 +28,44 @@ std::uint64_t aheadOf(const FSChangeToken& token) {
 std::shared_ptr<ChangesEnumeration> FSChangesEnumerations::make(
     const FSChangeToken& token, const std::string& container, const std::vector<URL>& urls,
     std::shared_ptr<VesselChangeObserver> observer) {
-  return std::make_shared<FSChangesEnumerator>(context_, events_, roots_, token, container, urls,
-                                               std::move(observer));
+  auto enumerator = std::make_shared<FSChangesEnumerator>(
+      context_, events_, roots_, token, container, urls, std::move(observer), running_);
+  const std::lock_guard lock(mutex_);
+  std::erase_if(made_, [](const auto& earlier) { return earlier.expired(); });
+  made_.push_back(enumerator);
+  return enumerator;
+}
+
+FSChangesEnumerations::~FSChangesEnumerations() {
+  for (const auto& made : made_) {
+    const auto enumerator = made.lock();
+    if (enumerator) enumerator->stop();
+  }
+  running_->wait();
+}
+
+void RunningReaders::add(const std::shared_ptr<FSEventReader>& reader) {
+  const std::lock_guard lock(mutex_);
+  std::erase_if(readers_, [](const Running& earlier) { return earlier.reader.expired(); });
+  readers_.push_back({reader, reader->streamQueue()});
+}
+
+void RunningReaders::wait() {
+  std::vector<Running> readers;
+  {
+    const std::lock_guard lock(mutex_);
+    readers.swap(readers_);
+  }
+  for (Running& running : readers) {
+    if (!running.reader.expired()) running.queue.sync([] {});
+  }
 }
 
 FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStreams& events,
                                          const AppLibraryRoots& roots, const FSChangeToken& token,
                                          std::string container, std::vector<URL> urls,
-                                         std::shared_ptr<VesselChangeObserver> observer)
+                                         std::shared_ptr<VesselChangeObserver> observer,
+                                         std::shared_ptr<RunningReaders> running)
     : context_(context),
       events_(events),
       currentToken_(token),
@@ -47,7 +77,7 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
       containerSight_(urls_, context.platform.resources),
       everywhereSight_(rootsOf(context, roots), context.platform.resources),
       look_(context_, everywhereSight_),
-      queue_("mirabel.changes"),
+      running_(std::move(running)),
       passedEventID_(token.streamEventID) {
   if (urls_.empty()) fatalError("require at least one URL to init a change enumerator");
 }
@@ -55,18 +85,6 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
 // The two passes --------------------------------------------------------------------------------
 
 void FSChangesEnumerator::start() {
-  queue_.async([self = shared_from_this()] { self->beginPathPass(); });
-}
-
-void FSChangesEnumerator::stop() {
-  queue_.async([self = shared_from_this()] {
-    self->isFinished_ = true;
-    self->stopReader();
-  });
-}
-
-void FSChangesEnumerator::beginPathPass() {
-  if (isFinished_) return;
   // The page of a listing carries an offset too, and must not be half believed.
   if (currentToken_.offset != 0 && (currentToken_.offset & offsetMark) == 0) {
     return finishWithError(Error::syncAnchorExpired());
@@ -74,16 +92,24 @@ void FSChangesEnumerator::beginPathPass() {
   startReader(FSEventReaderMode::pathBased, sinceFSEventID_ + aheadOf(currentToken_));
 }
 
-void FSChangesEnumerator::beginDocumentPass() {
-  if (isFinished_) return;
-  startReader(FSEventReaderMode::docIDBased, sinceFSEventID_);
+void FSChangesEnumerator::stop() {
+  isFinished_ = true;
+  stopReader();
 }
 
 void FSChangesEnumerator::startReader(FSEventReaderMode mode, std::uint64_t since) {
   passedEventID_ = since;
-  reader_ = FSEventReader::create(context_, events_, urls_, since, mode, Verbosity::quiet);
-  SerialQueue readerQueue = reader_->streamQueue();
-  readerQueue.async([self = shared_from_this(), reader = reader_] {
+  const auto reader =
+      FSEventReader::create(context_, events_, urls_, since, mode, Verbosity::quiet);
+  SerialQueue readerQueue = reader->streamQueue();
+  {
+    const std::lock_guard lock(mutex_);
+    if (isFinished_) return;
+    reader_ = reader;
+  }
+  running_->add(reader);
+  readerQueue.async([self = shared_from_this(), reader] {
+    if (self->isFinished_) return;
     reader->setDelegate(self);
     reader->start();
     // A history that can't be read must not look like one in which nothing happened.
@@ -92,12 +118,16 @@ void FSChangesEnumerator::startReader(FSEventReaderMode mode, std::uint64_t sinc
 }
 
 void FSChangesEnumerator::stopReader() {
-  if (!reader_) return;
-  SerialQueue readerQueue = reader_->streamQueue();
-  readerQueue.async([reader = std::move(reader_)] {
+  std::shared_ptr<FSEventReader> reader;
+  {
+    const std::lock_guard lock(mutex_);
+    reader = std::exchange(reader_, nullptr);
+  }
+  if (!reader) return;
+  SerialQueue readerQueue = reader->streamQueue();
+  readerQueue.async([reader] {
     if (reader->isRunning()) reader->stop();
   });
-  reader_.reset();
 }
 
 void FSChangesEnumerator::didFinishHistory(FSEventReader&) {
@@ -109,7 +139,7 @@ void FSChangesEnumerator::didFinishHistory(FSEventReader&) {
         FSReaderState{startupFSEventID_, startupFSEventID_ - sinceFSEventID_, numberOfChanges_};
     numberOfChanges_ = 0;
     stopReader();
-    return beginDocumentPass();
+    return startReader(FSEventReaderMode::docIDBased, sinceFSEventID_);
   }
   finish(false);
 }
@@ -137,8 +167,7 @@ void FSChangesEnumerator::endBatch() {
 }
 
 void FSChangesEnumerator::finish(bool moreComing) {
-  if (isFinished_) return;
-  isFinished_ = true;
+  if (isFinished_.exchange(true)) return;
   if (!moreComing && !pathBasedReaderState_) fatalError("path based reader bookmark is missing");
   const std::uint64_t path =
       pathBasedReaderState_ ? pathBasedReaderState_->eventID : passedEventID_;
@@ -172,8 +201,7 @@ void FSChangesEnumerator::finish(bool moreComing) {
 }
 
 void FSChangesEnumerator::finishWithError(const Error& error) {
-  if (isFinished_) return;
-  isFinished_ = true;
+  if (isFinished_.exchange(true)) return;
   if (error.is(VesselErrorCode::syncAnchorExpired)) {
     logInfo("fetching changes did finish after reset");
   }

@@ -1,8 +1,10 @@
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 #include <map>
 #include <memory>
+#include <mutex>
 #include <optional>
 #include <string>
 #include <vector>
@@ -21,6 +23,24 @@ struct FSReaderState {
   std::uint64_t eventID = 0;
   std::uint64_t offset = 0;
   std::uint64_t numberOfChanges = 0;
+};
+
+/// The readers of a provider's enumerations, so that whoever takes down what they use can wait for
+/// them: a reader goes through the rest of its batch even when its enumeration has finished. Any
+/// thread may call it.
+class RunningReaders {
+ public:
+  void add(const std::shared_ptr<FSEventReader>& reader);
+  /// Returns when no batch is under way. Not to be called from a reader's queue.
+  void wait();
+
+ private:
+  struct Running {
+    std::weak_ptr<FSEventReader> reader;
+    SerialQueue queue;
+  };
+  std::mutex mutex_;
+  std::vector<Running> readers_;
 };
 
 /// Tells the changes of one container since an anchor, at most 100 a batch, in two passes over the
@@ -42,7 +62,8 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   FSChangesEnumerator(const ItemContext& context, EventStreams& events,
                       const AppLibraryRoots& roots, const FSChangeToken& token,
                       std::string container, std::vector<URL> urls,
-                      std::shared_ptr<VesselChangeObserver> observer);
+                      std::shared_ptr<VesselChangeObserver> observer,
+                      std::shared_ptr<RunningReaders> running);
 
   void start() override;
   void stop() override;
@@ -63,16 +84,12 @@ class FSChangesEnumerator final : public ChangesEnumeration,
 
  private:
   void startReader(FSEventReaderMode mode, std::uint64_t since);
-  void beginPathPass();
-  void beginDocumentPass();
-
   /// Whether the event is this pass's to tell of; ends the pass or the batch where it is not.
   [[nodiscard]] bool accepts(const FileSystemEvent& event);
   void endBatch();
   void finish(bool moreComing);
   void finishWithError(const Error& error);
   void stopReader();
-  [[nodiscard]] std::uint64_t position() const;
 
   /// Tells what has become of the things that a record names.
   void settle(const FileSystemEvent& event);
@@ -95,7 +112,8 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   std::uint64_t numberOfReaderCaughtUp_ = 0;
   std::string container_;
   std::vector<URL> urls_;
-  std::shared_ptr<FSEventReader> reader_;
+  std::mutex mutex_;
+  std::shared_ptr<FSEventReader> reader_;  // with mutex_
   std::shared_ptr<VesselChangeObserver> observer_;
   std::uint64_t sinceFSEventID_;
   std::uint64_t startupFSEventID_;
@@ -104,9 +122,9 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   HiddenTest containerSight_;
   HiddenTest everywhereSight_;
   ItemLook look_;
-  SerialQueue queue_;
+  std::shared_ptr<RunningReaders> running_;
   std::uint64_t passedEventID_;  ///< the last event that the pass under way is done with
-  bool isFinished_ = false;
+  std::atomic<bool> isFinished_ = false;
   // What the batch tells: identifiers in the order in which they came up, and the item of each
   // that is updated; null for those that are deleted.
   std::vector<std::string> order_;
@@ -120,6 +138,8 @@ class FSChangesEnumerations final : public ChangesEnumerations {
   FSChangesEnumerations(const ItemContext& context, EventStreams& events,
                         const AppLibraryRoots& roots)
       : context_(context), events_(events), roots_(roots) {}
+  /// Stops what still runs, and waits for it: what it uses may go afterwards.
+  ~FSChangesEnumerations() override;
 
   [[nodiscard]] std::shared_ptr<ChangesEnumeration> make(
       const FSChangeToken& token, const std::string& container, const std::vector<URL>& urls,
@@ -129,6 +149,9 @@ class FSChangesEnumerations final : public ChangesEnumerations {
   ItemContext context_;
   EventStreams& events_;
   const AppLibraryRoots& roots_;
+  std::shared_ptr<RunningReaders> running_ = std::make_shared<RunningReaders>();
+  std::mutex mutex_;
+  std::vector<std::weak_ptr<FSChangesEnumerator>> made_;  // with mutex_
 };
 
 }  // namespace mirabel

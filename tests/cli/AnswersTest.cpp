@@ -50,8 +50,9 @@ TEST_F(Answers, AnItemHasTheKeysOfWhatItHas) {
   keys.insert("childItemCount");
   EXPECT_EQ(keysOf(folder), keys);
   EXPECT_EQ(folder.at("childItemCount"), 0);
-  EXPECT_EQ(run({"--json", "ls"}).json().at("items").size(), 2u);
-  for (const nlohmann::json& item : run({"--json", "ls"}).json().at("items")) {
+  const nlohmann::json page = run({"--json", "ls"}).json();
+  EXPECT_EQ(page.at("items").size(), 2u);
+  for (const nlohmann::json& item : page.at("items")) {
     EXPECT_EQ(item, item.at("filename") == "folder" ? folder : document);
   }
 }

@@ -1,8 +1,8 @@
 #include "convergence/Host.h"
 
 #include <future>
-#include <stdexcept>
 #include <gtest/gtest.h>
+#include <stdexcept>
 #include <utility>
 
 #include "foundation/Values.h"

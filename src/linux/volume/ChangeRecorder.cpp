@@ -14,14 +14,18 @@ bool holdsThings(const ObjectRow& row) {
 }  // namespace
 
 ChangeRecorder::ChangeRecorder(IdentityStore& store, EventJournal& journal,
-                               const MonitoredRoots& roots,
+                               const IndexedPaths& paths, const MonitoredRoots& roots,
                                std::function<bool(std::string_view)> isPackageName)
-    : store_(store), journal_(journal), roots_(roots), isPackageName_(std::move(isPackageName)) {}
+    : store_(store),
+      journal_(journal),
+      paths_(paths),
+      roots_(roots),
+      isPackageName_(std::move(isPackageName)) {}
 
 Result<void> ChangeRecorder::changed(const ObjectRow& row, const Location& location,
                                      bool changedKind) {
   if (!isActive()) return {};
-  auto path = store_.pathOf(location);
+  auto path = paths_.pathOf(location);
   if (!path) return fail(path.error());
   // A folder above that is nowhere has told of its contents itself.
   if (!*path) return {};
@@ -45,8 +49,8 @@ Result<void> ChangeRecorder::moved(const ObjectRow& row, const std::optional<Loc
   bool sightChanges = true;
   if (from) {
     if (auto told = changed(row, *from, changedKind); !told) return told;
-    auto before = store_.pathOf(*from);
-    auto after = store_.pathOf(to);
+    auto before = paths_.pathOf(*from);
+    auto after = paths_.pathOf(to);
     if (!before) return fail(before.error());
     if (!after) return fail(after.error());
     sightChanges = !*before || !*after || !(sightOf(**before) == sightOf(**after));
@@ -67,7 +71,7 @@ Result<void> ChangeRecorder::handedOn(std::uint32_t documentID, std::uint64_t so
 
 Result<void> ChangeRecorder::gone(const ObjectRow& row, const Location& from) {
   if (!isActive()) return {};
-  auto path = store_.pathOf(from);
+  auto path = paths_.pathOf(from);
   if (!path) return fail(path.error());
   // Where the folder above is nowhere either, it has told of all that was in it.
   if (!*path) return {};

@@ -10,6 +10,7 @@
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/volume/EventJournal.h"
 #include "linux/volume/IdentityStore.h"
+#include "linux/volume/IndexedPaths.h"
 
 namespace mirabel {
 
@@ -17,8 +18,8 @@ namespace mirabel {
 /// before the history is active. Used under the lock of the index, inside its transactions.
 class ChangeRecorder {
  public:
-  ChangeRecorder(IdentityStore& store, EventJournal& journal, const MonitoredRoots& roots,
-                 std::function<bool(std::string_view)> isPackageName);
+  ChangeRecorder(IdentityStore& store, EventJournal& journal, const IndexedPaths& paths,
+                 const MonitoredRoots& roots, std::function<bool(std::string_view)> isPackageName);
 
   [[nodiscard]] bool isActive() const { return journal_.isActive(); }
 
@@ -57,6 +58,7 @@ class ChangeRecorder {
 
   IdentityStore& store_;
   EventJournal& journal_;
+  const IndexedPaths& paths_;
   const MonitoredRoots& roots_;
   std::function<bool(std::string_view)> isPackageName_;
 };

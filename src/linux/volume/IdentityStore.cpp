@@ -11,9 +11,6 @@ namespace {
 
 constexpr std::uint64_t schemaVersion = 1;
 
-// More folders above each other than any path has; a longer chain is a damaged index.
-constexpr int deepestFolder = 1 << 20;
-
 // Kept in the database, so it must never change: FNV-1a, folded to 31 bits.
 std::int64_t placeHash(std::string_view name) {
   std::uint64_t hash = 0xCBF29CE484222325;
@@ -225,22 +222,6 @@ Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
 
 Result<void> IdentityStore::remove(std::uint64_t slot) {
   return statements_->remove.bind(1, slot).run();
-}
-
-Result<std::optional<std::string>> IdentityStore::pathOf(const Location& location) {
-  std::vector<std::string> names{location.name};
-  std::uint64_t folder = location.folder;
-  for (int depth = 0; folder != 0; ++depth) {
-    auto above = objectByFileID(folder);
-    if (!above) return fail(above.error());
-    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
-    names.push_back((*above)->location->name);
-    folder = (*above)->location->folder;
-  }
-  std::string path = std::move(names.back());
-  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
-    path.append("/").append(*name);
-  return path;
 }
 
 Result<std::vector<ObjectRow>> IdentityStore::childrenOf(std::uint64_t folder) {

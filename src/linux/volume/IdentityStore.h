@@ -114,8 +114,6 @@ class IdentityStore {
   [[nodiscard]] Result<void> put(const ObjectRow& row);
   [[nodiscard]] Result<void> remove(std::uint64_t slot);
 
-  /// Where a place is; nothing when a folder above it is detached.
-  [[nodiscard]] Result<std::optional<std::string>> pathOf(const Location& location);
   /// What lies in a folder, further links not counted.
   [[nodiscard]] Result<std::vector<ObjectRow>> childrenOf(std::uint64_t folder);
   /// How many names the index has in a folder, further links among them.

@@ -19,8 +19,9 @@ Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRec
       roots_(roots),
       device_(device),
       isPackageName_(std::move(isPackageName)),
+      paths_(store, roots, device),
       finder_(roots, device),
-      placer_(store, allocator, recorder, finder_, roots, *this, device, isPackageName_) {
+      placer_(store, allocator, recorder, finder_, roots, paths_, *this, device, isPackageName_) {
   placer_.setOthers([] { return std::vector<ObjectRow>(); });
 }
 
@@ -44,7 +45,7 @@ Result<std::uint64_t> Learner::folderID(const std::string& path, int folder) {
   auto slot = placer_.slotOf(seen);
   if (!slot) return fail(slot.error());
   if (slot->row && slot->row->location && compare(*slot->row, seen) == Match::same) {
-    auto known = store_.pathOf(*slot->row->location);
+    auto known = paths_.pathOf(*slot->row->location);
     if (!known) return fail(known.error());
     if (*known == path) return slot->row->fileID;
   }
@@ -237,7 +238,7 @@ Result<std::optional<ObjectRow>> Learner::objectInPlace(const SeenObject& seen) 
   if (!slot) return fail(slot.error());
   const std::optional<ObjectRow>& row = slot->row;
   if (!row || !row->location || compare(*row, seen) != Match::same) return std::nullopt;
-  auto standing = placer_.standingPath(*row, *row->location);
+  auto standing = paths_.standingPath(*row, *row->location);
   if (!standing) return fail(standing.error());
   return *standing ? row : std::nullopt;
 }
@@ -256,7 +257,7 @@ Result<void> Learner::leave(ObjectRow row) {
 
 Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
   if (!row.location) return std::nullopt;
-  return placer_.standingPath(row, *row.location);
+  return paths_.standingPath(row, *row.location);
 }
 
 Result<void> Learner::settleFoldersAbove(const Location& location) {
@@ -264,7 +265,7 @@ Result<void> Learner::settleFoldersAbove(const Location& location) {
     if (roots_.descriptor(root) < 0) continue;
     if (auto id = rootID(root); !id) return fail(id.error());
   }
-  auto folders = placer_.foldersAbove(location);
+  auto folders = paths_.foldersAbove(location);
   if (!folders) return fail(folders.error());
   for (const std::uint64_t id : *folders) {
     auto folder = store_.objectByFileID(id);
@@ -280,7 +281,7 @@ Result<void> Learner::settleFoldersAbove(const Location& location) {
 
 Result<void> Learner::learnAt(const Location& location) {
   if (auto settled = settleFoldersAbove(location); !settled) return settled;
-  auto path = store_.pathOf(location);
+  auto path = paths_.pathOf(location);
   if (!path) return fail(path.error());
   if (!*path) return {};
   const auto look = lookAt(roots_, **path);
@@ -294,7 +295,7 @@ Result<void> Learner::learnAt(const Location& location) {
 Result<std::optional<std::string>> Learner::search(ObjectRow row) {
   std::optional<std::string> hint;
   if (row.location) {
-    auto path = store_.pathOf(*row.location);
+    auto path = paths_.pathOf(*row.location);
     if (!path) return fail(path.error());
     if (*path) hint = splitPath(**path).parent;
   }

@@ -88,6 +88,7 @@ class Learner final : private FolderIdentities {
   const MonitoredRoots& roots_;
   std::uint64_t device_;
   PackageNames isPackageName_;
+  IndexedPaths paths_;
   ObjectFinder finder_;
   Placer placer_;
 };

@@ -5,14 +5,9 @@
 #include <fcntl.h>
 #include <utility>
 
-#include "linux/kernel/LongPath.h"
-#include "linux/volume/DiskEntry.h"
-
 namespace mirabel {
 namespace {
 
-// More folders above each other than any path has; a longer chain is a damaged index.
-constexpr int deepestFolder = 1 << 20;
 // Moves that uncover moves. Each detaches a row first, so this is only reached when names change
 // faster than they are read.
 constexpr int deepestChain = 64;
@@ -35,13 +30,15 @@ class Deeper {
 }  // namespace
 
 Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
-               ObjectFinder& finder, const MonitoredRoots& roots, FolderIdentities& folders,
-               std::uint64_t device, std::function<bool(std::string_view)> isPackageName)
+               ObjectFinder& finder, const MonitoredRoots& roots, const IndexedPaths& paths,
+               FolderIdentities& folders, std::uint64_t device,
+               std::function<bool(std::string_view)> isPackageName)
     : store_(store),
       allocator_(allocator),
       recorder_(recorder),
       finder_(finder),
       roots_(roots),
+      paths_(paths),
       folders_(folders),
       device_(device),
       isPackageName_(std::move(isPackageName)) {}
@@ -128,31 +125,13 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
   if (!link) return fail(link.error());
   if (*link == row.slot) return true;
   if (!row.location) return false;
-  auto still = isStillAt(row, *row.location);
+  auto still = paths_.isAt(row, *row.location);
   if (!still || !*still) return still;
   // Linking over a document ends it: the object that arrives is shown under its other names too,
   // and keeps the identity that it has there.
   if (auto vacated = vacate(arrival, row.slot); !vacated) return fail(vacated.error());
   if (auto added = store_.addLink(arrival.location, row.slot); !added) return fail(added.error());
   return true;
-}
-
-Result<std::optional<std::string>> Placer::standingPath(const ObjectRow& row,
-                                                        const Location& location) {
-  auto path = store_.pathOf(location);
-  if (!path || !*path) return path;
-  const auto look = lookAt(roots_, **path);
-  const bool stands = look && look->seen.status.inode == row.inode &&
-                      fileSystemOf(look->seen, device_) == row.fileSystem &&
-                      compare(row, look->seen) == Match::same;
-  if (!stands) return std::nullopt;
-  return path;
-}
-
-Result<bool> Placer::isStillAt(const ObjectRow& row, const Location& location) {
-  auto path = standingPath(row, location);
-  if (!path) return fail(path.error());
-  return path->has_value();
 }
 
 Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool changedKind) {
@@ -331,7 +310,7 @@ Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivin
 
 Result<bool> Placer::hasOtherName(ObjectRow& row, const Location& lost) {
   if (row.location && *row.location != lost) {
-    auto still = isStillAt(row, *row.location);
+    auto still = paths_.isAt(row, *row.location);
     if (!still || *still) return still;
   }
   return promoteLink(row);
@@ -419,7 +398,7 @@ Result<bool> Placer::promoteLink(ObjectRow& row) {
     if (auto removed = store_.removeLink(name.folder, name.name); !removed) {
       return fail(removed.error());
     }
-    auto still = isStillAt(row, name);
+    auto still = paths_.isAt(row, name);
     if (!still) return still;
     if (!*still) continue;
     row.location = name;
@@ -449,19 +428,6 @@ Result<void> Placer::ensureDocument(ObjectRow& row) {
 Result<ObjectRow> Placer::put(ObjectRow row) {
   if (auto written = store_.put(row); !written) return fail(written.error());
   return row;
-}
-
-Result<std::vector<std::uint64_t>> Placer::foldersAbove(const Location& location) {
-  std::vector<std::uint64_t> folders;
-  for (std::uint64_t folder = location.folder; folder != 0 && folders.size() < deepestFolder;) {
-    folders.push_back(folder);
-    auto row = store_.objectByFileID(folder);
-    if (!row) return fail(row.error());
-    if (!*row || !(*row)->location) break;
-    folder = (*row)->location->folder;
-  }
-  std::ranges::reverse(folders);
-  return folders;
 }
 
 }  // namespace mirabel

@@ -12,6 +12,7 @@
 #include "linux/volume/ChangeRecorder.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
+#include "linux/volume/IndexedPaths.h"
 #include "linux/volume/ObjectFinder.h"
 #include "linux/volume/ObjectMatcher.h"
 
@@ -56,8 +57,9 @@ class Placer {
  public:
   /// References outlive it. `device` is the number of the volume's own file system.
   Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
-         ObjectFinder& finder, const MonitoredRoots& roots, FolderIdentities& folders,
-         std::uint64_t device, std::function<bool(std::string_view)> isPackageName);
+         ObjectFinder& finder, const MonitoredRoots& roots, const IndexedPaths& paths,
+         FolderIdentities& folders, std::uint64_t device,
+         std::function<bool(std::string_view)> isPackageName);
 
   /// The row as it is afterwards. POSIX error ESTALE when the entry went away meanwhile.
   [[nodiscard]] Result<ObjectRow> place(Arrival arrival);
@@ -76,11 +78,6 @@ class Placer {
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
   /// Moves the row to one of the object's other names that still stands; false when none does.
   [[nodiscard]] Result<bool> promoteLink(ObjectRow& row);
-  /// The path of that name, if the disk has the object under it.
-  [[nodiscard]] Result<std::optional<std::string>> standingPath(const ObjectRow& row,
-                                                                const Location& location);
-  /// File IDs of the folders above a place as the index has them, the outermost first.
-  [[nodiscard]] Result<std::vector<std::uint64_t>> foldersAbove(const Location& location);
 
  private:
   [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
@@ -94,8 +91,6 @@ class Placer {
   [[nodiscard]] Result<void> tellChange(const ObjectRow& row, const Location& location,
                                         bool changedKind);
   [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, const ObjectRow& row);
-
-  [[nodiscard]] Result<bool> isStillAt(const ObjectRow& row, const Location& location);
 
   /// A document ID that an arrival takes over; nothing when it takes none.
   using Inheritance = Result<std::optional<std::uint32_t>>;
@@ -124,6 +119,7 @@ class Placer {
   ChangeRecorder& recorder_;
   ObjectFinder& finder_;
   const MonitoredRoots& roots_;
+  const IndexedPaths& paths_;
   FolderIdentities& folders_;
   std::uint64_t device_;
   std::function<bool(std::string_view)> isPackageName_;

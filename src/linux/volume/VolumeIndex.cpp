@@ -21,7 +21,8 @@ class StoredVolumeIndex final : public VolumeIndex {
                     const std::function<bool(std::string_view)>& isPackageName)
       : state_(std::move(state)),
         roots_(roots),
-        recorder_(state_->store(), state_->journal(), roots, isPackageName),
+        paths_(state_->store(), roots, device),
+        recorder_(state_->store(), state_->journal(), paths_, roots, isPackageName),
         learner_(state_->store(), state_->allocator(), recorder_, roots, device, isPackageName),
         reconciler_(learner_, state_->store(), recorder_, roots, device, isPackageName),
         device_(device) {}
@@ -116,6 +117,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   std::mutex mutex_;
   std::unique_ptr<VolumeState> state_;
   const MonitoredRoots& roots_;
+  IndexedPaths paths_;
   ChangeRecorder recorder_;
   Learner learner_;
   Reconciler reconciler_;

@@ -1,0 +1,64 @@
+#include "linux/volume/IndexedPaths.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "linux/volume/DiskEntry.h"
+#include "linux/volume/ObjectMatcher.h"
+
+namespace mirabel {
+namespace {
+
+// More folders above each other than any path has; a longer chain is a damaged index.
+constexpr int deepestFolder = 1 << 16;
+
+}  // namespace
+
+Result<std::optional<std::string>> IndexedPaths::pathOf(const Location& location) const {
+  std::vector<std::string> names{location.name};
+  std::uint64_t folder = location.folder;
+  for (int depth = 0; folder != 0; ++depth) {
+    auto above = store_.objectByFileID(folder);
+    if (!above) return fail(above.error());
+    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
+    names.push_back((*above)->location->name);
+    folder = (*above)->location->folder;
+  }
+  std::string path = std::move(names.back());
+  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
+    path.append("/").append(*name);
+  return path;
+}
+
+Result<std::vector<std::uint64_t>> IndexedPaths::foldersAbove(const Location& location) const {
+  std::vector<std::uint64_t> folders;
+  for (std::uint64_t folder = location.folder; folder != 0 && folders.size() < deepestFolder;) {
+    folders.push_back(folder);
+    auto row = store_.objectByFileID(folder);
+    if (!row) return fail(row.error());
+    if (!*row || !(*row)->location) break;
+    folder = (*row)->location->folder;
+  }
+  std::ranges::reverse(folders);
+  return folders;
+}
+
+Result<std::optional<std::string>> IndexedPaths::standingPath(const ObjectRow& row,
+                                                              const Location& location) const {
+  auto path = pathOf(location);
+  if (!path || !*path) return path;
+  const auto look = lookAt(roots_, **path);
+  const bool stands = look && look->seen.status.inode == row.inode &&
+                      fileSystemOf(look->seen, device_) == row.fileSystem &&
+                      compare(row, look->seen) == Match::same;
+  if (!stands) return std::nullopt;
+  return path;
+}
+
+Result<bool> IndexedPaths::isAt(const ObjectRow& row, const Location& location) const {
+  auto path = standingPath(row, location);
+  if (!path) return fail(path.error());
+  return path->has_value();
+}
+
+}  // namespace mirabel

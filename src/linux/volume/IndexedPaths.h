@@ -1,0 +1,37 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "linux/kernel/MonitoredRoots.h"
+#include "linux/volume/IdentityStore.h"
+
+namespace mirabel {
+
+/// The paths of places in the index, and whether the disk agrees. Used under the lock of the index.
+/// Errors: `ErrorDomain::store`.
+class IndexedPaths {
+ public:
+  /// References outlive it. `device` is the number of the volume's own file system.
+  IndexedPaths(IdentityStore& store, const MonitoredRoots& roots, std::uint64_t device)
+      : store_(store), roots_(roots), device_(device) {}
+
+  /// Where the index believes a place to be; nothing when a folder above it is detached.
+  [[nodiscard]] Result<std::optional<std::string>> pathOf(const Location& location) const;
+  /// File IDs of the folders above a place as the index has them, the outermost first.
+  [[nodiscard]] Result<std::vector<std::uint64_t>> foldersAbove(const Location& location) const;
+  /// The path of a place, if the disk has the object of `row` there.
+  [[nodiscard]] Result<std::optional<std::string>> standingPath(const ObjectRow& row,
+                                                                const Location& location) const;
+  [[nodiscard]] Result<bool> isAt(const ObjectRow& row, const Location& location) const;
+
+ private:
+  IdentityStore& store_;
+  const MonitoredRoots& roots_;
+  std::uint64_t device_;
+};
+
+}  // namespace mirabel
