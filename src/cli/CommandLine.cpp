@@ -19,6 +19,9 @@ constexpr const char* itemHelp =
     "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has\n"
     "no / in it is an identifier: did=N for a document, fid=N for a folder, #bundle for the\n"
     "documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
+constexpr const char* containerHelp =
+    "ITEM is the word root, a folder's identifier or path, workingset for everything, or alldirs\n"
+    "for every folder.\n\n";
 constexpr const char* pathHelp =
     "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
 constexpr const char* exitCodeHelp =
@@ -33,6 +36,8 @@ struct Arguments {
   std::string path;
   std::string item;
   ListOptions list;
+  ChangesOptions changes;
+  std::string container = "root";
   bool showVersion = false;
 };
 
@@ -81,6 +86,17 @@ void addCommands(CLI::App& app, Arguments& arguments) {
   list->add_option("--pages", arguments.list.pages, "Stop after so many pages (all)")
       ->type_name("N")
       ->check(isPageCount);
+  auto* anchor = addCommand(app, "anchor", "Print the anchor of now, to ask for changes from there",
+                            containerHelp);
+  anchor->add_option("ITEM", arguments.container, "root, workingset, alldirs or a folder (root)")
+      ->type_name("");
+  auto* changes = addCommand(app, "changes", "Print what changed since an anchor", containerHelp);
+  changes->add_option("--since", arguments.changes.since, "An anchor that was printed before")
+      ->required()
+      ->type_name("ANCHOR");
+  changes
+      ->add_option("ITEM", arguments.changes.item, "root, workingset, alldirs or a folder (root)")
+      ->type_name("");
   addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
   addCommand(app, "demo", "A guided tour in a temporary home", "");
 }
@@ -90,6 +106,8 @@ ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& argume
   if (app.got_subcommand("path")) return runPath(program, arguments.item);
   if (app.got_subcommand("info")) return runInfo(program, arguments.item);
   if (app.got_subcommand("ls")) return runList(program, arguments.list);
+  if (app.got_subcommand("anchor")) return runAnchor(program, arguments.container);
+  if (app.got_subcommand("changes")) return runChanges(program, arguments.changes);
   if (app.got_subcommand("doctor")) return runDoctor(program);
   return runDemo(program);
 }

@@ -21,6 +21,14 @@ struct ListOptions {
 };
 ExitCode runList(Program& program, const ListOptions& options);
 
+ExitCode runAnchor(Program& program, const std::string& item);
+
+struct ChangesOptions {
+  std::string item = "root";
+  std::string since;  ///< base64 of an anchor
+};
+ExitCode runChanges(Program& program, const ChangesOptions& options);
+
 ExitCode runDoctor(Program& program);
 ExitCode runDemo(Program& program);
 

@@ -58,7 +58,7 @@ std::string fileText(const Error& error) {
 
 std::string vesselText(const Error& error) {
   if (error.is(VesselErrorCode::syncAnchorExpired)) {
-    return "the page is no longer valid; start over without --page";
+    return "it is no longer valid; start over, with a new listing or a new anchor";
   }
   if (error.is(VesselErrorCode::noSuchItem)) return "no item has this identifier";
   return error.description();

@@ -13,8 +13,14 @@ Result<std::unique_ptr<Session>> Session::open(Options options) {
   if (!platform) return fail(platform.error());
   std::unique_ptr<Session> session(new Session);
   session->platform_ = std::move(*platform);
-  session->provider_ =
-      std::make_unique<LocalVessel>(session->platform(), session->roots_, session->owners_);
+  EventStreams& events = session->platform_->events();
+  session->identity_ = std::make_unique<FileObjectURLs>(session->platform(), session->roots_);
+  session->enumerations_ = std::make_unique<FSChangesEnumerations>(
+      ItemContext{session->platform(), *session->identity_, session->owners_}, events,
+      session->roots_);
+  session->provider_ = std::make_unique<LocalVessel>(
+      session->platform(), session->roots_, session->owners_,
+      ChangeServices{events, session->diagnostics_, *session->enumerations_});
   return session;
 }
 

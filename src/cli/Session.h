@@ -8,7 +8,9 @@
 #include <string_view>
 
 #include "foundation/Error.h"
+#include "fs/FSChangesEnumerator.h"
 #include "linux/files/LinuxPlatform.h"
+#include "linux/log/LoggingDiagnosticReporter.h"
 #include "provider/LocalVessel.h"
 
 namespace mirabel {
@@ -26,6 +28,10 @@ class Session {
   [[nodiscard]] static Result<std::unique_ptr<Session>> open(Options options);
 
   [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
+  /// Lists the container and tells its changes. Errors: see `LocalVessel`.
+  [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(std::string_view container) {
+    return provider_->enumeratorForContainerItemIdentifier(container);
+  }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
 
@@ -34,6 +40,9 @@ class Session {
   std::unique_ptr<LinuxPlatform> platform_;
   NoAppLibraryRoots roots_;
   NoAppLibraryOwners owners_;
+  LoggingDiagnosticReporter diagnostics_;
+  std::unique_ptr<FileObjectURLs> identity_;
+  std::unique_ptr<FSChangesEnumerations> enumerations_;
   std::unique_ptr<LocalVessel> provider_;
 };
 

@@ -23,6 +23,8 @@ inline constexpr std::uint32_t userDropped = 0x02;
 inline constexpr std::uint32_t kernelDropped = 0x04;
 inline constexpr std::uint32_t eventIDsWrapped = 0x08;
 inline constexpr std::uint32_t historyDone = 0x10;
+/// Says of a path record that a folder became a package there, or stopped being one.
+inline constexpr std::uint32_t changedKind = 0x100'0000;
 }  // namespace eventflag
 
 /// Bits of the flags that a stream is created with.

@@ -1,3 +1,4 @@
+#include "linux/events/LinuxEventStreams.h"
 #include "linux/files/LinuxPlatform.h"
 
 #include "linux/files/HomeLayout.h"
@@ -36,6 +37,7 @@ struct LinuxPlatform::Parts {
   NoApplications applications;
   LinuxVesselManager manager{URL::fileURL(layout.documents)};
   LinuxVolumeHistory history{*index};
+  LinuxEventStreams events{*index};
   SystemClock clock;
   Platform platform{resources,  attributes,   objects, documents, directories, sizes,
                     operations, applications, manager, history,   clock};
@@ -67,6 +69,8 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
 LinuxPlatform::LinuxPlatform(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
 
 LinuxPlatform::~LinuxPlatform() = default;
+
+EventStreams& LinuxPlatform::events() const { return parts_->events; }
 
 const Platform& LinuxPlatform::platform() const {
   return parts_->platform;

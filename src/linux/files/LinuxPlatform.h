@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "platform/EventStreams.h"
 #include "platform/Platform.h"
 
 namespace mirabel {
@@ -44,6 +45,8 @@ class LinuxPlatform {
   LinuxPlatform& operator=(const LinuxPlatform&) = delete;
 
   [[nodiscard]] const Platform& platform() const;
+  /// The event history of the documents' volume.
+  [[nodiscard]] EventStreams& events() const;
   /// Absolute and resolved.
   [[nodiscard]] const std::string& home() const;
   [[nodiscard]] const std::string& stateFolder() const;

@@ -6,8 +6,8 @@ namespace mirabel {
 
 // Names are blobs: bytes, compared as bytes. The columns that a listing compares come first, the
 // handle, which it seldom needs, last. Rows are appended; what is looked up by is in indexes of
-// small integers, so that a folder of 100,000 touches few pages: `place` is a hash of folder and
-// name. `file_id` is absent where it is the inode number.
+// small integers, so that a folder of 100,000 touches few pages: `place` is a hash of the name.
+// `file_id` is absent where it is the inode number.
 const char* const IdentityStatements::schema = R"(
 CREATE TABLE IF NOT EXISTS meta(key TEXT PRIMARY KEY, value NOT NULL) WITHOUT ROWID;
 CREATE TABLE IF NOT EXISTS objects(
@@ -32,7 +32,7 @@ CREATE UNIQUE INDEX IF NOT EXISTS objects_foreign ON objects(file_system, inode)
 CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id IS NOT NULL;
 CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
   WHERE document_id IS NOT NULL AND document_id <> slot;
-CREATE INDEX IF NOT EXISTS objects_place ON objects(place) WHERE place IS NOT NULL;
+CREATE INDEX IF NOT EXISTS objects_place ON objects(folder, place) WHERE folder IS NOT NULL;
 CREATE TABLE IF NOT EXISTS links(
   folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
   PRIMARY KEY(folder, name)) WITHOUT ROWID;
@@ -53,12 +53,12 @@ Result<std::unique_ptr<IdentityStatements>> IdentityStatements::prepare(Database
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE inode = ?1 AND file_system IS NULL",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_id = ?1",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE document_id = ?1 AND document_id <> slot",
-      "SELECT " OBJECT_COLUMNS "FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1 AND place = ?3 AND name = ?2",
       "SELECT " OBJECT_COLUMNS "FROM objects WHERE file_system = ?1 AND inode = ?2",
       "SELECT slot FROM objects WHERE inode = ?1 AND file_system IS NULL",
       "SELECT inode, file_id, document_id, kind, folder, name, birth_time, change_time, settled, "
       "file_system FROM objects WHERE slot >= ?1",
-      "SELECT 1 FROM objects WHERE place = ?3 AND folder = ?1 AND name = ?2",
+      "SELECT 1 FROM objects WHERE folder = ?1 AND place = ?3 AND name = ?2",
       "INSERT INTO objects(" OBJECT_COLUMNS
       ", place) VALUES(?1,?2,?3,?4,?5,?6,?7,?8,?9,?10,?11,?12,?13,?14,?15)",
       "UPDATE objects SET inode=?2, file_id=?3, document_id=?4, kind=?5, folder=?6, name=?7, "
@@ -75,6 +75,10 @@ Result<std::unique_ptr<IdentityStatements>> IdentityStatements::prepare(Database
       "INSERT OR REPLACE INTO handovers(folder, name, document_id, kind) VALUES(?1,?2,?3,?4)",
       "DELETE FROM handovers WHERE document_id = ?1",
       "SELECT EXISTS(SELECT 1 FROM handovers)",
+      "SELECT " OBJECT_COLUMNS "FROM objects WHERE folder = ?1",
+      "SELECT (SELECT count(*) FROM objects WHERE folder = ?1) + "
+      "(SELECT count(*) FROM links WHERE folder = ?1)",
+      "SELECT name, slot FROM links WHERE folder = ?1",
       "SELECT value FROM meta WHERE key = CAST(?1 AS TEXT)",
       "INSERT OR REPLACE INTO meta(key, value) VALUES(CAST(?1 AS TEXT), ?2)",
   };

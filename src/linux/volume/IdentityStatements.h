@@ -33,8 +33,11 @@ struct IdentityStatements {
   Statement& addHandover = all[19];
   Statement& removeHandovers = all[20];
   Statement& anyHandover = all[21];
-  Statement& meta = all[22];
-  Statement& setMeta = all[23];
+  Statement& children = all[22];
+  Statement& nameCount = all[23];
+  Statement& linksIn = all[24];
+  Statement& meta = all[25];
+  Statement& setMeta = all[26];
 
   static const char* const schema;
   /// Errors: those of `Database::prepare`.

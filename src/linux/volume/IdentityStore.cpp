@@ -11,13 +11,12 @@ namespace {
 
 constexpr std::uint64_t schemaVersion = 1;
 
-// Kept in the database, so it must never change: FNV-1a over the folder's ID and the name.
-std::int64_t placeHash(std::uint64_t folder, std::string_view name) {
-  constexpr std::uint64_t prime = 0x100000001B3;
-  std::uint64_t hash = (0xCBF29CE484222325 ^ folder) * prime;
+// Kept in the database, so it must never change: FNV-1a, folded to 31 bits.
+std::int64_t placeHash(std::string_view name) {
+  std::uint64_t hash = 0xCBF29CE484222325;
   for (const char c : name)
-    hash = (hash ^ static_cast<unsigned char>(c)) * prime;
-  return static_cast<std::int64_t>(hash);
+    hash = (hash ^ static_cast<unsigned char>(c)) * 0x100000001B3;
+  return static_cast<std::int64_t>((hash ^ (hash >> 32)) & 0x7FFFFFFF);
 }
 
 }  // namespace
@@ -73,6 +72,10 @@ Result<std::optional<ObjectRow>> IdentityStore::readObject(Statement& statement)
   auto found = statement.step();
   if (!found) return fail(found.error());
   if (!*found) return std::nullopt;
+  return objectIn(statement);
+}
+
+ObjectRow IdentityStore::objectIn(const Statement& statement) {
   ObjectRow row;
   row.slot = statement.unsignedInteger(0);
   row.inode = statement.unsignedInteger(1);
@@ -119,7 +122,7 @@ Result<std::optional<ObjectRow>> IdentityStore::objectByDocumentID(std::uint32_t
 Result<std::optional<ObjectRow>> IdentityStore::objectAt(std::uint64_t folder,
                                                          std::string_view name) {
   return readObject(
-      statements_->byPlace.bind(1, folder).bindBlob(2, name).bind(3, placeHash(folder, name)));
+      statements_->byPlace.bind(1, folder).bindBlob(2, name).bind(3, placeHash(name)));
 }
 
 Result<std::optional<ObjectRow>> IdentityStore::foreignObject(std::uint64_t fileSystem,
@@ -183,7 +186,7 @@ Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view na
     if (*handover) return true;
   }
   Statement& statement =
-      statements_->occupied.bind(1, folder).bindBlob(2, name).bind(3, placeHash(folder, name));
+      statements_->occupied.bind(1, folder).bindBlob(2, name).bind(3, placeHash(name));
   StatementScope scope(statement);
   return statement.step();
 }
@@ -206,7 +209,7 @@ Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
   statement.bind(5, static_cast<std::int64_t>(row.kind));
   if (row.location) {
     statement.bind(6, row.location->folder).bindBlob(7, row.location->name);
-    statement.bind(15, placeHash(row.location->folder, row.location->name));
+    statement.bind(15, placeHash(row.location->name));
   } else {
     statement.bindNull(6).bindNull(7).bindNull(15);
   }
@@ -219,6 +222,39 @@ Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
 
 Result<void> IdentityStore::remove(std::uint64_t slot) {
   return statements_->remove.bind(1, slot).run();
+}
+
+Result<std::vector<ObjectRow>> IdentityStore::childrenOf(std::uint64_t folder) {
+  Statement& statement = statements_->children.bind(1, folder);
+  StatementScope scope(statement);
+  std::vector<ObjectRow> result;
+  while (true) {
+    auto found = statement.step();
+    if (!found) return fail(found.error());
+    if (!*found) return result;
+    result.push_back(objectIn(statement));
+  }
+}
+
+Result<std::uint64_t> IdentityStore::nameCount(std::uint64_t folder) {
+  Statement& statement = statements_->nameCount.bind(1, folder);
+  StatementScope scope(statement);
+  auto found = statement.step();
+  if (!found) return fail(found.error());
+  return statement.unsignedInteger(0);
+}
+
+Result<std::vector<std::pair<std::string, std::uint64_t>>> IdentityStore::linksIn(
+    std::uint64_t folder) {
+  Statement& statement = statements_->linksIn.bind(1, folder);
+  StatementScope scope(statement);
+  std::vector<std::pair<std::string, std::uint64_t>> result;
+  while (true) {
+    auto found = statement.step();
+    if (!found) return fail(found.error());
+    if (!*found) return result;
+    result.emplace_back(std::string(statement.blob(0)), statement.unsignedInteger(1));
+  }
 }
 
 Result<std::optional<std::uint64_t>> IdentityStore::linkAt(std::uint64_t folder,

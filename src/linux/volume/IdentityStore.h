@@ -114,10 +114,18 @@ class IdentityStore {
   [[nodiscard]] Result<void> put(const ObjectRow& row);
   [[nodiscard]] Result<void> remove(std::uint64_t slot);
 
+  /// What lies in a folder, further links not counted.
+  [[nodiscard]] Result<std::vector<ObjectRow>> childrenOf(std::uint64_t folder);
+  /// How many names the index has in a folder, further links among them.
+  [[nodiscard]] Result<std::uint64_t> nameCount(std::uint64_t folder);
+
   /// Further names of hard-linked objects.
   [[nodiscard]] Result<std::optional<std::uint64_t>> linkAt(std::uint64_t folder,
                                                             std::string_view name);
   [[nodiscard]] Result<std::vector<Location>> links(std::uint64_t slot);
+  /// Names and slots of the links in a folder.
+  [[nodiscard]] Result<std::vector<std::pair<std::string, std::uint64_t>>> linksIn(
+      std::uint64_t folder);
   [[nodiscard]] Result<void> addLink(const Location& location, std::uint64_t slot);
   [[nodiscard]] Result<void> removeLink(std::uint64_t folder, std::string_view name);
 
@@ -138,6 +146,7 @@ class IdentityStore {
   [[nodiscard]] Result<void> make();
   [[nodiscard]] Result<void> prepare();
   [[nodiscard]] Result<std::optional<ObjectRow>> readObject(Statement& statement);
+  [[nodiscard]] static ObjectRow objectIn(const Statement& statement);
   [[nodiscard]] Result<bool> stepTo(std::uint64_t inode);
   [[nodiscard]] Result<void> write(Statement& statement, const ObjectRow& row);
 

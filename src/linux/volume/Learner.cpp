@@ -12,15 +12,16 @@
 
 namespace mirabel {
 
-Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, const MonitoredRoots& roots,
-                 std::uint64_t device, PackageNames isPackageName)
+Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+                 const MonitoredRoots& roots, std::uint64_t device, PackageNames isPackageName)
     : store_(store),
+      recorder_(recorder),
       roots_(roots),
       device_(device),
       isPackageName_(std::move(isPackageName)),
       paths_(store, roots, device),
       finder_(roots, device),
-      placer_(store, allocator, finder_, roots, paths_, *this, device, isPackageName_) {
+      placer_(store, allocator, recorder, finder_, roots, paths_, *this, device, isPackageName_) {
   placer_.setOthers([] { return std::vector<ObjectRow>(); });
 }
 
@@ -242,6 +243,16 @@ Result<std::optional<ObjectRow>> Learner::objectInPlace(const SeenObject& seen) 
   return *standing ? row : std::nullopt;
 }
 
+Result<void> Learner::leave(ObjectRow row) {
+  const Location from = *row.location;
+  auto promoted = placer_.promoteLink(row);
+  if (!promoted) return fail(promoted.error());
+  if (*promoted) return recorder_.moved(row, from, *row.location);
+  row.location.reset();
+  if (auto told = recorder_.gone(row, from); !told) return told;
+  return store_.put(row);
+}
+
 // Finding again ---------------------------------------------------------------------------------
 
 Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
@@ -291,8 +302,8 @@ Result<std::optional<std::string>> Learner::search(ObjectRow row) {
   const auto found = finder_.find(row, hint.value_or(roots_.paths().front()),
                                   [] { return std::vector<ObjectRow>(); });
   if (!found) {
-    row.location.reset();
-    if (auto written = store_.put(row); !written) return fail(written.error());
+    if (!row.location) return std::nullopt;
+    if (auto left = leave(std::move(row)); !left) return fail(left.error());
     return std::nullopt;
   }
   auto placed = placer_.placeFound(std::move(row), *found);

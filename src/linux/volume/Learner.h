@@ -22,8 +22,8 @@ class Learner final : private FolderIdentities {
   using PackageNames = std::function<bool(std::string_view)>;
 
   /// References outlive it. `device` is the number of the volume's own file system.
-  Learner(IdentityStore& store, IdentifierAllocator& allocator, const MonitoredRoots& roots,
-          std::uint64_t device, PackageNames isPackageName);
+  Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+          const MonitoredRoots& roots, std::uint64_t device, PackageNames isPackageName);
 
   /// File ID of the folder at `path`, which is open as `folder`; learns it and the folders above
   /// where they are not known to lie there.
@@ -39,6 +39,9 @@ class Learner final : private FolderIdentities {
   /// Where the object lies now, the disk being right; nothing when it is not to be found. What
   /// was found out is in the index then, a save of the document by another object included.
   [[nodiscard]] Result<std::optional<std::string>> find(std::uint64_t fileID);
+  /// Takes in that the object is not at its place, nor anywhere that was looked at: it goes on
+  /// under another of its names, or is detached.
+  [[nodiscard]] Result<void> leave(ObjectRow row);
   /// File ID of the object that holds the document now.
   [[nodiscard]] Result<std::optional<std::uint64_t>> holderOf(std::uint32_t documentID);
 
@@ -81,6 +84,7 @@ class Learner final : private FolderIdentities {
                                                          std::span<const Sighting> sightings);
 
   IdentityStore& store_;
+  ChangeRecorder& recorder_;
   const MonitoredRoots& roots_;
   std::uint64_t device_;
   PackageNames isPackageName_;

@@ -29,11 +29,13 @@ class Deeper {
 
 }  // namespace
 
-Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
-               const MonitoredRoots& roots, const IndexedPaths& paths, FolderIdentities& folders,
-               std::uint64_t device, std::function<bool(std::string_view)> isPackageName)
+Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+               ObjectFinder& finder, const MonitoredRoots& roots, const IndexedPaths& paths,
+               FolderIdentities& folders, std::uint64_t device,
+               std::function<bool(std::string_view)> isPackageName)
     : store_(store),
       allocator_(allocator),
+      recorder_(recorder),
       finder_(finder),
       roots_(roots),
       paths_(paths),
@@ -77,18 +79,42 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
 // Known objects ---------------------------------------------------------------------------------
 
 Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
-  const bool changed = row.kind != arrival.kind || isStale(row, arrival.seen.status);
+  const bool changedKind = row.kind != arrival.kind;
+  bool isKnownName = row.location == arrival.location;
+  const bool changed = changedKind || row.changeTime != arrival.seen.status.changeTime;
+  const bool stale = changed || isStale(row, arrival.seen.status);
   row.kind = arrival.kind;
   refresh(row, arrival.seen.status);
   const std::uint32_t before = row.documentID;
   if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
-  if (row.location != arrival.location) {
+  if (!isKnownName) {
+    auto link = store_.linkAt(arrival.location.folder, arrival.location.name);
+    if (!link) return fail(link.error());
+    isKnownName = *link == row.slot;
     auto further = isFurtherLink(arrival, row);
     if (!further) return fail(further.error());
-    if (!*further) return moveTo(arrival, std::move(row));
+    if (!*further) return moveTo(arrival, std::move(row), changedKind);
   }
-  if (!changed && row.documentID == before) return row;
-  return put(std::move(row));
+  if (isKnownName && !stale && row.documentID == before) return row;
+  auto written = put(std::move(row));
+  if (!written || (isKnownName && !changed)) return written;
+  if (auto told = tellChange(*written, arrival.location, changedKind); !told) {
+    return fail(told.error());
+  }
+  return written;
+}
+
+// An object that changed is told under each of its names.
+Result<void> Placer::tellChange(const ObjectRow& row, const Location& location, bool changedKind) {
+  if (!recorder_.isActive()) return {};
+  auto names = store_.links(row.slot);
+  if (!names) return fail(names.error());
+  if (row.location) names->push_back(*row.location);
+  if (std::ranges::find(*names, location) == names->end()) names->push_back(location);
+  for (const Location& name : *names) {
+    if (auto told = recorder_.changed(row, name, changedKind); !told) return told;
+  }
+  return changedKind ? recorder_.contents(row.fileID) : Result<void>();
 }
 
 Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row) {
@@ -108,7 +134,7 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
   return true;
 }
 
-Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
+Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool changedKind) {
   const std::optional<Location> from = std::exchange(row.location, std::nullopt);
   // Off its old name first: what is found to lie there now can then be put there.
   if (auto detached = store_.put(row); !detached) return fail(detached.error());
@@ -133,7 +159,18 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row) {
     auto noted = store_.addHandover(*from, {own, row.kind});
     if (!noted) return fail(noted.error());
   }
-  return put(std::move(row));
+  auto written = put(std::move(row));
+  if (!written) return written;
+  if (*inherited) {
+    // Its own document ends here, at least for now: the name's goes on.
+    auto told = recorder_.handedOn(own, written->fileID, 0);
+    if (told) told = recorder_.handedOn(**inherited, 0, written->fileID);
+    if (!told) return fail(told.error());
+  }
+  auto told = recorder_.moved(*written, from, arrival.location, changedKind);
+  if (told && changedKind) told = tellChange(*written, arrival.location, true);
+  if (!told) return fail(told.error());
+  return written;
 }
 
 Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& found) {
@@ -164,7 +201,8 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
     auto again = slotOf(arrival.seen);
     if (!again) return fail(again.error());
     if (again->row && compare(*again->row, arrival.seen) == Match::same) {
-      return placeKnown(arrival, std::move(*again->row));
+      return document ? adopt(arrival, std::move(*again->row), *document)
+                      : Result<ObjectRow>(fail(document.error()));
     }
   }
   if (!document) return fail(document.error());
@@ -194,7 +232,21 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
   const bool isOwnDocument = !*document && row.documentID != 0;
   row.slot = isOwnDocument ? row.documentID : allocator_.nextUpperSlot();
   if (auto inserted = store_.insert(row); !inserted) return fail(inserted.error());
+  Result<void> told;
+  if (*document) told = recorder_.handedOn(**document, 0, row.fileID);
+  if (told) told = recorder_.changed(row, arrival.location);
+  if (!told) return fail(told.error());
   return row;
+}
+
+Result<ObjectRow> Placer::adopt(const Arrival& arrival, ObjectRow row,
+                                std::optional<std::uint32_t> document) {
+  if (!document || !isDocumentKind(row.kind)) return placeKnown(arrival, std::move(row));
+  if (auto own = take(row); !own) return fail(own.error());
+  row.documentID = *document;
+  if (auto written = store_.put(row); !written) return fail(written.error());
+  if (auto told = recorder_.handedOn(*document, 0, row.fileID); !told) return fail(told.error());
+  return placeKnown(arrival, std::move(row));
 }
 
 // What was there before -------------------------------------------------------------------------
@@ -206,7 +258,12 @@ Placer::Inheritance Placer::retire(ObjectRow former, const Arrival& arrival) {
   if (auto dropped = dropLinks(former.slot); !dropped) return fail(dropped.error());
   if (former.location) names->push_back(std::move(*former.location));
   former.location.reset();
-  const std::uint32_t document = take(former);
+  for (const Location& name : *names) {
+    if (auto told = recorder_.gone(former, name); !told) return fail(told.error());
+  }
+  auto taken = take(former);
+  if (!taken) return fail(taken.error());
+  const std::uint32_t document = *taken;
   if (auto written = store_.put(former); !written) return fail(written.error());
   if (document == 0 || !isDocumentKind(former.kind)) return std::nullopt;
   const bool hadThisName = std::ranges::find(*names, arrival.location) != names->end();
@@ -243,10 +300,12 @@ Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivin
                           isBackupOf(*(*occupant)->location, arrival.location);
     return isBackup ? handOver(std::move(**occupant)) : std::nullopt;
   }
+  // Where a folder or a link went is found out when somebody asks, unless there is a history to
+  // tell of it; whose a document is, now.
+  if (isDocument || recorder_.isActive()) return settleOccupant(arrival, std::move(**occupant));
   (*occupant)->location.reset();
   if (auto detached = store_.put(**occupant); !detached) return fail(detached.error());
-  // Where a folder or a link went is found out when somebody asks; whose a document is, now.
-  return isDocument ? vacateDocument(arrival, std::move(**occupant)) : std::nullopt;
+  return std::nullopt;
 }
 
 Result<bool> Placer::hasOtherName(ObjectRow& row, const Location& lost) {
@@ -260,33 +319,43 @@ Result<bool> Placer::hasOtherName(ObjectRow& row, const Location& lost) {
 Placer::Inheritance Placer::handOver(ObjectRow backup) {
   auto own = allocator_.nextDocumentID();
   if (!own) return fail(own.error());
-  const std::uint32_t document = take(backup);
+  auto document = take(backup);
+  if (!document) return fail(document.error());
   backup.documentID = *own;
   if (auto written = store_.put(backup); !written) return fail(written.error());
-  return document;
+  if (auto told = tellChange(backup, *backup.location, false); !told) return fail(told.error());
+  return *document;
 }
 
-Placer::Inheritance Placer::vacateDocument(const Arrival& arrival, ObjectRow occupant) {
+Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occupant) {
   const Deeper deeper(depth_);
+  const ObjectRow before = occupant;
+  // One of which only a further link was known had this name, too.
+  const Location from = occupant.location.value_or(arrival.location);
+  occupant.location.reset();
+  if (auto detached = store_.put(occupant); !detached) return fail(detached.error());
   if (depth_ > deepestChain) return std::nullopt;
-  const bool canInherit = occupant.kind == arrival.kind;
   const auto found = finder_.find(occupant, arrival.folderPath, others_);
-  if (!found) {
-    if (!canInherit) return std::nullopt;
-    const std::uint32_t document = take(occupant);
-    if (auto written = store_.put(occupant); !written) return fail(written.error());
-    return document;
-  }
-  const bool isInSameFolder = found->folderPath == arrival.folderPath;
+  const bool isInSameFolder = found && found->folderPath == arrival.folderPath;
   // Whoever arrives was seen there a moment ago: names are changing hands faster than they are
   // read, and the next look will tell.
   if (isInSameFolder && found->name == arrival.location.name) return fail(Error::posix(ESTALE));
   const bool isBackup = isInSameFolder && isBackupName(found->name, arrival.location.name);
+  const bool canInherit =
+      occupant.kind == arrival.kind && isDocumentKind(occupant.kind) && occupant.documentID != 0;
   std::optional<std::uint32_t> inherited;
-  if (isBackup && canInherit) {
-    inherited = take(occupant);
+  if (canInherit && (!found || isBackup)) {
+    auto taken = take(occupant);
+    if (!taken) return fail(taken.error());
+    inherited = *taken;
     if (auto written = store_.put(occupant); !written) return fail(written.error());
   }
+  if (!found) {
+    // The document may go on; the object, and what lay in it, does not.
+    if (auto told = recorder_.gone(occupant, from); !told) return fail(told.error());
+    return inherited;
+  }
+  if (auto told = recorder_.changed(before, from); !told) return fail(told.error());
   auto moved = placeFound(std::move(occupant), *found);
   if (!moved) return fail(moved.error());
   return inherited;
@@ -308,14 +377,18 @@ Placer::Inheritance Placer::takeHandover(const Arrival& arrival, std::uint32_t o
     if (!isBackupOf(*backup.location, arrival.location)) return std::nullopt;
     return handOver(std::move(backup));
   }
-  take(backup);
+  if (auto taken = take(backup); !taken) return fail(taken.error());
   if (auto written = store_.put(backup); !written) return fail(written.error());
   return document;
 }
 
-std::uint32_t Placer::take(ObjectRow& holder) {
-  if (holder.documentID != 0) takenDocuments_.insert(holder.documentID);
-  return std::exchange(holder.documentID, 0);
+Result<std::uint32_t> Placer::take(ObjectRow& holder) {
+  const std::uint32_t document = std::exchange(holder.documentID, 0);
+  if (document == 0) return document;
+  takenDocuments_.insert(document);
+  auto told = recorder_.handedOn(document, holder.fileID, 0);
+  if (!told) return fail(told.error());
+  return document;
 }
 
 Result<bool> Placer::promoteLink(ObjectRow& row) {

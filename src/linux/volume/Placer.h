@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "linux/volume/ChangeRecorder.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/IndexedPaths.h"
@@ -55,9 +56,10 @@ class FolderIdentities {
 class Placer {
  public:
   /// References outlive it. `device` is the number of the volume's own file system.
-  Placer(IdentityStore& store, IdentifierAllocator& allocator, ObjectFinder& finder,
-         const MonitoredRoots& roots, const IndexedPaths& paths, FolderIdentities& folders,
-         std::uint64_t device, std::function<bool(std::string_view)> isPackageName);
+  Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
+         ObjectFinder& finder, const MonitoredRoots& roots, const IndexedPaths& paths,
+         FolderIdentities& folders, std::uint64_t device,
+         std::function<bool(std::string_view)> isPackageName);
 
   /// The row as it is afterwards. POSIX error ESTALE when the entry went away meanwhile.
   [[nodiscard]] Result<ObjectRow> place(Arrival arrival);
@@ -81,7 +83,13 @@ class Placer {
   [[nodiscard]] Result<ObjectRow> placeKnown(const Arrival& arrival, ObjectRow row);
   [[nodiscard]] Result<ObjectRow> placeNew(const Arrival& arrival, const Slot& slot,
                                            std::string handle);
-  [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row);
+  /// Takes over a row that came to be while its arrival was under way, with the document that the
+  /// arrival inherited.
+  [[nodiscard]] Result<ObjectRow> adopt(const Arrival& arrival, ObjectRow row,
+                                        std::optional<std::uint32_t> document);
+  [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row, bool changedKind);
+  [[nodiscard]] Result<void> tellChange(const ObjectRow& row, const Location& location,
+                                        bool changedKind);
   [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, const ObjectRow& row);
 
   /// A document ID that an arrival takes over; nothing when it takes none.
@@ -93,9 +101,10 @@ class Placer {
   [[nodiscard]] Inheritance inherit(const Arrival& arrival, std::uint64_t arrivingSlot,
                                     std::uint32_t ownDocument);
   [[nodiscard]] Inheritance vacate(const Arrival& arrival, std::uint64_t arrivingSlot);
-  [[nodiscard]] Inheritance vacateDocument(const Arrival& arrival, ObjectRow occupant);
+  [[nodiscard]] Inheritance settleOccupant(const Arrival& arrival, ObjectRow occupant);
   [[nodiscard]] Inheritance takeHandover(const Arrival& arrival, std::uint32_t ownDocument);
-  std::uint32_t take(ObjectRow& holder);
+  /// Takes the holder's document, 0 where it has none, and tells that it did.
+  [[nodiscard]] Result<std::uint32_t> take(ObjectRow& holder);
   /// Takes the document from a backup, which gets one of its own.
   [[nodiscard]] Inheritance handOver(ObjectRow backup);
   /// Whether the object stands under another name than the one it lost; its row then has that.
@@ -107,6 +116,7 @@ class Placer {
 
   IdentityStore& store_;
   IdentifierAllocator& allocator_;
+  ChangeRecorder& recorder_;
   ObjectFinder& finder_;
   const MonitoredRoots& roots_;
   const IndexedPaths& paths_;

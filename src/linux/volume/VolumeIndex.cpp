@@ -7,6 +7,7 @@
 
 #include "linux/kernel/LongPath.h"
 #include "linux/volume/Learner.h"
+#include "linux/volume/Reconciler.h"
 #include "linux/volume/VolumeState.h"
 #include "linux/volume/VolumeUUID.h"
 
@@ -16,10 +17,14 @@ namespace {
 class StoredVolumeIndex final : public VolumeIndex {
  public:
   StoredVolumeIndex(std::unique_ptr<VolumeState> state, const MonitoredRoots& roots,
-                    std::uint64_t device, std::function<bool(std::string_view)> isPackageName)
+                    std::uint64_t device,
+                    const std::function<bool(std::string_view)>& isPackageName)
       : state_(std::move(state)),
         roots_(roots),
-        learner_(state_->store(), state_->allocator(), roots, device, std::move(isPackageName)),
+        paths_(state_->store(), roots, device),
+        recorder_(state_->store(), state_->journal(), paths_, roots, isPackageName),
+        learner_(state_->store(), state_->allocator(), recorder_, roots, device, isPackageName),
+        reconciler_(learner_, state_->store(), recorder_, roots, device, isPackageName),
         device_(device) {}
 
   Result<void> learn(const std::string& folderPath, int folder,
@@ -65,6 +70,25 @@ class StoredVolumeIndex final : public VolumeIndex {
     return *fileID;
   }
 
+  Result<void> reconcile() override {
+    const std::scoped_lock lock(mutex_);
+    return reconcileLocked();
+  }
+
+  Result<std::uint64_t> currentEventID() override {
+    const std::scoped_lock lock(mutex_);
+    if (auto done = reconcileLocked(); !done) return fail(done.error());
+    auto begun = state_->transaction([&] { return state_->journal().activate(); });
+    if (!begun) return fail(begun.error());
+    return state_->journal().lastID();
+  }
+
+  Result<std::vector<JournalRecord>> events(std::uint64_t since, std::size_t limit) override {
+    const std::scoped_lock lock(mutex_);
+    if (!state_->journal().canReplay(since)) return fail(Error::posix(ESTALE));
+    return state_->journal().replay(since, limit);
+  }
+
   UUID historyUUID() const override { return state_->history(); }
 
   std::uint32_t device() const override {
@@ -73,6 +97,10 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
  private:
+  Result<void> reconcileLocked() {
+    return reconciler_.run([&](const auto& work) { return state_->transaction(work); });
+  }
+
   Result<void> find(std::uint64_t fileID, std::optional<std::string>& path) {
     auto found = learner_.find(fileID);
     if (!found) return fail(found.error());
@@ -89,7 +117,10 @@ class StoredVolumeIndex final : public VolumeIndex {
   std::mutex mutex_;
   std::unique_ptr<VolumeState> state_;
   const MonitoredRoots& roots_;
+  IndexedPaths paths_;
+  ChangeRecorder recorder_;
   Learner learner_;
+  Reconciler reconciler_;
   std::uint64_t device_;
 };
 
@@ -107,7 +138,7 @@ Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(const MonitoredRoots& roo
   if (!state) return fail(state.error());
   if (!options.isPackageName) options.isPackageName = [](std::string_view) { return false; };
   return std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device,
-                                             std::move(options.isPackageName));
+                                             options.isPackageName);
 }
 
 }  // namespace mirabel

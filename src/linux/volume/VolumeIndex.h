@@ -8,11 +8,13 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "foundation/Values.h"
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/kernel/ObjectStatus.h"
+#include "linux/volume/EventJournal.h"
 
 namespace mirabel {
 
@@ -63,6 +65,17 @@ class VolumeIndex {
   [[nodiscard]] virtual Result<std::string> pathOfFileID(std::uint64_t fileID) = 0;
   /// ENOENT when no object holds the document.
   [[nodiscard]] virtual Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) = 0;
+
+  /// Brings the index in step with everything below the roots, by a look at every entry. What
+  /// differs becomes events.
+  [[nodiscard]] virtual Result<void> reconcile() = 0;
+  /// Reconciles, and answers the ID of the last event: whatever a finished system call changed has
+  /// an ID at or below it. The first call begins the history.
+  [[nodiscard]] virtual Result<std::uint64_t> currentEventID() = 0;
+  /// At most `limit` events after `since`, oldest first. Error: POSIX ESTALE when some of them are
+  /// no longer kept, or `since` was never given out.
+  [[nodiscard]] virtual Result<std::vector<JournalRecord>> events(std::uint64_t since,
+                                                                  std::size_t limit) = 0;
 
   [[nodiscard]] virtual UUID historyUUID() const = 0;
   /// The volume's number as the system sees it; never 0.

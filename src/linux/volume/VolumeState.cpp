@@ -106,6 +106,7 @@ VolumeState::Trust VolumeState::assess() const {
 
 Result<void> VolumeState::setAside(const Notice& notice) {
   allocator_.reset();
+  journal_.reset();
   store_.reset();
   database_.reset();
   std::string aside;
@@ -150,7 +151,10 @@ Result<void> VolumeState::openDatabase(Trust trust) {
       return fail(Error::store(SQLITE_CORRUPT, "the database was changed from outside"));
     }
   }
+  auto journal = EventJournal::open(**database);
+  if (!journal) return fail(journal.error());
   database_ = std::move(*database);
+  journal_ = std::move(*journal);
   store_ = std::move(*store);
   return {};
 }
@@ -213,12 +217,14 @@ Result<void> VolumeState::transaction(const std::function<Result<void>()>& work)
   if (auto undone = database_->execute("ROLLBACK"); !undone) {
     logDebug("can't roll back; " + undone.error().description());
   }
+  if (auto reloaded = journal_->reload(); !reloaded) broken_ = reloaded.error();
   return done;
 }
 
 Result<void> VolumeState::commit(std::int64_t changesBefore) {
   if (database_->changeCount() == changesBefore) return database_->execute("COMMIT");
   if (auto saved = allocator_->save(); !saved) return saved;
+  if (auto saved = journal_->saveBounds(); !saved) return saved;
   const bool isFirst = !hasWritten_;
   if (isFirst) {
     if (auto begun = beginSession(); !begun) return begun;
@@ -248,6 +254,7 @@ void VolumeState::noteFailure(const Error& error) {
 
 void VolumeState::closeInOrder() {
   allocator_.reset();
+  journal_.reset();
   store_.reset();
   if (!database_ || !hasWritten_) return;
   if (broken_ || !database_->checkpoint()) return;

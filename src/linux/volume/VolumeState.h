@@ -7,6 +7,7 @@
 
 #include "foundation/Error.h"
 #include "linux/volume/Database.h"
+#include "linux/volume/EventJournal.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/StateFolder.h"
@@ -36,6 +37,7 @@ class VolumeState {
 
   [[nodiscard]] IdentityStore& store() { return *store_; }
   [[nodiscard]] IdentifierAllocator& allocator() { return *allocator_; }
+  [[nodiscard]] EventJournal& journal() { return *journal_; }
   [[nodiscard]] const UUID& history() const { return witness_.history; }
 
   /// Runs `work` in a transaction. What it wrote is on disk when this returns without an error,
@@ -63,6 +65,7 @@ class VolumeState {
   bool hasWitness_ = false;
   std::unique_ptr<Database> database_;
   std::unique_ptr<IdentityStore> store_;
+  std::unique_ptr<EventJournal> journal_;
   std::unique_ptr<IdentifierAllocator> allocator_;
   bool hasWritten_ = false;
   std::optional<Error> broken_;

@@ -1,0 +1,73 @@
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "linux/volume/Database.h"
+
+namespace mirabel {
+
+/// One record of the history. Either something happened at a path, or a document passed from one
+/// object to another.
+struct JournalRecord {
+  std::uint64_t id = 0;
+  bool isDocument = false;
+  // Path records.
+  std::uint64_t folder = 0;  ///< file ID of the folder that `path` lies in; 0 for a root
+  std::string path;
+  std::uint64_t fileID = 0;
+  bool changedKind = false;  ///< a folder became a package, or stopped being one
+  // Both; 0 in a path record of what is no document.
+  std::uint32_t documentID = 0;
+  // Document records; 0 for none.
+  std::uint64_t source = 0;
+  std::uint64_t destination = 0;
+};
+
+/// The event history of a volume, a table of its database: written in the transactions that change
+/// the index, so that the two never disagree. IDs are consecutive and never used twice. Used under
+/// the lock of the index.
+class EventJournal {
+ public:
+  [[nodiscard]] static Result<std::unique_ptr<EventJournal>> open(Database& database);
+
+  /// Nothing is recorded before the first anchor is handed out: nobody could ask for it.
+  [[nodiscard]] bool isActive() const { return isActive_; }
+  [[nodiscard]] Result<void> activate();
+
+  [[nodiscard]] Result<void> append(const JournalRecord& record);
+  /// Writes what `append` counted; to be called before the transaction ends.
+  [[nodiscard]] Result<void> saveBounds();
+
+  /// ID of the last record; 0 before the first.
+  [[nodiscard]] std::uint64_t lastID() const { return nextID_ - 1; }
+  /// Whether every record after `since` is still here, and `since` was ever given out.
+  [[nodiscard]] bool canReplay(std::uint64_t since) const {
+    return isActive_ && since + 1 >= firstID_ && since < nextID_;
+  }
+  /// At most `limit` records after `since`, oldest first.
+  [[nodiscard]] Result<std::vector<JournalRecord>> replay(std::uint64_t since, std::size_t limit);
+
+  /// Forgets the oldest records until `kept` are left.
+  [[nodiscard]] Result<void> prune(std::uint64_t kept);
+
+  /// Takes back what was counted since the transaction began; to be called after a rollback.
+  [[nodiscard]] Result<void> reload();
+
+ private:
+  explicit EventJournal(Database& database) : database_(database) {}
+  Database& database_;
+  std::vector<Statement> statements_;
+  std::uint64_t firstID_ = 1;
+  std::uint64_t nextID_ = 1;
+  std::uint64_t savedNextID_ = 1;
+  bool isActive_ = false;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,152 @@
+#include "convergence/Host.h"
+
+#include <future>
+#include <gtest/gtest.h>
+#include <stdexcept>
+#include <utility>
+
+#include "foundation/Values.h"
+
+namespace mirabel::testing {
+namespace {
+
+std::string text(const std::optional<Date>& date) {
+  return date ? date->rfc3339() : "-";
+}
+
+HeldItem heldItem(const LocalItem& item) {
+  std::string properties = item.typeIdentifier();
+  const auto add = [&](const std::string& value) { properties += " | " + value; };
+  add(item.documentSize() ? item.documentSize()->description() : "-");
+  add(text(item.creationDate()));
+  add(text(item.contentModificationDate()));
+  add(item.childItemCount() ? std::to_string(*item.childItemCount()) : "-");
+  add(std::to_string(item.capabilities()));
+  add(item.isTrashed() ? "trashed" : "-");
+  add(text(item.lastUsedDate()));
+  add(item.tagData() ? std::string(stringView(*item.tagData())) : "-");
+  add(item.favoriteRank() ? item.favoriteRank()->description() : "-");
+  add(item.fileID() ? std::to_string(*item.fileID()) : "-");
+  return {item.parentItemIdentifier(), item.filename(), properties};
+}
+
+class PageCollector final : public VesselEnumerationObserver {
+ public:
+  void didEnumerateItems(const VesselItems& items) override { collected = items; }
+  void finishEnumeratingUpToPage(const std::optional<Data>& page) override { next = page; }
+  void finishEnumeratingWithError(const Error& failure) override { error = failure; }
+
+  VesselItems collected;
+  std::optional<Data> next;
+  std::optional<Error> error;
+};
+
+class ChangeCollector final : public VesselChangeObserver {
+ public:
+  void didUpdateItems(const VesselItems& items) override {
+    updated.insert(updated.end(), items.begin(), items.end());
+  }
+  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override {
+    deleted.insert(deleted.end(), identifiers.begin(), identifiers.end());
+  }
+  void finishEnumeratingChangesUpToSyncAnchor(const Data& reached, bool more) override {
+    anchor = reached;
+    moreComing = more;
+    done.set_value();
+  }
+  void finishEnumeratingWithError(const Error& failure) override {
+    error = failure;
+    done.set_value();
+  }
+
+  VesselItems updated;
+  std::vector<std::string> deleted;
+  Data anchor;
+  bool moreComing = false;
+  std::optional<Error> error;
+  std::promise<void> done;
+};
+
+}  // namespace
+
+Host::Host(const std::string& home) {
+  LinuxPlatform::Options options;
+  options.home = home;
+  auto opened = LinuxPlatform::open(std::move(options));
+  if (!opened) throw std::runtime_error(opened.error().description());
+  platform_ = std::move(*opened);
+  const Platform& platform = platform_->platform();
+  identity_ = std::make_unique<FileObjectURLs>(platform, roots_);
+  const ItemContext context{platform, *identity_, owners_};
+  enumerations_ = std::make_unique<FSChangesEnumerations>(context, platform_->events(), roots_);
+  vessel_ = std::make_unique<LocalVessel>(
+      platform, roots_, owners_, ChangeServices{platform_->events(), diagnostics_, *enumerations_});
+}
+
+std::string Host::identifierOf(const std::string& path) const {
+  return vessel_->persistentIdentifierForItemAtURL(URL::fileURL(path)).value_or("");
+}
+
+std::shared_ptr<VesselEnumerator> Host::enumerator(const std::string& container) {
+  auto made = vessel_->enumeratorForContainerItemIdentifier(container);
+  EXPECT_TRUE(made) << container << ": " << (made ? "" : made.error().description());
+  return made.value_or(nullptr);
+}
+
+// A client of a folder holds what has that folder as its parent.
+void Host::apply(Replica& replica, const LocalItem& item) const {
+  const bool isFolder = replica.container != VesselWorkingSetContainerItemIdentifier &&
+                        replica.container != VesselAllDirectoriesContainerItemIdentifier;
+  if (isFolder && item.parentItemIdentifier() != replica.container) {
+    replica.items.erase(item.itemIdentifier());
+    return;
+  }
+  replica.items.insert_or_assign(item.itemIdentifier(), heldItem(item));
+}
+
+Replica Host::list(const std::string& container) {
+  Replica replica{container, {}, {}};
+  const auto enumerating = enumerator(container);
+  if (!enumerating) return replica;
+  enumerating->currentSyncAnchor([&](std::optional<Data> anchor) {
+    ASSERT_TRUE(anchor);
+    replica.anchor = *anchor;
+  });
+  Data page = dataFromString(VesselInitialPageSortedByName);
+  while (true) {
+    PageCollector collector;
+    enumerating->enumerateItems(collector, page);
+    EXPECT_FALSE(collector.error) << container << ": " << collector.error->description();
+    for (const auto& item : collector.collected)
+      apply(replica, *item);
+    if (!collector.next) return replica;
+    page = *collector.next;
+  }
+}
+
+void Host::catchUp(Replica& replica) {
+  const auto enumerating = enumerator(replica.container);
+  if (!enumerating) return;
+  for (bool more = true; more;) {
+    const auto collector = std::make_shared<ChangeCollector>();
+    enumerating->enumerateChanges(collector, replica.anchor);
+    collector->done.get_future().wait();
+    if (collector->error) {
+      ASSERT_TRUE(collector->error->is(VesselErrorCode::syncAnchorExpired))
+          << collector->error->description();
+      const int restarts = replica.restarts + 1;
+      replica = list(replica.container);
+      replica.restarts = restarts;
+      return;
+    }
+    for (const auto& item : collector->updated)
+      apply(replica, *item);
+    for (const std::string& identifier : collector->deleted)
+      replica.items.erase(identifier);
+    EXPECT_LE(collector->updated.size() + collector->deleted.size(), 100u);
+    replica.anchor = collector->anchor;
+    more = collector->moreComing;
+  }
+}
+
+}  // namespace mirabel::testing

@@ -1,0 +1,57 @@
+#pragma once
+
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "fs/FSChangesEnumerator.h"
+#include "linux/files/LinuxPlatform.h"
+#include "linux/log/LoggingDiagnosticReporter.h"
+#include "provider/LocalVessel.h"
+
+namespace mirabel::testing {
+
+/// What a client keeps of one item: every property that it is told.
+struct HeldItem {
+  std::string parent;
+  std::string filename;
+  std::string text;  ///< the other properties, in one line
+  friend bool operator==(const HeldItem&, const HeldItem&) = default;
+};
+
+/// A client's copy of one container, with the anchor that it is good for.
+struct Replica {
+  std::string container;
+  std::map<std::string, HeldItem> items;
+  Data anchor;
+  int restarts = 0;
+};
+
+/// The provider of a home on real disk, with a host that lists and asks for changes as the
+/// protocol has it. Destroying it closes everything, as a process that ends does.
+class Host {
+ public:
+  explicit Host(const std::string& home);
+
+  /// Takes an anchor, then lists.
+  [[nodiscard]] Replica list(const std::string& container);
+  /// Asks for changes until there are no more, and applies them; lists again when told to start
+  /// over.
+  void catchUp(Replica& replica);
+  [[nodiscard]] std::string identifierOf(const std::string& path) const;
+
+ private:
+  std::shared_ptr<VesselEnumerator> enumerator(const std::string& container);
+  void apply(Replica& replica, const LocalItem& item) const;
+
+  std::unique_ptr<LinuxPlatform> platform_;
+  NoAppLibraryRoots roots_;
+  NoAppLibraryOwners owners_;
+  LoggingDiagnosticReporter diagnostics_;
+  std::unique_ptr<FileObjectURLs> identity_;
+  std::unique_ptr<FSChangesEnumerations> enumerations_;
+  std::unique_ptr<LocalVessel> vessel_;
+};
+
+}  // namespace mirabel::testing

@@ -1,0 +1,31 @@
+#pragma once
+
+#include <random>
+#include <string>
+#include <vector>
+
+namespace mirabel::testing {
+
+/// Random changes to a tree on real disk, of every kind that people and programs make. What the
+/// file system refuses is no change.
+class RandomTree {
+ public:
+  RandomTree(std::string root, std::string outside, unsigned seed)
+      : root_(std::move(root)), outside_(std::move(outside)), random_(seed) {}
+
+  /// Makes one, and answers what it was, for people.
+  std::string change();
+  [[nodiscard]] std::size_t pick(std::size_t n) { return random_() % n; }
+
+ private:
+  [[nodiscard]] std::vector<std::string> all(bool folders) const;
+  [[nodiscard]] std::string any(bool folders);
+  [[nodiscard]] std::string anyName();
+  void save(const std::string& path, std::size_t way);
+
+  std::string root_;
+  std::string outside_;  ///< a folder on the same file system that is not presented
+  std::mt19937 random_;
+};
+
+}  // namespace mirabel::testing
