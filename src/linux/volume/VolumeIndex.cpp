@@ -14,6 +14,9 @@
 namespace mirabel {
 namespace {
 
+// Enough for weeks of work on a home; an anchor from before starts over.
+constexpr std::uint64_t eventsKept = 1'000'000;
+
 class StoredVolumeIndex final : public VolumeIndex {
  public:
   StoredVolumeIndex(std::unique_ptr<VolumeState> state, const MonitoredRoots& roots,
@@ -78,7 +81,10 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<std::uint64_t> currentEventID() override {
     const std::scoped_lock lock(mutex_);
     if (auto done = reconcileLocked(); !done) return fail(done.error());
-    auto begun = state_->transaction([&] { return state_->journal().activate(); });
+    auto begun = state_->transaction([&]() -> Result<void> {
+      if (auto active = state_->journal().activate(); !active) return active;
+      return state_->journal().prune(eventsKept);
+    });
     if (!begun) return fail(begun.error());
     return state_->journal().lastID();
   }
