@@ -14,7 +14,8 @@ namespace {
 
 std::string makeBase() {
   const char* given = std::getenv("MIRABEL_TEST_DIR");
-  std::string pattern = std::string(given != nullptr ? given : "/tmp") + "/mirabel-volume-XXXXXX";
+  std::string pattern = given != nullptr ? given : std::filesystem::temp_directory_path().string();
+  pattern += "/mirabel-volume-XXXXXX";
   if (::mkdtemp(pattern.data()) == nullptr) throw std::runtime_error("can't make " + pattern);
   return std::filesystem::canonical(pattern);
 }

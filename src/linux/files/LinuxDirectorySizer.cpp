@@ -3,7 +3,6 @@
 #include <cerrno>
 #include <dirent.h>
 #include <fcntl.h>
-#include <linux/openat2.h>
 #include <string>
 #include <unordered_set>
 #include <vector>
@@ -15,9 +14,6 @@
 
 namespace mirabel {
 namespace {
-
-constexpr unsigned long long beneath =
-    RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
 
 // What was a folder of ours a moment ago and now is gone, a link or a mount.
 bool isNoLongerThere(const Error& error) {
@@ -35,7 +31,8 @@ class SizeWalk {
       const std::string path = std::move(pending_.back());
       pending_.pop_back();
       // Opened anew from the top each time: one descriptor is enough for any depth.
-      auto folder = openLongPath(top_.descriptor.get(), path, O_RDONLY | O_DIRECTORY, beneath);
+      auto folder =
+          openLongPath(top_.descriptor.get(), path, O_RDONLY | O_DIRECTORY, resolveBeneath);
       if (!folder && !path.empty() && isNoLongerThere(folder.error())) continue;
       if (!folder) return fail(folder.error());
       auto read = readFolder(path, RawDirectory(std::move(*folder)));

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
-#include <linux/openat2.h>
 #include <string>
 #include <string_view>
 #include <sys/stat.h>
@@ -15,13 +14,12 @@ namespace mirabel {
 namespace {
 
 constexpr mode_t permissions = 0777;
-constexpr unsigned long long beneath =
-    RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
 
 enum class Links { followed, refused };
 
 Result<UniqueFd> openStep(int folder, const std::string& name, Links links) {
-  if (links == Links::refused) return openLongPath(folder, name, O_PATH | O_DIRECTORY, beneath);
+  if (links == Links::refused)
+    return openLongPath(folder, name, O_PATH | O_DIRECTORY, resolveBeneath);
   UniqueFd opened(::openat(folder, name.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!opened) return fail(Error::posix(errno));
   return opened;

@@ -2,6 +2,7 @@
 
 #include <climits>
 #include <cstddef>
+#include <linux/openat2.h>
 #include <string>
 
 #include "foundation/Error.h"
@@ -11,6 +12,11 @@ namespace mirabel {
 
 /// The kernel takes paths shorter than this in one go (the terminating NUL counts).
 inline constexpr std::size_t longPathThreshold = PATH_MAX;
+
+/// How what lies below an open folder is reached: symbolic links are refused anywhere on the way,
+/// and so is another mount. For `openLongPath`.
+inline constexpr unsigned long long resolveBeneath =
+    RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
 
 /// The parent of an absolute path, and its last component; "/" and "" for the root.
 struct SplitPath {

@@ -3,17 +3,11 @@
 #include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
-#include <linux/openat2.h>
 
 #include "linux/kernel/ObjectStatus.h"
 
 namespace mirabel {
 namespace {
-
-// Symbolic links are refused anywhere on the way, and so is another mount: what is mounted below
-// a root is listed and not entered.
-constexpr unsigned long long beneath =
-    RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
 
 bool holds(const std::string& root, std::string_view path) {
   if (!path.starts_with(root)) return false;
@@ -55,7 +49,7 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
   if (!place) return openLongPath(AT_FDCWD, path, allFlags);
   const int root = descriptor(place->root);
   if (root < 0) return fail(Error::posix(ENOENT));
-  auto opened = openLongPath(root, std::string(place->relative), allFlags, beneath);
+  auto opened = openLongPath(root, std::string(place->relative), allFlags, resolveBeneath);
   if (!opened || place->relative.empty()) return opened;
   // A subvolume is no mount to the kernel, and gives out inode numbers of the root's once more.
   const auto status = statusAt(opened->get(), "");
