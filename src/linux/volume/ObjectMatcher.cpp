@@ -87,9 +87,10 @@ std::uint64_t fileSystemOf(const SeenObject& seen, std::uint64_t volume) {
 }
 
 void refresh(ObjectRow& row, const ObjectStatus& status) {
+  const bool wasSettled = row.isSettled && row.changeTime == status.changeTime;
   row.birthTime = status.birthTime;
   row.changeTime = status.changeTime;
-  row.isSettled = isSettledAt(status.changeTime, status.seenAt);
+  row.isSettled = wasSettled || isSettledAt(status.changeTime, status.seenAt);
   row.modificationTime = status.modificationTime;
   row.size = status.size;
 }
