@@ -115,7 +115,7 @@ Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerIte
   auto folders = foldersOf(identifier);
   if (!folders) return fail(folders.error());
   auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
-                                                      std::string(identifier), *std::move(folders));
+                                                std::string(identifier), *std::move(folders));
   enumerator->startNotifier();
   return enumerator;
 }

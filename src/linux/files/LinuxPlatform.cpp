@@ -1,6 +1,6 @@
-#include "linux/events/LinuxEventStreams.h"
 #include "linux/files/LinuxPlatform.h"
 
+#include "linux/events/LinuxEventStreams.h"
 #include "linux/files/HomeLayout.h"
 #include "linux/files/LinuxDirectorySizer.h"
 #include "linux/files/LinuxDirectoryStreams.h"
@@ -70,7 +70,9 @@ LinuxPlatform::LinuxPlatform(std::unique_ptr<Parts> parts) : parts_(std::move(pa
 
 LinuxPlatform::~LinuxPlatform() = default;
 
-EventStreams& LinuxPlatform::events() const { return parts_->events; }
+EventStreams& LinuxPlatform::events() const {
+  return parts_->events;
+}
 
 const Platform& LinuxPlatform::platform() const {
   return parts_->platform;

@@ -28,7 +28,7 @@ enum Query : std::size_t { bounds, setBounds, append_, replay_, prune_ };
 
 Result<std::unique_ptr<EventJournal>> EventJournal::open(Database& database) {
   if (auto made = database.execute(schema); !made) return fail(made.error());
-  std::unique_ptr<EventJournal> journal(new EventJournal(database));
+  std::unique_ptr<EventJournal> journal(new EventJournal);
   for (const char* sql : {
            "SELECT first_id, next_id FROM history",
            "INSERT OR REPLACE INTO history(only, first_id, next_id) VALUES(1, ?1, ?2)",

@@ -61,8 +61,7 @@ class EventJournal {
   [[nodiscard]] Result<void> reload();
 
  private:
-  explicit EventJournal(Database& database) : database_(database) {}
-  Database& database_;
+  EventJournal() = default;
   std::vector<Statement> statements_;
   std::uint64_t firstID_ = 1;
   std::uint64_t nextID_ = 1;
