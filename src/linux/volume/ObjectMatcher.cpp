@@ -95,8 +95,12 @@ void refresh(ObjectRow& row, const ObjectStatus& status) {
   row.size = status.size;
 }
 
+bool hasChanged(const ObjectRow& row, const ObjectStatus& status) {
+  return row.changeTime != status.changeTime || row.size != status.size;
+}
+
 bool isStale(const ObjectRow& row, const ObjectStatus& status) {
-  return row.changeTime != status.changeTime ||
+  return hasChanged(row, status) ||
          (!row.isSettled && isSettledAt(status.changeTime, status.seenAt));
 }
 

@@ -38,6 +38,10 @@ struct PreciseLook {
 
 /// Copies the times and the size into the row, and decides whether its change time is settled.
 void refresh(ObjectRow& row, const ObjectStatus& status);
+/// Whether the object has changed since the row was written, as far as can be seen. The size is
+/// looked at too: tmpfs gives a folder that loses an entry the time of that entry, which need not
+/// be a new one.
+[[nodiscard]] bool hasChanged(const ObjectRow& row, const ObjectStatus& status);
 /// Whether the row differs from what `refresh` would make of it.
 [[nodiscard]] bool isStale(const ObjectRow& row, const ObjectStatus& status);
 

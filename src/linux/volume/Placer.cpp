@@ -81,7 +81,7 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
 Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
   const bool changedKind = row.kind != arrival.kind;
   bool isKnownName = row.location == arrival.location;
-  const bool changed = changedKind || row.changeTime != arrival.seen.status.changeTime;
+  const bool changed = changedKind || hasChanged(row, arrival.seen.status);
   const bool stale = changed || isStale(row, arrival.seen.status);
   row.kind = arrival.kind;
   refresh(row, arrival.seen.status);
