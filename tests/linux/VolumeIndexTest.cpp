@@ -136,6 +136,21 @@ TEST_F(VolumeIndexTest, AHardLinkedFileIsOneThingAsLongAsItHasAName) {
   EXPECT_EQ(findDocument(a.documentID), "folder/b");
 }
 
+// Making room for the further name moves a document onto another name of the same file.
+TEST_F(VolumeIndexTest, ALinkThatTakesTheNameOfADocumentWhichTookALinkKeepsBothApart) {
+  write(".file");
+  see(".file");
+  link(".file", "b");
+  write("f");
+  see("f");
+  const std::uint32_t document = this->document("b");
+  rename("f", "b");
+  link(".file", "f");
+  EXPECT_EQ(this->document("f"), this->document(".file"));
+  EXPECT_EQ(findDocument(document), "b");
+  EXPECT_NE(this->document("f"), document);
+}
+
 TEST_F(VolumeIndexTest, ListingWhatIsKnownWritesNothing) {
   write("a");
   link("a", "b");

@@ -117,7 +117,7 @@ Result<void> Placer::tellChange(const ObjectRow& row, const Location& location, 
   return changedKind ? recorder_.contents(row.fileID) : Result<void>();
 }
 
-Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row) {
+Result<bool> Placer::isFurtherLink(const Arrival& arrival, ObjectRow& row) {
   if (arrival.seen.status.linkCount < 2 || arrival.seen.status.kind == FileKind::folder) {
     return false;
   }
@@ -130,6 +130,14 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, const ObjectRow& row)
   // Linking over a document ends it: the object that arrives is shown under its other names too,
   // and keeps the identity that it has there.
   if (auto vacated = vacate(arrival, row.slot); !vacated) return fail(vacated.error());
+  // Making room may have touched this row too: another of its names may have been a document's.
+  auto current = store_.objectInSlot(row.slot);
+  if (!current) return fail(current.error());
+  if (*current) {
+    row.documentID = (*current)->documentID;
+    row.location = std::move((*current)->location);
+  }
+  if (auto ensured = ensureDocument(row); !ensured) return fail(ensured.error());
   if (auto added = store_.addLink(arrival.location, row.slot); !added) return fail(added.error());
   return true;
 }

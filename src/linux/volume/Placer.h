@@ -90,7 +90,7 @@ class Placer {
   [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row, bool changedKind);
   [[nodiscard]] Result<void> tellChange(const ObjectRow& row, const Location& location,
                                         bool changedKind);
-  [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, const ObjectRow& row);
+  [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, ObjectRow& row);
 
   /// A document ID that an arrival takes over; nothing when it takes none.
   using Inheritance = Result<std::optional<std::uint32_t>>;
