@@ -4,7 +4,7 @@
 #include <ostream>
 
 #include "cli/Commands.h"
-#include "cli/ItemArgument.h"
+#include "cli/ContainerArgument.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
 #include "platform/EnumerationObservers.h"
@@ -35,20 +35,6 @@ class Batch final : public VesselChangeObserver {
   std::promise<Result<void>> finished;
 };
 
-Result<std::string> containerOf(const Session& session, const std::string& text) {
-  if (text == "workingset") return std::string(VesselWorkingSetContainerItemIdentifier);
-  if (text == "alldirs") return std::string(VesselAllDirectoriesContainerItemIdentifier);
-  auto item = ItemArgument(text).item(session);
-  if (!item) return fail(item.error());
-  return (*item)->itemIdentifier();
-}
-
-Result<std::shared_ptr<VesselEnumerator>> enumeratorOf(Session& session, const std::string& text) {
-  auto container = containerOf(session, text);
-  if (!container) return fail(container.error());
-  return session.enumerator(*container);
-}
-
 void print(Program& program, const Batch& batch) {
   if (program.options().json) {
     nlohmann::json line;
@@ -75,7 +61,7 @@ void print(Program& program, const Batch& batch) {
 ExitCode runAnchor(Program& program, const std::string& item) {
   Session* session = program.session();
   if (session == nullptr) return program.exitCode();
-  auto enumerator = enumeratorOf(*session, item);
+  auto enumerator = ContainerArgument(item).enumerator(*session);
   if (!enumerator) return program.report(enumerator.error(), "can't find " + item);
   std::optional<Data> anchor;
   (*enumerator)->currentSyncAnchor([&](std::optional<Data> answer) { anchor = std::move(answer); });
@@ -97,7 +83,7 @@ ExitCode runChanges(Program& program, const ChangesOptions& options) {
   Session* session = program.session();
   if (session == nullptr) return program.exitCode();
   const std::string failure = "can't tell the changes of " + options.item;
-  auto enumerator = enumeratorOf(*session, options.item);
+  auto enumerator = ContainerArgument(options.item).enumerator(*session);
   if (!enumerator) return program.report(enumerator.error(), failure);
   auto anchor = fromBase64(options.since);
   if (!anchor) return program.report(Error::syncAnchorExpired(), failure);

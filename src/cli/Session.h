@@ -28,9 +28,9 @@ class Session {
   [[nodiscard]] static Result<std::unique_ptr<Session>> open(Options options);
 
   [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
-  /// Lists the container and tells its changes. Errors: see `LocalVessel`.
+  /// Lists the container and tells its changes, when it is asked. Errors: see `LocalVessel`.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(std::string_view container) {
-    return provider_->enumeratorForContainerItemIdentifier(container);
+    return provider_->enumeratorForContainerItemIdentifier(container, LiveUpdates::unwanted);
   }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }

@@ -8,6 +8,9 @@
 
 namespace mirabel {
 
+/// Whether the host is to be told by itself that a container has changed.
+enum class LiveUpdates { wanted, unwanted };
+
 /// What following changes needs beyond the items: references that outlive who gets it.
 struct ChangeServices {
   EventStreams& events;

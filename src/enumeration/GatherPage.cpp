@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "foundation/Log.h"
+#include "foundation/SplitWork.h"
 #include "platform/VesselManager.h"
 
 namespace mirabel {
@@ -10,6 +11,8 @@ namespace {
 
 constexpr std::string_view trashName = ".Trash";
 constexpr std::string_view folderType = "inode/directory";
+// Handing work to another thread costs as much as a few items.
+constexpr std::size_t pieceSize = 32;
 
 /// One level, without hidden names, for the trash; the default for every other folder.
 std::optional<EnumeratorOptions> optionsFor(const URL& folder) {
@@ -73,18 +76,22 @@ Result<void> GatherPage::gather(FSDirectoryWalk& walk) {
   entryCount_ = *counted;
   if (shown.empty()) return {};
   if (auto fetched = context_.platform.resources.prefetch(shown); !fetched) return fetched;
-  for (const URL& url : shown) {
-    if (isLeftOut(url)) continue;
-    if (auto added = addItem(url); !added) return added;
+  std::vector<Result<std::shared_ptr<LocalItem>>> made(shown.size());
+  splitWork(shown.size(), pieceSize, [&](std::size_t begin, std::size_t end) {
+    for (std::size_t i = begin; i < end; ++i)
+      if (!isLeftOut(shown[i])) made[i] = look_.at(shown[i]);
+  });
+  for (std::size_t i = 0; i < shown.size(); ++i) {
+    if (isLeftOut(shown[i])) continue;
+    if (!made[i]) return fail(made[i].error());
+    if (auto added = addItem(shown[i], *std::move(made[i])); !added) return added;
   }
   return {};
 }
 
-Result<void> GatherPage::addItem(const URL& url) {
-  auto item = look_.at(url);
-  if (!item) return fail(item.error());
-  if (*item) {
-    items_.push_back(*std::move(item));
+Result<void> GatherPage::addItem(const URL& url, std::shared_ptr<LocalItem> item) {
+  if (item) {
+    items_.push_back(std::move(item));
     return {};
   }
   const URL folder = url.deletingLastPathComponent();

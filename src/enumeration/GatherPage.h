@@ -48,7 +48,8 @@ class GatherPage {
   [[nodiscard]] const VesselItems& items() const { return items_; }
 
  private:
-  [[nodiscard]] Result<void> addItem(const URL& url);
+  /// Null: none was there to be made.
+  [[nodiscard]] Result<void> addItem(const URL& url, std::shared_ptr<LocalItem> item);
   [[nodiscard]] bool isLeftOut(const URL& url) const;
   [[nodiscard]] bool hasMoved(const URL& folder);
 

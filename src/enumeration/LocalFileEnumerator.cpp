@@ -32,16 +32,17 @@ std::optional<FSChangeToken> tokenFrom(const Data& bytes) {
 }  // namespace
 
 std::shared_ptr<LocalFileEnumerator> LocalFileEnumerator::create(
-    const EnumerationServices& services, std::string container, std::vector<URL> urls) {
+    const EnumerationServices& services, std::string container, std::vector<URL> urls,
+    LiveUpdates liveUpdates) {
   return std::shared_ptr<LocalFileEnumerator>(
-      new LocalFileEnumerator(services, std::move(container), std::move(urls)));
+      new LocalFileEnumerator(services, std::move(container), std::move(urls), liveUpdates));
 }
 
 LocalFileEnumerator::LocalFileEnumerator(const EnumerationServices& services, std::string container,
-                                         std::vector<URL> urls)
+                                         std::vector<URL> urls, LiveUpdates liveUpdates)
     : services_(services), scope_{std::move(container), std::move(urls)} {
   if (scope_.urls.empty()) fatalError("can't create enumerator for an empty list of URLs");
-  if (scope_.isWorkingSet()) return;
+  if (scope_.isWorkingSet() || liveUpdates == LiveUpdates::unwanted) return;
   notifier_ =
       FSChangesNotifier::create(services_.items, services_.changes.events,
                                 services_.changes.diagnostics, scope_.container, scope_.urls, {});

@@ -24,9 +24,10 @@ class LocalFileEnumerator final : public VesselEnumerator,
  public:
   /// `urls` are the folders to walk, the document storage the first of several; none at all is a
   /// programming error. An ordinary container has its one folder. Where no notifier can be made,
-  /// which is logged, the enumerator does everything but live updates.
+  /// which is logged, or live updates are not wanted, it does everything else.
   [[nodiscard]] static std::shared_ptr<LocalFileEnumerator> create(
-      const EnumerationServices& services, std::string container, std::vector<URL> urls);
+      const EnumerationServices& services, std::string container, std::vector<URL> urls,
+      LiveUpdates liveUpdates = LiveUpdates::wanted);
   /// Invalidates, and waits until the notifier is at rest: at most as long as that waits for the
   /// host.
   ~LocalFileEnumerator() override;
@@ -45,7 +46,7 @@ class LocalFileEnumerator final : public VesselEnumerator,
   [[nodiscard]] const std::string& container() const { return scope_.container; }
   [[nodiscard]] const URL& enumeratedItemURL() const { return scope_.urls.front(); }
   [[nodiscard]] const std::vector<URL>& urls() const { return scope_.urls; }
-  /// Null for the working set, and where none could be made.
+  /// Null for the working set, where none could be made, and where none is wanted.
   [[nodiscard]] const std::shared_ptr<FSChangesNotifier>& notifier() const { return notifier_; }
   [[nodiscard]] bool shouldUpdateFileIDInPalimpsest() const { return scope_.isWorkingSet(); }
   [[nodiscard]] std::size_t runningEnumerations() const;
@@ -63,7 +64,7 @@ class LocalFileEnumerator final : public VesselEnumerator,
   };
 
   LocalFileEnumerator(const EnumerationServices& services, std::string container,
-                      std::vector<URL> urls);
+                      std::vector<URL> urls, LiveUpdates liveUpdates);
 
   [[nodiscard]] Result<void> gatherPhase(VesselEnumerationObserver& observer,
                                          const std::optional<FSChangeToken>& cursor);

@@ -99,7 +99,8 @@ GatherPhaseResumeCheck canResumeGatherPhase(const ItemContext& context, EventStr
   const auto checker = std::make_shared<FSEventChecker>(previousEventID);
   reader->setDelegate(checker);
   SerialQueue queue = reader->streamQueue();
-  queue.async([reader, checker] {
+  // On this thread, which waits for it anyway: waking others costs as much as a short replay.
+  queue.sync([&] {
     reader->start();
     if (!reader->isRunning()) checker->didNotStart();
   });

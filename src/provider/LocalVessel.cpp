@@ -109,13 +109,13 @@ Result<std::shared_ptr<LocalItem>> LocalVessel::_propertiesForItemAtURL(const UR
 }
 
 Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerItemIdentifier(
-    std::string_view identifier) {
+    std::string_view identifier, LiveUpdates liveUpdates) {
   const LogSection section("enumerator for " + std::string(identifier));
   if (!changes_) return fail(Error::posix(ENOTSUP, "this provider follows no changes"));
   auto folders = foldersOf(identifier);
   if (!folders) return fail(folders.error());
-  auto enumerator = LocalFileEnumerator::create({context_, *changes_, walks_},
-                                                std::string(identifier), *std::move(folders));
+  auto enumerator = LocalFileEnumerator::create(
+      {context_, *changes_, walks_}, std::string(identifier), *std::move(folders), liveUpdates);
   enumerator->startNotifier();
   return enumerator;
 }

@@ -39,10 +39,11 @@ class LocalVessel {
       std::string_view identifier) const;
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> _propertiesForItemAtURL(const URL& url) const;
 
-  /// The enumerator of a container, with its live updates started. It must not outlive the
-  /// provider. Errors: those of `urlForIdentifier`; POSIX ENOTSUP for a provider without changes.
+  /// The enumerator of a container, with its live updates started where they are wanted. It must
+  /// not outlive the provider. Errors: those of `urlForIdentifier`; POSIX ENOTSUP for a provider
+  /// without changes.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumeratorForContainerItemIdentifier(
-      std::string_view identifier);
+      std::string_view identifier, LiveUpdates liveUpdates = LiveUpdates::wanted);
 
   /// All content is local: these complete at once, without an error.
   void providePlaceholderAtURL(const URL& url, const ErrorHandler& completionHandler) const;

@@ -83,12 +83,31 @@ TEST_F(Pages, ThatAreNoneOfThisHistoryStartOver) {
     expectFailure(run({"ls", "--page=" + text}), 4, "start over");
     EXPECT_EQ(run({"--json", "ls", "--page=" + text}).error().at("code"), -1002) << text;
   }
-  // One that lies behind the end of the folder is merely the end.
+  // One that lies behind the end of the folder, too.
   auto token =
       *FSChangeToken::decode(std::span<const std::uint8_t>(dataFromString(*fromBase64(page))));
   token.offset = ~std::uint64_t{0} - 1;
-  const Answer beyond = run({"--json", "ls", "--page", base64(stringView(token.encode()))});
-  EXPECT_EQ(beyond.json().at("items").size(), 0u);
+  expectFailure(run({"ls", "--page", base64(stringView(token.encode()))}), 4, "start over");
+}
+
+TEST_F(Pages, OfEverythingAndOfAllFoldersAreListedByTheirWords) {
+  home.makeFolder("folder");
+  home.makeFolder("folder/inner");
+  home.writeFile("folder/inner/doc");
+  home.makeFolder(".Trash");
+  home.writeFile(".Trash/erased");
+  home.makeFolder("workingset");
+  const auto names = [&](const std::string& item) {
+    std::set<std::string> seen;
+    const nlohmann::json page = run({"--json", "ls", item}).json();
+    for (const auto& each : page.at("items"))
+      seen.insert(each.at("filename"));
+    return seen;
+  };
+  using Names = std::set<std::string>;
+  EXPECT_EQ(names("workingset"), (Names{"folder", "inner", "doc", "workingset", "erased"}));
+  EXPECT_EQ(names("alldirs"), (Names{"folder", "inner", "workingset"}));
+  EXPECT_EQ(names(home.at("workingset")), Names{});
 }
 
 }  // namespace
