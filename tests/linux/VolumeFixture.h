@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
 #include <gtest/gtest.h>
 #include <memory>
 #include <string>
@@ -47,6 +48,10 @@ class VolumeFixture : public testing::Test {
   /// Relative path of a document or a file ID; empty when there is none.
   std::string findDocument(std::uint32_t documentID);
   std::string findFile(std::uint64_t fileID);
+
+  /// How the index hears of changes: not at all, at first. Whoever asks brings it in step; no
+  /// thread does.
+  std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher_;
 
   std::string base_;
   std::string documents_;

@@ -116,6 +116,20 @@ std::optional<std::string> handleAt(int directory, const std::string& name) {
   return result;
 }
 
+std::vector<std::uint64_t> inodesIn(std::string_view handle) {
+  constexpr std::size_t typeSize = sizeof(file_handle::handle_type);
+  std::vector<std::uint64_t> numbers;
+  for (std::size_t at = typeSize; at + sizeof(std::uint32_t) <= handle.size(); at += 4) {
+    std::uint64_t number = 0;
+    std::memcpy(&number, handle.data() + at, sizeof(std::uint32_t));
+    numbers.push_back(number);
+    if (at + sizeof(number) > handle.size()) continue;
+    std::memcpy(&number, handle.data() + at, sizeof(number));
+    numbers.push_back(number);
+  }
+  return numbers;
+}
+
 Date dateFromNanoseconds(std::int64_t nanosecondsSince1970) {
   std::int64_t seconds = nanosecondsSince1970 / nanosecondsPerSecond;
   std::int64_t rest = nanosecondsSince1970 % nanosecondsPerSecond;

@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
@@ -39,6 +40,10 @@ struct ObjectStatus {
 /// The kernel's handle of an object: bytes that name it among all objects, of now and of before,
 /// on its file system. Starts with the handle's type. Nothing where the file system has none.
 [[nodiscard]] std::optional<std::string> handleAt(int directory, const std::string& name);
+
+/// Numbers in a handle, one of which is the inode number of its object on the file systems there
+/// are: where to look for what has that handle.
+[[nodiscard]] std::vector<std::uint64_t> inodesIn(std::string_view handle);
 
 Date dateFromNanoseconds(std::int64_t nanoseconds);
 

@@ -45,6 +45,8 @@ class EventJournal {
   /// Writes what `append` counted; to be called before the transaction ends.
   [[nodiscard]] Result<void> saveBounds();
 
+  /// ID of the oldest record that is kept, or of the next one where none is.
+  [[nodiscard]] std::uint64_t firstID() const { return firstID_; }
   /// ID of the last record; 0 before the first.
   [[nodiscard]] std::uint64_t lastID() const { return nextID_ - 1; }
   /// Whether every record after `since` is still here, and `since` was ever given out.

@@ -172,6 +172,7 @@ Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unset
                   {folder.id, sighting.name},
                   objectKind(sighting.status.kind, sighting.isPackage),
                   *occupied};
+  arrival.isReported = sighting.isReported;
   // Whoever is placed under a free name moves nobody, so what was new when the batch began is new
   // still, unless the same inode number stands in it twice: a further link, or a fresh reuse.
   if (entry.isNew && !*occupied && sighting.status.linkCount == 1) {
@@ -309,6 +310,13 @@ Result<std::optional<std::string>> Learner::search(ObjectRow row) {
   auto placed = placer_.placeFound(std::move(row), *found);
   if (!placed) return fail(placed.error());
   return verify(*placed);
+}
+
+Result<std::optional<std::string>> Learner::standingPath(std::uint64_t fileID) {
+  auto row = store_.objectByFileID(fileID);
+  if (!row) return fail(row.error());
+  if (!*row) return std::nullopt;
+  return verify(**row);
 }
 
 Result<std::optional<std::string>> Learner::find(std::uint64_t fileID) {

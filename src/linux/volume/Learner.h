@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <functional>
 #include <optional>
+#include <set>
 #include <span>
 #include <string>
 #include <string_view>
@@ -35,6 +36,15 @@ class Learner final : private FolderIdentities {
                                    std::span<Sighting> sightings);
   [[nodiscard]] Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
                                            bool isPackage);
+
+  /// See `Placer`.
+  [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {
+    return placer_.takeArrivedFolders();
+  }
+  /// Tells where names have changed of late; null, which it is at first: nobody does.
+  void setRecentPlaces(RecentPlaces* places) { finder_.setRecentPlaces(places); }
+  /// Where the index has the object, if it stands there; nothing is searched for.
+  [[nodiscard]] Result<std::optional<std::string>> standingPath(std::uint64_t fileID);
 
   /// Where the object lies now, the disk being right; nothing when it is not to be found. What
   /// was found out is in the index then, a save of the document by another object included.

@@ -1,5 +1,6 @@
 #include "linux/volume/ObjectFinder.h"
 
+#include <fcntl.h>
 #include <set>
 #include <utility>
 
@@ -13,11 +14,29 @@ bool ObjectFinder::isObject(const ObjectRow& row, const Candidate& candidate,
          compare(row, look) == Match::same;
 }
 
+std::optional<ObjectFinder::Found> ObjectFinder::findAmong(
+    const ObjectRow& row, const std::vector<RecentPlace>& places) const {
+  for (const RecentPlace& place : places) {
+    auto folder = roots_.open(place.folderPath, O_PATH | O_DIRECTORY);
+    if (!folder) continue;
+    const auto look = lookPrecisely(folder->get(), place.name);
+    if (look && isObject(row, {place.folderPath, folder->get(), place.name, row.inode}, *look)) {
+      return Found{place.folderPath, place.name, look->status};
+    }
+  }
+  return std::nullopt;
+}
+
 std::optional<ObjectFinder::Found> ObjectFinder::find(const ObjectRow& row,
                                                       const std::string& folderPath,
                                                       const Others& others) {
   if (auto known = answers_.find(row.slot); known != answers_.end()) return known->second;
 
+  if (recent_ != nullptr) {
+    if (const auto places = recent_->placesOf(row.inode)) {
+      return answers_[row.slot] = findAmong(row, *places);
+    }
+  }
   std::map<std::uint64_t, ObjectRow> lost{{row.inode, row}};
   std::set<std::uint64_t> wanted{row.inode};
   const auto visitor = [&](const Candidate& candidate) {

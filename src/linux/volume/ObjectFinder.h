@@ -9,6 +9,7 @@
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/ObjectMatcher.h"
+#include "linux/volume/RecentPlaces.h"
 #include "linux/volume/TreeSearch.h"
 
 namespace mirabel {
@@ -29,17 +30,23 @@ class ObjectFinder {
   /// Further objects that will be asked for soon; called before the roots are looked through.
   using Others = std::function<std::vector<ObjectRow>()>;
 
-  /// Looks in the folder at `folderPath` first, then everywhere.
+  /// Looks where names have changed of late, where that is known; else in the folder at
+  /// `folderPath` first, then everywhere.
   [[nodiscard]] std::optional<Found> find(const ObjectRow& row, const std::string& folderPath,
                                           const Others& others);
   void forget() { answers_.clear(); }
+  /// `places` outlives it; null: nobody knows.
+  void setRecentPlaces(RecentPlaces* places) { recent_ = places; }
 
  private:
   [[nodiscard]] bool isObject(const ObjectRow& row, const Candidate& candidate,
                               const PreciseLook& look) const;
+  [[nodiscard]] std::optional<Found> findAmong(const ObjectRow& row,
+                                               const std::vector<RecentPlace>& places) const;
 
   const MonitoredRoots& roots_;
   std::uint64_t device_;
+  RecentPlaces* recent_ = nullptr;
   std::map<std::uint64_t, std::optional<Found>> answers_;  // by slot
 };
 

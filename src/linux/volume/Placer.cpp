@@ -81,7 +81,8 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
 Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
   const bool changedKind = row.kind != arrival.kind;
   bool isKnownName = row.location == arrival.location;
-  const bool changed = changedKind || hasChanged(row, arrival.seen.status);
+  const bool changed =
+      changedKind || hasChanged(row, arrival.seen.status) || (arrival.isReported && !row.isSettled);
   const bool stale = changed || isStale(row, arrival.seen.status);
   row.kind = arrival.kind;
   refresh(row, arrival.seen.status);
@@ -144,6 +145,7 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, ObjectRow& row) {
 
 Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool changedKind) {
   const std::optional<Location> from = std::exchange(row.location, std::nullopt);
+  if (auto noted = noteArrival(row, from); !noted) return fail(noted.error());
   // Off its old name first: what is found to lie there now can then be put there.
   if (auto detached = store_.put(row); !detached) return fail(detached.error());
   if (arrival.seen.status.linkCount < 2) {
@@ -179,6 +181,17 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
   if (told && changedKind) told = tellChange(*written, arrival.location, true);
   if (!told) return fail(told.error());
   return written;
+}
+
+Result<void> Placer::noteArrival(const ObjectRow& row, const std::optional<Location>& from) {
+  if (row.kind != ObjectKind::folder && row.kind != ObjectKind::package) return {};
+  if (from) {
+    auto path = paths_.pathOf(*from);
+    if (!path) return fail(path.error());
+    if (*path) return {};
+  }
+  arrivedFolders_.insert(row.fileID);
+  return {};
 }
 
 Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& found) {
@@ -240,8 +253,8 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
   const bool isOwnDocument = !*document && row.documentID != 0;
   row.slot = isOwnDocument ? row.documentID : allocator_.nextUpperSlot();
   if (auto inserted = store_.insert(row); !inserted) return fail(inserted.error());
-  Result<void> told;
-  if (*document) told = recorder_.handedOn(**document, 0, row.fileID);
+  Result<void> told = noteArrival(row, std::nullopt);
+  if (told && *document) told = recorder_.handedOn(**document, 0, row.fileID);
   if (told) told = recorder_.changed(row, arrival.location);
   if (!told) return fail(told.error());
   return row;
@@ -304,6 +317,10 @@ Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivin
   if (!elsewhere) return fail(elsewhere.error());
   const bool isDocument = (*occupant)->documentID != 0 && isDocumentKind((*occupant)->kind);
   if (*elsewhere) {
+    // It has a name less now, which its other names show.
+    if (auto told = tellChange(**occupant, *(*occupant)->location, false); !told) {
+      return fail(told.error());
+    }
     const bool isBackup = isDocument && (*occupant)->kind == arrival.kind &&
                           isBackupOf(*(*occupant)->location, arrival.location);
     return isBackup ? handOver(std::move(**occupant)) : std::nullopt;

@@ -28,6 +28,7 @@ struct Arrival {
   /// Set when the index surely has nothing under the inode number: the handle of what is seen,
   /// empty where the file system has none.
   std::optional<std::string> newHandle = std::nullopt;
+  bool isReported = false;  ///< see `Sighting`
 };
 
 /// The row that the index has for an inode number, which may be another generation's.
@@ -74,6 +75,12 @@ class Placer {
     return std::exchange(takenDocuments_, {});
   }
 
+  /// File IDs of folders that are new, or came back from nowhere, since the last call: of what lies
+  /// in them nothing is known.
+  [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {
+    return std::exchange(arrivedFolders_, {});
+  }
+
   /// Puts an object that is not at its place where the finder has found it.
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
   /// Moves the row to one of the object's other names that still stands; false when none does.
@@ -88,6 +95,8 @@ class Placer {
   [[nodiscard]] Result<ObjectRow> adopt(const Arrival& arrival, ObjectRow row,
                                         std::optional<std::uint32_t> document);
   [[nodiscard]] Result<ObjectRow> moveTo(const Arrival& arrival, ObjectRow row, bool changedKind);
+  /// Takes note of a folder that was not anywhere before.
+  [[nodiscard]] Result<void> noteArrival(const ObjectRow& row, const std::optional<Location>& from);
   [[nodiscard]] Result<void> tellChange(const ObjectRow& row, const Location& location,
                                         bool changedKind);
   [[nodiscard]] Result<bool> isFurtherLink(const Arrival& arrival, ObjectRow& row);
@@ -125,6 +134,7 @@ class Placer {
   std::function<bool(std::string_view)> isPackageName_;
   ObjectFinder::Others others_;
   std::set<std::uint32_t> takenDocuments_;
+  std::set<std::uint64_t> arrivedFolders_;
   int depth_ = 0;
 };
 

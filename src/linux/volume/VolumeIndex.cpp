@@ -1,13 +1,16 @@
 #include "linux/volume/VolumeIndex.h"
 
+#include <atomic>
 #include <cerrno>
 #include <fcntl.h>
 #include <mutex>
 #include <utility>
 
+#include "foundation/Log.h"
 #include "linux/kernel/LongPath.h"
+#include "linux/volume/FollowThread.h"
+#include "linux/volume/Follower.h"
 #include "linux/volume/Learner.h"
-#include "linux/volume/Reconciler.h"
 #include "linux/volume/VolumeState.h"
 #include "linux/volume/VolumeUUID.h"
 
@@ -20,28 +23,37 @@ constexpr std::uint64_t eventsKept = 1'000'000;
 class StoredVolumeIndex final : public VolumeIndex {
  public:
   StoredVolumeIndex(std::unique_ptr<VolumeState> state, const MonitoredRoots& roots,
-                    std::uint64_t device,
-                    const std::function<bool(std::string_view)>& isPackageName)
+                    std::uint64_t device, const Options& options)
       : state_(std::move(state)),
         roots_(roots),
         paths_(state_->store(), roots, device),
-        recorder_(state_->store(), state_->journal(), paths_, roots, isPackageName),
-        learner_(state_->store(), state_->allocator(), recorder_, roots, device, isPackageName),
-        reconciler_(learner_, state_->store(), recorder_, roots, device, isPackageName),
-        device_(device) {}
+        recorder_(state_->store(), state_->journal(), paths_, roots, options.isPackageName),
+        learner_(state_->store(), state_->allocator(), recorder_, roots, device,
+                 options.isPackageName),
+        follower_(
+            {learner_, state_->store(), recorder_, paths_, roots, device, options.isPackageName},
+            {options.makeWatcher, options.notice}),
+        followsInBackground_(options.followsInBackground && options.makeWatcher),
+        device_(device) {
+    learner_.setRecentPlaces(&follower_);
+  }
+
+  ~StoredVolumeIndex() override { thread_.reset(); }
 
   Result<void> learn(const std::string& folderPath, int folder,
                      std::span<Sighting> sightings) override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     const std::string path = plainPath(folderPath);
-    return state_->transaction([&] { return learner_.learn(path, folder, sightings); });
+    return inTransaction([&] { return learner_.learn(path, folder, sightings); });
   }
 
   Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
                              bool isPackage) override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     Result<Sighting> answer = fail(Error::posix(ENOENT));
-    auto done = state_->transaction([&]() -> Result<void> {
+    auto done = inTransaction([&]() -> Result<void> {
       answer = learner_.learnPath(plainPath(path), status, isPackage);
       if (!answer) return fail(answer.error());
       return {};
@@ -51,18 +63,27 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
   Result<std::string> pathOfFileID(std::uint64_t fileID) override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     std::optional<std::string> path;
-    auto done = state_->transaction([&]() -> Result<void> { return find(fileID, path); });
+    // Where changes are heard of, what has not happened to it need not be searched for.
+    auto done = follower_.isInStep() ? stand(fileID, path) : Result<void>();
+    if (done && !path && follower_.isInStep()) done = follower_.catchUp(transactions());
+    if (done && !path) {
+      done = inTransaction([&]() -> Result<void> { return find(fileID, path); });
+    }
     if (!done) return fail(done.error());
     if (!path) return fail(Error::posix(ENOENT));
     return std::move(*path);
   }
 
   Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     std::optional<std::uint64_t> fileID;
-    auto done = state_->transaction([&]() -> Result<void> {
+    auto done = follower_.isInStep() ? follower_.catchUp(transactions()) : Result<void>();
+    if (!done) return fail(done.error());
+    done = inTransaction([&]() -> Result<void> {
       auto holder = learner_.holderOf(documentID);
       if (!holder) return fail(holder.error());
       fileID = *holder;
@@ -74,18 +95,21 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
   Result<void> reconcile() override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
-    return reconcileLocked();
+    return follower_.compareAll(transactions());
   }
 
   Result<std::uint64_t> currentEventID() override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
-    if (auto done = reconcileLocked(); !done) return fail(done.error());
-    auto begun = state_->transaction([&]() -> Result<void> {
+    if (auto done = follower_.catchUp(transactions()); !done) return fail(done.error());
+    auto begun = inTransaction([&]() -> Result<void> {
       if (auto active = state_->journal().activate(); !active) return active;
       return state_->journal().prune(eventsKept);
     });
     if (!begun) return fail(begun.error());
+    if (followsInBackground_ && !thread_) startThread();
     return state_->journal().lastID();
   }
 
@@ -93,6 +117,17 @@ class StoredVolumeIndex final : public VolumeIndex {
     const std::scoped_lock lock(mutex_);
     if (!state_->journal().canReplay(since)) return fail(Error::posix(ESTALE));
     return state_->journal().replay(since, limit);
+  }
+
+  JournalBell& bell() override { return bell_; }
+
+  Status status() override {
+    const std::scoped_lock lock(mutex_);
+    Status status{follower_.status()};
+    if (!state_->journal().isActive()) return status;
+    status.firstEventID = state_->journal().firstID();
+    status.lastEventID = state_->journal().lastID();
+    return status;
   }
 
   UUID historyUUID() const override { return state_->history(); }
@@ -103,8 +138,56 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
  private:
-  Result<void> reconcileLocked() {
-    return reconciler_.run([&](const auto& work) { return state_->transaction(work); });
+  /// Rings the bell when a call is over and its lock is free.
+  class Ringing {
+   public:
+    explicit Ringing(StoredVolumeIndex& index) : index_(index) {}
+    ~Ringing() { index_.bell_.ring(index_.lastEventID_); }
+    Ringing(const Ringing&) = delete;
+    Ringing& operator=(const Ringing&) = delete;
+
+   private:
+    StoredVolumeIndex& index_;
+  };
+
+  Result<void> inTransaction(const std::function<Result<void>()>& work) {
+    auto done = state_->transaction(work);
+    lastEventID_ = state_->journal().lastID();
+    return done;
+  }
+
+  Transaction transactions() {
+    return [this](const std::function<Result<void>()>& work) { return inTransaction(work); };
+  }
+
+  void startThread() {
+    thread_ = std::make_unique<FollowThread>(
+        FollowThread::Work{[this] {
+                             const std::scoped_lock lock(mutex_);
+                             return follower_.watcher();
+                           },
+                           [this] {
+                             const Ringing ringing(*this);
+                             const std::scoped_lock lock(mutex_);
+                             auto done = follower_.catchUp(transactions());
+                             if (!done)
+                               logError("can't follow changes; " + done.error().description());
+                           },
+                           [this] { return isDue(); }});
+  }
+
+  /// Whether whoever waits for changes has to be told by a look at everything.
+  bool isDue() {
+    if (!bell_.hasListeners()) return false;
+    const std::scoped_lock lock(mutex_);
+    return follower_.isComparisonDue();
+  }
+
+  Result<void> stand(std::uint64_t fileID, std::optional<std::string>& path) {
+    auto standing = learner_.standingPath(fileID);
+    if (!standing) return fail(standing.error());
+    path = std::move(*standing);
+    return {};
   }
 
   Result<void> find(std::uint64_t fileID, std::optional<std::string>& path) {
@@ -126,8 +209,12 @@ class StoredVolumeIndex final : public VolumeIndex {
   IndexedPaths paths_;
   ChangeRecorder recorder_;
   Learner learner_;
-  Reconciler reconciler_;
+  Follower follower_;
+  bool followsInBackground_;
   std::uint64_t device_;
+  JournalBell bell_;
+  std::atomic<std::uint64_t> lastEventID_ = 0;
+  std::unique_ptr<FollowThread> thread_;
 };
 
 }  // namespace
@@ -143,8 +230,7 @@ Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(const MonitoredRoots& roo
   auto state = VolumeState::open(std::move(*folder), options.notice);
   if (!state) return fail(state.error());
   if (!options.isPackageName) options.isPackageName = [](std::string_view) { return false; };
-  return std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device,
-                                             options.isPackageName);
+  return std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
 }
 
 }  // namespace mirabel

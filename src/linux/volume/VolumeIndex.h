@@ -15,6 +15,9 @@
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/kernel/ObjectStatus.h"
 #include "linux/volume/EventJournal.h"
+#include "linux/volume/FollowStatus.h"
+#include "linux/volume/JournalBell.h"
+#include "linux/watch/FolderWatcher.h"
 
 namespace mirabel {
 
@@ -25,6 +28,9 @@ struct Sighting {
   bool isPackage = false;
   std::uint64_t fileID = 0;      ///< answered
   std::uint32_t documentID = 0;  ///< answered; 0 for what is no document
+  /// A record says that it was written to, or its attributes were: true also where times are too
+  /// coarse to show it.
+  bool isReported = false;
 };
 
 /// The lasting identities of one volume: which object has which file ID, which document has which
@@ -42,6 +48,11 @@ class VolumeIndex {
     std::function<bool(std::string_view name)> isPackageName;
     /// How long to wait for another process that owns the volume.
     std::chrono::milliseconds timeout{30'000};
+    /// Hears of changes once the history has begun; nothing: every question about the history is
+    /// answered by a look at all files.
+    std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher;
+    /// Whether a thread takes in changes as they come; else only who asks brings the index in step.
+    bool followsInBackground = true;
     /// Told once when it has to wait, and when a damaged database was set aside.
     std::function<void(std::string_view)> notice;
   };
@@ -69,13 +80,24 @@ class VolumeIndex {
   /// Brings the index in step with everything below the roots, by a look at every entry. What
   /// differs becomes events.
   [[nodiscard]] virtual Result<void> reconcile() = 0;
-  /// Reconciles, and answers the ID of the last event: whatever a finished system call changed has
-  /// an ID at or below it. The first call begins the history.
+  /// Brings the index in step, and answers the ID of the last event: whatever a finished system
+  /// call changed has an ID at or below it. The first call begins the history; from then on changes
+  /// are heard of.
   [[nodiscard]] virtual Result<std::uint64_t> currentEventID() = 0;
   /// At most `limit` events after `since`, oldest first. Error: POSIX ESTALE when some of them are
   /// no longer kept, or `since` was never given out.
   [[nodiscard]] virtual Result<std::vector<JournalRecord>> events(std::uint64_t since,
                                                                   std::size_t limit) = 0;
+
+  /// Tells whoever is added that there are further events.
+  [[nodiscard]] virtual JournalBell& bell() = 0;
+  struct Status {
+    FollowStatus following;
+    /// Events kept: IDs from `firstEventID` to `lastEventID`; both 0 before the history begins.
+    std::uint64_t firstEventID = 0;
+    std::uint64_t lastEventID = 0;
+  };
+  [[nodiscard]] virtual Status status() = 0;
 
   [[nodiscard]] virtual UUID historyUUID() const = 0;
   /// The volume's number as the system sees it; never 0.

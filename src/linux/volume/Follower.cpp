@@ -1,0 +1,227 @@
+#include "linux/volume/Follower.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <string>
+#include <utility>
+
+#include "foundation/Log.h"
+
+namespace mirabel {
+namespace {
+
+// A round takes in what was queued when it began. More than this many have something to do only
+// when names change faster than they are read.
+constexpr int mostRounds = 16;
+// How often everything is compared in one go because records were dropped meanwhile.
+constexpr int mostComparisons = 3;
+constexpr std::chrono::minutes watchAgainAfter{1};
+
+}  // namespace
+
+Follower::Follower(IndexContext context, Options options)
+    : context_(std::move(context)),
+      options_(std::move(options)),
+      missing_(context_),
+      scan_(context_, missing_),
+      places_(context_, missing_, scan_),
+      recent_(context_) {}
+
+Result<void> Follower::catchUp(const Transaction& transaction) {
+  if (!isInStep_) return compareAll(transaction);
+  auto outcome = follow(transaction);
+  if (!outcome) isInStep_ = false;
+  if (!outcome) return fail(outcome.error());
+  return *outcome == Outcome::inStep ? Result<void>() : compareAll(transaction);
+}
+
+// Following records -----------------------------------------------------------------------------
+
+Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
+  for (int round = 0; round < mostRounds; ++round) {
+    auto isSound = drain();
+    if (!isSound) return fail(isSound.error());
+    if (!*isSound) return Outcome::lost;
+    if (auto added = addArrived(); !added) return fail(added.error());
+    if (looks_.isEmpty() && scan_.isEmpty()) break;
+    looks_.merge(later_.take());
+    if (auto done = followRound(transaction, looks_.take()); !done) return fail(done.error());
+    if (scan_.watchFailure()) return Outcome::lost;
+  }
+  if (auto settled = settle(transaction); !settled) return fail(settled.error());
+  if (!later_.isEmpty()) {
+    // Mostly their folder is known by now to have gone.
+    if (auto done = followRound(transaction, later_.take()); !done) return fail(done.error());
+    if (auto settled = settle(transaction); !settled) return fail(settled.error());
+  }
+  recent_.clear();
+  // A folder is elsewhere, and no record has told of that.
+  return later_.isEmpty() && !scan_.watchFailure() ? Outcome::inStep : Outcome::lost;
+}
+
+Result<void> Follower::followRound(const Transaction& transaction, LookList::Folders looks) {
+  auto later = places_.look(transaction, *watcher_, std::move(looks));
+  if (!later) return fail(later.error());
+  later_.merge(std::move(*later));
+  return scanArrived(transaction);
+}
+
+Result<void> Follower::settle(const Transaction& transaction) {
+  if (missing_.isEmpty()) return {};
+  return transaction([&] { return missing_.settle(); });
+}
+
+/// False when records were dropped.
+Result<bool> Follower::drain() {
+  LookList fresh;
+  auto drained = watcher_->drain(fresh);
+  if (!drained) return fail(drained.error());
+  if (drained->hasLost) return false;
+  recent_.add(fresh);
+  looks_.merge(fresh.take());
+  return true;
+}
+
+std::optional<std::vector<RecentPlace>> Follower::placesOf(std::uint64_t inode) {
+  if (!isInStep_) return std::nullopt;
+  auto isSound = drain();
+  if (!isSound || !*isSound) {
+    isInStep_ = false;
+    return std::nullopt;
+  }
+  return recent_.placesOf(inode);
+}
+
+Result<void> Follower::addArrived() {
+  for (const std::uint64_t id : context_.learner.takeArrivedFolders()) {
+    if (scan_.hasRead(id)) continue;
+    auto row = context_.store.objectByFileID(id);
+    if (!row) return fail(row.error());
+    if (!*row || !(*row)->location || (*row)->fileSystem != 0) continue;
+    auto path = context_.paths.pathOf(*(*row)->location);
+    if (!path) return fail(path.error());
+    if (*path && context_.roots.locate(**path)) {
+      scan_.add(std::move(**path), id, TreeScan::Depth::everything);
+    }
+  }
+  return {};
+}
+
+Result<void> Follower::scanArrived(const Transaction& transaction) {
+  while (true) {
+    if (auto scanned = scan_.run(transaction); !scanned) return scanned;
+    if (auto added = addArrived(); !added) return added;
+    if (scan_.isEmpty()) break;
+  }
+  if (!scan_.watchFailure()) scan_.clear();
+  return {};
+}
+
+// Comparing everything --------------------------------------------------------------------------
+
+Result<void> Follower::compareAll(const Transaction& transaction) {
+  isInStep_ = false;
+  prepareWatcher();
+  for (int attempt = 0; attempt < mostComparisons; ++attempt) {
+    if (auto scanned = scanAll(transaction); !scanned) return scanned;
+    if (const auto& failure = scan_.watchFailure()) giveUpWatching(*failure);
+    const bool wasDisturbed = scan_.disturbances() != 0;
+    scan_.clear();
+    if (!watcher_) {
+      if (wasDisturbed) continue;
+      return {};
+    }
+    isInStep_ = true;
+    auto outcome = follow(transaction);
+    if (!outcome || *outcome == Outcome::lost) isInStep_ = false;
+    if (!outcome) return fail(outcome.error());
+    if (*outcome == Outcome::inStep) return {};
+    if (const auto& failure = scan_.watchFailure()) giveUpWatching(*failure);
+  }
+  // Whatever had finished when this was called is in the index; of the rest nothing is known.
+  return {};
+}
+
+bool Follower::isComparisonDue() const {
+  // At most a twentieth of the time goes into looking.
+  const auto rest =
+      std::max<std::chrono::steady_clock::duration>(std::chrono::seconds(2), 20 * comparisonTook_);
+  return !isInStep_ && std::chrono::steady_clock::now() - comparedAt_ > rest;
+}
+
+Result<void> Follower::scanAll(const Transaction& transaction) {
+  const auto began = std::chrono::steady_clock::now();
+  missing_.clear();
+  recent_.clear();
+  scan_.clear();
+  looks_.clear();
+  later_.clear();
+  scan_.setWatcher(watcher_.get());
+  if (watcher_) {
+    // What was queued so far will be seen by the comparison.
+    LookList seenAnyway;
+    if (auto drained = watcher_->drain(seenAnyway); !drained) return fail(drained.error());
+  }
+  static_cast<void>(context_.learner.takeArrivedFolders());
+  auto added = transaction([&] { return scan_.addRoots(); });
+  if (added) added = scan_.run(transaction);
+  if (!added) return added;
+  foldersNeeded_ = scan_.foldersRead();
+  unreadable_ = scan_.unreadableFolders();
+  comparedAt_ = std::chrono::steady_clock::now();
+  comparisonTook_ = comparedAt_ - began;
+  // Only now is it known that what is missing did not turn up elsewhere.
+  return settle(transaction);
+}
+
+void Follower::prepareWatcher() {
+  if (watcher_ || !options_.makeWatcher) return;
+  const auto now = std::chrono::steady_clock::now();
+  if (refusal_ && now < retryAt_) return;
+  auto made = options_.makeWatcher();
+  if (made) {
+    watcher_ = std::move(*made);
+    return;
+  }
+  giveUpWatching(made.error());
+}
+
+void Follower::giveUpWatching(const Error& error) {
+  const bool isNews = !refusal_;
+  refusal_ = error;
+  retryAt_ = std::chrono::steady_clock::now() + watchAgainAfter;
+  if (watcher_) refusedKind_ = watcher_->kind();
+  // Marks that do not cover everything are of no use, and others may need them.
+  scan_.setWatcher(nullptr);
+  watcher_.reset();
+  isInStep_ = false;
+  logInfo("can't watch the folders; " + error.description());
+  if (!isNews || !options_.notice) return;
+  const FollowStatus now = status();
+  std::string text = "can't watch the folders for changes";
+  if (error.isPosix(ENOSPC) && now.limits.allowed) {
+    text += ": that needs " + std::to_string(now.marksNeeded) + " marks, and " +
+            std::to_string(*now.limits.allowed) + " are allowed; raise \"" + now.limits.setting +
+            "\" with sysctl";
+  } else {
+    text += " (" + error.description() + ")";
+  }
+  options_.notice(text + "; until then every question is answered by a look at all files");
+}
+
+FollowStatus Follower::status() const {
+  FollowStatus status;
+  status.refusal = refusal_;
+  status.marksNeeded = foldersNeeded_;
+  status.unreadableFolders = unreadable_;
+  if (watcher_) {
+    status.watcher = watcher_->kind();
+    status.foldersWatched = watcher_->watchedFolders();
+    status.refusal.reset();
+  }
+  const auto kind = status.watcher ? status.watcher : refusedKind_;
+  status.limits = WatchLimits::of(kind.value_or(WatcherKind::folderMarks));
+  return status;
+}
+
+}  // namespace mirabel

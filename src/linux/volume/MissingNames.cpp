@@ -1,0 +1,36 @@
+#include "linux/volume/MissingNames.h"
+
+#include <utility>
+
+namespace mirabel {
+
+Result<void> MissingNames::add(std::uint64_t folder, const std::string& name) {
+  auto link = context_.store.linkAt(folder, name);
+  if (!link) return fail(link.error());
+  if (*link) addLink(**link, {folder, name});
+  auto object = context_.store.objectAt(folder, name);
+  if (!object) return fail(object.error());
+  if (*object) addObject((*object)->slot, {folder, name});
+  return {};
+}
+
+Result<void> MissingNames::settle() {
+  for (const Missing& missing : std::exchange(missing_, {})) {
+    if (auto settled = settle(missing); !settled) return settled;
+  }
+  return {};
+}
+
+Result<void> MissingNames::settle(const Missing& missing) {
+  auto row = context_.store.objectInSlot(missing.slot);
+  if (!row) return fail(row.error());
+  if (missing.isLink) {
+    auto removed = context_.store.removeLink(missing.location.folder, missing.location.name);
+    if (!removed || !*row) return removed;
+    return context_.recorder.changed(**row, missing.location);
+  }
+  if (!*row || (*row)->location != missing.location) return {};
+  return context_.learner.leave(std::move(**row));
+}
+
+}  // namespace mirabel

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace mirabel {
+
+/// A name under which an object may have turned up.
+struct RecentPlace {
+  std::string folderPath;
+  std::string name;
+};
+
+/// Where names have changed since the index was last in step with the disk: while everything is
+/// watched, an object that has left its place is at one of these, or has left the roots.
+class RecentPlaces {
+ public:
+  virtual ~RecentPlaces() = default;
+  /// Names that stand, or stood a moment ago, for an object with that inode number. Nothing when
+  /// not everything is watched, and only a look everywhere will tell.
+  [[nodiscard]] virtual std::optional<std::vector<RecentPlace>> placesOf(std::uint64_t inode) = 0;
+};
+
+}  // namespace mirabel

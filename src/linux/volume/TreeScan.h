@@ -1,0 +1,78 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <unordered_set>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "linux/volume/IndexContext.h"
+#include "linux/volume/MissingNames.h"
+#include "linux/watch/FolderWatcher.h"
+
+namespace mirabel {
+
+/// Compares folders of the index with the disk, by a look at every entry, and takes the
+/// differences in. Each folder is watched from before it is read, so that what happens to it
+/// afterwards is heard of. Folders that can't be read hold nothing. Used under the lock of the
+/// index.
+class TreeScan {
+ public:
+  TreeScan(const IndexContext& context, MissingNames& missing)
+      : context_(context), missing_(missing) {}
+
+  /// Null: nobody watches.
+  void setWatcher(FolderWatcher* watcher) { watcher_ = watcher; }
+
+  enum class Depth {
+    everything,  ///< all folders below
+    folder,      ///< the folder itself, and folders in it that nobody watches
+  };
+  void add(std::string path, std::uint64_t id, Depth depth);
+  [[nodiscard]] Result<void> addRoots();
+  [[nodiscard]] bool isEmpty() const { return pending_.empty(); }
+  void clear();
+
+  /// Goes through what was added. When it returns without an error, the index shows what the disk
+  /// showed at some moment since the call, for each entry that did not change meanwhile; names
+  /// that are missing are still to be settled. An error leaves what was taken in.
+  [[nodiscard]] Result<void> run(const Transaction& transaction);
+
+  /// Whether that folder was gone through since the last `clear`.
+  [[nodiscard]] bool hasRead(std::uint64_t id) const { return read_.contains(id); }
+  [[nodiscard]] std::size_t foldersRead() const { return read_.size(); }
+  /// Folders that went away, or changed places, while they were read.
+  [[nodiscard]] std::size_t disturbances() const { return disturbances_; }
+  /// Set when the kernel refused to watch a folder that can be read.
+  [[nodiscard]] const std::optional<Error>& watchFailure() const { return watchFailure_; }
+  /// Folders that are there and can't be read, since the last `clear`.
+  [[nodiscard]] std::size_t unreadableFolders() const { return unreadable_; }
+
+ private:
+  struct Folder {
+    std::string path;
+    std::uint64_t id;
+    Depth depth;
+  };
+  [[nodiscard]] Result<void> readBatch();
+  [[nodiscard]] Result<void> read(const Folder& folder);
+  [[nodiscard]] Result<void> readEntries(const Folder& folder, UniqueFd opened);
+  [[nodiscard]] Result<std::uint64_t> takeIn(const Folder& folder, int descriptor,
+                                             std::vector<Sighting>& batch);
+  [[nodiscard]] Result<void> findMissing(const Folder& folder);
+  void watch(int folder, std::uint64_t id);
+
+  const IndexContext& context_;
+  MissingNames& missing_;
+  FolderWatcher* watcher_ = nullptr;
+  std::vector<Folder> pending_;
+  std::unordered_set<std::uint64_t> read_;
+  std::size_t entriesRead_ = 0;  // in the transaction under way
+  std::size_t disturbances_ = 0;
+  std::size_t unreadable_ = 0;
+  std::optional<Error> watchFailure_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,49 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+#include "linux/kernel/UniqueFd.h"
+#include "linux/watch/FolderWatcher.h"
+
+namespace mirabel {
+
+/// fanotify, with a mark on each folder or one on the file system. Records name their folder by
+/// its handle.
+class FanotifyWatcher final : public FolderWatcher {
+ public:
+  [[nodiscard]] static Result<std::unique_ptr<FolderWatcher>> create(WatcherKind kind);
+
+  [[nodiscard]] Result<void> watch(int folder, std::uint64_t id) override;
+  void forget(std::uint64_t id) override;
+  [[nodiscard]] bool isWatched(std::uint64_t id) const override { return handles_.contains(id); }
+  [[nodiscard]] std::size_t watchedFolders() const override { return handles_.size(); }
+  [[nodiscard]] Result<Drained> drain(LookList& looks) override;
+  [[nodiscard]] int descriptor() const override { return group_.get(); }
+  [[nodiscard]] WatcherKind kind() const override { return kind_; }
+
+ private:
+  FanotifyWatcher(UniqueFd group, WatcherKind kind);
+  [[nodiscard]] Result<void> mark(int folder);
+
+  struct Hash {
+    using is_transparent = void;
+    std::size_t operator()(std::string_view text) const {
+      return std::hash<std::string_view>()(text);
+    }
+  };
+  UniqueFd group_;
+  WatcherKind kind_;
+  bool hasFileSystemMark_ = false;
+  std::unordered_map<std::string, std::uint64_t, Hash, std::equal_to<>> folders_;  // by handle
+  std::unordered_map<std::uint64_t, std::string> handles_;
+  std::unique_ptr<std::byte[]> buffer_;
+};
+
+}  // namespace mirabel
