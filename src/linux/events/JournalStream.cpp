@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <atomic>
+#include <set>
+#include <tuple>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -34,39 +36,82 @@ FileSystemEvent eventOf(JournalRecord record) {
 
 }  // namespace
 
-struct JournalStream::Run {
-  VolumeIndex& index;
-  std::shared_ptr<StreamGate> gate;
+struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> {
+  Run(const StreamServices& shared, JournalSelection selected, std::uint64_t after,
+      std::chrono::milliseconds gathering, EventStreams::Callback told)
+      : services(shared),
+        selection(std::move(selected)),
+        since(after),
+        patience(gathering),
+        callback(std::move(told)) {}
+
+  StreamServices services;
   JournalSelection selection;
   std::uint64_t since;
+  std::chrono::milliseconds patience;
   EventStreams::Callback callback;
+  std::optional<SerialQueue> queue;
   std::atomic<bool> isStopped = false;
   std::vector<std::uint64_t> folders;  // the watched paths' own IDs: they may have had other names
 
-  // Batches run in turn with whatever else its owner submits, a stop for one.
-  void deliver() {
-    const std::shared_lock open(gate->mutex);
-    if (gate->isClosed || isStopped) return;
-    auto last = index.currentEventID();
+  [[nodiscard]] std::chrono::milliseconds latency() const override { return patience; }
+
+  void submit() override {
+    queue->async([self = shared_from_this()] {
+      const std::shared_lock open(self->services.gate->mutex);
+      if (!self->services.gate->isClosed && !self->isStopped) self->deliver();
+    });
+  }
+
+  // Runs in turn with whatever else its owner submits, a stop for one.
+  void begin() {
+    const std::shared_lock open(services.gate->mutex);
+    if (services.gate->isClosed || isStopped) return;
+    auto last = services.index.currentEventID();
     if (!last) return lose(last.error());
     for (const std::string& path : selection.paths) {
       const auto status = statusOf(path);
       if (!status) continue;
-      auto seen = index.learnPath(path, *status, false);
+      auto seen = services.index.learnPath(path, *status, false);
       if (seen) folders.push_back(seen->fileID);
     }
+    if (!deliver()) return;
+    tellOfStream(eventflag::historyDone);
+    if (!isStopped) services.live.add(weak_from_this());
+  }
+
+  /// Delivers what there is; false when the history has a gap there.
+  bool deliver() {
     while (!isStopped) {
-      auto records = index.events(since, batchSize);
-      if (!records) return lose(records.error());
-      if (records->empty()) break;
+      auto records = services.index.events(since, batchSize);
+      if (!records) lose(records.error());
+      if (!records) return false;
+      if (records->empty()) return true;
       since = records->back().id;
-      std::vector<FileSystemEvent> batch;
-      for (JournalRecord& record : *records) {
-        if (isSelected(record)) batch.push_back(eventOf(std::move(record)));
-      }
+      const auto batch = batchOf(std::move(*records));
       if (!batch.empty() && !isStopped) callback(batch);
     }
-    tellOfStream(eventflag::historyDone);
+    return true;
+  }
+
+  [[nodiscard]] std::vector<FileSystemEvent> batchOf(std::vector<JournalRecord> records) const {
+    std::vector<FileSystemEvent> batch;
+    for (JournalRecord& record : records) {
+      if (isSelected(record)) batch.push_back(eventOf(std::move(record)));
+    }
+    // From the last to the first: of those that are alike the last one stands.
+    std::set<std::tuple<std::string_view, std::optional<std::uint64_t>,
+                        std::optional<std::uint32_t>, std::uint32_t>>
+        told;
+    std::vector<bool> isRepeated(batch.size());
+    for (std::size_t i = batch.size(); i-- > 0;) {
+      const FileSystemEvent& event = batch[i];
+      isRepeated[i] =
+          !told.emplace(*event.path, event.fileID, event.documentID, event.flags).second;
+    }
+    std::size_t index = 0;
+    std::erase_if(batch, [&](const FileSystemEvent&) { return isRepeated[index++]; });
+    return batch;
   }
 
   [[nodiscard]] bool isSelected(const JournalRecord& record) const {
@@ -79,6 +124,7 @@ struct JournalStream::Run {
   void lose(const Error& error) {
     logDebug([&] { return "can't replay the history; " + error.description(); });
     tellOfStream(eventflag::kernelDropped);
+    isStopped = true;
   }
 
   void tellOfStream(std::uint32_t flag) {
@@ -90,23 +136,23 @@ struct JournalStream::Run {
   }
 };
 
-JournalStream::JournalStream(VolumeIndex& index, std::shared_ptr<StreamGate> gate,
-                             JournalSelection selection, std::uint64_t since,
+JournalStream::JournalStream(const StreamServices& services, JournalSelection selection,
+                             std::uint64_t since, std::chrono::milliseconds latency,
                              EventStreams::Callback callback)
-    : run_(new Run{
-          index, std::move(gate), std::move(selection), since, std::move(callback), false, {}}) {}
+    : run_(std::make_shared<Run>(services, std::move(selection), since, latency,
+                                 std::move(callback))) {}
 
 JournalStream::~JournalStream() {
   run_->isStopped = true;
 }
 
 void JournalStream::setDispatchQueue(SerialQueue queue) {
-  queue_ = std::move(queue);
+  run_->queue = std::move(queue);
 }
 
 void JournalStream::start() {
-  if (!queue_) return;
-  queue_->async([run = run_] { run->deliver(); });
+  if (!run_->queue) return;
+  run_->queue->async([run = run_] { run->begin(); });
 }
 
 void JournalStream::stop() {

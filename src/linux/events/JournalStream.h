@@ -1,12 +1,13 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <memory>
-#include <optional>
 #include <shared_mutex>
 #include <string>
 #include <vector>
 
+#include "linux/events/LiveStreams.h"
 #include "linux/volume/VolumeIndex.h"
 #include "platform/EventStreams.h"
 
@@ -25,13 +26,22 @@ struct StreamGate {
   bool isClosed = false;
 };
 
+/// What the streams of a volume share.
+struct StreamServices {
+  VolumeIndex& index;
+  LiveStreams& live;
+  std::shared_ptr<StreamGate> gate;
+};
+
 /// A cursor into the volume's history. Starting it brings the index in step with the disk, then
-/// delivers the history a batch at a time; nothing queues in memory. Any thread may call it.
+/// delivers the history a batch at a time, then what comes; nothing queues in memory. Of several
+/// events of one batch that say the same of one object, the last is delivered. Any thread may call
+/// it.
 class JournalStream final : public EventStream {
  public:
-  /// `index` lives until the gate is closed.
-  JournalStream(VolumeIndex& index, std::shared_ptr<StreamGate> gate, JournalSelection selection,
-                std::uint64_t since, EventStreams::Callback callback);
+  /// `services` live until their gate is closed.
+  JournalStream(const StreamServices& services, JournalSelection selection, std::uint64_t since,
+                std::chrono::milliseconds latency, EventStreams::Callback callback);
   ~JournalStream() override;
 
   void setDispatchQueue(SerialQueue queue) override;
@@ -43,7 +53,6 @@ class JournalStream final : public EventStream {
   // Shared with the work that is under way on the queue.
   struct Run;
   std::shared_ptr<Run> run_;
-  std::optional<SerialQueue> queue_;
 };
 
 }  // namespace mirabel

@@ -10,25 +10,32 @@
 namespace mirabel {
 
 LinuxEventStreams::LinuxEventStreams(VolumeIndex& index)
-    : index_(index), gate_(std::make_shared<StreamGate>()) {}
+    : index_(index),
+      live_(std::make_unique<LiveStreams>(index.bell())),
+      gate_(std::make_shared<StreamGate>()) {}
 
 LinuxEventStreams::~LinuxEventStreams() {
+  live_.reset();
   const std::scoped_lock closing(gate_->mutex);
   gate_->isClosed = true;
 }
 
+StreamServices LinuxEventStreams::services() const {
+  return {index_, *live_, gate_};
+}
+
 Result<std::unique_ptr<EventStream>> LinuxEventStreams::createForPaths(
-    std::vector<std::string> paths, std::uint64_t since, std::chrono::milliseconds, std::uint32_t,
-    Callback callback) {
-  return std::make_unique<JournalStream>(index_, gate_, JournalSelection{false, std::move(paths)},
-                                         since, std::move(callback));
+    std::vector<std::string> paths, std::uint64_t since, std::chrono::milliseconds latency,
+    std::uint32_t, Callback callback) {
+  return std::make_unique<JournalStream>(services(), JournalSelection{false, std::move(paths)},
+                                         since, latency, std::move(callback));
 }
 
 Result<std::unique_ptr<EventStream>> LinuxEventStreams::createRelativeToDevice(
-    DeviceID, std::vector<std::string> paths, std::uint64_t since, std::chrono::milliseconds,
-    std::uint32_t, Callback callback) {
+    DeviceID, std::vector<std::string> paths, std::uint64_t since,
+    std::chrono::milliseconds latency, std::uint32_t, Callback callback) {
   if (paths != std::vector<std::string>{"/.docid"}) return fail(Error::posix(ENOTSUP));
-  return std::make_unique<JournalStream>(index_, gate_, JournalSelection{true, {}}, since,
+  return std::make_unique<JournalStream>(services(), JournalSelection{true, {}}, since, latency,
                                          std::move(callback));
 }
 

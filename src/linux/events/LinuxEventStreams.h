@@ -10,9 +10,8 @@
 
 namespace mirabel {
 
-/// The event history of the volume of the documents, on the journal that its index keeps. What
-/// happened is found out by comparing the index with the disk whenever the history is asked: a
-/// stream delivers what there is when it starts, and ends with that.
+/// The event history of the volume of the documents, on the journal that its index keeps. A stream
+/// delivers what there is when it starts, then what comes, as long as the index hears of changes.
 class LinuxEventStreams final : public EventStreams {
  public:
   /// `index` outlives it.
@@ -30,7 +29,10 @@ class LinuxEventStreams final : public EventStreams {
   [[nodiscard]] std::uint64_t currentEventID() override;
 
  private:
+  [[nodiscard]] StreamServices services() const;
+
   VolumeIndex& index_;
+  std::unique_ptr<LiveStreams> live_;
   std::shared_ptr<StreamGate> gate_;
 };
 
