@@ -6,15 +6,19 @@
 #include <fstream>
 #include <stdio.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "linux/kernel/RawDirectory.h"
 
 namespace mirabel {
 namespace {
 
-std::string makeBase() {
+std::string makeBase(bool inMemory) {
   const char* given = std::getenv("MIRABEL_TEST_DIR");
-  std::string pattern = given != nullptr ? given : std::filesystem::temp_directory_path().string();
+  const bool canBeInMemory = inMemory && ::access("/dev/shm", W_OK) == 0;
+  std::string pattern = given != nullptr ? given
+                        : canBeInMemory  ? "/dev/shm"
+                                         : std::filesystem::temp_directory_path().string();
   pattern += "/mirabel-volume-XXXXXX";
   if (::mkdtemp(pattern.data()) == nullptr) throw std::runtime_error("can't make " + pattern);
   return std::filesystem::canonical(pattern);
@@ -22,8 +26,10 @@ std::string makeBase() {
 
 }  // namespace
 
-VolumeFixture::VolumeFixture()
-    : base_(makeBase()), documents_(base_ + "/Documents"), state_(base_ + "/state") {
+VolumeFixture::VolumeFixture(Where where)
+    : base_(makeBase(where == Where::inMemory)),
+      documents_(base_ + "/Documents"),
+      state_(base_ + "/state") {
   ::mkdir(documents_.c_str(), 0755);
 }
 

@@ -18,7 +18,10 @@ namespace mirabel {
 /// at the end.
 class VolumeFixture : public testing::Test {
  protected:
-  VolumeFixture();
+  /// Bursts of files are made in memory unless a file system was named: some disks need a minute to
+  /// be rid of them.
+  enum class Where { onDisk, inMemory };
+  explicit VolumeFixture(Where where = Where::onDisk);
   ~VolumeFixture() override;
 
   std::string path(std::string_view relative) const {

@@ -43,20 +43,23 @@ Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
     if (!isSound) return fail(isSound.error());
     if (!*isSound) return Outcome::lost;
     if (auto added = addArrived(); !added) return fail(added.error());
+    if (auto added = addDisturbed(); !added) return fail(added.error());
     if (looks_.isEmpty() && scan_.isEmpty()) break;
     looks_.merge(later_.take());
     if (auto done = followRound(transaction, looks_.take()); !done) return fail(done.error());
     if (scan_.watchFailure()) return Outcome::lost;
   }
   if (auto settled = settle(transaction); !settled) return fail(settled.error());
-  if (!later_.isEmpty()) {
+  if (!later_.isEmpty() || scan_.wasDisturbed()) {
     // Mostly their folder is known by now to have gone.
+    if (auto added = addDisturbed(); !added) return fail(added.error());
     if (auto done = followRound(transaction, later_.take()); !done) return fail(done.error());
     if (auto settled = settle(transaction); !settled) return fail(settled.error());
   }
   recent_.clear();
   // A folder is elsewhere, and no record has told of that.
-  return later_.isEmpty() && !scan_.watchFailure() ? Outcome::inStep : Outcome::lost;
+  const bool isDone = later_.isEmpty() && !scan_.wasDisturbed() && !scan_.watchFailure();
+  return isDone ? Outcome::inStep : Outcome::lost;
 }
 
 Result<void> Follower::followRound(const Transaction& transaction, LookList::Folders looks) {
@@ -95,14 +98,27 @@ std::optional<std::vector<RecentPlace>> Follower::placesOf(std::uint64_t inode) 
 Result<void> Follower::addArrived() {
   for (const std::uint64_t id : context_.learner.takeArrivedFolders()) {
     if (scan_.hasRead(id)) continue;
-    auto row = context_.store.objectByFileID(id);
-    if (!row) return fail(row.error());
-    if (!*row || !(*row)->location || (*row)->fileSystem != 0) continue;
-    auto path = context_.paths.pathOf(*(*row)->location);
-    if (!path) return fail(path.error());
-    if (*path && context_.roots.locate(**path)) {
-      scan_.add(std::move(**path), id, TreeScan::Depth::everything);
-    }
+    if (auto added = addByID(id); !added) return added;
+  }
+  return {};
+}
+
+/// What was to be read changed places first: a record tells where to, by now.
+Result<void> Follower::addDisturbed() {
+  for (const std::uint64_t id : scan_.takeDisturbed()) {
+    if (auto added = addByID(id); !added) return added;
+  }
+  return {};
+}
+
+Result<void> Follower::addByID(std::uint64_t folder) {
+  auto row = context_.store.objectByFileID(folder);
+  if (!row) return fail(row.error());
+  if (!*row || !(*row)->location || (*row)->fileSystem != 0) return {};
+  auto path = context_.paths.pathOf(*(*row)->location);
+  if (!path) return fail(path.error());
+  if (*path && context_.roots.locate(**path)) {
+    scan_.add(std::move(**path), folder, TreeScan::Depth::everything);
   }
   return {};
 }
@@ -125,10 +141,9 @@ Result<void> Follower::compareAll(const Transaction& transaction) {
   for (int attempt = 0; attempt < mostComparisons; ++attempt) {
     if (auto scanned = scanAll(transaction); !scanned) return scanned;
     if (const auto& failure = scan_.watchFailure()) giveUpWatching(*failure);
-    const bool wasDisturbed = scan_.disturbances() != 0;
     scan_.clear();
     if (!watcher_) {
-      if (wasDisturbed) continue;
+      if (!scan_.takeDisturbed().empty()) continue;
       return {};
     }
     isInStep_ = true;
@@ -156,6 +171,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   scan_.clear();
   looks_.clear();
   later_.clear();
+  static_cast<void>(scan_.takeDisturbed());
   scan_.setWatcher(watcher_.get());
   if (watcher_) {
     // What was queued so far will be seen by the comparison.
@@ -167,7 +183,6 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   if (added) added = scan_.run(transaction);
   if (!added) return added;
   foldersNeeded_ = scan_.foldersRead();
-  unreadable_ = scan_.unreadableFolders();
   comparedAt_ = std::chrono::steady_clock::now();
   comparisonTook_ = comparedAt_ - began;
   // Only now is it known that what is missing did not turn up elsewhere.
@@ -213,7 +228,7 @@ FollowStatus Follower::status() const {
   FollowStatus status;
   status.refusal = refusal_;
   status.marksNeeded = foldersNeeded_;
-  status.unreadableFolders = unreadable_;
+  status.unreadableFolders = scan_.unreadableFolders();
   if (watcher_) {
     status.watcher = watcher_->kind();
     status.foldersWatched = watcher_->watchedFolders();

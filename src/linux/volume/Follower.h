@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -57,6 +58,8 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] Result<bool> drain();
   [[nodiscard]] Result<void> scanArrived(const Transaction& transaction);
   [[nodiscard]] Result<void> addArrived();
+  [[nodiscard]] Result<void> addDisturbed();
+  [[nodiscard]] Result<void> addByID(std::uint64_t folder);
   [[nodiscard]] Result<void> scanAll(const Transaction& transaction);
   void prepareWatcher();
   void giveUpWatching(const Error& error);
@@ -77,7 +80,6 @@ class Follower final : public RecentPlaces {
   std::chrono::steady_clock::time_point comparedAt_{};
   std::chrono::steady_clock::duration comparisonTook_{};
   std::size_t foldersNeeded_ = 0;
-  std::size_t unreadable_ = 0;
 };
 
 }  // namespace mirabel

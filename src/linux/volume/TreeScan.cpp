@@ -8,6 +8,7 @@
 
 #include "foundation/SplitWork.h"
 #include "linux/kernel/RawDirectory.h"
+#include "linux/volume/ObjectMatcher.h"
 
 namespace mirabel {
 namespace {
@@ -50,8 +51,6 @@ Result<void> TreeScan::addRoots() {
 void TreeScan::clear() {
   pending_.clear();
   read_.clear();
-  disturbances_ = 0;
-  unreadable_ = 0;
   watchFailure_.reset();
 }
 
@@ -70,7 +69,7 @@ Result<void> TreeScan::readBatch() {
     pending_.pop_back();
     auto done = read(folder);
     if (!done && isDisturbance(done.error())) {
-      ++disturbances_;
+      disturbed_.push_back(folder.id);
       continue;
     }
     if (!done) return done;
@@ -83,19 +82,42 @@ Result<void> TreeScan::read(const Folder& folder) {
   auto opened = context_.roots.open(folder.path, O_RDONLY | O_DIRECTORY);
   if (!opened && !isClosedToUs(opened.error())) return fail(opened.error());
   if (!opened) {
-    ++unreadable_;
+    unreadable_.insert(folder.id);
     read_.insert(folder.id);
     return findMissing(folder);
   }
-  const auto status = statusAt(opened->get(), "");
+  auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
   // What is mounted there, or is a volume of its own, is another's.
   if (status->device != context_.device) return findMissing(folder);
   auto id = context_.learner.folderID(folder.path, opened->get());
   if (!id) return fail(id.error());
   watch(opened->get(), *id);
+  const Folder itself{folder.path, *id, folder.depth};
+  auto done = lookAtItself(itself, opened->get());
+  if (done) done = readEntries(itself, std::move(*opened));
+  if (!done) {
+    // Who is watched is known: whoever meets it under its new name reads it.
+    if (watcher_ != nullptr) watcher_->forget(*id);
+    return done;
+  }
+  unreadable_.erase(*id);
   read_.insert(*id);
-  return readEntries({folder.path, *id, folder.depth}, std::move(*opened));
+  return {};
+}
+
+/// Since it was seen in the folder above, something may have come into it, or left.
+Result<void> TreeScan::lookAtItself(const Folder& folder, int descriptor) {
+  auto row = context_.store.objectByFileID(folder.id);
+  if (!row) return fail(row.error());
+  auto status = statusAt(descriptor, "");
+  if (!status) return fail(status.error());
+  if (!*row || !(*row)->location || (*row)->location->folder == 0) return {};
+  if (!hasChanged(**row, *status)) return {};
+  const bool isPackage = context_.isPackageName((*row)->location->name);
+  auto learned = context_.learner.learnPath(folder.path, *status, isPackage);
+  if (!learned) return fail(learned.error());
+  return {};
 }
 
 void TreeScan::watch(int folder, std::uint64_t id) {

@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 #include <unordered_set>
+#include <utility>
 #include <vector>
 
 #include "foundation/Error.h"
@@ -43,12 +44,14 @@ class TreeScan {
   /// Whether that folder was gone through since the last `clear`.
   [[nodiscard]] bool hasRead(std::uint64_t id) const { return read_.contains(id); }
   [[nodiscard]] std::size_t foldersRead() const { return read_.size(); }
-  /// Folders that went away, or changed places, while they were read.
-  [[nodiscard]] std::size_t disturbances() const { return disturbances_; }
+  /// Folders that went away, or changed places, before they were read to the end, since the last
+  /// call: their paths are to be found out again.
+  [[nodiscard]] std::vector<std::uint64_t> takeDisturbed() { return std::exchange(disturbed_, {}); }
+  [[nodiscard]] bool wasDisturbed() const { return !disturbed_.empty(); }
   /// Set when the kernel refused to watch a folder that can be read.
   [[nodiscard]] const std::optional<Error>& watchFailure() const { return watchFailure_; }
-  /// Folders that are there and can't be read, since the last `clear`.
-  [[nodiscard]] std::size_t unreadableFolders() const { return unreadable_; }
+  /// Folders that were met and could not be read when they were looked into last.
+  [[nodiscard]] std::size_t unreadableFolders() const { return unreadable_.size(); }
 
  private:
   struct Folder {
@@ -62,6 +65,7 @@ class TreeScan {
   [[nodiscard]] Result<std::uint64_t> takeIn(const Folder& folder, int descriptor,
                                              std::vector<Sighting>& batch);
   [[nodiscard]] Result<void> findMissing(const Folder& folder);
+  [[nodiscard]] Result<void> lookAtItself(const Folder& folder, int descriptor);
   void watch(int folder, std::uint64_t id);
 
   const IndexContext& context_;
@@ -70,8 +74,8 @@ class TreeScan {
   std::vector<Folder> pending_;
   std::unordered_set<std::uint64_t> read_;
   std::size_t entriesRead_ = 0;  // in the transaction under way
-  std::size_t disturbances_ = 0;
-  std::size_t unreadable_ = 0;
+  std::vector<std::uint64_t> disturbed_;
+  std::unordered_set<std::uint64_t> unreadable_;
   std::optional<Error> watchFailure_;
 };
 

@@ -1,0 +1,302 @@
+// The index follows what happens on disk: after any burst, drop or refusal it is in step, and a
+// comparison of everything finds nothing more.
+#include <atomic>
+#include <cerrno>
+#include <cstdlib>
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <map>
+#include <set>
+#include <sys/stat.h>
+#include <thread>
+#include <unistd.h>
+
+#include "linux/VolumeFixture.h"
+#include "support/OrdinaryUser.h"
+
+namespace mirabel {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// A real watcher that can be made to lose records, or to have no more marks.
+class FaultyWatcher final : public FolderWatcher {
+ public:
+  struct Faults {
+    std::size_t marks = 1'000'000;
+    bool loses = false;
+    int made = 0;
+  };
+  FaultyWatcher(std::unique_ptr<FolderWatcher> real, Faults& faults)
+      : real_(std::move(real)), faults_(faults) {
+    ++faults_.made;
+  }
+
+  Result<void> watch(int folder, std::uint64_t id) override {
+    if (real_->watchedFolders() >= faults_.marks && !real_->isWatched(id)) {
+      return fail(Error::posix(ENOSPC));
+    }
+    return real_->watch(folder, id);
+  }
+  void forget(std::uint64_t id) override { real_->forget(id); }
+  bool isWatched(std::uint64_t id) const override { return real_->isWatched(id); }
+  std::size_t watchedFolders() const override { return real_->watchedFolders(); }
+  Result<Drained> drain(LookList& looks) override {
+    if (!std::exchange(faults_.loses, false)) return real_->drain(looks);
+    LookList lost;
+    auto drained = real_->drain(lost);
+    if (drained) drained->hasLost = true;
+    return drained;
+  }
+  int descriptor() const override { return real_->descriptor(); }
+  WatcherKind kind() const override { return real_->kind(); }
+
+ private:
+  std::unique_ptr<FolderWatcher> real_;
+  Faults& faults_;
+};
+
+class FollowerTest : public VolumeFixture, public ::testing::WithParamInterface<WatcherKind> {
+ protected:
+  FollowerTest() : VolumeFixture(Where::inMemory) {}
+
+  void SetUp() override {
+    makeWatcher_ = [this]() -> Result<std::unique_ptr<FolderWatcher>> {
+      auto real = makeWatcher(GetParam());
+      if (!real) return fail(real.error());
+      return std::make_unique<FaultyWatcher>(std::move(*real), faults_);
+    };
+    if (!makeWatcher(GetParam())) GTEST_SKIP() << "not on this kernel";
+  }
+
+  std::uint64_t anchor() { return index().currentEventID().value(); }
+
+  /// Paths below the documents that events since then name.
+  std::set<std::string> told(std::uint64_t since) {
+    std::set<std::string> paths;
+    const auto records = index().events(since, 10'000'000);
+    EXPECT_TRUE(records);
+    for (const JournalRecord& record : *records) {
+      if (!record.isDocument) paths.insert(record.path.substr(documents_.size()));
+    }
+    return paths;
+  }
+
+  void expectInStep(const char* what) {
+    const std::uint64_t last = anchor();
+    EXPECT_TRUE(index().reconcile());
+    EXPECT_EQ(told(last), std::set<std::string>()) << what;
+  }
+
+  FaultyWatcher::Faults faults_;
+};
+
+TEST_P(FollowerTest, WhatHappensIsToldWithoutAComparison) {
+  struct Case {
+    const char* what;
+    std::function<void()> change;
+    std::set<std::string> told;
+  };
+  makeFolder("a/b");
+  makeFolder("c");
+  write("a/f");
+  write("a/b/deep");
+  std::uint64_t since = anchor();
+  const std::vector<Case> cases = {
+      {"nothing", [] {}, {}},
+      {"write", [&] { write("a/f", "longer"); }, {"/a/f"}},
+      {"create", [&] { write("c/new"); }, {"/c", "/c/new"}},
+      {"move", [&] { rename("c/new", "a/new"); }, {"/a", "/c", "/a/new", "/c/new"}},
+      {"delete", [&] { remove("a/new"); }, {"/a", "/a/new"}},
+      {"move of a folder", [&] { rename("a/b", "c/b"); }, {"/a", "/c", "/a/b", "/c/b"}},
+      {"in a moved folder", [&] { write("c/b/deep", "longer"); }, {"/c/b/deep"}},
+      {"a new tree",
+       [&] {
+         makeFolder("t/u/v");
+         write("t/u/v/w");
+       },
+       {"/t", "/t/u", "/t/u/v", "/t/u/v/w"}},
+      {"in the new tree", [&] { write("t/u/v/w", "longer"); }, {"/t/u/v/w"}},
+      {"out", [&] { fs::rename(path("t"), base_ + "/out"); }, {"/t", "/t/u", "/t/u/v", "/t/u/v/w"}},
+      {"out of sight", [&] { std::ofstream(base_ + "/out/u/x"); }, {}},
+      {"a part comes back",
+       [&] { fs::rename(base_ + "/out/u", path("c/u")); },
+       {"/c", "/c/u", "/c/u/x", "/c/u/v", "/c/u/v/w"}},
+      {"in it", [&] { write("c/u/x", "longer"); }, {"/c/u/x"}},
+  };
+  for (const Case& one : cases) {
+    one.change();
+    const std::uint64_t now = anchor();
+    EXPECT_EQ(told(since), one.told) << one.what;
+    expectInStep(one.what);
+    since = now;
+  }
+}
+
+TEST_P(FollowerTest, AnUnlinkedDocumentEndsAndASavedOneGoesOn) {
+  write("saved");
+  write("unlinked");
+  anchor();
+  const std::uint32_t saved = document("saved"), unlinked = document("unlinked");
+  write("temporary", "new");
+  rename("temporary", "saved");
+  remove("unlinked");
+  write("unlinked", "another");
+  anchor();
+  EXPECT_EQ(document("saved"), saved);
+  EXPECT_NE(document("unlinked"), unlinked);
+  EXPECT_TRUE(index().fileIDOfDocument(unlinked).error().isPosix(ENOENT));
+}
+
+TEST_P(FollowerTest, ADroppedRecordCostsAComparisonAndNothingElse) {
+  makeFolder("a");
+  const std::uint64_t since = anchor();
+  for (int round = 0; round < 5; ++round) {
+    const std::string name = "a/f" + std::to_string(round);
+    write(name);
+    faults_.loses = true;
+    const auto paths = told((anchor(), since));
+    EXPECT_TRUE(paths.contains("/" + name));
+    write(name, "longer");
+    expectInStep(name.c_str());
+  }
+  EXPECT_EQ(faults_.made, 1) << "what is watched stays watched";
+}
+
+TEST_P(FollowerTest, WithTooFewMarksEveryQuestionIsAnsweredByAComparison) {
+  for (int i = 0; i < 20; ++i)
+    makeFolder("folder" + std::to_string(i));
+  faults_.marks = 10;
+  std::uint64_t since = anchor();
+  ASSERT_EQ(notices_.size(), 1u);
+  EXPECT_NE(notices_[0].find("needs 21 marks"), std::string::npos) << notices_[0];
+  EXPECT_NE(notices_[0].find("sysctl"), std::string::npos) << notices_[0];
+  const auto status = index().status().following;
+  EXPECT_FALSE(status.watcher);
+  EXPECT_EQ(status.marksNeeded, 21u);
+  EXPECT_TRUE(status.refusal && status.refusal->isPosix(ENOSPC));
+  for (int i = 0; i < 20; ++i) {
+    const std::string name = "folder" + std::to_string(i) + "/f";
+    write(name);
+    const std::uint64_t now = anchor();
+    EXPECT_TRUE(told(since).contains("/" + name));
+    since = now;
+  }
+  EXPECT_EQ(notices_.size(), 1u) << "said once";
+}
+
+TEST_P(FollowerTest, NewMarksThatRunOutEndTheWatchingAndNotTheTelling) {
+  makeFolder("a");
+  std::uint64_t since = anchor();
+  faults_.marks = 4;
+  for (int i = 0; i < 8; ++i) {
+    makeFolder("a/" + std::to_string(i));
+    write("a/" + std::to_string(i) + "/f");
+    const std::uint64_t now = anchor();
+    EXPECT_TRUE(told(since).contains("/a/" + std::to_string(i) + "/f"));
+    since = now;
+  }
+  EXPECT_EQ(notices_.size(), 1u);
+}
+
+// Files made faster than the queue holds, and folders faster than they are watched.
+TEST_P(FollowerTest, NothingOfABurstIsMissing) {
+  makeFolder("one");
+  const std::uint64_t since = anchor();
+  // One queue is like the other, and a comparison of so much takes its time.
+  const bool isShort = GetParam() == WatcherKind::inotify;
+  const int files = isShort ? 20'000 : 50'000;
+  const int folders = isShort ? 200 : 1000;
+  for (int i = 0; i < files; ++i) {
+    const UniqueFd made(::open(path("one/" + std::to_string(i)).c_str(), O_CREAT | O_WRONLY, 0600));
+    ASSERT_TRUE(made);
+  }
+  anchor();
+  EXPECT_EQ(told(since).size(), static_cast<std::size_t>(files) + 1);
+
+  std::atomic<bool> isDone = false;
+  std::thread writer([&] {
+    for (int i = 0; i < folders; ++i) {
+      const std::string folder = path("f" + std::to_string(i));
+      ::mkdir(folder.c_str(), 0700);
+      for (int j = 0; j < 50; ++j) {
+        const std::string file = folder + "/" + std::to_string(j);
+        const UniqueFd made(::open(file.c_str(), O_CREAT | O_WRONLY, 0600));
+      }
+    }
+    isDone = true;
+  });
+  const std::uint64_t before = index().status().lastEventID;
+  while (!isDone)
+    anchor();
+  writer.join();
+  anchor();
+  EXPECT_EQ(told(before).size(), static_cast<std::size_t>(folders) * 51);
+  expectInStep("after a burst of folders");
+}
+
+// As archives are unpacked and version control checks out: temporary names, renames into place,
+// folders that are made and go again, while the index is asked all the time.
+TEST_P(FollowerTest, AnUnpackedTreeIsInStepWhileItIsWritten) {
+  anchor();
+  std::atomic<bool> isDone = false;
+  std::thread writer([&] {
+    for (int i = 0; i < 150; ++i) {
+      const std::string folder = path("pack" + std::to_string(i));
+      fs::create_directories(folder + ".tmp/objects/in");
+      for (int j = 0; j < 10; ++j) {
+        const std::string temporary = folder + ".tmp/objects/tmp" + std::to_string(j);
+        const UniqueFd made(::open(temporary.c_str(), O_CREAT | O_WRONLY, 0600));
+        ::rename(temporary.c_str(), (folder + ".tmp/objects/in/o" + std::to_string(j)).c_str());
+      }
+      ::rename((folder + ".tmp").c_str(), folder.c_str());
+      if (i % 3 == 0) fs::remove_all(folder);
+      if (i % 5 == 1) ::rename((folder + "/objects").c_str(), (folder + ".moved").c_str());
+      const std::string config = path("config");
+      const UniqueFd lock(::open((config + ".lock").c_str(), O_CREAT | O_WRONLY, 0600));
+      ::rename((config + ".lock").c_str(), config.c_str());
+    }
+    isDone = true;
+  });
+  while (!isDone)
+    EXPECT_TRUE(index().currentEventID());
+  writer.join();
+  expectInStep("after an unpacked tree");
+}
+
+TEST_P(FollowerTest, AFolderThatIsClosedHoldsNothingUntilItIsOpened) {
+  makeFolder("a/b");
+  write("a/b/f");
+  // The administrator reads everything.
+  if (testing::OrdinaryUser::isRoot()) {
+    for (const auto& entry : fs::recursive_directory_iterator(base_))
+      ASSERT_EQ(::chown(entry.path().c_str(), testing::OrdinaryUser::substitute, 0), 0);
+    ASSERT_EQ(::chown(base_.c_str(), testing::OrdinaryUser::substitute, 0), 0);
+  }
+  const testing::OrdinaryUser user;
+  std::uint64_t since = anchor();
+  ::chmod(path("a").c_str(), 0);
+  std::uint64_t now = anchor();
+  EXPECT_EQ(told(since), (std::set<std::string>{"/a", "/a/b", "/a/b/f"}));
+  EXPECT_EQ(index().status().following.unreadableFolders, 1u);
+  since = now;
+  ::chmod(path("a").c_str(), 0755);
+  now = anchor();
+  EXPECT_EQ(told(since), (std::set<std::string>{"/a", "/a/b", "/a/b/f"}));
+  write("a/b/f", "longer");
+  since = now;
+  anchor();
+  EXPECT_EQ(told(since), (std::set<std::string>{"/a/b/f"}));
+}
+
+INSTANTIATE_TEST_SUITE_P(Watchers, FollowerTest,
+                         ::testing::Values(WatcherKind::folderMarks, WatcherKind::inotify),
+                         [](const auto& instance) {
+                           return instance.param == WatcherKind::inotify ? "Inotify"
+                                                                         : "FolderMarks";
+                         });
+
+}  // namespace
+}  // namespace mirabel
