@@ -201,6 +201,39 @@ TEST_P(FollowerTest, NewMarksThatRunOutEndTheWatchingAndNotTheTelling) {
   EXPECT_EQ(notices_.size(), 1u);
 }
 
+TEST_P(FollowerTest, ARootThatIsMovedAwayIsEmptyUntilThereIsAnother) {
+  makeFolder("a");
+  write("a/f");
+  const std::uint64_t folder = file("a"), content = file("a/f");
+  std::uint64_t since = anchor();
+  const auto expectTold = [&](const std::set<std::string>& paths, const char* what) {
+    const std::uint64_t now = anchor();
+    EXPECT_EQ(told(since), paths) << what;
+    since = now;
+  };
+  fs::rename(documents_, base_ + "/away");
+  expectTold({"", "/a", "/a/f"}, "moved away");
+  EXPECT_TRUE(index().pathOfFileID(content).error().isPosix(ENOENT));
+  fs::create_directory(documents_);
+  write("other");
+  expectTold({"", "/other"}, "another in its place");
+  write("other", "longer");
+  expectTold({"/other"}, "which is followed");
+  fs::rename(documents_, base_ + "/second");
+  fs::rename(base_ + "/away", documents_);
+  expectTold({"", "/other", "/a", "/a/f"}, "the first one again");
+  EXPECT_EQ(file("a"), folder);
+  EXPECT_EQ(file("a/f"), content);
+  write("a/f", "longer");
+  expectTold({"/a/f"}, "which is followed");
+  expectInStep("after all");
+}
+
+TEST_P(FollowerTest, AStateFolderInTheDocumentsIsRefused) {
+  state_ = path("state");
+  EXPECT_TRUE(tryOpen().error().isPosix(EINVAL));
+}
+
 // Files made faster than the queue holds, and folders faster than they are watched.
 TEST_P(FollowerTest, NothingOfABurstIsMissing) {
   makeFolder("one");

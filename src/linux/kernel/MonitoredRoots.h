@@ -13,14 +13,19 @@
 
 namespace mirabel {
 
-/// The folders that are presented, open for the life of the process. Everything below them is
-/// reached through their descriptors, without following a symbolic link and without crossing onto
-/// another file system, so that nothing put in the way can lead out of the tree. Paths may be of
-/// any length. Immutable once made; any thread may call it.
+/// The folders that are presented, kept open. Everything below them is reached through their
+/// descriptors, without following a symbolic link and without crossing onto another file system,
+/// so that nothing put in the way can lead out of the tree. Paths may be of any length. Any thread
+/// may call it.
 class MonitoredRoots {
  public:
   /// Paths are absolute and resolved. One that does not exist is kept and is simply empty.
   explicit MonitoredRoots(std::vector<std::string> paths);
+  ~MonitoredRoots();
+
+  /// Looks whether each root is still the folder at its path: one may have been moved away, made
+  /// since, or have something mounted on it. Whether any of them changed; those are open anew then.
+  [[nodiscard]] bool refresh();
 
   struct Place {
     std::size_t root;
@@ -30,6 +35,7 @@ class MonitoredRoots {
   [[nodiscard]] std::optional<Place> locate(std::string_view path) const;
 
   [[nodiscard]] const std::vector<std::string>& paths() const { return paths_; }
+  /// Negative for a root that is not there. Stays open for a while when the root has changed.
   [[nodiscard]] int descriptor(std::size_t root) const;
 
   /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
@@ -39,9 +45,9 @@ class MonitoredRoots {
   [[nodiscard]] Result<UniqueFd> open(const std::string& path, int flags) const;
 
  private:
+  struct Root;
   std::vector<std::string> paths_;
-  std::vector<std::shared_ptr<UniqueFd>> descriptors_;
-  std::vector<std::uint64_t> devices_;  // of the file system that each root is on
+  std::vector<std::unique_ptr<Root>> roots_;
 };
 
 }  // namespace mirabel

@@ -28,6 +28,7 @@ Follower::Follower(IndexContext context, Options options)
       recent_(context_) {}
 
 Result<void> Follower::catchUp(const Transaction& transaction) {
+  if (options_.haveRootsChanged()) isInStep_ = false;
   if (!isInStep_) return compareAll(transaction);
   auto outcome = follow(transaction);
   if (!outcome) isInStep_ = false;

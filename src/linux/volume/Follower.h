@@ -28,6 +28,8 @@ class Follower final : public RecentPlaces {
   struct Options {
     /// Makes the watcher; nothing: no folder is watched.
     std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher;
+    /// Says whether a root is another folder than it was, which no record tells of.
+    std::function<bool()> haveRootsChanged;
     /// Told, once, when folders can't be watched.
     std::function<void(std::string_view)> notice;
   };

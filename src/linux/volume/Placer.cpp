@@ -355,8 +355,14 @@ Placer::Inheritance Placer::handOver(ObjectRow backup) {
 Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occupant) {
   const Deeper deeper(depth_);
   const ObjectRow before = occupant;
-  // One of which only a further link was known had this name, too.
-  const Location from = occupant.location.value_or(arrival.location);
+  // One of which only a further link was known had this name, too. So had one whose folder is the
+  // arrival itself, which is nowhere at this moment.
+  Location from = arrival.location;
+  if (occupant.location) {
+    auto path = paths_.pathOf(*occupant.location);
+    if (!path) return fail(path.error());
+    if (*path) from = *occupant.location;
+  }
   occupant.location.reset();
   if (auto detached = store_.put(occupant); !detached) return fail(detached.error());
   if (depth_ > deepestChain) return std::nullopt;

@@ -40,7 +40,11 @@ void TreeScan::add(std::string path, std::uint64_t id, Depth depth) {
 Result<void> TreeScan::addRoots() {
   const MonitoredRoots& roots = context_.roots;
   for (std::size_t i = 0; i < roots.paths().size(); ++i) {
-    if (roots.descriptor(i) < 0) continue;
+    // One that is not there holds nothing.
+    if (roots.descriptor(i) < 0) {
+      if (auto noted = missing_.add(0, roots.paths()[i]); !noted) return noted;
+      continue;
+    }
     auto id = context_.learner.folderID(roots.paths()[i], roots.descriptor(i));
     if (!id) return fail(id.error());
     add(roots.paths()[i], *id, Depth::everything);

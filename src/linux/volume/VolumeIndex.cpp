@@ -22,8 +22,8 @@ constexpr std::uint64_t eventsKept = 1'000'000;
 
 class StoredVolumeIndex final : public VolumeIndex {
  public:
-  StoredVolumeIndex(std::unique_ptr<VolumeState> state, const MonitoredRoots& roots,
-                    std::uint64_t device, const Options& options)
+  StoredVolumeIndex(std::unique_ptr<VolumeState> state, MonitoredRoots& roots, std::uint64_t device,
+                    const Options& options)
       : state_(std::move(state)),
         roots_(roots),
         paths_(state_->store(), roots, device),
@@ -32,7 +32,7 @@ class StoredVolumeIndex final : public VolumeIndex {
                  options.isPackageName),
         follower_(
             {learner_, state_->store(), recorder_, paths_, roots, device, options.isPackageName},
-            {options.makeWatcher, options.notice}),
+            {options.makeWatcher, [&roots] { return roots.refresh(); }, options.notice}),
         followsInBackground_(options.followsInBackground && options.makeWatcher),
         device_(device) {
     learner_.setRecentPlaces(&follower_);
@@ -180,7 +180,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   bool isDue() {
     if (!bell_.hasListeners()) return false;
     const std::scoped_lock lock(mutex_);
-    return follower_.isComparisonDue();
+    return follower_.isComparisonDue() || follower_.isInStep();
   }
 
   Result<void> stand(std::uint64_t fileID, std::optional<std::string>& path) {
@@ -219,8 +219,12 @@ class StoredVolumeIndex final : public VolumeIndex {
 
 }  // namespace
 
-Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(const MonitoredRoots& roots,
-                                                       Options options) {
+Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(MonitoredRoots& roots, Options options) {
+  // Every change that is written down would be one more.
+  if (roots.locate(options.stateFolder)) {
+    return fail(Error::posix(EINVAL, "the state folder \"" + options.stateFolder +
+                                         "\" lies in the documents that it is to tell of"));
+  }
   auto status = statusOf(options.volumePath);
   if (!status) return fail(status.error());
   auto uuid = volumeUUID(options.volumePath);

@@ -59,8 +59,9 @@ class VolumeIndex {
 
   /// Opens or makes the index of the volume that holds `volumePath`. Errors: POSIX EBUSY when
   /// another process owned it to the end of the timeout; EPERM for a state folder that is a
-  /// symbolic link or belongs to somebody else; other POSIX errors; `ErrorDomain::store`.
-  [[nodiscard]] static Result<std::unique_ptr<VolumeIndex>> open(const MonitoredRoots& roots,
+  /// symbolic link or belongs to somebody else; EINVAL for one below a root; other POSIX errors;
+  /// `ErrorDomain::store`.
+  [[nodiscard]] static Result<std::unique_ptr<VolumeIndex>> open(MonitoredRoots& roots,
                                                                  Options options);
   virtual ~VolumeIndex() = default;
 
