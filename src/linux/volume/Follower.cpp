@@ -57,6 +57,10 @@ Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
     if (auto done = followRound(transaction, later_.take()); !done) return fail(done.error());
     if (auto settled = settle(transaction); !settled) return fail(settled.error());
   }
+  if (places_.hasOthers()) {
+    auto looked = transaction([&] { return places_.lookAtOthers(); });
+    if (!looked) return fail(looked.error());
+  }
   recent_.clear();
   // A folder is elsewhere, and no record has told of that.
   const bool isDone = later_.isEmpty() && !scan_.wasDisturbed() && !scan_.watchFailure();
@@ -172,6 +176,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   scan_.clear();
   looks_.clear();
   later_.clear();
+  places_.clear();
   static_cast<void>(scan_.takeDisturbed());
   scan_.setWatcher(watcher_.get());
   if (watcher_) {

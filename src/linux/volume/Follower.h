@@ -42,7 +42,7 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] Result<void> compareAll(const Transaction& transaction);
 
   /// Whether changes are heard of, so that the index need not be compared.
-  [[nodiscard]] bool isInStep() const { return isInStep_; }
+  [[nodiscard]] bool isInStep() const override { return isInStep_; }
   /// Whether changes are not heard of, and the last look at everything was long enough ago for
   /// those who wait to be worth another.
   [[nodiscard]] bool isComparisonDue() const;

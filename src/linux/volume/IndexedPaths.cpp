@@ -55,6 +55,13 @@ Result<std::optional<std::string>> IndexedPaths::standingPath(const ObjectRow& r
   return path;
 }
 
+Result<bool> IndexedPaths::folderStands(const Location& location) const {
+  auto folder = store_.objectByFileID(location.folder);
+  if (!folder) return fail(folder.error());
+  if (!*folder || !(*folder)->location) return false;
+  return isAt(**folder, *(*folder)->location);
+}
+
 Result<bool> IndexedPaths::isAt(const ObjectRow& row, const Location& location) const {
   auto path = standingPath(row, location);
   if (!path) return fail(path.error());

@@ -35,6 +35,8 @@ class ObjectFinder {
   [[nodiscard]] std::optional<Found> find(const ObjectRow& row, const std::string& folderPath,
                                           const Others& others);
   void forget() { answers_.clear(); }
+  /// Whether it is known where names have changed of late.
+  [[nodiscard]] bool isFollowing() const { return recent_ != nullptr && recent_->isInStep(); }
   /// `places` outlives it; null: nobody knows.
   void setRecentPlaces(RecentPlaces* places) { recent_ = places; }
 

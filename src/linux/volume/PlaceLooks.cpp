@@ -77,7 +77,7 @@ Result<PlaceLooks::Presence> PlaceLooks::lookInFolder(FolderWatcher& watcher, st
   if (*presence == Presence::gone) {
     // What was linked in it, and unlinked with it, may live on elsewhere.
     for (const auto& [name, look] : names) {
-      if (auto done = lookAtOtherNames(look, nullptr); !done) return fail(done.error());
+      if (auto done = noteOthers(look, nullptr); !done) return fail(done.error());
     }
     return presence;
   }
@@ -111,7 +111,7 @@ Result<std::vector<Sighting>> PlaceLooks::sightings(const Folder& folder, const 
       auto ended = endUnlinked(folder, name, look, status ? &*status : nullptr);
       if (!ended) return fail(ended.error());
     }
-    if (auto done = lookAtOtherNames(look, status ? &*status : nullptr); !done) {
+    if (auto done = noteOthers(look, status ? &*status : nullptr); !done) {
       return fail(done.error());
     }
     if (!status) {
@@ -142,37 +142,50 @@ Result<void> PlaceLooks::endUnlinked(const Folder& folder, const std::string& na
 
 // What was linked under a name that does not stand for it any more may have other names: the count
 // of its links has changed there.
-Result<void> PlaceLooks::lookAtOtherNames(const Look& look, const ObjectStatus* status) {
+Result<void> PlaceLooks::noteOthers(const Look& look, const ObjectStatus* status) {
   for (const std::string& handle : look.objects) {
     const std::vector<std::uint64_t> inodes = inodesIn(handle);
     if (status != nullptr && std::ranges::find(inodes, status->inode) != inodes.end()) continue;
     for (const std::uint64_t inode : inodes) {
       auto row = context_.store.objectByInode(inode);
       if (!row) return fail(row.error());
-      if (!*row || (*row)->handle != handle || !(*row)->location) continue;
-      if (auto done = lookAtObject(**row); !done) return done;
+      if (*row && (*row)->handle == handle) others_.insert((*row)->fileID);
     }
   }
   return {};
 }
 
-Result<void> PlaceLooks::lookAtObject(const ObjectRow& row) {
+Result<void> PlaceLooks::lookAtOthers() {
+  for (const std::uint64_t id : std::exchange(others_, {})) {
+    auto row = context_.store.objectByFileID(id);
+    if (!row) return fail(row.error());
+    if (!*row || !(*row)->location) continue;
+    auto isThere = lookAtObject(**row);
+    if (!isThere) return fail(isThere.error());
+    if (!*isThere) others_.insert(id);
+  }
+  return {};
+}
+
+Result<bool> PlaceLooks::lookAtObject(const ObjectRow& row) {
   auto path = context_.paths.pathOf(*row.location);
   if (!path) return fail(path.error());
-  if (!*path || row.location->folder == 0) return {};
+  if (!*path || row.location->folder == 0) return true;
   const auto look = lookAt(context_.roots, **path);
-  if (!look) return {};  // whoever removed it has left a record of that
+  if (!look || look->seen.status.inode != row.inode) return false;
   const bool isPackage = context_.isPackageName(row.location->name);
   auto learned = context_.learner.learnPath(**path, look->seen.status, isPackage);
   if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
-  return {};
+  return learned.has_value();
 }
 
 // Its count and its dates are those of a new state as well. A change of its mode may have made it
 // readable, or unreadable.
 Result<void> PlaceLooks::lookAtItself(const Folder& folder, bool attributesChanged) {
   if (attributesChanged) scan_.add(folder.path, folder.row.fileID, TreeScan::Depth::folder);
-  return lookAtObject(folder.row);
+  // Whoever has moved it since has left a record of that.
+  if (auto looked = lookAtObject(folder.row); !looked) return fail(looked.error());
+  return {};
 }
 
 void PlaceLooks::followFolder(const FolderWatcher& watcher, const Folder& folder,

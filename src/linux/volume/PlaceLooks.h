@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -23,6 +24,11 @@ class PlaceLooks {
   /// at again after further records.
   [[nodiscard]] Result<LookList::Folders> look(const Transaction& transaction,
                                                FolderWatcher& watcher, LookList::Folders folders);
+  /// Looks at what was linked or unlinked somewhere under its other names; to be called when the
+  /// places were looked at. What does not lie where the index has it is kept for the next time.
+  [[nodiscard]] Result<void> lookAtOthers();
+  [[nodiscard]] bool hasOthers() const { return !others_.empty(); }
+  void clear() { others_.clear(); }
 
  private:
   using Names = LookList::Names;
@@ -39,14 +45,16 @@ class PlaceLooks {
   [[nodiscard]] Result<std::vector<Sighting>> sightings(const Folder& folder, const Names& names);
   [[nodiscard]] Result<void> endUnlinked(const Folder& folder, const std::string& name,
                                          const Look& look, const ObjectStatus* status);
-  [[nodiscard]] Result<void> lookAtOtherNames(const Look& look, const ObjectStatus* status);
-  [[nodiscard]] Result<void> lookAtObject(const ObjectRow& row);
+  [[nodiscard]] Result<void> noteOthers(const Look& look, const ObjectStatus* status);
+  /// False when it does not lie where the index has it.
+  [[nodiscard]] Result<bool> lookAtObject(const ObjectRow& row);
   [[nodiscard]] Result<void> lookAtItself(const Folder& folder, bool attributesChanged);
   void followFolder(const FolderWatcher& watcher, const Folder& folder, const Sighting& sighting);
 
   const IndexContext& context_;
   MissingNames& missing_;
   TreeScan& scan_;
+  std::set<std::uint64_t> others_;  // file IDs
 };
 
 }  // namespace mirabel

@@ -126,7 +126,7 @@ Result<bool> Placer::isFurtherLink(const Arrival& arrival, ObjectRow& row) {
   if (!link) return fail(link.error());
   if (*link == row.slot) return true;
   if (!row.location) return false;
-  auto still = paths_.isAt(row, *row.location);
+  auto still = stands(row, *row.location);
   if (!still || !*still) return still;
   // Linking over a document ends it: the object that arrives is shown under its other names too,
   // and keeps the identity that it has there.
@@ -335,7 +335,7 @@ Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivin
 
 Result<bool> Placer::hasOtherName(ObjectRow& row, const Location& lost) {
   if (row.location && *row.location != lost) {
-    auto still = paths_.isAt(row, *row.location);
+    auto still = stands(row, *row.location);
     if (!still || *still) return still;
   }
   return promoteLink(row);
@@ -422,6 +422,16 @@ Result<std::uint32_t> Placer::take(ObjectRow& holder) {
   return document;
 }
 
+// Where changes are heard of, a name in a folder that is itself being moved stands: its loss would
+// be heard of under the folder, wherever that lies.
+Result<bool> Placer::stands(const ObjectRow& row, const Location& name) const {
+  auto still = paths_.isAt(row, name);
+  if (!still || *still || !finder_.isFollowing()) return still;
+  auto folder = paths_.folderStands(name);
+  if (!folder) return folder;
+  return !*folder;
+}
+
 Result<bool> Placer::promoteLink(ObjectRow& row) {
   auto names = store_.links(row.slot);
   if (!names) return fail(names.error());
@@ -429,7 +439,7 @@ Result<bool> Placer::promoteLink(ObjectRow& row) {
     if (auto removed = store_.removeLink(name.folder, name.name); !removed) {
       return fail(removed.error());
     }
-    auto still = paths_.isAt(row, name);
+    auto still = stands(row, name);
     if (!still) return still;
     if (!*still) continue;
     row.location = name;

@@ -118,6 +118,8 @@ class Placer {
   [[nodiscard]] Inheritance handOver(ObjectRow backup);
   /// Whether the object stands under another name than the one it lost; its row then has that.
   [[nodiscard]] Result<bool> hasOtherName(ObjectRow& row, const Location& lost);
+  /// Whether a further name of the object still stands for it.
+  [[nodiscard]] Result<bool> stands(const ObjectRow& row, const Location& name) const;
   [[nodiscard]] Result<void> dropLinks(std::uint64_t slot);
   [[nodiscard]] Result<void> ensureDocument(ObjectRow& row);
   /// Writes the row and answers it.

@@ -18,6 +18,8 @@ struct RecentPlace {
 class RecentPlaces {
  public:
   virtual ~RecentPlaces() = default;
+  /// Whether everything is watched.
+  [[nodiscard]] virtual bool isInStep() const = 0;
   /// Names that stand, or stood a moment ago, for an object with that inode number. Nothing when
   /// not everything is watched, and only a look everywhere will tell.
   [[nodiscard]] virtual std::optional<std::vector<RecentPlace>> placesOf(std::uint64_t inode) = 0;

@@ -1,0 +1,90 @@
+// Event streams on real folders, heard of by each kind of watcher.
+#include <filesystem>
+#include <fstream>
+
+#include "linux/VolumeFixture.h"
+#include "linux/events/LinuxEventStreams.h"
+#include "platform/EventStreamsConformance.h"
+#include "support/FakeEventStreams.h"
+#include "support/TempHome.h"
+
+namespace mirabel::testing {
+namespace {
+
+class FakeHistory final : public HistoryUnderTest {
+ public:
+  EventStreams& streams() override { return streams_; }
+  std::string folder() const override { return "/documents/a"; }
+  std::string otherFolder() const override { return "/documents/b"; }
+  void change(const std::string& path) override { streams_.append(path, ++fileID_); }
+  void save(const std::string& path) override {
+    streams_.appendDocument(1, fileID_, fileID_ + 1);
+    change(path);
+  }
+  void deliver() override { streams_.deliver(); }
+
+ private:
+  FakeEventStreams streams_;
+  std::uint64_t fileID_ = 0;
+};
+
+class RealHistory final : public HistoryUnderTest {
+ public:
+  explicit RealHistory(WatcherKind kind) : roots_({home_.documents()}) {
+    home_.makeFolder("a");
+    home_.makeFolder("b");
+    VolumeIndex::Options options;
+    options.stateFolder = home_.stateFolder();
+    options.volumePath = home_.documents();
+    options.makeWatcher = [kind] { return makeWatcher(kind); };
+    index_ = std::move(VolumeIndex::open(roots_, std::move(options)).value());
+    streams_ = std::make_unique<LinuxEventStreams>(*index_);
+  }
+  EventStreams& streams() override { return *streams_; }
+  std::string folder() const override { return home_.at("a"); }
+  std::string otherFolder() const override { return home_.at("b"); }
+  void change(const std::string& path) override { std::ofstream(path) << ++count_; }
+  void save(const std::string& path) override {
+    std::ofstream(path + ".new") << ++count_;
+    std::filesystem::rename(path + ".new", path);
+  }
+  void deliver() override {}  // the kernel says so
+
+ private:
+  TempHome home_;
+  MonitoredRoots roots_;
+  std::unique_ptr<VolumeIndex> index_;
+  std::unique_ptr<LinuxEventStreams> streams_;
+  int count_ = 0;
+};
+
+HistoryFactory real(WatcherKind kind) {
+  return [kind]() -> std::unique_ptr<HistoryUnderTest> {
+    if (!makeWatcher(kind)) return nullptr;
+    return std::make_unique<RealHistory>(kind);
+  };
+}
+
+INSTANTIATE_TEST_SUITE_P(Fake, EventStreamsConformance,
+                         ::testing::Values([] { return std::make_unique<FakeHistory>(); }));
+INSTANTIATE_TEST_SUITE_P(FolderMarks, EventStreamsConformance,
+                         ::testing::Values(real(WatcherKind::folderMarks)));
+INSTANTIATE_TEST_SUITE_P(Inotify, EventStreamsConformance,
+                         ::testing::Values(real(WatcherKind::inotify)));
+
+// A thousand writes within the latency are one event of one file, told once it is over.
+TEST(LinuxEventStreams, WritesToOneFileAreMerged) {
+  RealHistory history(WatcherKind::folderMarks);
+  const std::uint64_t since = history.streams().currentEventID();
+  for (int i = 0; i < 20; ++i) {
+    history.change(history.folder() + "/f");
+    static_cast<void>(history.streams().currentEventID());
+  }
+  StreamListener listener(history);
+  listener.startForPaths({history.folder()}, since);
+  ASSERT_TRUE(listener.waitForFlag(eventflag::historyDone));
+  EXPECT_EQ(listener.count(history.folder() + "/f"), 1u);
+}
+
+}  // namespace
+}  // namespace mirabel::testing
