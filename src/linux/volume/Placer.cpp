@@ -27,6 +27,20 @@ class Deeper {
   int& depth_;
 };
 
+// Names an object that is off its old place and not yet at its new one.
+class Moving {
+ public:
+  Moving(std::vector<std::uint64_t>& all, std::uint64_t fileID) : all_(all) {
+    all_.push_back(fileID);
+  }
+  ~Moving() { all_.pop_back(); }
+  Moving(const Moving&) = delete;
+  Moving& operator=(const Moving&) = delete;
+
+ private:
+  std::vector<std::uint64_t>& all_;
+};
+
 }  // namespace
 
 Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
@@ -148,6 +162,7 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
   if (auto noted = noteArrival(row, from); !noted) return fail(noted.error());
   // Off its old name first: what is found to lie there now can then be put there.
   if (auto detached = store_.put(row); !detached) return fail(detached.error());
+  const Moving moving(moving_, row.fileID);
   if (arrival.seen.status.linkCount < 2) {
     if (auto dropped = dropLinks(row.slot); !dropped) return fail(dropped.error());
   }
@@ -427,6 +442,14 @@ Result<std::uint32_t> Placer::take(ObjectRow& holder) {
 Result<bool> Placer::stands(const ObjectRow& row, const Location& name) const {
   auto still = paths_.isAt(row, name);
   if (!still || *still || !finder_.isFollowing()) return still;
+  auto above = paths_.foldersAbove(name);
+  if (!above) return fail(above.error());
+  if (above->empty()) return false;
+  auto outermost = store_.objectByFileID(above->front());
+  if (!outermost) return fail(outermost.error());
+  // In what is nowhere nothing stands, unless it is just being put elsewhere.
+  const bool isAttached = *outermost && (*outermost)->location;
+  if (!isAttached) return std::ranges::find(moving_, above->front()) != moving_.end();
   auto folder = paths_.folderStands(name);
   if (!folder) return folder;
   return !*folder;

@@ -137,6 +137,7 @@ class Placer {
   ObjectFinder::Others others_;
   std::set<std::uint32_t> takenDocuments_;
   std::set<std::uint64_t> arrivedFolders_;
+  std::vector<std::uint64_t> moving_;  // file IDs of what is between two places
   int depth_ = 0;
 };
 
