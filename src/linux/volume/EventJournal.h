@@ -1,11 +1,13 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "foundation/Error.h"
@@ -30,19 +32,29 @@ struct JournalRecord {
   std::uint64_t destination = 0;
 };
 
-/// The event history of a volume, a table of its database: written in the transactions that change
+/// What is kept: no more records than these, and none that are older, to the hour.
+struct Retention {
+  std::uint64_t count = 1'000'000;  ///< weeks of work on a home
+  std::chrono::seconds age = std::chrono::days(90);
+};
+
+/// The event history of a volume, tables of its database: written in the transactions that change
 /// the index, so that the two never disagree. IDs are consecutive and never used twice. Used under
 /// the lock of the index.
 class EventJournal {
  public:
-  [[nodiscard]] static Result<std::unique_ptr<EventJournal>> open(Database& database);
+  using Now = std::function<std::chrono::system_clock::time_point()>;
+
+  /// `database` outlives it.
+  [[nodiscard]] static Result<std::unique_ptr<EventJournal>> open(
+      Database& database, Now now = std::chrono::system_clock::now);
 
   /// Nothing is recorded before the first anchor is handed out: nobody could ask for it.
   [[nodiscard]] bool isActive() const { return isActive_; }
   [[nodiscard]] Result<void> activate();
 
   [[nodiscard]] Result<void> append(const JournalRecord& record);
-  /// Writes what `append` counted; to be called before the transaction ends.
+  /// Writes what `append` counted, and when; to be called before the transaction ends.
   [[nodiscard]] Result<void> saveBounds();
 
   /// ID of the oldest record that is kept, or of the next one where none is.
@@ -56,18 +68,29 @@ class EventJournal {
   /// At most `limit` records after `since`, oldest first.
   [[nodiscard]] Result<std::vector<JournalRecord>> replay(std::uint64_t since, std::size_t limit);
 
-  /// Forgets the oldest records until `kept` are left.
-  [[nodiscard]] Result<void> prune(std::uint64_t kept);
+  /// Forgets the records that need not be kept: none of them is replayed any more. Their rows go
+  /// a few at a time, at most so many in one call that it takes no longer than writing did.
+  [[nodiscard]] Result<void> prune(const Retention& retention);
+  /// Forgets all records; their IDs stay used.
+  [[nodiscard]] Result<void> startOver();
 
   /// Takes back what was counted since the transaction began; to be called after a rollback.
   [[nodiscard]] Result<void> reload();
 
  private:
-  EventJournal() = default;
+  explicit EventJournal(Now now) : now_(std::move(now)) {}
+  [[nodiscard]] std::int64_t seconds() const;
+  [[nodiscard]] Result<void> noteTime();
+  [[nodiscard]] Result<std::uint64_t> firstYoungerThan(std::int64_t time);
+  [[nodiscard]] Result<void> removeRows();
+
+  Now now_;
   std::vector<Statement> statements_;
   std::uint64_t firstID_ = 1;
   std::uint64_t nextID_ = 1;
   std::uint64_t savedNextID_ = 1;
+  std::optional<std::int64_t> lastTime_;  ///< of the last row of times
+  std::uint64_t appended_ = 0;            ///< since rows were removed last
   bool isActive_ = false;
 };
 

@@ -17,9 +17,6 @@
 namespace mirabel {
 namespace {
 
-// Enough for weeks of work on a home; an anchor from before starts over.
-constexpr std::uint64_t eventsKept = 1'000'000;
-
 class StoredVolumeIndex final : public VolumeIndex {
  public:
   StoredVolumeIndex(std::unique_ptr<VolumeState> state, MonitoredRoots& roots, std::uint64_t device,
@@ -106,7 +103,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     if (auto done = follower_.catchUp(transactions()); !done) return fail(done.error());
     auto begun = inTransaction([&]() -> Result<void> {
       if (auto active = state_->journal().activate(); !active) return active;
-      return state_->journal().prune(eventsKept);
+      return state_->journal().prune(Retention{});
     });
     if (!begun) return fail(begun.error());
     if (followsInBackground_ && !thread_) startThread();
