@@ -1,9 +1,7 @@
-#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <set>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "linux/VolumeFixture.h"
@@ -162,36 +160,11 @@ TEST_F(VolumeStateTest, AnOlderCopyPutBackGivesNoIdentityTwice) {
   EXPECT_NE(index().historyUUID(), history);
 }
 
-// After a crash the last identities are in the log alone.
-TEST_F(VolumeStateTest, ALogThatIsMissingGivesNoIdentityTwice) {
-  write("early");
-  const std::uint32_t early = document("early");
-  const UUID history = index().historyUUID();
-  const auto copy = [this](const std::string& from, const std::string& to) {
-    std::filesystem::copy_file(from, to, std::filesystem::copy_options::overwrite_existing);
-  };
-  copy(volumeFolder() + "/witness", base_ + "/witness");
-  close();
-  copy(database(), base_ + "/database");
-  write("late");
-  const Sighting late = see("late");
-  close();
-  copy(base_ + "/witness", volumeFolder() + "/witness");
-  copy(base_ + "/database", database());
-  std::filesystem::remove(database() + "-wal");
-  remove("late");
-  write("later");
-  EXPECT_NE(document("later"), late.documentID);
-  EXPECT_NE(file("later"), late.fileID);
-  EXPECT_EQ(document("early"), early);
-  EXPECT_NE(index().historyUUID(), history);
-  EXPECT_EQ(notices_.size(), 1u);
-}
-
+// Nobody can say then how old the database is: identities stay, the history does not.
 TEST_F(VolumeStateTest, AWitnessThatIsOlderOrMissingCostsNoIdentity) {
   write("doc");
   const std::uint32_t document = this->document("doc");
-  const UUID history = index().historyUUID();
+  std::set<UUID> histories{index().historyUUID()};
   close();
   const std::string witness = volumeFolder() + "/witness";
   std::filesystem::copy_file(witness, base_ + "/witness");
@@ -199,13 +172,13 @@ TEST_F(VolumeStateTest, AWitnessThatIsOlderOrMissingCostsNoIdentity) {
   see("another");
   close();
   std::filesystem::rename(base_ + "/witness", witness);
-  for (int round = 0; round < 2; ++round) {
+  for (std::size_t round = 1; round <= 2; ++round) {
     EXPECT_EQ(this->document("doc"), document);
-    EXPECT_EQ(index().historyUUID(), history);
+    EXPECT_TRUE(histories.insert(index().historyUUID()).second);
+    EXPECT_EQ(notices_.size(), round);
     close();
     std::filesystem::remove(witness);
   }
-  EXPECT_TRUE(notices_.empty());
 }
 
 TEST_F(VolumeStateTest, ALockThatWasRemovedLetsNobodyIn) {
@@ -215,44 +188,6 @@ TEST_F(VolumeStateTest, ALockThatWasRemovedLetsNobodyIn) {
   const auto second = tryOpen();
   ASSERT_FALSE(second);
   EXPECT_TRUE(second.error().isPosix(EBUSY)) << second.error().description();
-}
-
-// SIGKILL while identities are being handed out: what a process was told stays true.
-TEST_F(VolumeStateTest, AKilledProcessLosesNothingThatItWasTold) {
-  for (int round = 0; round < 4; ++round) {
-    int channel[2];
-    ASSERT_EQ(::pipe(channel), 0);
-    const pid_t child = ::fork();
-    if (child == 0) {
-      for (int i = 0;; ++i) {
-        const std::string name = "r" + std::to_string(round) + "-" + std::to_string(i);
-        write(name);
-        const std::string line = name + " " + std::to_string(document(name)) + "\n";
-        if (::write(channel[1], line.data(), line.size()) < 0) ::_exit(1);
-      }
-    }
-    ::close(channel[1]);
-    std::string told;
-    char buffer[512];
-    while (told.size() < 200 + 150u * static_cast<unsigned>(round)) {
-      const ssize_t count = ::read(channel[0], buffer, sizeof buffer);
-      ASSERT_GT(count, 0);
-      told.append(buffer, static_cast<std::size_t>(count));
-    }
-    ::kill(child, SIGKILL);
-    while (const ssize_t count = ::read(channel[0], buffer, sizeof buffer)) {
-      told.append(buffer, static_cast<std::size_t>(count));
-    }
-    ::close(channel[0]);
-    ::waitpid(child, nullptr, 0);
-    std::istringstream lines(told.substr(0, told.rfind('\n') + 1));
-    std::string name;
-    std::uint32_t id = 0;
-    while (lines >> name >> id)
-      EXPECT_EQ(document(name), id) << name;
-    close();
-  }
-  EXPECT_TRUE(notices_.empty());
 }
 
 }  // namespace

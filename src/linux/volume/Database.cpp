@@ -4,11 +4,14 @@
 #include <sqlite3.h>
 #include <utility>
 
+#include "linux/volume/PageSums.h"
+
 namespace mirabel {
 namespace {
 
 // Exclusive locking keeps the log's index in memory and saves a lock per transaction; the volume
-// has one owner anyway. The page cache is bounded: 8 MiB serve folders of 100,000 entries.
+// has one owner anyway. The page cache is bounded: 8 MiB serve folders of 100,000 entries. The
+// owner decides when the log is moved into the database.
 constexpr const char* settings =
     "PRAGMA locking_mode=EXCLUSIVE;"
     "PRAGMA journal_mode=WAL;"
@@ -17,7 +20,7 @@ constexpr const char* settings =
     "PRAGMA temp_store=MEMORY;"
     "PRAGMA trusted_schema=OFF;"
     "PRAGMA cell_size_check=ON;"
-    "PRAGMA wal_autocheckpoint=4000;";
+    "PRAGMA wal_autocheckpoint=0;";
 
 // A full disk is an ordinary failure, and told as one. So is another process that has the database
 // although the lock on its folder was free, because somebody removed the lock's file.
@@ -41,13 +44,24 @@ Result<std::unique_ptr<Database>> Database::open(const std::string& path) {
       sqlite3_open_v2(path.c_str(), &handle,
                       SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOMUTEX |
                           SQLITE_OPEN_NOFOLLOW | SQLITE_OPEN_PRIVATECACHE,
-                      nullptr);
+                      summedFileLayer());
   std::unique_ptr<Database> database(new Database(handle));
   if (code != SQLITE_OK) return fail(database->lastError());
   sqlite3_extended_result_codes(handle, 1);
+  // Both for a new database only; an older one keeps what it has.
+  if (auto set = database->execute("PRAGMA page_size=4096"); !set) return fail(set.error());
+  int reserved = pageSumSize;
+  sqlite3_file_control(handle, "main", SQLITE_FCNTL_RESERVE_BYTES, &reserved);
   int persists = 1;
   sqlite3_file_control(handle, "main", SQLITE_FCNTL_PERSIST_WAL, &persists);
   if (auto set = database->execute(settings); !set) return fail(set.error());
+  sqlite3_wal_hook(
+      handle,
+      [](void* count, sqlite3*, const char*, int pages) {
+        *static_cast<int*>(count) = pages;
+        return SQLITE_OK;
+      },
+      &database->logPages_);
   return database;
 }
 
@@ -55,10 +69,14 @@ Database::~Database() {
   sqlite3_close_v2(handle_);
 }
 
-Result<void> Database::checkpoint() {
-  const int code =
-      sqlite3_wal_checkpoint_v2(handle_, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
+Result<void> Database::checkpoint(Log log) {
+  const int mode = log == Log::emptied ? SQLITE_CHECKPOINT_TRUNCATE : SQLITE_CHECKPOINT_FULL;
+  int pages = 0;
+  int moved = 0;
+  const int code = sqlite3_wal_checkpoint_v2(handle_, nullptr, mode, &pages, &moved);
   if (code != SQLITE_OK) return fail(lastError());
+  if (moved < pages) return fail(Error::store(SQLITE_BUSY, "the log is still being read"));
+  logPages_ = 0;
   return {};
 }
 
@@ -81,6 +99,12 @@ Error Database::lastError() const {
 
 std::int64_t Database::changeCount() const {
   return sqlite3_total_changes64(handle_);
+}
+
+bool Database::metDamage() const {
+  int met = 0;
+  sqlite3_file_control(handle_, "main", metWrongPage, &met);
+  return met != 0;
 }
 
 Statement::~Statement() {

@@ -17,8 +17,9 @@ namespace mirabel {
 class Statement;
 
 /// A connection to one SQLite database in WAL mode, fully synchronous, locked for this process
-/// alone. The write-ahead log stays beside the database when that is closed. Used under the lock of
-/// its owner.
+/// alone. Each page has a sum of its own, see PageSums.h: reading one that was damaged fails with
+/// SQLITE_CORRUPT. The write-ahead log stays beside the database when that is closed. Used under
+/// the lock of its owner.
 class Database {
  public:
   /// Opens or creates. Errors: `ErrorDomain::store` with SQLite's result code.
@@ -33,12 +34,19 @@ class Database {
   [[nodiscard]] Error lastError() const;
   /// How many rows were written since it was opened.
   [[nodiscard]] std::int64_t changeCount() const;
-  /// Moves what the write-ahead log holds into the database, and empties it.
-  [[nodiscard]] Result<void> checkpoint();
+  /// Whether a damaged page was met.
+  [[nodiscard]] bool metDamage() const;
+  /// How many pages the write-ahead log held after the last commit; it grows until a checkpoint.
+  [[nodiscard]] int logPages() const { return logPages_; }
+  /// Moves all that the write-ahead log holds into the database, durably; then the log is begun
+  /// anew by the next write, or at once.
+  enum class Log { kept, emptied };
+  [[nodiscard]] Result<void> checkpoint(Log log);
 
  private:
   explicit Database(sqlite3* handle) : handle_(handle) {}
   sqlite3* handle_;
+  int logPages_ = 0;
 };
 
 /// A prepared statement: bind, step, read columns, reset, again. Views of columns live until the

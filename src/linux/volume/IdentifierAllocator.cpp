@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstring>
 #include <limits>
+#include <utility>
 
 namespace mirabel {
 namespace {
@@ -11,6 +13,17 @@ namespace {
 // of a block with the database does not matter.
 constexpr std::uint64_t documentBlock = 1u << 16;
 constexpr std::uint64_t fileBlock = 1u << 20;
+constexpr std::uint64_t documentEnd = std::uint64_t{1} << 32;
+constexpr std::uint64_t fileEnd = std::uint64_t{1} << 63;
+
+// A sixteenth of what is left, and as much again at random, so that two leaps from the same place
+// do not meet.
+std::uint64_t leapt(std::uint64_t from, std::uint64_t end, const UUID& random, std::size_t at) {
+  const std::uint64_t part = (end - std::min(from, end)) / 16;
+  std::uint32_t number = 0;
+  std::memcpy(&number, random.bytes.data() + at, sizeof number);
+  return from + part + static_cast<std::uint64_t>(static_cast<double>(part) * number / 0x1p32);
+}
 
 }  // namespace
 
@@ -39,22 +52,25 @@ Result<std::uint32_t> IdentifierAllocator::nextDocumentID() {
     return fail(Error::posix(EOVERFLOW, "all document IDs of this volume have been given"));
   }
   if (nextDocument_ >= witness_->documentLimit) {
-    Witness noted = *witness_;
-    noted.documentLimit = nextDocument_ + documentBlock;
-    if (auto written = noted.write(*folder_); !written) return fail(written.error());
-    *witness_ = noted;
+    auto reserved = reserve(witness_->documentLimit, nextDocument_ + documentBlock);
+    if (!reserved) return fail(reserved.error());
   }
   return static_cast<std::uint32_t>(nextDocument_++);
 }
 
 Result<std::uint64_t> IdentifierAllocator::nextFileID() {
   if (nextFile_ >= witness_->fileLimit) {
-    Witness noted = *witness_;
-    noted.fileLimit = nextFile_ + fileBlock;
-    if (auto written = noted.write(*folder_); !written) return fail(written.error());
-    *witness_ = noted;
+    auto reserved = reserve(witness_->fileLimit, nextFile_ + fileBlock);
+    if (!reserved) return fail(reserved.error());
   }
   return nextFile_++;
+}
+
+Result<void> IdentifierAllocator::reserve(std::uint64_t& limit, std::uint64_t end) {
+  const std::uint64_t before = std::exchange(limit, end);
+  auto written = witness_->write(*folder_);
+  if (!written) limit = before;
+  return written;
 }
 
 Result<void> IdentifierAllocator::save() {
@@ -78,6 +94,13 @@ Result<void> IdentifierAllocator::spendInodeNumbers() {
   nextDocument_ = std::max(nextDocument_, witness_->documentLimit);
   nextFile_ = std::max(nextFile_, witness_->fileLimit);
   return store_->setNumber("inode_numbers_spent", 1);
+}
+
+Result<void> IdentifierAllocator::leap() {
+  const UUID random = UUID::random();
+  nextDocument_ = leapt(nextDocument_, documentEnd, random, 0);
+  nextFile_ = leapt(nextFile_, fileEnd, random, 12);
+  return spendInodeNumbers();
 }
 
 }  // namespace mirabel

@@ -30,11 +30,17 @@ class IdentifierAllocator {
   /// Whether inode numbers may no longer serve as file IDs, because it is not known which of
   /// them did before.
   [[nodiscard]] bool inodeNumbersAreSpent() const { return inodesSpent_; }
+  /// Goes on behind all that the witness knows of, with file IDs of the upper range alone.
   [[nodiscard]] Result<void> spendInodeNumbers();
+  /// The same where no witness says what was handed out: far away from all that the database knows
+  /// of, at random, so that not even a copy that is put back twice gives an identity twice.
+  [[nodiscard]] Result<void> leap();
 
  private:
   IdentifierAllocator(IdentityStore& store, Witness& witness, const StateFolder& folder)
       : store_(&store), witness_(&witness), folder_(&folder) {}
+  /// Raises a limit of the witness, durably.
+  [[nodiscard]] Result<void> reserve(std::uint64_t& limit, std::uint64_t end);
 
   IdentityStore* store_;
   Witness* witness_;

@@ -1,11 +1,7 @@
 #include "linux/volume/VolumeState.h"
 
 #include <algorithm>
-#include <cerrno>
-#include <cstdio>
-#include <fcntl.h>
 #include <sqlite3.h>
-#include <sys/stat.h>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -13,28 +9,8 @@
 namespace mirabel {
 namespace {
 
-constexpr std::string_view databaseName = "volume.db";
-constexpr std::string_view logName = "volume.db-wal";
-// Left behind by a process that met damage while it ran, for the next one to act on.
-constexpr std::string_view damageMark = "damaged";
-
-bool exists(const StateFolder& folder, std::string_view name) {
-  struct stat status {};
-  return ::fstatat(folder.descriptor(), std::string(name).c_str(), &status, AT_SYMLINK_NOFOLLOW) ==
-         0;
-}
-
-struct FileStamp {
-  std::uint64_t size;
-  std::int64_t time;
-};
-
-std::optional<FileStamp> stampOf(const std::string& path) {
-  struct stat status {};
-  if (::lstat(path.c_str(), &status) != 0) return std::nullopt;
-  return FileStamp{static_cast<std::uint64_t>(status.st_size),
-                   status.st_mtim.tv_sec * 1'000'000'000 + status.st_mtim.tv_nsec};
-}
+// Pages in the log after which it is moved into the database, 16 MiB.
+constexpr int longLog = 4000;
 
 bool isCorruption(const Error& error) {
   if (error.domain != ErrorDomain::store) return false;
@@ -46,8 +22,8 @@ bool isInputOutput(const Error& error) {
   return error.domain == ErrorDomain::store && (error.code & 0xFF) == SQLITE_IOERR;
 }
 
-Result<void> quickCheck(Database& database) {
-  auto statement = database.prepare("PRAGMA quick_check(1)");
+Result<void> check(Database& database, const char* pragma) {
+  auto statement = database.prepare(pragma);
   if (!statement) return fail(statement.error());
   StatementScope scope(*statement);
   auto row = statement->step();
@@ -63,10 +39,10 @@ Result<void> quickCheck(Database& database) {
 Result<std::unique_ptr<VolumeState>> VolumeState::open(StateFolder folder, const Notice& notice) {
   std::unique_ptr<VolumeState> state(new VolumeState(std::move(folder)));
   if (auto witness = Witness::read(state->folder_)) {
-    state->witness_ = *witness;
+    state->witness_ = std::move(*witness);
     state->hasWitness_ = true;
   }
-  bool isNew = !exists(state->folder_, databaseName);
+  bool isNew = !state->files_.exist();
   const Trust trust = isNew ? Trust::asClosed : state->assess();
   auto opened = trust == Trust::damaged ? fail(Error::store(SQLITE_CORRUPT, "marked as damaged"))
                                         : state->openDatabase(trust);
@@ -76,9 +52,22 @@ Result<std::unique_ptr<VolumeState>> VolumeState::open(StateFolder folder, const
     opened = state->openDatabase(Trust::asClosed);
   }
   if (!opened) return fail(opened.error());
-  if (auto adopted = state->adoptHistory(isNew, trust, notice); !adopted) {
-    return fail(adopted.error());
+  auto history = state->store_->historyUUID();
+  if (!history) return fail(history.error());
+  if (*history && state->isNewest(**history, trust)) {
+    state->isAsClosed_ = trust == Trust::asClosed;
+    state->isAdopted_ = true;
+    return state;
   }
+  // A first start may have failed, for want of room, before it acknowledged anything.
+  const bool isFirst = !*history && state->witness_.commits == 0 && !state->files_.wereSetAside();
+  if (!isNew && !isFirst && notice) {
+    notice(
+        "the volume's state is older than what this program wrote last, or it is not known "
+        "whether it is; anchors and pages made with it start over");
+  }
+  if (auto begun = state->startOver(isFirst); !begun) return fail(begun.error());
+  state->isAdopted_ = true;
   return state;
 }
 
@@ -89,19 +78,12 @@ VolumeState::~VolumeState() {
 // Opening ---------------------------------------------------------------------------------------
 
 VolumeState::Trust VolumeState::assess() const {
-  if (exists(folder_, damageMark)) return Trust::damaged;
-  if (!hasWitness_) return Trust::notClosed;
+  if (files_.areMarkedAsDamaged()) return Trust::damaged;
+  if (!hasWitness_ || files_.userVersion() < witness_.foldings) return Trust::incomplete;
   // Without the log, what was written last may be missing.
-  if (witness_.closedDigest == 0) {
-    return exists(folder_, logName) ? Trust::notClosed : Trust::logLost;
-  }
-  const std::string path = folder_.file(databaseName);
-  const auto stamp = stampOf(path);
-  if (stamp && stamp->size == witness_.closedSize && stamp->time == witness_.closedTime) {
-    return Trust::asClosed;
-  }
-  const auto digest = digestOfFile(path);
-  return digest && *digest == witness_.closedDigest ? Trust::asClosed : Trust::changed;
+  if (witness_.closedSize == 0) return files_.haveLog() ? Trust::notClosed : Trust::incomplete;
+  const DatabaseFiles::Stamp closed{witness_.closedSize, witness_.closedTime};
+  return files_.stamp() == closed ? Trust::asClosed : Trust::notClosed;
 }
 
 Result<void> VolumeState::setAside(const Notice& notice) {
@@ -109,98 +91,57 @@ Result<void> VolumeState::setAside(const Notice& notice) {
   journal_.reset();
   store_.reset();
   database_.reset();
-  std::string aside;
-  for (int number = 1;; ++number) {
-    aside = std::string(databaseName) + ".damaged-" + std::to_string(number);
-    if (!exists(folder_, aside)) break;
-  }
-  const int directory = folder_.descriptor();
-  for (const std::string& suffix : {std::string("-wal"), std::string("-shm"), std::string()}) {
-    const std::string from = std::string(databaseName) + suffix;
-    if (!exists(folder_, from)) continue;
-    if (::renameat(directory, from.c_str(), directory, (aside + suffix).c_str()) != 0) {
-      return fail(Error::posix(errno, folder_.file(from)));
-    }
-  }
-  ::unlinkat(directory, std::string(damageMark).c_str(), 0);
+  auto aside = files_.setAside();
+  if (!aside) return fail(aside.error());
   if (notice) {
-    notice("the volume's database is damaged; it was set aside as \"" + folder_.file(aside) +
+    notice("the volume's database is damaged; it was set aside as \"" + *aside +
            "\" and a new one was begun, with new identities");
   }
   return {};
 }
 
 Result<void> VolumeState::openDatabase(Trust trust) {
-  // SQLite gives its log the mode of the database.
-  const UniqueFd made(::openat(folder_.descriptor(), std::string(databaseName).c_str(),
-                               O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
-  if (!made) return fail(Error::posix(errno, folder_.file(databaseName)));
-  auto database = Database::open(folder_.file(databaseName));
+  if (auto made = files_.make(); !made) return made;
+  auto database = Database::open(files_.path());
   if (!database) return fail(database.error());
-  if (trust != Trust::asClosed) {
-    if (auto checked = quickCheck(**database); !checked) return fail(checked.error());
-  }
-  auto store = IdentityStore::open(**database);
-  if (!store) return fail(store.error());
-  if (trust == Trust::changed) {
-    // Sound, but not what was closed last: an older copy has an older session, beside an older
-    // witness it is newer, and anything else was changed where the check does not look.
-    auto session = (*store)->number("session");
-    if (!session) return fail(session.error());
-    if (session->value_or(0) == witness_.session) {
-      return fail(Error::store(SQLITE_CORRUPT, "the database was changed from outside"));
-    }
-  }
-  auto journal = EventJournal::open(**database);
-  if (!journal) return fail(journal.error());
   database_ = std::move(*database);
-  journal_ = std::move(*journal);
+  if (trust != Trust::asClosed) {
+    // Reads every page, and so checks its sum.
+    if (auto sound = check(*database_, "PRAGMA quick_check(1)"); !sound) return sound;
+  }
+  auto store = IdentityStore::open(*database_);
+  if (!store) return fail(store.error());
   store_ = std::move(*store);
-  return {};
-}
-
-bool VolumeState::isOutdated(const std::optional<UUID>& history, std::uint64_t session,
-                             Trust trust) const {
-  if (!hasWitness_) return false;
-  return !history || *history != witness_.history || session < witness_.session ||
-         trust == Trust::logLost;
-}
-
-Result<void> VolumeState::adoptHistory(bool isNew, Trust trust, const Notice& notice) {
-  auto history = store_->historyUUID();
-  if (!history) return fail(history.error());
-  auto session = store_->number("session");
-  if (!session) return fail(session.error());
-  const bool isFirst = isNew && !hasWitness_ && !exists(folder_, "volume.db.damaged-1");
-  const bool isOlder = !isNew && isOutdated(*history, session->value_or(0), trust);
-  const bool isLost = isNew && !isFirst;
-  if (!isNew && !isOlder && *history) {
-    if (!hasWitness_) witness_ = Witness{**history};
-    witness_.session = std::max(witness_.session, session->value_or(0));
-    auto allocator = IdentifierAllocator::open(*store_, witness_, folder_);
-    if (!allocator) return fail(allocator.error());
-    allocator_ = std::make_unique<IdentifierAllocator>(*allocator);
-    return {};
+  auto journal = EventJournal::open(*database_);
+  if (!journal) return fail(journal.error());
+  journal_ = std::move(*journal);
+  auto commits = store_->number("commits");
+  if (!commits) return fail(commits.error());
+  commits_ = commits->value_or(0);
+  if (trust == Trust::incomplete || commits_ < witness_.commits) {
+    // Sound pages that may be of different times: do they fit each other?
+    if (auto sound = check(*database_, "PRAGMA integrity_check(1)"); !sound) return sound;
   }
-  if (isLost && !hasWitness_) {
-    // Both are gone: begin in the upper half of each range, where none was given yet.
-    witness_.documentLimit = std::uint64_t{1} << 31;
-    witness_.fileLimit = upperFileIDs + (std::uint64_t{1} << 61);
-  }
-  if (isOlder && notice) {
-    notice(
-        "the volume's database is older than what this program wrote last; anchors and pages "
-        "made with it start over");
-  }
-  witness_.history = UUID::random();
-  witness_.session = std::max(witness_.session, session->value_or(0));
   auto allocator = IdentifierAllocator::open(*store_, witness_, folder_);
   if (!allocator) return fail(allocator.error());
   allocator_ = std::make_unique<IdentifierAllocator>(*allocator);
+  return {};
+}
+
+bool VolumeState::isNewest(const UUID& history, Trust trust) const {
+  return hasWitness_ && trust != Trust::incomplete && history == witness_.history &&
+         commits_ >= witness_.commits;
+}
+
+Result<void> VolumeState::startOver(bool isFirst) {
+  witness_.history = UUID::random();
+  witness_.foldings = files_.userVersion();
+  commits_ = witness_.commits = std::max(commits_, witness_.commits);
   return transaction([&]() -> Result<void> {
     if (auto set = store_->setHistoryUUID(witness_.history); !set) return set;
+    if (auto emptied = journal_->startOver(); !emptied) return emptied;
     if (isFirst) return {};
-    return allocator_->spendInodeNumbers();
+    return hasWitness_ ? allocator_->spendInodeNumbers() : allocator_->leap();
   });
 }
 
@@ -225,22 +166,45 @@ Result<void> VolumeState::commit(std::int64_t changesBefore) {
   if (database_->changeCount() == changesBefore) return database_->execute("COMMIT");
   if (auto saved = allocator_->save(); !saved) return saved;
   if (auto saved = journal_->saveBounds(); !saved) return saved;
-  const bool isFirst = !hasWritten_;
-  if (isFirst) {
-    if (auto begun = beginSession(); !begun) return begun;
+  if (auto counted = store_->setNumber("commits", commits_ + 1); !counted) return counted;
+  if (!isLogBegun_) {
+    if (auto begun = beginLog(); !begun) return begun;
   }
   if (auto committed = database_->execute("COMMIT"); !committed) return committed;
-  if (!isFirst) return {};
-  // Only now is the session in the database; a witness ahead of it would call it an older copy.
-  hasWritten_ = true;
-  ++witness_.session;
-  return witness_.write(folder_);
+  isLogBegun_ = hasWritten_ = true;
+  // Only now: a witness ahead of the database would call it an older copy.
+  witness_.commits = ++commits_;
+  note();
+  if (database_->logPages() >= longLog) static_cast<void>(foldLog(Database::Log::kept));
+  return {};
 }
 
-Result<void> VolumeState::beginSession() {
-  witness_.closedDigest = 0;
-  if (auto written = witness_.write(folder_); !written) return written;
-  return store_->setNumber("session", witness_.session + 1);
+// The log bears a number that comes into the database file with the rest of it: a file without it
+// is not the one that the next log goes on from.
+Result<void> VolumeState::beginLog() {
+  if (!hasWritten_) {
+    witness_.closedSize = 0;
+    if (auto written = witness_.write(folder_); !written) return written;
+  }
+  const std::string number = std::to_string(witness_.foldings + 1);
+  return database_->execute(("PRAGMA user_version=" + number).c_str());
+}
+
+bool VolumeState::foldLog(Database::Log log) {
+  if (auto folded = database_->checkpoint(log); !folded) {
+    noteFailure(folded.error());
+    return false;
+  }
+  isLogBegun_ = false;
+  witness_.foldings = files_.userVersion();
+  note();
+  return true;
+}
+
+void VolumeState::note() {
+  if (auto noted = witness_.note(); !noted) {
+    logDebug([&] { return "can't note in the volume's witness; " + noted.error().description(); });
+  }
 }
 
 void VolumeState::noteFailure(const Error& error) {
@@ -248,23 +212,22 @@ void VolumeState::noteFailure(const Error& error) {
   if (isInputOutput(error)) broken_ = error;
   if (!isCorruption(error)) return;
   broken_ = error;
-  UniqueFd mark(::openat(folder_.descriptor(), std::string(damageMark).c_str(),
-                         O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+  files_.markAsDamaged();
 }
 
 void VolumeState::closeInOrder() {
   allocator_.reset();
   journal_.reset();
   store_.reset();
-  if (!database_ || !hasWritten_) return;
-  if (broken_ || !database_->checkpoint()) return;
-  const std::string path = folder_.file(databaseName);
-  const auto stamp = stampOf(path);
-  const auto digest = digestOfFile(path);
-  if (!stamp || !digest) return;
+  if (!database_ || !isAdopted_) return;
+  // Not all that reads does so in a transaction.
+  if (database_->metDamage()) return files_.markAsDamaged();
+  if (broken_ || (isAsClosed_ && !hasWritten_)) return;
+  if (!foldLog(Database::Log::emptied)) return;
+  const auto stamp = files_.stamp();
+  if (!stamp) return;
   witness_.closedSize = stamp->size;
-  witness_.closedTime = stamp->time;
-  witness_.closedDigest = *digest;
+  witness_.closedTime = stamp->modificationTime;
   if (auto written = witness_.write(folder_); !written) {
     logDebug("can't write the volume's witness; " + written.error().description());
   }

@@ -7,6 +7,7 @@
 
 #include "foundation/Error.h"
 #include "linux/volume/Database.h"
+#include "linux/volume/DatabaseFiles.h"
 #include "linux/volume/EventJournal.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
@@ -19,18 +20,30 @@ namespace mirabel {
 /// whether the database can be trusted, and wraps changes in transactions. Used under the lock of
 /// the index.
 ///
-/// A database that does not check out is renamed to "volume.db.damaged-N" and a new one begun; so
-/// is one that was lost. One that turns out to be an older copy, or to have lost its log, is kept.
-/// In all these cases the history gets a new UUID, document IDs go on behind the last that may have
-/// been given, and inode numbers no longer serve as file IDs: no identity of before is given to
-/// another thing.
+/// The history goes on only when it is known that nothing acknowledged is missing. Each
+/// transaction counts itself in the database, and the witness notes the count when it is on disk:
+///
+/// - The database has that count, or one more: it is the newest. The one more was written when the
+///   process was killed before it could acknowledge it, and was told to nobody.
+/// - It has less: it is an older copy, or its log was cut, lost or damaged. Replaying it would
+///   leave out what the lost part told, identities among it: the history starts over.
+/// - There is no witness, or the witness is a copy: the whole state was put back, and nobody knows
+///   from when. The history starts over.
+/// - The database file holds less than what was moved into it from earlier logs: it was put back
+///   under a log that does not fit it. The history starts over.
+/// - A page has not the sum that it ought to have: the database is renamed to
+///   "volume.db.damaged-N", and a new one is begun. So it is when the database was removed.
+///
+/// To start over means: the history gets a new UUID, so that no anchor of before is answered,
+/// however far its event IDs have come; identities that are known are kept; new document IDs are
+/// above all that may have been given, and inode numbers no longer serve as file IDs.
 class VolumeState {
  public:
   using Notice = std::function<void(std::string_view)>;
 
   [[nodiscard]] static Result<std::unique_ptr<VolumeState>> open(StateFolder folder,
                                                                  const Notice& notice);
-  /// Closes the database in order and notes its digest in the witness.
+  /// Closes the database in order and notes in the witness how it was left.
   ~VolumeState();
   VolumeState(const VolumeState&) = delete;
   VolumeState& operator=(const VolumeState&) = delete;
@@ -45,29 +58,36 @@ class VolumeState {
   [[nodiscard]] Result<void> transaction(const std::function<Result<void>()>& work);
 
  private:
-  explicit VolumeState(StateFolder folder) : folder_(std::move(folder)) {}
+  explicit VolumeState(StateFolder folder) : folder_(std::move(folder)), files_(folder_) {}
 
-  /// What the witness says of the database file before it is opened.
-  enum class Trust { asClosed, notClosed, logLost, changed, damaged };
+  /// What the witness says of the database's files before they are opened.
+  enum class Trust { asClosed, notClosed, incomplete, damaged };
   [[nodiscard]] Trust assess() const;
   [[nodiscard]] Result<void> setAside(const Notice& notice);
   [[nodiscard]] Result<void> openDatabase(Trust trust);
-  [[nodiscard]] bool isOutdated(const std::optional<UUID>& history, std::uint64_t session,
-                                Trust trust) const;
-  [[nodiscard]] Result<void> adoptHistory(bool isNew, Trust trust, const Notice& notice);
-  [[nodiscard]] Result<void> beginSession();
+  [[nodiscard]] bool isNewest(const UUID& history, Trust trust) const;
+  [[nodiscard]] Result<void> startOver(bool isFirst);
   [[nodiscard]] Result<void> commit(std::int64_t changesBefore);
+  [[nodiscard]] Result<void> beginLog();
+  /// Moves the log into the database; not on failure.
+  [[nodiscard]] bool foldLog(Database::Log log);
+  void note();
   void noteFailure(const Error& error);
   void closeInOrder();
 
   StateFolder folder_;
+  DatabaseFiles files_;
   Witness witness_;
   bool hasWitness_ = false;
   std::unique_ptr<Database> database_;
   std::unique_ptr<IdentityStore> store_;
   std::unique_ptr<EventJournal> journal_;
   std::unique_ptr<IdentifierAllocator> allocator_;
+  std::uint64_t commits_ = 0;  ///< transactions that the database holds
+  bool isAdopted_ = false;     ///< the witness is of this database
+  bool isAsClosed_ = false;    ///< it was when opened as the witness says
   bool hasWritten_ = false;
+  bool isLogBegun_ = false;  ///< the log bears the number of the next folding
   std::optional<Error> broken_;
 };
 
