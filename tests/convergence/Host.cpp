@@ -72,6 +72,7 @@ class ChangeCollector final : public VesselChangeObserver {
 Host::Host(const std::string& home) {
   LinuxPlatform::Options options;
   options.home = home;
+  options.makeWatcher = [faults = faults_] { return makeFaultyWatcher(makeWatcher(), faults); };
   auto opened = LinuxPlatform::open(std::move(options));
   if (!opened) throw std::runtime_error(opened.error().description());
   platform_ = std::move(*opened);

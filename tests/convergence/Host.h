@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "fs/FSChangesEnumerator.h"
+#include "linux/FaultyWatcher.h"
 #include "linux/files/LinuxPlatform.h"
 #include "linux/log/LoggingDiagnosticReporter.h"
 #include "provider/LocalVessel.h"
@@ -34,6 +35,9 @@ class Host {
  public:
   explicit Host(const std::string& home);
 
+  /// The kernel's queue loses what it holds and what comes before it is read next.
+  void dropRecords() { faults_->loses = true; }
+
   /// Takes an anchor, then lists.
   [[nodiscard]] Replica list(const std::string& container);
   /// Asks for changes until there are no more, and applies them; lists again when told to start
@@ -42,6 +46,7 @@ class Host {
   [[nodiscard]] std::string identifierOf(const std::string& path) const;
 
  private:
+  std::shared_ptr<WatcherFaults> faults_ = std::make_shared<WatcherFaults>();
   std::shared_ptr<VesselEnumerator> enumerator(const std::string& container);
   void apply(Replica& replica, const LocalItem& item) const;
 

@@ -15,6 +15,8 @@ class RandomTree {
 
   /// Makes one, and answers what it was, for people.
   std::string change();
+  /// What comes next depends on the seed and on the tree alone.
+  void reseed(unsigned seed) { random_.seed(seed); }
   [[nodiscard]] std::size_t pick(std::size_t n) { return random_() % n; }
 
  private:

@@ -13,6 +13,7 @@
 #include <thread>
 #include <unistd.h>
 
+#include "linux/FaultyWatcher.h"
 #include "linux/VolumeFixture.h"
 #include "support/OrdinaryUser.h"
 
@@ -21,52 +22,13 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// A real watcher that can be made to lose records, or to have no more marks.
-class FaultyWatcher final : public FolderWatcher {
- public:
-  struct Faults {
-    std::size_t marks = 1'000'000;
-    bool loses = false;
-    int made = 0;
-  };
-  FaultyWatcher(std::unique_ptr<FolderWatcher> real, Faults& faults)
-      : real_(std::move(real)), faults_(faults) {
-    ++faults_.made;
-  }
-
-  Result<void> watch(int folder, std::uint64_t id) override {
-    if (real_->watchedFolders() >= faults_.marks && !real_->isWatched(id)) {
-      return fail(Error::posix(ENOSPC));
-    }
-    return real_->watch(folder, id);
-  }
-  void forget(std::uint64_t id) override { real_->forget(id); }
-  bool isWatched(std::uint64_t id) const override { return real_->isWatched(id); }
-  std::size_t watchedFolders() const override { return real_->watchedFolders(); }
-  Result<Drained> drain(LookList& looks) override {
-    if (!std::exchange(faults_.loses, false)) return real_->drain(looks);
-    LookList lost;
-    auto drained = real_->drain(lost);
-    if (drained) drained->hasLost = true;
-    return drained;
-  }
-  int descriptor() const override { return real_->descriptor(); }
-  WatcherKind kind() const override { return real_->kind(); }
-
- private:
-  std::unique_ptr<FolderWatcher> real_;
-  Faults& faults_;
-};
-
 class FollowerTest : public VolumeFixture, public ::testing::WithParamInterface<WatcherKind> {
  protected:
   FollowerTest() : VolumeFixture(Where::inMemory) {}
 
   void SetUp() override {
     makeWatcher_ = [this]() -> Result<std::unique_ptr<FolderWatcher>> {
-      auto real = makeWatcher(GetParam());
-      if (!real) return fail(real.error());
-      return std::make_unique<FaultyWatcher>(std::move(*real), faults_);
+      return makeFaultyWatcher(makeWatcher(GetParam()), faults_);
     };
     if (!makeWatcher(GetParam())) GTEST_SKIP() << "not on this kernel";
   }
@@ -90,7 +52,7 @@ class FollowerTest : public VolumeFixture, public ::testing::WithParamInterface<
     EXPECT_EQ(told(last), std::set<std::string>()) << what;
   }
 
-  FaultyWatcher::Faults faults_;
+  std::shared_ptr<WatcherFaults> faults_ = std::make_shared<WatcherFaults>();
 };
 
 TEST_P(FollowerTest, WhatHappensIsToldWithoutAComparison) {
@@ -156,19 +118,19 @@ TEST_P(FollowerTest, ADroppedRecordCostsAComparisonAndNothingElse) {
   for (int round = 0; round < 5; ++round) {
     const std::string name = "a/f" + std::to_string(round);
     write(name);
-    faults_.loses = true;
+    faults_->loses = true;
     const auto paths = told((anchor(), since));
     EXPECT_TRUE(paths.contains("/" + name));
     write(name, "longer");
     expectInStep(name.c_str());
   }
-  EXPECT_EQ(faults_.made, 1) << "what is watched stays watched";
+  EXPECT_EQ(faults_->made, 1) << "what is watched stays watched";
 }
 
 TEST_P(FollowerTest, WithTooFewMarksEveryQuestionIsAnsweredByAComparison) {
   for (int i = 0; i < 20; ++i)
     makeFolder("folder" + std::to_string(i));
-  faults_.marks = 10;
+  faults_->marks = 10;
   std::uint64_t since = anchor();
   ASSERT_EQ(notices_.size(), 1u);
   EXPECT_NE(notices_[0].find("needs 21 marks"), std::string::npos) << notices_[0];
@@ -190,7 +152,7 @@ TEST_P(FollowerTest, WithTooFewMarksEveryQuestionIsAnsweredByAComparison) {
 TEST_P(FollowerTest, NewMarksThatRunOutEndTheWatchingAndNotTheTelling) {
   makeFolder("a");
   std::uint64_t since = anchor();
-  faults_.marks = 4;
+  faults_->marks = 4;
   for (int i = 0; i < 8; ++i) {
     makeFolder("a/" + std::to_string(i));
     write("a/" + std::to_string(i) + "/f");

@@ -58,7 +58,7 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   indexOptions.volumePath = roots->descriptor(0) >= 0 ? layout->documents : layout->home;
   indexOptions.stateFolder = layout->stateFolder;
   indexOptions.isPackageName = PackageTypes::isPackageName;
-  if (options.watchesFolders) indexOptions.makeWatcher = [] { return makeWatcher(); };
+  indexOptions.makeWatcher = std::move(options.makeWatcher);
   indexOptions.timeout = options.timeout;
   indexOptions.notice = std::move(options.notice);
   auto index = VolumeIndex::open(*roots, std::move(indexOptions));

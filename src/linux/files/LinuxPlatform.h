@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "linux/watch/FolderWatcher.h"
 #include "platform/EventStreams.h"
 #include "platform/Platform.h"
 
@@ -29,9 +30,11 @@ class LinuxPlatform {
     std::vector<std::string> furtherRoots{};
     /// Where state is kept; absent: "mirabel" in the XDG state folder.
     std::optional<std::string> stateFolder{};
-    /// Whether changes are heard of from the kernel; else every question about them is answered
-    /// by a look at all files.
-    bool watchesFolders = true;
+    /// Hears of changes from the kernel; empty: every question about them is answered by a look at
+    /// all files.
+    std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher = [] {
+      return mirabel::makeWatcher();
+    };
     /// How long to wait for another process that owns the volume.
     std::chrono::milliseconds timeout{30'000};
     /// Told what a person should know: that it has to wait, that a damaged database was set aside.

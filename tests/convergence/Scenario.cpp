@@ -1,0 +1,204 @@
+#include "convergence/Scenario.h"
+
+#include <csignal>
+#include <fcntl.h>
+#include <filesystem>
+#include <memory>
+#include <random>
+#include <spawn.h>
+#include <stdexcept>
+#include <sys/wait.h>
+
+#include "cli/Printing.h"
+#include "convergence/Host.h"
+#include "convergence/RandomTree.h"
+#include "support/TempHome.h"
+
+namespace mirabel::testing {
+namespace {
+
+constexpr int mostShrinkingRuns = 300;
+
+/// `mirabel changes` in a process of its own, to be killed.
+class Follower {
+ public:
+  Follower(const std::string& home, const Data& anchor) {
+    std::vector<std::string> words{MIRABEL_PROGRAM, "--home",  home,
+                                   "changes",       "--since", base64(stringView(anchor)),
+                                   "workingset"};
+    std::vector<char*> arguments;
+    for (std::string& word : words)
+      arguments.push_back(word.data());
+    arguments.push_back(nullptr);
+    posix_spawn_file_actions_t actions;
+    ::posix_spawn_file_actions_init(&actions);
+    for (const int stream : {STDOUT_FILENO, STDERR_FILENO})
+      ::posix_spawn_file_actions_addopen(&actions, stream, "/dev/null", O_WRONLY, 0);
+    const int failure =
+        ::posix_spawn(&process_, MIRABEL_PROGRAM, &actions, nullptr, arguments.data(), environ);
+    ::posix_spawn_file_actions_destroy(&actions);
+    if (failure != 0) throw std::runtime_error("posix_spawn");
+  }
+  ~Follower() {
+    ::kill(process_, SIGKILL);
+    ::waitpid(process_, nullptr, 0);
+  }
+  Follower(const Follower&) = delete;
+  Follower& operator=(const Follower&) = delete;
+
+ private:
+  pid_t process_ = -1;
+};
+
+/// What a client holds wrongly; empty when it holds what a fresh listing shows.
+std::string difference(const Replica& replica, const Replica& fresh) {
+  for (const auto& [identifier, item] : fresh.items) {
+    const auto held = replica.items.find(identifier);
+    if (held == replica.items.end()) {
+      return replica.container + ": " + identifier + " " + item.filename + " was not told";
+    }
+    if (held->second == item) continue;
+    return replica.container + ": " + identifier + " is held as " + held->second.filename + " in " +
+           held->second.parent + " " + held->second.text + "\nand is " + item.filename + " in " +
+           item.parent + " " + item.text;
+  }
+  for (const auto& [identifier, item] : replica.items) {
+    if (!fresh.items.contains(identifier)) {
+      return replica.container + ": " + identifier + " " + item.filename +
+             " is gone and was not told";
+    }
+  }
+  return {};
+}
+
+class Run {
+ public:
+  Run() : outside_(home_.path() + "/outside"), tree_(home_.documents(), outside_, 0) {
+    std::filesystem::create_directory(outside_);
+    home_.makeFolder("watched");
+    open();
+    watched_ = host_->identifierOf(home_.at("watched"));
+    for (const std::string& container :
+         {std::string(VesselWorkingSetContainerItemIdentifier),
+          std::string(VesselAllDirectoriesContainerItemIdentifier),
+          std::string(VesselRootContainerItemIdentifier), watched_}) {
+      replicas_.push_back(host_->list(container));
+    }
+  }
+
+  /// False when the sequence has failed.
+  bool make(const Step& step) {
+    tree_.reseed(step.seed);
+    switch (step.kind) {
+      case Step::Kind::change:
+        tell(tree_.change());
+        return true;
+      case Step::Kind::restart:
+        tell("restart");
+        host_.reset();
+        open();
+        return true;
+      case Step::Kind::kill:
+        kill();
+        return true;
+      case Step::Kind::drop:
+        tell("drop");
+        host_->dropRecords();
+        return true;
+      case Step::Kind::catchUp:
+        return catchUp();
+    }
+    return true;
+  }
+
+  Outcome outcome;
+
+ private:
+  void open() { host_ = std::make_unique<Host>(home_.path()); }
+  void tell(const std::string& what) { outcome.story += "\n  " + what; }
+
+  void kill() {
+    tell("killed while it catches up:");
+    host_.reset();
+    {
+      const Follower follower(home_.path(), replicas_.front().anchor);
+      for (std::size_t changes = tree_.pick(40); changes > 0; --changes)
+        tell("  " + tree_.change());
+    }
+    open();
+  }
+
+  bool catchUp() {
+    for (Replica& replica : replicas_) {
+      // A folder that is gone or out of sight is nobody's container any more.
+      if (replica.container == watched_ && host_->identifierOf(home_.at("watched")) != watched_) {
+        continue;
+      }
+      const int before = replica.restarts;
+      host_->catchUp(replica);
+      ++outcome.catchUps;
+      outcome.startedOver += replica.restarts - before;
+      outcome.failure = difference(replica, host_->list(replica.container));
+      if (!outcome.failure.empty()) return false;
+    }
+    tell("caught up");
+    return true;
+  }
+
+  TempHome home_;
+  std::string outside_;
+  RandomTree tree_;
+  std::unique_ptr<Host> host_;
+  std::string watched_;
+  std::vector<Replica> replicas_;
+};
+
+}  // namespace
+
+std::vector<Step> stepsOf(unsigned seed) {
+  std::mt19937 random(seed);
+  const auto pick = [&](unsigned n) { return static_cast<unsigned>(random() % n); };
+  std::vector<Step> steps;
+  const auto add = [&](Step::Kind kind) { steps.push_back({kind, pick(1u << 31)}); };
+  for (int i = 0; i < 25; ++i)
+    add(Step::Kind::change);
+  for (int round = 0; round < 8; ++round) {
+    for (unsigned changes = 1 + pick(12); changes > 0; --changes)
+      add(Step::Kind::change);
+    const unsigned interruption = pick(12);
+    if (interruption < 3) add(Step::Kind::restart);
+    if (interruption == 3) add(Step::Kind::kill);
+    if (interruption == 4) add(Step::Kind::drop);
+    add(Step::Kind::catchUp);
+  }
+  return steps;
+}
+
+Outcome run(const std::vector<Step>& steps) {
+  Run sequence;
+  for (const Step& step : steps) {
+    if (!sequence.make(step)) break;
+  }
+  return sequence.outcome;
+}
+
+// Leaves out ever smaller pieces as long as what is left fails.
+std::vector<Step> shrink(std::vector<Step> steps) {
+  int runs = 0;
+  for (std::size_t piece = steps.size() / 2; piece > 0; piece /= 2) {
+    for (std::size_t at = 0; at + piece <= steps.size() && runs < mostShrinkingRuns;) {
+      std::vector<Step> fewer = steps;
+      const auto begin = fewer.begin() + static_cast<std::ptrdiff_t>(at);
+      fewer.erase(begin, begin + static_cast<std::ptrdiff_t>(piece));
+      ++runs;
+      if (run(fewer).failure.empty()) {
+        at += piece;
+      } else {
+        steps = std::move(fewer);
+      }
+    }
+  }
+  return steps;
+}
+
+}  // namespace mirabel::testing
