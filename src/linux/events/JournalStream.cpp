@@ -99,12 +99,13 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
     for (JournalRecord& record : records) {
       if (isSelected(record)) batch.push_back(eventOf(std::move(record)));
     }
-    // From the last to the first: of those that are alike the last one stands.
+    // Of those that are alike the first one stands: whoever stops reading after it, at an event ID
+    // that was the last when he began, must have had it.
     std::set<std::tuple<std::string_view, std::optional<std::uint64_t>,
                         std::optional<std::uint32_t>, std::uint32_t>>
         told;
     std::vector<bool> isRepeated(batch.size());
-    for (std::size_t i = batch.size(); i-- > 0;) {
+    for (std::size_t i = 0; i < batch.size(); ++i) {
       const FileSystemEvent& event = batch[i];
       isRepeated[i] =
           !told.emplace(*event.path, event.fileID, event.documentID, event.flags).second;

@@ -35,7 +35,7 @@ struct StreamServices {
 
 /// A cursor into the volume's history. Starting it brings the index in step with the disk, then
 /// delivers the history a batch at a time, then what comes; nothing queues in memory. Of several
-/// events of one batch that say the same of one object, the last is delivered. Any thread may call
+/// events of one batch that say the same of one object, the first is delivered. Any thread may call
 /// it.
 class JournalStream final : public EventStream {
  public:
