@@ -1,59 +1,27 @@
-#include <future>
-#include <memory>
+#include <cerrno>
 #include <nlohmann/json.hpp>
 #include <ostream>
 
+#include "cli/ChangeBatch.h"
 #include "cli/Commands.h"
 #include "cli/ContainerArgument.h"
-#include "cli/ItemJSON.h"
-#include "cli/Printing.h"
-#include "platform/EnumerationObservers.h"
 
 namespace mirabel {
 namespace {
 
-/// One batch of changes, as it comes from the enumeration's queue.
-class Batch final : public VesselChangeObserver {
- public:
-  void didUpdateItems(const VesselItems& items) override {
-    updated.insert(updated.end(), items.begin(), items.end());
+Result<void> tellChanges(Program& program, VesselEnumerator& enumerator, std::string anchor) {
+  for (bool more = true; more;) {
+    // The rest of a long history is not read for nobody.
+    if (!program.canWrite()) return fail(Error::posix(EPIPE));
+    const auto batch = ChangeBatch::ask(enumerator, anchor);
+    if (!batch) return fail(batch.error());
+    (*batch)->print(program);
+    more = (*batch)->moreComing();
+    anchor = (*batch)->anchor();
   }
-  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override {
-    deleted.insert(deleted.end(), identifiers.begin(), identifiers.end());
-  }
-  void finishEnumeratingChangesUpToSyncAnchor(const Data& reached, bool more) override {
-    anchor = base64(stringView(reached));
-    moreComing = more;
-    finished.set_value({});
-  }
-  void finishEnumeratingWithError(const Error& error) override { finished.set_value(fail(error)); }
-
-  VesselItems updated;
-  std::vector<std::string> deleted;
-  std::string anchor;
-  bool moreComing = false;
-  std::promise<Result<void>> finished;
-};
-
-void print(Program& program, const Batch& batch) {
-  if (program.options().json) {
-    nlohmann::json line;
-    line["updated"] = nlohmann::json::array();
-    for (const auto& item : batch.updated)
-      line["updated"].push_back(itemJSON(*item));
-    line["deleted"] = batch.deleted;
-    line["anchor"] = batch.anchor;
-    line["moreComing"] = batch.moreComing;
-    program.out() << line.dump() << '\n';
-    return;
-  }
-  for (const auto& item : batch.updated) {
-    program.out() << "updated  " << printable(item->itemIdentifier()) << "  "
-                  << printable(item->url().path()) << '\n';
-  }
-  for (const std::string& identifier : batch.deleted) {
-    program.out() << "deleted  " << printable(identifier) << '\n';
-  }
+  // People need the last one only, to ask again from there.
+  if (!program.options().json) program.note("the anchor is now " + anchor);
+  return {};
 }
 
 }  // namespace
@@ -63,18 +31,13 @@ ExitCode runAnchor(Program& program, const std::string& item) {
   if (session == nullptr) return program.exitCode();
   auto enumerator = ContainerArgument(item).enumerator(*session);
   if (!enumerator) return program.report(enumerator.error(), "can't find " + item);
-  std::optional<Data> anchor;
-  (*enumerator)->currentSyncAnchor([&](std::optional<Data> answer) { anchor = std::move(answer); });
+  const auto anchor = currentAnchor(**enumerator);
   (*enumerator)->invalidate();
-  if (!anchor) {
-    return program.report(Error::local(LocalVesselError::unableToGetDeviceUUID),
-                          "can't take an anchor of " + item);
-  }
-  const std::string text = base64(stringView(*anchor));
+  if (!anchor) return program.report(anchor.error(), "can't take an anchor of " + item);
   if (program.options().json) {
-    program.out() << nlohmann::json{{"anchor", text}}.dump() << '\n';
+    program.out() << nlohmann::json{{"anchor", *anchor}}.dump() << '\n';
   } else {
-    program.out() << text << '\n';
+    program.out() << *anchor << '\n';
   }
   return ExitCode::done;
 }
@@ -85,22 +48,10 @@ ExitCode runChanges(Program& program, const ChangesOptions& options) {
   const std::string failure = "can't tell the changes of " + options.item;
   auto enumerator = ContainerArgument(options.item).enumerator(*session);
   if (!enumerator) return program.report(enumerator.error(), failure);
-  auto anchor = fromBase64(options.since);
-  if (!anchor) return program.report(Error::syncAnchorExpired(), failure);
-  for (bool more = true; more;) {
-    const auto batch = std::make_shared<Batch>();
-    (*enumerator)->enumerateChanges(batch, dataFromString(*anchor));
-    if (auto finished = batch->finished.get_future().get(); !finished) {
-      return program.report(finished.error(), failure);
-    }
-    print(program, *batch);
-    more = batch->moreComing;
-    anchor = fromBase64(batch->anchor);
-    // People need the last one only, to ask again from there.
-    if (!more && !program.options().json) program.note("the anchor is now " + batch->anchor);
-  }
+  const auto told = tellChanges(program, **enumerator, options.since);
   (*enumerator)->invalidate();
-  return ExitCode::done;
+  if (told) return ExitCode::done;
+  return program.canWrite() ? program.report(told.error(), failure) : ExitCode::failed;
 }
 
 }  // namespace mirabel

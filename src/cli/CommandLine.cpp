@@ -19,9 +19,12 @@ constexpr const char* itemHelp =
     "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has\n"
     "no / in it is an identifier: did=N for a document, fid=N for a folder, #bundle for the\n"
     "documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
-constexpr const char* containerHelp =
+const std::string containerHelp =
     "ITEM is the word root, a folder's identifier or path, workingset for everything, or alldirs\n"
     "for every folder.\n\n";
+constexpr const char* watchHelp =
+    "It goes on until it is interrupted, and then tells the anchor to go on from. It holds the\n"
+    "volume as long as it runs: other commands wait for that, and then say that it is busy.\n\n";
 constexpr const char* pathHelp =
     "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
 constexpr const char* exitCodeHelp =
@@ -37,6 +40,7 @@ struct Arguments {
   std::string item;
   ListOptions list;
   ChangesOptions changes;
+  WatchOptions watch;
   std::string container = "root";
   bool showVersion = false;
 };
@@ -56,9 +60,9 @@ void addGlobalOptions(CLI::App& app, Arguments& arguments) {
 }
 
 CLI::App* addCommand(CLI::App& app, const char* name, const char* description,
-                     const char* argumentHelp) {
+                     const std::string& argumentHelp) {
   CLI::App* command = app.add_subcommand(name, description);
-  command->footer(std::string(argumentHelp) + "Global options: see mirabel --help.");
+  command->footer(argumentHelp + "Global options: see mirabel --help.");
   return command;
 }
 
@@ -97,6 +101,14 @@ void addCommands(CLI::App& app, Arguments& arguments) {
   changes
       ->add_option("ITEM", arguments.changes.item, "root, workingset, alldirs or a folder (root)")
       ->type_name("");
+  auto* watch = addCommand(app, "watch", "Print changes as they come", containerHelp + watchHelp);
+  watch->add_option("ITEM", arguments.watch.item, "root, workingset, alldirs or a folder (root)")
+      ->type_name("");
+  watch
+      ->add_option("--since", arguments.watch.since,
+                   "First print what changed since an anchor that was printed before")
+      ->type_name("ANCHOR");
+  addCommand(app, "status", "Say how changes are followed, and what the history holds", "");
   addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
   addCommand(app, "demo", "A guided tour in a temporary home", "");
 }
@@ -108,6 +120,8 @@ ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& argume
   if (app.got_subcommand("ls")) return runList(program, arguments.list);
   if (app.got_subcommand("anchor")) return runAnchor(program, arguments.container);
   if (app.got_subcommand("changes")) return runChanges(program, arguments.changes);
+  if (app.got_subcommand("watch")) return runWatch(program, arguments.watch);
+  if (app.got_subcommand("status")) return runStatus(program);
   if (app.got_subcommand("doctor")) return runDoctor(program);
   return runDemo(program);
 }

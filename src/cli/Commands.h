@@ -29,6 +29,13 @@ struct ChangesOptions {
 };
 ExitCode runChanges(Program& program, const ChangesOptions& options);
 
+struct WatchOptions {
+  std::string item = "root";
+  std::optional<std::string> since;  ///< base64 of an anchor; absent: from now on
+};
+ExitCode runWatch(Program& program, const WatchOptions& options);
+
+ExitCode runStatus(Program& program);
 ExitCode runDoctor(Program& program);
 ExitCode runDemo(Program& program);
 

@@ -26,7 +26,9 @@ class ContainerArgument {
 
   /// Errors: those of `ItemArgument`.
   [[nodiscard]] Result<Container> container(const Session& session) const;
-  /// The enumerator of that container. Errors: the same, and those of `Session::enumerator`.
+  /// The same, and POSIX ENOTDIR for what is no folder: of a file no changes would ever be told.
+  [[nodiscard]] Result<Container> followed(const Session& session) const;
+  /// The enumerator of what can be followed. Errors: the same, and those of `Session::enumerator`.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(Session& session) const;
 
  private:

@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <fstream>
 #include <ostream>
+#include <set>
 #include <sstream>
 #include <unistd.h>
 
@@ -43,7 +44,8 @@ class Tour {
 
   bool run() {
     say("A temporary home with a few documents.");
-    return makeDocuments() && list() && rename() && save() && moveAndReuse();
+    return makeDocuments() && list() && rename() && save() && moveAndReuse() &&
+           changesWhileNothingRan();
   }
 
  private:
@@ -123,6 +125,58 @@ class Tour {
     if (other.empty() || other == letter_) return false;
     say("Everything that is known of it:");
     return !command("info " + letter_, runInfo, letter_).empty();
+  }
+
+  bool changesWhileNothingRan() {
+    say("Take an anchor, change a few things while nothing runs, and ask what has changed since.");
+    const std::string bread =
+        command("id ~/Documents/Recipes/bread.md", runId, documents_ / "Recipes/bread.md");
+    const std::string anchor = command("anchor workingset", runAnchor, "workingset");
+    if (bread.empty() || anchor.empty() || !changeAFewThings()) return false;
+    const auto changes = [](Program& program, const std::string& since) {
+      return runChanges(program, {"workingset", since});
+    };
+    const std::string told = command("changes workingset --since ANCHOR", changes, anchor);
+    if (!isAllThatChanged(told, bread)) return false;
+    say("That is all of it, and nothing else: the folder is told too, for what it holds changed.");
+    return true;
+  }
+
+  bool changeAFewThings() {
+    shell("mv ~/Documents/budget.csv ~/Documents/2027.csv");
+    fs::rename(documents_ / "budget.csv", documents_ / "2027.csv");
+    shell("echo '# Salad' > ~/Documents/salad.md");
+    shell("rm ~/Documents/Recipes/bread.md");
+    fs::remove(documents_ / "Recipes/bread.md");
+    shell("cd ~/Documents/Recipes && echo 'Thanks again!' > .new && mv .new thanks.txt");
+    if (!write(documents_ / "salad.md", "# Salad\n") ||
+        !write(documents_ / "Recipes/.new", "Thanks again!\n")) {
+      return false;
+    }
+    fs::rename(documents_ / "Recipes/.new", documents_ / "Recipes/thanks.txt");
+    return true;
+  }
+
+  // Lines are "updated  IDENTIFIER  PATH" and "deleted  IDENTIFIER".
+  bool isAllThatChanged(const std::string& told, const std::string& deleted) const {
+    std::set<std::string> paths;
+    std::istringstream lines(told);
+    std::string verb;
+    for (std::string line; std::getline(lines, line);) {
+      std::istringstream words(line);
+      std::string identifier;
+      std::string path;
+      words >> verb >> identifier >> std::ws;
+      std::getline(words, path);
+      if (verb == "deleted" && identifier != deleted) return false;
+      const bool isLetter = path == documents_ / "Recipes/thanks.txt";
+      if (isLetter != (identifier == letter_)) return false;
+      paths.insert(path);
+    }
+    const std::set<std::string> expected = {"", documents_ / "2027.csv", documents_ / "salad.md",
+                                            documents_ / "Recipes",
+                                            documents_ / "Recipes/thanks.txt"};
+    return paths == expected;
   }
 
   static bool sync(const fs::path& file) {

@@ -1,4 +1,5 @@
 #include <cerrno>
+#include <fcntl.h>
 #include <nlohmann/json.hpp>
 #include <ostream>
 #include <vector>
@@ -8,6 +9,8 @@
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
 #include "linux/files/HomeLayout.h"
+#include "linux/kernel/LongPath.h"
+#include "linux/volume/FollowStatus.h"
 #include "linux/volume/VolumeAbilities.h"
 
 namespace mirabel {
@@ -76,6 +79,45 @@ Finding uuidFinding(bool has) {
           ""};
 }
 
+Result<FollowStatus> tryWatching(const std::string& folder) {
+  auto opened = openLongPath(AT_FDCWD, folder, O_PATH | O_DIRECTORY);
+  if (!opened) return fail(opened.error());
+  auto watcher = makeWatcher();
+  if (!watcher) return fail(watcher.error());
+  FollowStatus status;
+  status.watcher = (*watcher)->kind();
+  status.limits = WatchLimits::of((*watcher)->kind());
+  auto watched = (*watcher)->watch(opened->get(), 1);
+  if (!watched) status.refusal = watched.error();
+  return status;
+}
+
+// One folder is tried. How many there are is not counted for this: "mirabel status" knows.
+Finding watchingFinding(const std::string& folder) {
+  const std::string subject = "watching";
+  const std::string without = ": every question about changes is answered by a look at all files";
+  const auto tried = tryWatching(folder);
+  if (!tried) {
+    return {subject, Health::limited,
+            "folders can't be watched (" + explanation(tried.error()) + ")" + without, ""};
+  }
+  std::string limit;
+  if (tried->limits.allowed) {
+    limit = std::to_string(*tried->limits.allowed) + " folders at most, by \"" +
+            tried->limits.setting + "\"";
+  }
+  if (!tried->refusal) {
+    return {subject, Health::good,
+            std::string(nameOf(*tried->watcher)) + (limit.empty() ? "" : "; ") + limit, ""};
+  }
+  if (tried->refusal->isPosix(ENOSPC) && !limit.empty()) {
+    return {subject, Health::limited, "no further folder can be watched; " + limit + without,
+            "raise \"" + tried->limits.setting + "\" with sysctl"};
+  }
+  return {subject, Health::limited,
+          "folders can't be watched there (" + explanation(*tried->refusal) + ")" + without, ""};
+}
+
 Finding stateFinding(const Result<void>& opened, const HomeLayout& layout) {
   const std::string subject = "state";
   if (opened) return {subject, Health::good, layout.stateFolder, ""};
@@ -103,6 +145,7 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
     findings.push_back(birthTimeFinding(abilities->hasBirthTimes));
     findings.push_back(handleFinding(abilities->hasHandles, abilities->hasBirthTimes));
     findings.push_back(uuidFinding(abilities->hasUUID));
+    findings.push_back(watchingFinding(*volume));
   }
   Session::Options options{program.options().home, program.options().timeout,
                            [&](std::string_view text) { program.note(text); }};

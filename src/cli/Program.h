@@ -17,6 +17,7 @@ struct Streams {
   std::ostream& out;
   std::ostream& err;
   bool isTerminal = false;  ///< whether `out` is one: colours and columns for people
+  int descriptor = -1;      ///< of `out`, where it has one: shows that its reader has left
 };
 
 /// What was said before the command.
@@ -40,6 +41,7 @@ class Program {
   /// False once nobody reads the answer any more, or it can't be written: time to end.
   [[nodiscard]] bool canWrite() const;
   [[nodiscard]] bool isTerminal() const { return streams_.isTerminal; }
+  [[nodiscard]] int outputDescriptor() const { return streams_.descriptor; }
 
   /// Null after a failure that was reported; `exitCode` tells with what to end.
   [[nodiscard]] Session* session();

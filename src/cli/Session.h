@@ -29,8 +29,9 @@ class Session {
 
   [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
   /// Lists the container and tells its changes, when it is asked. Errors: see `LocalVessel`.
-  [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(std::string_view container) {
-    return provider_->enumeratorForContainerItemIdentifier(container, LiveUpdates::unwanted);
+  [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(
+      std::string_view container, LiveUpdates liveUpdates = LiveUpdates::unwanted) {
+    return provider_->enumeratorForContainerItemIdentifier(container, liveUpdates);
   }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }

@@ -21,7 +21,7 @@ void occupyStandardStreams() {
 
 bool readerHasLeft() {
   pollfd output{STDOUT_FILENO, 0, 0};
-  return ::poll(&output, 1, 0) == 1 && (output.revents & POLLERR) != 0;
+  return ::poll(&output, 1, 0) == 1 && (output.revents & (POLLERR | POLLHUP)) != 0;
 }
 
 // A reader that has seen enough ends the pipe: no failure to tell of. The program ends like any
@@ -41,7 +41,7 @@ int main(int count, char** arguments) {
   std::signal(SIGPIPE, SIG_IGN);
   std::ios::sync_with_stdio(false);
   const std::vector<std::string> words(arguments + (count > 0 ? 1 : 0), arguments + count);
-  const mirabel::Streams streams{std::cout, std::cerr, ::isatty(STDOUT_FILENO) == 1};
+  const mirabel::Streams streams{std::cout, std::cerr, ::isatty(STDOUT_FILENO) == 1, STDOUT_FILENO};
   const int code = mirabel::runCommandLine(words, streams);
   std::cout.flush();
   if (std::cout) return code;

@@ -103,7 +103,7 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
   }
   EXPECT_EQ(subjects,
             (std::set<std::string>{"home", "documents", "extended attributes", "birth times",
-                                   "file handles", "volume UUID", "state"}));
+                                   "file handles", "volume UUID", "watching", "state"}));
   home.remove("");
   const Answer missing = run({"doctor"});
   EXPECT_EQ(missing.code, 1);
@@ -115,6 +115,7 @@ TEST_F(Answers, TheDemonstrationFindsItsDocumentToTheEnd) {
   const Answer answer = run({"demo"});
   EXPECT_EQ(answer.code, 0) << answer.out << answer.err;
   EXPECT_THAT(answer.out, HasSubstr("/Documents/Recipes/thanks.txt\n"));
+  EXPECT_THAT(answer.out, HasSubstr("$ mirabel changes workingset --since"));
   EXPECT_THAT(answer.out, HasSubstr("The home was temporary and is gone."));
 }
 

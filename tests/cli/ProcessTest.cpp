@@ -1,12 +1,8 @@
-#include <array>
 #include <csignal>
-#include <cstdio>
-#include <fcntl.h>
-#include <spawn.h>
 #include <sys/wait.h>
-#include <unistd.h>
 
 #include "cli/CommandLineFixture.h"
+#include "cli/Running.h"
 #include "cli/Session.h"
 
 namespace mirabel::testing {
@@ -22,51 +18,6 @@ class Processes : public CommandLineFixture {
     options.home = home.path();
     return Session::open(std::move(options)).value();
   }
-};
-
-/// The built program, running, with its standard error to read from.
-class Running {
- public:
-  explicit Running(std::vector<std::string> arguments) {
-    arguments.insert(arguments.begin(), MIRABEL_PROGRAM);
-    std::vector<char*> words;
-    words.reserve(arguments.size() + 1);
-    for (std::string& argument : arguments)
-      words.push_back(argument.data());
-    words.push_back(nullptr);
-    std::array<int, 2> ends{};
-    if (::pipe2(ends.data(), O_CLOEXEC) != 0) throw std::runtime_error("pipe2");
-    posix_spawn_file_actions_t actions;
-    ::posix_spawn_file_actions_init(&actions);
-    ::posix_spawn_file_actions_adddup2(&actions, ends[1], STDERR_FILENO);
-    ::posix_spawn_file_actions_addopen(&actions, STDOUT_FILENO, "/dev/null", O_WRONLY, 0);
-    const int failure =
-        ::posix_spawn(&process_, MIRABEL_PROGRAM, &actions, nullptr, words.data(), environ);
-    ::posix_spawn_file_actions_destroy(&actions);
-    ::close(ends[1]);
-    if (failure != 0) throw std::runtime_error("posix_spawn");
-    errors_ = ::fdopen(ends[0], "r");
-  }
-  ~Running() { ::fclose(errors_); }
-  Running(const Running&) = delete;
-  Running& operator=(const Running&) = delete;
-
-  /// Waits for it to say a line.
-  std::string line() {
-    std::array<char, 512> text{};
-    return ::fgets(text.data(), text.size(), errors_) == nullptr ? "" : text.data();
-  }
-  void send(int signal) const { ::kill(process_, signal); }
-  /// Its wait status.
-  int end() const {
-    int status = 0;
-    ::waitpid(process_, &status, 0);
-    return status;
-  }
-
- private:
-  pid_t process_ = -1;
-  std::FILE* errors_ = nullptr;
 };
 
 TEST_F(Processes, IdentitiesOutliveThem) {
@@ -90,20 +41,22 @@ TEST_F(Processes, WaitForEachOtherAndGiveUpWithExitCodeSeven) {
   // It does not make the volume sick.
   EXPECT_EQ(run({"--timeout", "0", "doctor"}).code, 0);
 
-  Running waiting({"--home", home.path(), "--timeout", "60", "ls", "--pages", "1"});
-  EXPECT_THAT(waiting.line(), HasSubstr("waiting for another process"));
+  Running waiting({MIRABEL_PROGRAM, "--home", home.path(), "--timeout", "60", "ls"});
+  EXPECT_THAT(waiting.errors().line(), HasSubstr("waiting for another process"));
   held.reset();
   EXPECT_EQ(waiting.end(), 0);
 }
 
 TEST_F(Processes, AnInterruptEndsTheWaiting) {
   const auto held = hold();
-  for (const int signal : {SIGINT, SIGTERM}) {
-    Running waiting({"--home", home.path(), "--timeout", "60", "ls"});
-    EXPECT_THAT(waiting.line(), HasSubstr("waiting"));
-    waiting.send(signal);
-    const int status = waiting.end();
-    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == signal) << status;
+  for (const char* command : {"ls", "watch"}) {
+    for (const int signal : {SIGINT, SIGTERM}) {
+      Running waiting({MIRABEL_PROGRAM, "--home", home.path(), "--timeout", "60", command});
+      EXPECT_THAT(waiting.errors().line(), HasSubstr("waiting"));
+      waiting.send(signal);
+      const int status = waiting.end();
+      EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == signal) << command << status;
+    }
   }
 }
 

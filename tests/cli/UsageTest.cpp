@@ -28,6 +28,9 @@ TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
       {"--timeout", "1e9", "ls"},
       {"--home", "/", "ls"},  // said twice
       {"doctor", "argument"},
+      {"status", "argument"},
+      {"watch", "--since"},
+      {"watch", "a", "b"},
       {"ls", "a", "doctor", "b"},
   };
   for (const auto& arguments : cases) {
@@ -47,7 +50,8 @@ TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
 TEST_F(Usage, HelpAndVersionAreAnswers) {
   const Answer help = run({"--help"});
   EXPECT_EQ(help.code, 0);
-  for (const char* word : {"id", "path", "info", "ls", "doctor", "demo", "--json", "./fid=3"}) {
+  for (const char* word :
+       {"id", "path", "info", "ls", "watch", "doctor", "demo", "--json", "./fid=3"}) {
     EXPECT_THAT(help.out, HasSubstr(word));
   }
   const Answer list = run({"ls", "--help"});
@@ -61,7 +65,8 @@ TEST_F(Usage, TheManualKnowsEveryOptionAndCommandOfTheHelp) {
   const std::string manual(std::istreambuf_iterator<char>(file), {});
   const std::regex word("--[a-z]+|\\n  ([a-z]+) ");
   int count = 0;
-  for (const char* command : {"", "id", "path", "info", "ls", "doctor", "demo"}) {
+  for (const char* command :
+       {"", "id", "path", "info", "ls", "anchor", "changes", "watch", "status", "doctor", "demo"}) {
     const std::string help = *command == '\0' ? run({"--help"}).out : run({command, "--help"}).out;
     for (std::sregex_iterator it(help.begin(), help.end(), word), end; it != end; ++it, ++count) {
       const std::string found = (*it)[1].matched ? (*it)[1].str() : it->str();

@@ -79,6 +79,14 @@ const Platform& LinuxPlatform::platform() const {
   return parts_->platform;
 }
 
+LinuxVesselManager& LinuxPlatform::manager() const {
+  return parts_->manager;
+}
+
+VolumeIndex& LinuxPlatform::index() const {
+  return *parts_->index;
+}
+
 const std::string& LinuxPlatform::home() const {
   return parts_->layout.home;
 }

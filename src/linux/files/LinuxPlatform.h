@@ -9,6 +9,8 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "linux/files/LinuxVesselManager.h"
+#include "linux/volume/VolumeIndex.h"
 #include "linux/watch/FolderWatcher.h"
 #include "platform/EventStreams.h"
 #include "platform/Platform.h"
@@ -53,6 +55,10 @@ class LinuxPlatform {
   [[nodiscard]] const Platform& platform() const;
   /// The event history of the documents' volume.
   [[nodiscard]] EventStreams& events() const;
+  /// Gives the signals to whoever listens.
+  [[nodiscard]] LinuxVesselManager& manager() const;
+  /// How changes are followed, and what the history holds.
+  [[nodiscard]] VolumeIndex& index() const;
   /// Absolute and resolved.
   [[nodiscard]] const std::string& home() const;
   [[nodiscard]] const std::string& stateFolder() const;
