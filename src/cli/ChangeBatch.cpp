@@ -21,7 +21,7 @@ Result<std::shared_ptr<const ChangeBatch>> ChangeBatch::ask(VesselEnumerator& en
                                                             const std::string& anchor) {
   const auto bytes = fromBase64(anchor);
   if (!bytes) return fail(Error::syncAnchorExpired());
-  const auto batch = std::make_shared<ChangeBatch>();
+  auto batch = std::make_shared<ChangeBatch>();
   auto finished = batch->finished_.get_future();
   enumerator.enumerateChanges(batch, dataFromString(*bytes));
   if (auto outcome = finished.get(); !outcome) return fail(outcome.error());
