@@ -68,15 +68,14 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
     const std::shared_lock open(services.gate->mutex);
     if (services.gate->isClosed || isStopped) return;
     auto last = services.index.currentEventID();
-    if (!last) return lose(last.error());
+    if (!last) lose(last.error());
     for (const std::string& path : selection.paths) {
       const auto status = statusOf(path);
       if (!status) continue;
       auto seen = services.index.learnPath(path, *status, false);
       if (seen) folders.push_back(seen->fileID);
     }
-    if (!deliver()) return;
-    tellOfStream(eventflag::historyDone);
+    if (deliver()) tellOfStream(eventflag::historyDone);
     if (!isStopped) services.live.add(weak_from_this());
   }
 
@@ -125,7 +124,8 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
   void lose(const Error& error) {
     logDebug([&] { return "can't replay the history; " + error.description(); });
     tellOfStream(eventflag::kernelDropped);
-    isStopped = true;
+    // Whoever stays goes on with what comes.
+    since = services.index.status().lastEventID;
   }
 
   void tellOfStream(std::uint32_t flag) {

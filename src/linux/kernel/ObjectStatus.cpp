@@ -2,11 +2,13 @@
 
 #include <array>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 #include <fcntl.h>
 #include <limits>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
+#include <sys/utsname.h>
 #include <time.h>
 
 #include "linux/kernel/LongPath.h"
@@ -114,6 +116,17 @@ std::optional<std::string> handleAt(int directory, const std::string& name) {
   std::memcpy(result.data(), &handle.handle_type, sizeof(handle.handle_type));
   std::memcpy(result.data() + sizeof(handle.handle_type), handle.f_handle, handle.handle_bytes);
   return result;
+}
+
+bool timesAreCoarse() {
+  static const bool areCoarse = [] {
+    utsname system{};
+    int major = 0, minor = 0;
+    if (::uname(&system) != 0) return true;
+    if (std::sscanf(system.release, "%d.%d", &major, &minor) != 2) return true;
+    return major < 6 || (major == 6 && minor < 13);
+  }();
+  return areCoarse;
 }
 
 std::vector<std::uint64_t> inodesIn(std::string_view handle) {

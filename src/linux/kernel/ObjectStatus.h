@@ -41,6 +41,10 @@ struct ObjectStatus {
 /// on its file system. Starts with the handle's type. Nothing where the file system has none.
 [[nodiscard]] std::optional<std::string> handleAt(int directory, const std::string& name);
 
+/// Whether two changes of a file within a tick of the clock may leave the same times, also when it
+/// was looked at in between: on kernels before 6.13.
+[[nodiscard]] bool timesAreCoarse();
+
 /// Numbers in a handle, one of which is the inode number of its object on the file systems there
 /// are: where to look for what has that handle.
 [[nodiscard]] std::vector<std::uint64_t> inodesIn(std::string_view handle);

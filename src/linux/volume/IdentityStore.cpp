@@ -200,6 +200,7 @@ Result<void> IdentityStore::put(const ObjectRow& row) {
 }
 
 Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
+  folderPaths_.writes(row);
   const auto bindUnless = [&](int index, bool absent, std::uint64_t value) {
     absent ? statement.bindNull(index) : statement.bind(index, value);
   };
@@ -221,6 +222,7 @@ Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {
 }
 
 Result<void> IdentityStore::remove(std::uint64_t slot) {
+  folderPaths_.clear();
   return statements_->remove.bind(1, slot).run();
 }
 

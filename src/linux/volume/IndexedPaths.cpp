@@ -15,18 +15,32 @@ constexpr int deepestFolder = 1 << 16;
 }  // namespace
 
 Result<std::optional<std::string>> IndexedPaths::pathOf(const Location& location) const {
-  std::vector<std::string> names{location.name};
-  std::uint64_t folder = location.folder;
-  for (int depth = 0; folder != 0; ++depth) {
-    auto above = store_.objectByFileID(folder);
-    if (!above) return fail(above.error());
-    if (!*above || !(*above)->location || depth == deepestFolder) return std::nullopt;
-    names.push_back((*above)->location->name);
-    folder = (*above)->location->folder;
+  if (location.folder == 0) return location.name;
+  auto folder = folderPath(location.folder);
+  if (!folder || !*folder) return folder;
+  return **folder + "/" + location.name;
+}
+
+// From the folder up to the first one whose path is known, and down again.
+Result<std::optional<std::string>> IndexedPaths::folderPath(std::uint64_t folder) const {
+  FolderPaths& known = store_.folderPaths();
+  std::vector<ObjectRow> above;
+  std::string path;
+  for (std::uint64_t id = folder; id != 0; id = above.back().location->folder) {
+    if (const std::string* found = known.find(id)) {
+      path = *found;
+      break;
+    }
+    auto row = store_.objectByFileID(id);
+    if (!row) return fail(row.error());
+    if (!*row || !(*row)->location || above.size() == deepestFolder) return std::nullopt;
+    above.push_back(std::move(**row));
   }
-  std::string path = std::move(names.back());
-  for (auto name = names.rbegin() + 1; name != names.rend(); ++name)
-    path.append("/").append(*name);
+  for (; !above.empty(); above.pop_back()) {
+    const ObjectRow& row = above.back();
+    path = row.location->folder == 0 ? row.location->name : path + "/" + row.location->name;
+    known.add(row.fileID, *row.location, path);
+  }
   return path;
 }
 

@@ -31,6 +31,8 @@ class IndexedPaths {
   [[nodiscard]] Result<bool> isAt(const ObjectRow& row, const Location& location) const;
 
  private:
+  [[nodiscard]] Result<std::optional<std::string>> folderPath(std::uint64_t folder) const;
+
   IdentityStore& store_;
   const MonitoredRoots& roots_;
   std::uint64_t device_;

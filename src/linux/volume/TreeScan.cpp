@@ -176,6 +176,8 @@ Result<std::uint64_t> TreeScan::takeIn(const Folder& folder, int descriptor,
     if (isThere[i] == 0) continue;
     if (kept != i) batch[kept] = std::move(batch[i]);
     Sighting& sighting = batch[kept++];
+    // What was looked at right after a change may have had another one since.
+    sighting.isReported = timesAreCoarse();
     sighting.isPackage =
         sighting.status.kind == FileKind::folder && context_.isPackageName(sighting.name);
   }

@@ -158,6 +158,7 @@ Result<void> VolumeState::transaction(const std::function<Result<void>()>& work)
   if (auto undone = database_->execute("ROLLBACK"); !undone) {
     logDebug("can't roll back; " + undone.error().description());
   }
+  store_->folderPaths().clear();
   if (auto reloaded = journal_->reload(); !reloaded) broken_ = reloaded.error();
   return done;
 }
