@@ -41,7 +41,7 @@ FSChangesEnumerations::~FSChangesEnumerations() {
     const auto enumerator = made.lock();
     if (enumerator) enumerator->stop();
   }
-  running_->wait();
+  running_->stop();
 }
 
 void RunningReaders::add(const std::shared_ptr<FSEventReader>& reader) {
@@ -50,14 +50,18 @@ void RunningReaders::add(const std::shared_ptr<FSEventReader>& reader) {
   readers_.push_back({reader, reader->streamQueue()});
 }
 
-void RunningReaders::wait() {
+void RunningReaders::stop() {
   std::vector<Running> readers;
   {
     const std::lock_guard lock(mutex_);
     readers.swap(readers_);
   }
   for (Running& running : readers) {
-    if (!running.reader.expired()) running.queue.sync([] {});
+    const auto reader = running.reader.lock();
+    if (!reader) continue;
+    running.queue.sync([&] {
+      if (reader->isRunning()) reader->stop();
+    });
   }
 }
 

@@ -26,13 +26,15 @@ struct FSReaderState {
 };
 
 /// The readers of a provider's enumerations, so that whoever takes down what they use can wait for
-/// them: a reader goes through the rest of its batch even when its enumeration has finished. Any
-/// thread may call it.
+/// them: a reader goes through the rest of its batch even when its enumeration has finished, and
+/// an observer that is being told of the finish may be the last to hold one. Any thread may call
+/// it.
 class RunningReaders {
  public:
   void add(const std::shared_ptr<FSEventReader>& reader);
-  /// Returns when no batch is under way. Not to be called from a reader's queue.
-  void wait();
+  /// Stops those that run; returns when no batch is under way. Not to be called from a reader's
+  /// queue.
+  void stop();
 
  private:
   struct Running {

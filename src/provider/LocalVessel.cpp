@@ -33,6 +33,10 @@ LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
       context_{platform_, identity_, owners},
       changes_(std::move(changes)) {}
 
+LocalVessel::~LocalVessel() {
+  liveUpdates_.stop();
+}
+
 std::optional<URL> LocalVessel::URLForItemWithPersistentIdentifier(
     std::string_view identifier) const {
   return _urlForItemWithPersistentIdentifier(identifier);
@@ -116,6 +120,7 @@ Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerIte
   if (!folders) return fail(folders.error());
   auto enumerator = LocalFileEnumerator::create(
       {context_, *changes_, walks_}, std::string(identifier), *std::move(folders), liveUpdates);
+  if (const auto& notifier = enumerator->notifier()) liveUpdates_.add(notifier->reader());
   enumerator->startNotifier();
   return enumerator;
 }

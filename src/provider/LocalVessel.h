@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "enumeration/EnumerationServices.h"
+#include "fs/FSChangesEnumerator.h"
 #include "identity/FileObjectURLs.h"
 #include "items/LocalItem.h"
 #include "platform/EnumerationObservers.h"
@@ -22,6 +23,8 @@ class LocalVessel {
   /// Everything passed in outlives the provider. Without `changes` it has no enumerators.
   LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
               const AppLibraryOwners& owners, std::optional<ChangeServices> changes = {});
+  /// Ends the live updates of its enumerators.
+  ~LocalVessel();
   LocalVessel(const LocalVessel&) = delete;
   LocalVessel& operator=(const LocalVessel&) = delete;
 
@@ -71,6 +74,7 @@ class LocalVessel {
   ItemContext context_;
   std::optional<ChangeServices> changes_;
   OpenWalks walks_;
+  RunningReaders liveUpdates_;
 };
 
 }  // namespace mirabel

@@ -73,6 +73,21 @@ TEST_F(EnumeratorForContainerTest, UnknownContainerIsTheLookupsError) {
                   .isPosix(ENOTSUP));
 }
 
+// Whoever is told that an enumeration finished may take the provider down while the enumerator is
+// still held on the way back from that.
+TEST_F(EnumeratorForContainerTest, LiveUpdatesEndWithTheProvider) {
+  auto provider = std::make_unique<LocalVessel>(fake.platform(), libraries, libraries,
+                                                ChangeServices{events, fake.diagnostics, changes});
+  const auto enumerator =
+      provider->enumeratorForContainerItemIdentifier(VesselRootContainerItemIdentifier).value();
+  SerialQueue queue =
+      dynamic_cast<LocalFileEnumerator&>(*enumerator).notifier()->reader()->streamQueue();
+  queue.sync([] {});
+  EXPECT_EQ(events.runningStreams(), 1U);
+  provider.reset();
+  EXPECT_EQ(events.runningStreams(), 0U);
+}
+
 TEST_F(EnumeratorForContainerTest, LiveUpdatesRunFromTheStartUntilInvalidated) {
   const auto enumerator =
       vessel.enumeratorForContainerItemIdentifier(VesselRootContainerItemIdentifier).value();
