@@ -48,7 +48,10 @@ GatherPage::GatherPage(const ItemContext& context, const GatherScope& scope)
     : context_(context),
       scope_(scope),
       hiddenTest_(scope.urls, context.platform.resources),
-      look_(context, hiddenTest_) {}
+      look_(context, hiddenTest_),
+      names_(context, scope.urls,
+             scope.isRecursive() ? LinkNames::Depth::everything : LinkNames::Depth::children,
+             hiddenTest_) {}
 
 std::unique_ptr<FSDirectoryWalk> GatherPage::makeWalk() const {
   FSDirectoryWalk::Plan plan;
@@ -76,15 +79,20 @@ Result<void> GatherPage::gather(FSDirectoryWalk& walk) {
   entryCount_ = *counted;
   if (shown.empty()) return {};
   if (auto fetched = context_.platform.resources.prefetch(shown); !fetched) return fetched;
-  std::vector<Result<std::shared_ptr<LocalItem>>> made(shown.size());
-  splitWork(shown.size(), pieceSize, [&](std::size_t begin, std::size_t end) {
+  std::vector<URL> listed;
+  for (const URL& url : shown) {
+    const auto isPassed = isPassedOver(url);
+    if (!isPassed) return fail(isPassed.error());
+    if (!*isPassed) listed.push_back(url);
+  }
+  std::vector<Result<std::shared_ptr<LocalItem>>> made(listed.size());
+  splitWork(listed.size(), pieceSize, [&](std::size_t begin, std::size_t end) {
     for (std::size_t i = begin; i < end; ++i)
-      if (!isLeftOut(shown[i])) made[i] = look_.at(shown[i]);
+      made[i] = look_.at(listed[i]);
   });
-  for (std::size_t i = 0; i < shown.size(); ++i) {
-    if (isLeftOut(shown[i])) continue;
+  for (std::size_t i = 0; i < listed.size(); ++i) {
     if (!made[i]) return fail(made[i].error());
-    if (auto added = addItem(shown[i], *std::move(made[i])); !added) return added;
+    if (auto added = addItem(listed[i], *std::move(made[i])); !added) return added;
   }
   return {};
 }
@@ -102,8 +110,8 @@ Result<void> GatherPage::addItem(const URL& url, std::shared_ptr<LocalItem> item
 }
 
 /// Before an item is made of it: a document would get an identity for nothing.
-bool GatherPage::isLeftOut(const URL& url) const {
-  if (!scope_.isAllDirectories()) return false;
+Result<bool> GatherPage::isPassedOver(const URL& url) {
+  if (!scope_.isAllDirectories()) return names_.isShownElsewhere(url);
   const auto type =
       ResourceReader(context_.platform.resources).value(ResourceKey::typeIdentifier, url);
   return type && *type != ResourceValue(std::string(folderType));

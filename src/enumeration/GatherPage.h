@@ -11,6 +11,7 @@
 #include "fs/FSDirectoryWalk.h"
 #include "fs/HiddenTest.h"
 #include "fs/ItemLook.h"
+#include "fs/LinkNames.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {
@@ -50,13 +51,14 @@ class GatherPage {
  private:
   /// Null: none was there to be made.
   [[nodiscard]] Result<void> addItem(const URL& url, std::shared_ptr<LocalItem> item);
-  [[nodiscard]] bool isLeftOut(const URL& url) const;
+  [[nodiscard]] Result<bool> isPassedOver(const URL& url);
   [[nodiscard]] bool hasMoved(const URL& folder);
 
   const ItemContext& context_;
   const GatherScope& scope_;
   HiddenTest hiddenTest_;
   ItemLook look_;
+  LinkNames names_;
   std::uint64_t entryCount_ = 0;
   VesselItems items_;
   std::optional<URL> checkedFolder_;  // the one that `hasMoved` was last asked about

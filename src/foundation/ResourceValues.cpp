@@ -68,6 +68,8 @@ std::string_view nameOf(ResourceKey key) {
       return "fileIdentifier";
     case ResourceKey::documentIdentifier:
       return "documentIdentifier";
+    case ResourceKey::linkCount:
+      return "linkCount";
     case ResourceKey::fileResourceIdentifier:
       return "fileResourceIdentifier";
   }
@@ -98,6 +100,8 @@ ResourceValue resourceValue(const ResourceValues& values, ResourceKey key, std::
       return Number::of(values.fileID);
     case ResourceKey::documentIdentifier:
       return documentIDOrAbsent(values);
+    case ResourceKey::linkCount:
+      return Number::of(std::uint64_t{values.linkCount});
     case ResourceKey::fileResourceIdentifier:
       return {};
   }

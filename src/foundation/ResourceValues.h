@@ -27,6 +27,7 @@ enum class ResourceKey {
   isReachable,              ///< boolean: something is there
   fileIdentifier,           ///< number: the file ID
   documentIdentifier,       ///< number: the document ID, absent when none was assigned yet
+  linkCount,                ///< number: how many names it has on its file system; 1 for a folder
   fileResourceIdentifier,   ///< never stored; its name stands in one message
 };
 
@@ -46,6 +47,7 @@ struct ResourceValues {
   bool isWritable = false;
   std::uint64_t fileID = 0;
   std::uint32_t documentID = 0;  ///< 0: none assigned yet
+  std::uint32_t linkCount = 1;   ///< 1 for a folder
   std::uint64_t size = 0;
   std::optional<Date> creationDate = {};
   std::optional<Date> contentModificationDate = {};

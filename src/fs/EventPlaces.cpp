@@ -39,27 +39,14 @@ EventPlace EventPlaces::placeOf(const FileSystemEvent& event, const HiddenTest& 
     if (!place.document || place.document->destinationFileID == 0) return place;
     auto url = look.placeOf(static_cast<std::uint64_t>(place.document->destinationFileID));
     if (!url) place.failure = url.error();
-    if (url && *url) place.url = sharedURL((*url)->path());
+    if (url && *url) place.url = urls_.at((*url)->path());
   } else {
-    place.url = sharedURL(*event.path);
+    place.url = urls_.at(*event.path);
   }
   if (!place.url) return place;
   place.isMonitored = hiddenTest.isMonitored(*place.url);
   place.isHidden = hiddenTest.isHidden(*place.url);
   return place;
-}
-
-/// One URL for each path, as a child of its folder's.
-const URL& EventPlaces::sharedURL(std::string_view path) {
-  while (path.size() > 1 && path.ends_with('/'))
-    path.remove_suffix(1);
-  if (const auto found = urls_.find(std::string(path)); found != urls_.end()) return found->second;
-  const std::size_t slash = path.rfind('/');
-  if (slash == std::string_view::npos || slash + 1 == path.size()) {
-    return urls_.emplace(path, URL::fileURL(path)).first->second;
-  }
-  const URL folder = sharedURL(slash == 0 ? "/" : path.substr(0, slash));
-  return urls_.emplace(path, folder.appendingPathComponent(path.substr(slash + 1))).first->second;
 }
 
 }  // namespace mirabel

@@ -3,15 +3,13 @@
 #include <cstddef>
 #include <optional>
 #include <span>
-#include <string>
-#include <string_view>
-#include <unordered_map>
 #include <vector>
 
 #include "foundation/URL.h"
 #include "fs/DocumentIDPath.h"
 #include "fs/HiddenTest.h"
 #include "fs/ItemLook.h"
+#include "fs/SharedURLs.h"
 #include "platform/EventStreams.h"
 
 namespace mirabel {
@@ -42,10 +40,9 @@ class EventPlaces {
  private:
   [[nodiscard]] EventPlace placeOf(const FileSystemEvent& event, const HiddenTest& hiddenTest,
                                    const ItemLook& look);
-  [[nodiscard]] const URL& sharedURL(std::string_view path);
 
   std::vector<EventPlace> places_;
-  std::unordered_map<std::string, URL> urls_;
+  SharedURLs urls_;
 };
 
 }  // namespace mirabel

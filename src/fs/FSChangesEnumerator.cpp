@@ -81,6 +81,12 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
       containerSight_(urls_, context.platform.resources),
       everywhereSight_(rootsOf(context, roots), context.platform.resources),
       look_(context_, everywhereSight_),
+      containerNames_(
+          context_, urls_,
+          isFolderContainer() ? LinkNames::Depth::children : LinkNames::Depth::everything,
+          containerSight_),
+      everywhereNames_(context_, rootsOf(context, roots), LinkNames::Depth::everything,
+                       everywhereSight_),
       running_(std::move(running)),
       passedEventID_(token.streamEventID) {
   if (urls_.empty()) fatalError("require at least one URL to init a change enumerator");
@@ -220,19 +226,21 @@ void FSChangesEnumerator::didUpdateItem(FSEventReader& reader,
                                         const std::shared_ptr<LocalItem>& item, const URL& url) {
   const FileSystemEvent& event = *reader.currentEvent();
   if (!accepts(event)) return;
-  if (!isInSight(item->url())) return settle(event);
-  forwardUpdate(item, url);
+  const auto shown = itemShown(item);
+  if (!shown) return finishWithError(shown.error());
+  if (!*shown) return settle(event);
+  forwardUpdate(*shown, url);
   // What it was when this happened may be another identity of the same thing, or of another that
   // has its place now.
-  const std::string& told = item->itemIdentifier();
-  if (event.fileID && item->fileID() != event.fileID) return settle(event);
+  const std::string& told = (*shown)->itemIdentifier();
+  if (event.fileID && (*shown)->fileID() != event.fileID) return settle(event);
   if (event.documentID) {
     const std::string document = MRBFileObjectIdentifier::fromDocumentID(*event.documentID);
-    if (document != told) settleIdentifier(document, true);
+    if (document != told) settleIdentifier(document, true, url);
   }
   if (event.fileID && (event.flags & eventflag::changedKind) != 0) {
     const std::string file = MRBFileObjectIdentifier::fromFileID(*event.fileID);
-    if (file != told) settleIdentifier(file, true);
+    if (file != told) settleIdentifier(file, true, url);
   }
 }
 
@@ -241,7 +249,7 @@ void FSChangesEnumerator::didDeleteItem(FSEventReader& reader, const std::string
   const FileSystemEvent& event = *reader.currentEvent();
   if (!accepts(event)) return;
   if (event.fileID) return settle(event);
-  settleIdentifier(identifier, true);
+  settleIdentifier(identifier, true, {});
 }
 
 void FSChangesEnumerator::didDropEvent(FSEventReader& reader, const FileSystemEvent& event,
@@ -252,7 +260,7 @@ void FSChangesEnumerator::didDropEvent(FSEventReader& reader, const FileSystemEv
     const auto record = DocumentIDPath::parse(*event.path);
     if (record && record->documentID > 0) {
       const auto document = static_cast<std::uint64_t>(record->documentID);
-      settleIdentifier(MRBFileObjectIdentifier::fromDocumentID(document), true);
+      settleIdentifier(MRBFileObjectIdentifier::fromDocumentID(document), true, {});
     }
     return;
   }
@@ -262,21 +270,23 @@ void FSChangesEnumerator::didDropEvent(FSEventReader& reader, const FileSystemEv
 
 void FSChangesEnumerator::settle(const FileSystemEvent& event) {
   if (!event.fileID) return;
+  const URL url = URL::fileURL(*event.path);
   // A document is known by its document ID alone, but where it became one, or stopped to be.
   const std::string file = MRBFileObjectIdentifier::fromFileID(*event.fileID);
   const bool changedKind = (event.flags & eventflag::changedKind) != 0;
   if (event.documentID) {
-    settleIdentifier(MRBFileObjectIdentifier::fromDocumentID(*event.documentID), true);
+    settleIdentifier(MRBFileObjectIdentifier::fromDocumentID(*event.documentID), true, url);
   }
-  settleIdentifier(file, !event.documentID || changedKind);
+  settleIdentifier(file, !event.documentID || changedKind, url);
 }
 
 // The object of a file ID may be shown under a document ID by now: then that is told.
-void FSChangesEnumerator::settleIdentifier(const std::string& identifier, bool reportDeletion) {
+void FSChangesEnumerator::settleIdentifier(const std::string& identifier, bool reportDeletion,
+                                           const std::optional<URL>& eventURL) {
   if (isFinished_) return;
   auto item = itemInSight(identifier);
   if (!item) return finishWithError(item.error());
-  if (*item) forwardUpdate(*item, (*item)->url());
+  if (*item) forwardUpdate(*item, eventURL.value_or((*item)->url()));
   const bool isItself = *item && (*item)->itemIdentifier() == identifier;
   if (!isItself && reportDeletion) forwardDeletion(identifier);
 }
@@ -302,8 +312,26 @@ void FSChangesEnumerator::settlePackageAround(const URL& url) {
 
 Result<std::shared_ptr<LocalItem>> FSChangesEnumerator::itemInSight(const std::string& identifier) {
   const auto url = context_.identity.fileURLWithItemIdentifier(identifier);
-  if (!url || !isInSight(*url)) return nullptr;
-  return look_.at(*url);
+  if (!url) return nullptr;
+  const auto place = shownPlace(*url);
+  if (!place) return fail(place.error());
+  if (!*place) return nullptr;
+  return look_.at(**place);
+}
+
+Result<std::shared_ptr<LocalItem>> FSChangesEnumerator::itemShown(
+    const std::shared_ptr<LocalItem>& item) {
+  const auto place = shownPlace(item->url());
+  if (!place) return fail(place.error());
+  if (!*place) return nullptr;
+  return **place == item->url() ? item : look_.at(**place);
+}
+
+Result<std::optional<URL>> FSChangesEnumerator::shownPlace(const URL& url) {
+  if (!containerNames_.hasSeveral(url)) return isInSight(url) ? std::optional(url) : std::nullopt;
+  auto place = containerNames_.shownName(url);
+  if (!place || *place) return place;
+  return everywhereNames_.shownName(url);
 }
 
 bool FSChangesEnumerator::isInSight(const URL& url) const {

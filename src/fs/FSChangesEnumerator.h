@@ -14,6 +14,7 @@
 #include "fs/FSEventReader.h"
 #include "fs/HiddenTest.h"
 #include "fs/ItemLook.h"
+#include "fs/LinkNames.h"
 #include "identity/AppLibraryRoots.h"
 
 namespace mirabel {
@@ -95,14 +96,21 @@ class FSChangesEnumerator final : public ChangesEnumeration,
 
   /// Tells what has become of the things that a record names.
   void settle(const FileSystemEvent& event);
-  void settleIdentifier(const std::string& identifier, bool reportDeletion);
+  void settleIdentifier(const std::string& identifier, bool reportDeletion,
+                        const std::optional<URL>& eventURL);
   /// Tells the package around a place that is not shown, when it is shown itself.
   void settlePackageAround(const URL& url);
   void forwardUpdate(const std::shared_ptr<LocalItem>& item, const URL& eventURL);
   void forwardDeletion(const std::string& identifier);
   /// The item if a listing of this container, or of any other, shows it now.
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemInSight(const std::string& identifier);
+  /// The item under the name that it is shown under; null when none is.
+  [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemShown(
+      const std::shared_ptr<LocalItem>& item);
   [[nodiscard]] bool isInSight(const URL& url) const;
+  /// Where the object at `url` is shown: under its name in this container, or else under the one
+  /// that it has anywhere in sight. Nothing when it is shown nowhere.
+  [[nodiscard]] Result<std::optional<URL>> shownPlace(const URL& url);
   [[nodiscard]] std::optional<std::string> reasonToIgnore(const LocalItem& item,
                                                           const URL& eventURL) const;
   [[nodiscard]] bool isFolderContainer() const;
@@ -124,6 +132,8 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   HiddenTest containerSight_;
   HiddenTest everywhereSight_;
   ItemLook look_;
+  LinkNames containerNames_;
+  LinkNames everywhereNames_;
   std::shared_ptr<RunningReaders> running_;
   std::uint64_t passedEventID_;  ///< the last event that the pass under way is done with
   std::atomic<bool> isFinished_ = false;

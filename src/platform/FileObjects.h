@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
@@ -50,6 +51,12 @@ class FileObjects {
   /// ENOENT when no object of that ID is to be found in the monitored folders; no object has the
   /// ID 0 or one of 2^63 and more.
   [[nodiscard]] virtual Result<std::string> pathOfFileID(DeviceID device, std::uint64_t fileID) = 0;
+  /// Every path below the monitored folders that the object is known to have, in no order: several
+  /// for one that has hard links. Each is checked against the disk. A name that came since the
+  /// volume was last compared with the disk may be missing, and comes with an event. Empty where
+  /// `pathOfFileID` says ENOENT.
+  [[nodiscard]] virtual Result<std::vector<std::string>> pathsOfFileID(DeviceID device,
+                                                                       std::uint64_t fileID) = 0;
 };
 
 }  // namespace mirabel

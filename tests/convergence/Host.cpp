@@ -118,8 +118,11 @@ Replica Host::list(const std::string& container) {
     PageCollector collector;
     enumerating->enumerateItems(collector, page);
     EXPECT_FALSE(collector.error) << container << ": " << collector.error->description();
-    for (const auto& item : collector.collected)
+    for (const auto& item : collector.collected) {
+      EXPECT_FALSE(replica.items.contains(item->itemIdentifier()))
+          << container << ": " << item->filename() << " is listed twice";
       apply(replica, *item);
+    }
     if (!collector.next) return replica;
     page = *collector.next;
   }

@@ -65,8 +65,79 @@ void RandomTree::save(const std::string& path, std::size_t way) {
   }
 }
 
+// A file that had no name is given one, which must be free.
+void RandomTree::linkNameless(const std::string& to) {
+  const int file = ::open(root_.c_str(), O_TMPFILE | O_WRONLY | O_CLOEXEC, 0644);
+  if (file < 0) return;
+  const std::string contents(pick(60), 'x');
+  static_cast<void>(::write(file, contents.data(), contents.size()));
+  const std::string nameless = "/proc/self/fd/" + std::to_string(file);
+  ::linkat(AT_FDCWD, nameless.c_str(), AT_FDCWD, to.c_str(), AT_SYMLINK_FOLLOW);
+  ::close(file);
+}
+
+// A further name for the file: beside it, anywhere, over another file, or outside and back.
+std::string RandomTree::link(const std::string& file, const std::string& to) {
+  const std::string beside = fs::path(file).parent_path() / fs::path(to).filename();
+  const std::string out = outside_ + "/" + std::to_string(pick(3));
+  switch (pick(7)) {
+    case 0:
+      ::link(file.c_str(), beside.c_str());
+      return "link " + file + " to " + beside;
+    case 1: {
+      const std::string over = any(false), temporary = root_ + "/.link.tmp";
+      ::link(file.c_str(), temporary.c_str());
+      ::rename(temporary.c_str(), over.c_str());
+      ::unlink(temporary.c_str());
+      return "link " + file + " over " + over;
+    }
+    case 2:
+      ::link(file.c_str(), out.c_str());
+      return "link " + file + " to " + out;
+    case 3:
+      ::link(out.c_str(), to.c_str());
+      return "link " + out + " to " + to;
+    case 4:
+      linkNameless(to);
+      return "link a nameless file to " + to;
+    default:
+      ::link(file.c_str(), to.c_str());
+      return "link " + file + " to " + to;
+  }
+}
+
+std::string RandomTree::anyLinked() {
+  auto names = all(false);
+  std::erase_if(names, [](const std::string& name) {
+    struct stat status {};
+    return ::lstat(name.c_str(), &status) != 0 || status.st_nlink < 2;
+  });
+  return names.empty() ? any(false) : names[pick(names.size())];
+}
+
+// What is done to one of several names.
+std::string RandomTree::changeLinked(const std::string& to) {
+  const std::string file = anyLinked();
+  switch (pick(5)) {
+    case 0:
+      writeFile(file, pick(9) + 1, std::ios::app);
+      return "append linked " + file;
+    case 1:
+      ::rename(file.c_str(), to.c_str());
+      return "rename linked " + file + " to " + to;
+    case 2: {
+      const std::size_t way = pick(3);
+      save(file, way);
+      return "save linked " + file + " way " + std::to_string(way);
+    }
+    default:
+      ::unlink(file.c_str());
+      return "unlink linked " + file;
+  }
+}
+
 std::string RandomTree::change() {
-  const std::size_t kind = pick(17);
+  const std::size_t kind = pick(22);
   const std::string file = any(false), folder = any(true), to = anyName();
   const bool isRoot = folder == root_;
   switch (kind) {
@@ -118,6 +189,13 @@ std::string RandomTree::change() {
     case 15:
       ::rename((outside_ + "/" + std::to_string(pick(3))).c_str(), to.c_str());
       return "move in " + to;
+    case 16:
+    case 17:
+    case 18:
+      return link(file, to);
+    case 19:
+    case 20:
+      return changeLinked(to);
     default: {
       const std::string folderTo =
           fs::path(folder).parent_path() / (pick(2) == 0 ? "kind.quill" : "kind");

@@ -23,7 +23,11 @@ class RandomTree {
   [[nodiscard]] std::vector<std::string> all(bool folders) const;
   [[nodiscard]] std::string any(bool folders);
   [[nodiscard]] std::string anyName();
+  [[nodiscard]] std::string anyLinked();
   void save(const std::string& path, std::size_t way);
+  std::string link(const std::string& file, const std::string& to);
+  void linkNameless(const std::string& to);
+  std::string changeLinked(const std::string& to);
 
   std::string root_;
   std::string outside_;  ///< a folder on the same file system that is not presented

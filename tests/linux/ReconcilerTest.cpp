@@ -112,10 +112,60 @@ TEST_F(ReconcilerTest, AnUnchangedTreeMakesNoEvents) {
   EXPECT_TRUE(index().events(first + 1, 10).error().isPosix(ESTALE)) << "never given out";
 }
 
-struct Step {
-  const char* name;
-  std::function<void(const VolumeFixture&)> make;
-};
+// A container that showed a file under a name, or will, learns of it only from a record of a place
+// in it: so each name that came or went, or whose turn may have come, is named.
+TEST_F(ReconcilerTest, NamesOfAHardLinkAreToldThatCameOrWent) {
+  struct Case {
+    const char* name;
+    std::function<void()> make;
+    std::vector<std::string> told;
+  };
+  const auto unlink = [this](const char* name) { fs::remove(path(name)); };
+  const Case cases[] = {
+      {"a name more", [&] { link("a/x", "c/z"); }, {"a/x", "b/y", "c/z"}},
+      {"a name less", [&] { unlink("b/y"); }, {"b/y"}},
+      {"the first name less", [&] { unlink("a/x"); }, {"a/x", "b/y"}},
+      {"no name left", [&] { unlink("a/x"), unlink("b/y"); }, {"a/x", "b/y"}},
+      {"saved over one name", [&] { write("new"), fs::rename(path("new"), path("b/y")); }, {"b/y"}},
+      {"saved over one name, the other gone",
+       [&] { unlink("a/x"), write("new"), fs::rename(path("new"), path("b/y")); },
+       {"a/x", "b/y"}},
+      {"under one new name",
+       [&] { unlink("a/x"), fs::rename(path("b/y"), path("c/z")); },
+       {"a/x", "b/y", "c/z"}},
+      {"written to, and one name changed",
+       [&] { write("a/x", "longer"), fs::rename(path("a/x"), path("c/z")); },
+       {"a/x", "b/y", "c/z"}},
+      {"the folder of one name renamed", [&] { fs::rename(path("b"), path("d")); }, {"d/y"}},
+      {"the folder of the first name renamed", [&] { fs::rename(path("a"), path("d")); }, {"d/x"}},
+      {"the folder of one name hidden", [&] { fs::rename(path("b"), path(".b")); }, {".b/y"}},
+      {"the folder of one name deleted", [&] { fs::remove_all(path("b")); }, {"b/y"}},
+      {"the folder of the first name deleted", [&] { fs::remove_all(path("a")); }, {"a/x", "b/y"}},
+  };
+  for (const Case& c : cases) {
+    close();
+    fs::remove_all(documents_);
+    fs::create_directory(documents_);
+    for (const char* folder : {"a", "b", "c"})
+      makeFolder(folder);
+    write("a/x");
+    file("a/x");
+    link("a/x", "b/y");
+    const std::uint64_t id = file("b/y");
+    const std::uint64_t since = anchor();
+    c.make();
+    anchor();
+    std::set<std::string> told;
+    const auto records = index().events(since, 1000).value();
+    for (const JournalRecord& record : records) {
+      if (!record.isDocument && record.fileID == id) {
+        told.insert(record.path.substr(documents_.size() + 1));
+      }
+    }
+    for (const std::string& name : c.told)
+      EXPECT_TRUE(told.contains(name)) << c.name << ": " << name;
+  }
+}
 
 TEST_F(ReconcilerTest, AWholeTreeThatIsDeletedOrMovedOutIsToldThingByThing) {
   makeFolder("keep");

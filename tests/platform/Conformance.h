@@ -56,6 +56,9 @@ class PlatformConformance : public ::testing::TestWithParam<VolumeFactory> {
   Result<std::string> pathOf(std::uint64_t fileID) {
     return platform().objects.pathOfFileID(device(), fileID);
   }
+  std::vector<std::string> pathsOf(std::uint64_t fileID) {
+    return platform().objects.pathsOfFileID(device(), fileID).value();
+  }
   std::uint16_t linkCount(std::string_view name) {
     return platform().objects.status(at(name)).value().linkCount;
   }
@@ -119,6 +122,32 @@ TEST_P(PlatformConformance, HardLinkIsFoundUnderANameThatIsLeft) {
   const std::uint64_t file = fileID("a");
   volume->remove("a");
   EXPECT_EQ(pathOf(file).value(), at("b").path());
+}
+
+TEST_P(PlatformConformance, AllNamesOfAHardLinkAreKnownAndStand) {
+  volume->makeFolder("folder");
+  volume->writeFile("a", "");
+  volume->link("a", "folder/b");
+  volume->link("a", "c");
+  const std::uint64_t file = fileID("a");
+  EXPECT_EQ(fileID("folder/b"), file);
+  EXPECT_EQ(fileID("c"), file);
+  EXPECT_EQ(valuesOf("c").linkCount, 3U);
+  EXPECT_EQ(valuesOf("folder").linkCount, 1U);
+  EXPECT_THAT(pathsOf(file), ::testing::UnorderedElementsAre(at("a").path(), at("c").path(),
+                                                             at("folder/b").path()));
+  volume->remove("a");
+  volume->rename("folder", "moved");
+  fileID("moved");
+  EXPECT_THAT(pathsOf(file), ::testing::UnorderedElementsAre(at("c").path(), at("moved/b").path()));
+  volume->remove("c");
+  volume->remove("moved");
+  EXPECT_THAT(pathsOf(file), ::testing::IsEmpty());
+  EXPECT_THAT(pathsOf(0), ::testing::IsEmpty());
+
+  volume->writeFile("plain", "");
+  EXPECT_EQ(valuesOf("plain").linkCount, 1U);
+  EXPECT_THAT(pathsOf(fileID("plain")), ::testing::ElementsAre(at("plain").path()));
 }
 
 TEST_P(PlatformConformance, DocumentIDIsAllocatedOnceAndFollowsTheDocument) {

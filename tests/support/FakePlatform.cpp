@@ -179,9 +179,16 @@ class Objects final : public FileObjects {
   Result<std::string> pathOfFileID(DeviceID device, std::uint64_t fileID) override {
     const std::lock_guard lock(core_.mutex);
     if (auto error = core_.faults.hit(Op::pathOfFileID)) return fail(*std::move(error));
-    const auto path = core_.volume.pathOfFileID(fileID);
-    if (device != FakePlatform::deviceID || !path) return fail(Error::posix(ENOENT));
-    return *path;
+    const auto paths = core_.volume.pathsOfFileID(fileID);
+    if (device != FakePlatform::deviceID || paths.empty()) return fail(Error::posix(ENOENT));
+    return paths.front();
+  }
+
+  Result<std::vector<std::string>> pathsOfFileID(DeviceID device, std::uint64_t fileID) override {
+    const std::lock_guard lock(core_.mutex);
+    if (auto error = core_.faults.hit(Op::pathsOfFileID)) return fail(*std::move(error));
+    if (device != FakePlatform::deviceID) return std::vector<std::string>();
+    return core_.volume.pathsOfFileID(fileID);
   }
 
  private:

@@ -41,15 +41,20 @@ std::string typeOf(const FakeNode& node, std::string_view name) {
   return "inode/directory";
 }
 
-/// The first place below `folder` for which `matches` holds, depth first.
-std::optional<std::string> search(const FakeNode& folder, const std::string& path,
-                                  const std::function<bool(const FakeNode&)>& matches) {
-  for (const auto& [name, node] : folder.entries) {
-    const std::string place = path + "/" + name;
-    if (matches(*node)) return place;
-    if (auto found = search(*node, place, matches)) return found;
-  }
-  return {};
+using Visitor = std::function<bool(const FakeNode&, const std::string& path)>;
+
+/// Whether `isIt` holds for something below `folder`; nothing after that is visited. Depth first.
+bool search(const FakeNode& folder, const std::string& path, const Visitor& isIt) {
+  return std::ranges::any_of(folder.entries, [&](const Entry& entry) {
+    const std::string place = path + "/" + entry.first;
+    return isIt(*entry.second, place) || search(*entry.second, place, isIt);
+  });
+}
+
+void loseName(FakeNode& node) {
+  --node.names;
+  for (const auto& [name, child] : node.entries)
+    loseName(*child);
 }
 
 }  // namespace
@@ -57,6 +62,7 @@ std::optional<std::string> search(const FakeNode& folder, const std::string& pat
 FakeVolume::FakeVolume() : root_(std::make_shared<FakeNode>()) {
   root_->kind = FileKind::folder;
   root_->fileID = 2;
+  root_->names = 1;
 }
 
 FakeNode& FakeVolume::makeFolder(std::string_view path) {
@@ -83,7 +89,7 @@ FakeNode& FakeVolume::makeFifo(std::string_view path) {
 }
 
 void FakeVolume::link(std::string_view existing, std::string_view added) {
-  at(split(added).parent).entries.emplace_back(split(added).name, *find(existing));
+  enter(added, *find(existing));
 }
 
 void FakeVolume::rename(std::string_view from, std::string_view to) {
@@ -94,12 +100,14 @@ void FakeVolume::rename(std::string_view from, std::string_view to) {
   if (isSave) node->documentID = (*replaced)->documentID;
   if (replaced) remove(to);
   remove(from);
-  at(split(to).parent).entries.emplace_back(split(to).name, node);
+  enter(to, node);
 }
 
 void FakeVolume::remove(std::string_view path) {
   FakeNode& folder = at(split(path).parent);
-  folder.entries.erase(entryNamed(folder, split(path).name));
+  const auto entry = entryNamed(folder, split(path).name);
+  loseName(*entry->second);
+  folder.entries.erase(entry);
 }
 
 FakeNode& FakeVolume::at(std::string_view path) {
@@ -123,18 +131,23 @@ Result<std::shared_ptr<FakeNode>> FakeVolume::find(std::string_view path) const 
   return node;
 }
 
-std::optional<std::string> FakeVolume::pathOfFileID(std::uint64_t fileID) const {
-  return search(*root_, "", [&](const FakeNode& node) { return node.fileID == fileID; });
+std::vector<std::string> FakeVolume::pathsOfFileID(std::uint64_t fileID) const {
+  std::vector<std::string> paths;
+  search(*root_, "", [&](const FakeNode& node, const std::string& path) {
+    if (node.fileID == fileID) paths.push_back(path);
+    return false;
+  });
+  return paths;
 }
 
 std::uint64_t FakeVolume::fileIDOfDocument(std::uint64_t documentID) const {
   if (documentID == 0) return 0;
   std::uint64_t fileID = 0;
-  const auto found = search(*root_, "", [&](const FakeNode& node) {
+  const bool isFound = search(*root_, "", [&](const FakeNode& node, const std::string&) {
     fileID = node.fileID;
     return node.documentID == documentID;
   });
-  return found ? fileID : 0;
+  return isFound ? fileID : 0;
 }
 
 std::uint32_t FakeVolume::documentIDOf(FakeNode& node) {
@@ -149,6 +162,7 @@ ResourceValues FakeVolume::values(const FakeNode& node, std::string_view name) {
   values.isWritable = node.isWritable;
   values.fileID = node.fileID;
   values.documentID = node.documentID;
+  values.linkCount = node.names;
   values.size = node.contents.size();
   values.creationDate = node.created;
   values.contentModificationDate = node.modified;
@@ -164,8 +178,13 @@ FakeNode& FakeVolume::add(std::string_view path, FileKind kind) {
   auto node = std::make_shared<FakeNode>();
   node->kind = kind;
   node->fileID = nextFileID_++;
-  at(split(path).parent).entries.emplace_back(split(path).name, node);
+  enter(path, node);
   return *node;
+}
+
+void FakeVolume::enter(std::string_view path, std::shared_ptr<FakeNode> node) {
+  ++node->names;
+  at(split(path).parent).entries.emplace_back(split(path).name, std::move(node));
 }
 
 }  // namespace mirabel::testing

@@ -20,6 +20,7 @@ struct FakeNode {
   FileKind kind = FileKind::regular;
   std::uint64_t fileID = 0;
   std::uint32_t documentID = 0;
+  std::uint32_t names = 0;  ///< hard links; kept by the volume
   Data contents;
   Date created{1'700'000'000, 0};
   Date modified{1'700'000'100, 500'000'000};
@@ -53,7 +54,8 @@ class FakeVolume {
   [[nodiscard]] FakeNode& at(std::string_view path);
   /// ENOENT, ELOOP for a symbolic link on the way, ENOTDIR for another non-folder on the way.
   [[nodiscard]] Result<std::shared_ptr<FakeNode>> find(std::string_view path) const;
-  [[nodiscard]] std::optional<std::string> pathOfFileID(std::uint64_t fileID) const;
+  /// Depth first, in the order in which entries are read.
+  [[nodiscard]] std::vector<std::string> pathsOfFileID(std::uint64_t fileID) const;
   /// 0 for none.
   [[nodiscard]] std::uint64_t fileIDOfDocument(std::uint64_t documentID) const;
   [[nodiscard]] std::uint32_t documentIDOf(FakeNode& node);
@@ -65,6 +67,7 @@ class FakeVolume {
 
  private:
   FakeNode& add(std::string_view path, FileKind kind);
+  void enter(std::string_view path, std::shared_ptr<FakeNode> node);
 
   std::shared_ptr<FakeNode> root_;
   std::uint64_t nextFileID_ = 100;

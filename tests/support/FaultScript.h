@@ -25,6 +25,7 @@ enum class Op {
   attributes,
   status,
   pathOfFileID,
+  pathsOfFileID,
   permanentStorage,
   permanentStorageForItemAtURL,
   fileIDOfDocument,

@@ -82,6 +82,12 @@ Result<std::string> LinuxFileObjects::pathOfFileID(DeviceID device, std::uint64_
   return context_.index.pathOfFileID(fileID);
 }
 
+Result<std::vector<std::string>> LinuxFileObjects::pathsOfFileID(DeviceID device,
+                                                                 std::uint64_t fileID) {
+  if (device != context_.index.device()) return std::vector<std::string>();
+  return context_.index.pathsOfFileID(fileID);
+}
+
 // The kernel's own count of a folder's links tells the folders in it on some file systems and
 // nothing on others, so the entries are counted, as far as the answer can count.
 std::uint16_t LinuxFileObjects::linkCountOfFolder(const URL& url) const {

@@ -16,6 +16,7 @@ class LinuxFileObjects final : public FileObjects {
   /// The link count is 1 for what is no folder.
   Result<FileStatus> status(const URL& url) override;
   Result<std::string> pathOfFileID(DeviceID device, std::uint64_t fileID) override;
+  Result<std::vector<std::string>> pathsOfFileID(DeviceID device, std::uint64_t fileID) override;
 
  private:
   std::uint16_t linkCountOfFolder(const URL& url) const;

@@ -49,6 +49,8 @@ ResourceValues valuesOf(TypeTable& types, std::string_view name, const Sighting&
   values.isWritable = isWritable;
   values.fileID = sighting.fileID;
   values.documentID = sighting.documentID;
+  // The kernel's own count of a folder's links means something else.
+  if (status.kind != FileKind::folder) values.linkCount = status.linkCount;
   if (status.kind == FileKind::regular || status.kind == FileKind::symbolicLink) {
     values.size = status.size;
   }

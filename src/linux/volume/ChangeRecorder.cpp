@@ -56,7 +56,8 @@ Result<void> ChangeRecorder::moved(const ObjectRow& row, const std::optional<Loc
     sightChanges = !*before || !*after || !(sightOf(**before) == sightOf(**after));
   }
   if (auto told = changed(row, to, changedKind); !told) return told;
-  return sightChanges && holdsThings(row) ? contents(row.fileID) : Result<void>();
+  if (!holdsThings(row)) return {};
+  return contents(row.fileID, sightChanges ? Which::everything : Which::hardLinked);
 }
 
 Result<void> ChangeRecorder::handedOn(std::uint32_t documentID, std::uint64_t source,
@@ -110,6 +111,22 @@ Result<void> ChangeRecorder::goneContents(std::uint64_t folder, std::string path
     if (told) told = goneThing(std::move(thing), folders);
     if (!told) return told;
   }
+  for (const auto& [id, folderPath] : folders) {
+    if (auto told = goneLinks(id, folderPath); !told) return told;
+  }
+  return {};
+}
+
+Result<void> ChangeRecorder::goneLinks(std::uint64_t folder, const std::string& path) {
+  auto links = store_.linksIn(folder);
+  if (!links) return fail(links.error());
+  for (const auto& [name, slot] : *links) {
+    if (auto removed = store_.removeLink(folder, name); !removed) return removed;
+    auto row = store_.objectInSlot(slot);
+    if (!row) return fail(row.error());
+    if (!*row) continue;
+    if (auto told = append(**row, {folder, name}, path + "/" + name, false); !told) return told;
+  }
   return {};
 }
 
@@ -130,7 +147,9 @@ Result<void> ChangeRecorder::goneThing(ObjectRow thing,
   return thing.documentID == 0 ? Result<void>() : handedOn(thing.documentID, thing.fileID, 0);
 }
 
-Result<void> ChangeRecorder::contents(std::uint64_t folder) {
+Result<void> ChangeRecorder::contents(std::uint64_t folder, Which which) {
+  const bool isEverything = which == Which::everything;
+  if (!isEverything && !store_.mayHaveLinks()) return {};
   std::vector<std::uint64_t> pending{folder};
   while (!pending.empty()) {
     const std::uint64_t id = pending.back();
@@ -138,8 +157,21 @@ Result<void> ChangeRecorder::contents(std::uint64_t folder) {
     auto children = store_.childrenOf(id);
     if (!children) return fail(children.error());
     for (const ObjectRow& child : *children) {
-      if (auto told = changed(child, *child.location); !told) return told;
       if (holdsThings(child)) pending.push_back(child.fileID);
+      if (!isEverything) {
+        auto names = store_.links(child.slot);
+        if (!names) return fail(names.error());
+        if (names->empty()) continue;
+      }
+      if (auto told = changed(child, *child.location); !told) return told;
+    }
+    auto links = store_.linksIn(id);
+    if (!links) return fail(links.error());
+    for (const auto& [name, slot] : *links) {
+      auto row = store_.objectInSlot(slot);
+      if (!row) return fail(row.error());
+      if (!*row) continue;
+      if (auto told = changed(**row, {id, name}); !told) return told;
     }
   }
   return {};

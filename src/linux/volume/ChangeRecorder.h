@@ -27,7 +27,8 @@ class ChangeRecorder {
   [[nodiscard]] Result<void> changed(const ObjectRow& row, const Location& location,
                                      bool changedKind = false);
   /// The object got another name. What lies in it is told too where that comes into sight, leaves
-  /// it, or crosses into or out of the trash or another root.
+  /// it, or crosses into or out of the trash or another root; and otherwise what is hard-linked in
+  /// it, for which of its names a file is shown under hangs on the paths of all.
   [[nodiscard]] Result<void> moved(const ObjectRow& row, const std::optional<Location>& from,
                                    const Location& to, bool changedKind = false);
   [[nodiscard]] Result<void> handedOn(std::uint32_t documentID, std::uint64_t source,
@@ -35,8 +36,9 @@ class ChangeRecorder {
   /// The object is nowhere: so is its document, if it still has it, and everything in it, which is
   /// detached. The row itself is left to the caller.
   [[nodiscard]] Result<void> gone(const ObjectRow& row, const Location& from);
-  /// Records for everything in a folder, as it lies now.
-  [[nodiscard]] Result<void> contents(std::uint64_t folder);
+  enum class Which { everything, hardLinked };
+  /// Records for what is in a folder, as it lies now.
+  [[nodiscard]] Result<void> contents(std::uint64_t folder, Which which = Which::everything);
 
  private:
   /// What decides whether a path's items are shown, and how.
@@ -52,6 +54,8 @@ class ChangeRecorder {
   [[nodiscard]] Result<void> append(const ObjectRow& row, const Location& location,
                                     std::string path, bool changedKind);
   [[nodiscard]] Result<void> goneContents(std::uint64_t folder, std::string path);
+  /// Further names in a folder that is gone, of objects that lie elsewhere.
+  [[nodiscard]] Result<void> goneLinks(std::uint64_t folder, const std::string& path);
   /// `folders` are those that are gone.
   [[nodiscard]] Result<void> goneThing(ObjectRow thing,
                                        const std::map<std::uint64_t, std::string>& folders);

@@ -248,6 +248,7 @@ Result<std::uint64_t> IdentityStore::nameCount(std::uint64_t folder) {
 
 Result<std::vector<std::pair<std::string, std::uint64_t>>> IdentityStore::linksIn(
     std::uint64_t folder) {
+  if (!mayHaveLinks_) return std::vector<std::pair<std::string, std::uint64_t>>();
   Statement& statement = statements_->linksIn.bind(1, folder);
   StatementScope scope(statement);
   std::vector<std::pair<std::string, std::uint64_t>> result;

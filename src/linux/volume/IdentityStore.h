@@ -79,6 +79,8 @@ class IdentityStore {
   /// How many names the index has in a folder, further links among them.
   [[nodiscard]] Result<std::uint64_t> nameCount(std::uint64_t folder);
 
+  /// False when no object has further names, for sure.
+  [[nodiscard]] bool mayHaveLinks() const { return mayHaveLinks_; }
   /// Further names of hard-linked objects.
   [[nodiscard]] Result<std::optional<std::uint64_t>> linkAt(std::uint64_t folder,
                                                             std::string_view name);

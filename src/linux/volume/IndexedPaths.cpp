@@ -69,6 +69,19 @@ Result<std::optional<std::string>> IndexedPaths::standingPath(const ObjectRow& r
   return path;
 }
 
+Result<std::vector<std::string>> IndexedPaths::standingPaths(const ObjectRow& row) const {
+  auto names = store_.links(row.slot);
+  if (!names) return fail(names.error());
+  if (row.location) names->push_back(*row.location);
+  std::vector<std::string> paths;
+  for (const Location& name : *names) {
+    auto path = standingPath(row, name);
+    if (!path) return fail(path.error());
+    if (*path) paths.push_back(std::move(**path));
+  }
+  return paths;
+}
+
 Result<bool> IndexedPaths::folderStands(const Location& location) const {
   auto folder = store_.objectByFileID(location.folder);
   if (!folder) return fail(folder.error());

@@ -26,6 +26,8 @@ class IndexedPaths {
   /// The path of a place, if the disk has the object of `row` there.
   [[nodiscard]] Result<std::optional<std::string>> standingPath(const ObjectRow& row,
                                                                 const Location& location) const;
+  /// The same for every name that the index has for the object.
+  [[nodiscard]] Result<std::vector<std::string>> standingPaths(const ObjectRow& row) const;
   /// Whether the folder of a place lies where the index has it.
   [[nodiscard]] Result<bool> folderStands(const Location& location) const;
   [[nodiscard]] Result<bool> isAt(const ObjectRow& row, const Location& location) const;

@@ -248,7 +248,7 @@ Result<void> Learner::leave(ObjectRow row) {
   const Location from = *row.location;
   auto promoted = placer_.promoteLink(row);
   if (!promoted) return fail(promoted.error());
-  if (*promoted) return recorder_.moved(row, from, *row.location);
+  if (*promoted) return {};
   row.location.reset();
   if (auto told = recorder_.gone(row, from); !told) return told;
   return store_.put(row);

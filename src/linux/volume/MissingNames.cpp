@@ -1,5 +1,6 @@
 #include "linux/volume/MissingNames.h"
 
+#include <algorithm>
 #include <utility>
 
 namespace mirabel {
@@ -15,7 +16,10 @@ Result<void> MissingNames::add(std::uint64_t folder, const std::string& name) {
 }
 
 Result<void> MissingNames::settle() {
-  for (const Missing& missing : std::exchange(missing_, {})) {
+  auto names = std::exchange(missing_, {});
+  // Further names first: an object must not go on under one that is not shown any more.
+  std::ranges::stable_partition(names, &Missing::isLink);
+  for (const Missing& missing : names) {
     if (auto settled = settle(missing); !settled) return settled;
   }
   return {};

@@ -164,7 +164,12 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
   if (auto detached = store_.put(row); !detached) return fail(detached.error());
   const Moving moving(moving_, row.fileID);
   if (arrival.seen.status.linkCount < 2) {
+    auto names = store_.links(row.slot);
+    if (!names) return fail(names.error());
     if (auto dropped = dropLinks(row.slot); !dropped) return fail(dropped.error());
+    for (const Location& name : *names) {
+      if (auto told = recorder_.changed(row, name); !told) return fail(told.error());
+    }
   }
   auto inherited = inherit(arrival, row.slot, row.documentID);
   if (!inherited) return fail(inherited.error());
@@ -193,6 +198,12 @@ Result<ObjectRow> Placer::moveTo(const Arrival& arrival, ObjectRow row, bool cha
     if (!told) return fail(told.error());
   }
   auto told = recorder_.moved(*written, from, arrival.location, changedKind);
+  // It may have been written to as well, and this look is the one that would tell.
+  auto others = store_.links(written->slot);
+  if (!others) return fail(others.error());
+  for (const Location& name : *others) {
+    if (told) told = recorder_.changed(*written, name, changedKind);
+  }
   if (told && changedKind) told = tellChange(*written, arrival.location, true);
   if (!told) return fail(told.error());
   return written;
@@ -328,6 +339,10 @@ Placer::Inheritance Placer::vacate(const Arrival& arrival, std::uint64_t arrivin
   auto occupant = *link ? store_.objectInSlot(**link) : store_.objectAt(folder, name);
   if (!occupant) return fail(occupant.error());
   if (!*occupant || (*occupant)->slot == arrivingSlot) return std::nullopt;
+  if (*link) {
+    auto told = recorder_.changed(**occupant, arrival.location);
+    if (!told) return fail(told.error());
+  }
   auto elsewhere = hasOtherName(**occupant, arrival.location);
   if (!elsewhere) return fail(elsewhere.error());
   const bool isDocument = (*occupant)->documentID != 0 && isDocumentKind((*occupant)->kind);
@@ -397,6 +412,10 @@ Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occ
     if (auto written = store_.put(occupant); !written) return fail(written.error());
   }
   if (!found) {
+    // Its own name is not the one that was taken: whoever knew it by that one is told.
+    if (from != arrival.location) {
+      if (auto told = recorder_.changed(before, from); !told) return fail(told.error());
+    }
     // The document may go on; the object, and what lay in it, does not.
     if (auto told = recorder_.gone(occupant, from); !told) return fail(told.error());
     return inherited;
@@ -429,6 +448,13 @@ Placer::Inheritance Placer::takeHandover(const Arrival& arrival, std::uint32_t o
 }
 
 Result<std::uint32_t> Placer::take(ObjectRow& holder) {
+  // The document leaves every folder in which the holder has a name, and goes on in one at most.
+  auto names = store_.links(holder.slot);
+  if (!names) return fail(names.error());
+  if (!names->empty()) {
+    auto told = tellChange(holder, names->front(), false);
+    if (!told) return fail(told.error());
+  }
   const std::uint32_t document = std::exchange(holder.documentID, 0);
   if (document == 0) return document;
   takenDocuments_.insert(document);
@@ -464,9 +490,14 @@ Result<bool> Placer::promoteLink(ObjectRow& row) {
     }
     auto still = stands(row, name);
     if (!still) return still;
-    if (!*still) continue;
-    row.location = name;
+    if (!*still) {
+      // The index forgets that it had this name, so it is told now or never.
+      if (auto told = recorder_.changed(row, name); !told) return fail(told.error());
+      continue;
+    }
+    const std::optional<Location> from = std::exchange(row.location, name);
     if (auto written = store_.put(row); !written) return fail(written.error());
+    if (auto told = recorder_.moved(row, from, name); !told) return fail(told.error());
     return true;
   }
   return false;

@@ -83,7 +83,8 @@ class Placer {
 
   /// Puts an object that is not at its place where the finder has found it.
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
-  /// Moves the row to one of the object's other names that still stands; false when none does.
+  /// Moves the row to one of the object's other names that still stands, and tells of that and of
+  /// those that do not; false when none does.
   [[nodiscard]] Result<bool> promoteLink(ObjectRow& row);
 
  private:

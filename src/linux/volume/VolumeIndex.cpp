@@ -74,6 +74,27 @@ class StoredVolumeIndex final : public VolumeIndex {
     return std::move(*path);
   }
 
+  Result<std::vector<std::string>> pathsOfFileID(std::uint64_t fileID) override {
+    const std::scoped_lock lock(mutex_);
+    std::vector<std::string> paths;
+    auto done = state_->transaction([&]() -> Result<void> {
+      auto row = state_->store().objectByFileID(fileID);
+      if (!row) return fail(row.error());
+      if (!*row) return {};
+      auto standing = paths_.standingPaths(**row);
+      if (!standing) return fail(standing.error());
+      paths = std::move(*standing);
+      std::optional<std::string> found;
+      if (paths.empty()) {
+        if (auto looked = find(fileID, found); !looked) return looked;
+      }
+      if (found) paths.push_back(std::move(*found));
+      return {};
+    });
+    if (!done) return fail(done.error());
+    return paths;
+  }
+
   Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);

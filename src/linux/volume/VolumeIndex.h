@@ -75,6 +75,9 @@ class VolumeIndex {
 
   /// Checked against the disk; looks further when the object is not where it was. ENOENT.
   [[nodiscard]] virtual Result<std::string> pathOfFileID(std::uint64_t fileID) = 0;
+  /// Every name of the object that the index has and the disk agrees to; where there is none it
+  /// looks further, for one. Empty when that finds nothing.
+  [[nodiscard]] virtual Result<std::vector<std::string>> pathsOfFileID(std::uint64_t fileID) = 0;
   /// ENOENT when no object holds the document.
   [[nodiscard]] virtual Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) = 0;
 
