@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <functional>
 #include <map>
+#include <optional>
 #include <random>
 #include <set>
 #include <stdio.h>
@@ -114,7 +115,16 @@ TEST_F(ReconcilerTest, AnUnchangedTreeMakesNoEvents) {
 
 // A container that showed a file under a name, or will, learns of it only from a record of a place
 // in it: so each name that came or went, or whose turn may have come, is named.
-TEST_F(ReconcilerTest, NamesOfAHardLinkAreToldThatCameOrWent) {
+class HardLinksTest : public ReconcilerTest,
+                      public testing::WithParamInterface<std::optional<WatcherKind>> {
+ protected:
+  void SetUp() override {
+    if (!GetParam()) return;
+    makeWatcher_ = [] { return makeWatcher(*GetParam()); };
+  }
+};
+
+TEST_P(HardLinksTest, NamesAreToldThatCameOrWent) {
   struct Case {
     const char* name;
     std::function<void()> make;
@@ -130,6 +140,14 @@ TEST_F(ReconcilerTest, NamesOfAHardLinkAreToldThatCameOrWent) {
       {"saved over one name, the other gone",
        [&] { unlink("a/x"), write("new"), fs::rename(path("new"), path("b/y")); },
        {"a/x", "b/y"}},
+      {"saved over the first name, the folder of the other moved below it",
+       [&] {
+         write("new");
+         fs::rename(path("new"), path("a/x"));
+         makeFolder("a/deep");
+         fs::rename(path("b"), path("a/deep/b"));
+       },
+       {"a/x", "a/deep/b/y"}},
       {"under one new name",
        [&] { unlink("a/x"), fs::rename(path("b/y"), path("c/z")); },
        {"a/x", "b/y", "c/z"}},
@@ -152,6 +170,7 @@ TEST_F(ReconcilerTest, NamesOfAHardLinkAreToldThatCameOrWent) {
     file("a/x");
     link("a/x", "b/y");
     const std::uint64_t id = file("b/y");
+    const std::uint32_t document = this->document("b/y");
     const std::uint64_t since = anchor();
     c.make();
     anchor();
@@ -164,8 +183,15 @@ TEST_F(ReconcilerTest, NamesOfAHardLinkAreToldThatCameOrWent) {
     }
     for (const std::string& name : c.told)
       EXPECT_TRUE(told.contains(name)) << c.name << ": " << name;
+    if (index().pathOfFileID(id)) {
+      EXPECT_EQ(index().fileIDOfDocument(document), id) << c.name << ": another document";
+    }
   }
 }
+
+INSTANTIATE_TEST_SUITE_P(Watching, HardLinksTest,
+                         testing::Values(std::nullopt, WatcherKind::folderMarks,
+                                         WatcherKind::inotify));
 
 TEST_F(ReconcilerTest, AWholeTreeThatIsDeletedOrMovedOutIsToldThingByThing) {
   makeFolder("keep");

@@ -340,7 +340,8 @@ Result<std::optional<std::string>> Learner::find(std::uint64_t fileID) {
 
   auto promoted = placer_.promoteLink(**row);
   if (!promoted) return fail(promoted.error());
-  if (*promoted) return verify(**row);
+  if (*promoted) path = verify(**row);
+  if (!path || *path) return path;
   return search(std::move(**row));
 }
 
