@@ -149,7 +149,9 @@ Result<LocalFileEnumerator::Start> LocalFileEnumerator::resume(const FSChangeTok
     case Case::canResume:
       break;
   }
-  if (startsOver(walk.get(), check)) {
+  const auto stands = isWhereItStood(walk, cursor, check);
+  if (!stands) return fail(stands.error());
+  if (!*stands) {
     logInfo("what was listed has been moved, need to re-start gather phase from scratch");
     return fail(Error::syncAnchorExpired());
   }
@@ -157,14 +159,39 @@ Result<LocalFileEnumerator::Start> LocalFileEnumerator::resume(const FSChangeTok
   return Start{cursor.offset, check.lastProcessedFSEventID, std::move(walk)};
 }
 
-/// What the events alone do not tell. A walk that was kept stands where it stood, whatever names
-/// have left, but a folder that was moved may have gone from what it has yet to enter to what it
-/// has passed. An offset leads elsewhere once a name before it has left: a neighbour would be
-/// skipped.
-bool LocalFileEnumerator::startsOver(FSDirectoryWalk* walk,
-                                     const GatherPhaseResumeCheck& check) const {
-  if (walk == nullptr) return check.hasNameLeft;
-  return (scope_.isRecursive() && check.hasFolderMoved) || !walk->resume();
+/// What the events alone do not tell. A walk that was kept, or is taken up at the position that
+/// was, stands where it stood, whatever names have left, but a folder that was moved may have gone
+/// from what it has yet to enter to what it has passed. An offset leads elsewhere once a name
+/// before it has left: a neighbour would be skipped.
+Result<bool> LocalFileEnumerator::isWhereItStood(std::unique_ptr<FSDirectoryWalk>& walk,
+                                                 const FSChangeToken& cursor,
+                                                 const GatherPhaseResumeCheck& check) const {
+  const bool mayHavePassed = scope_.isRecursive() && check.hasFolderMoved;
+  if (walk) return !mayHavePassed && walk->resume();
+  const auto position = keptPosition(cursor.encode());
+  if (!position) return !check.hasNameLeft;
+  if (mayHavePassed) return false;
+  walk = GatherPage(services_.items, scope_).makeWalk();
+  return walk->restore(*position);
+}
+
+std::optional<WalkPosition> LocalFileEnumerator::keptPosition(const Data& cursor) const {
+  const auto bytes = services_.items.platform.positions.find(scope_.container, cursor);
+  return bytes ? WalkPosition::decode(*bytes) : std::nullopt;
+}
+
+/// In this process and, before the host has the cursor, on disk for another. Where a position can't
+/// be kept the listing goes on by its offset.
+void LocalFileEnumerator::keepForNextPage(std::unique_ptr<FSDirectoryWalk> walk,
+                                          const Data& cursor) const {
+  walk->pause();
+  if (const auto position = walk->position()) {
+    const auto kept =
+        services_.items.platform.positions.keep(scope_.container, cursor, position->encode());
+    if (!kept)
+      logDebug([&] { return "can't keep a listing's position; " + kept.error().description(); });
+  }
+  services_.walks.keep(scope_.container, cursor, std::move(walk));
 }
 
 Result<void> LocalFileEnumerator::finishPage(VesselEnumerationObserver& observer, Start start,
@@ -176,8 +203,7 @@ Result<void> LocalFileEnumerator::finishPage(VesselEnumerationObserver& observer
   }
   if (counter - start.offset == GatherPage::limit) {
     const Data cursor = FSChangeToken{0, deviceUUID, start.eventID, counter, 0}.encode();
-    start.walk->pause();
-    services_.walks.keep(scope_.container, cursor, std::move(start.walk));
+    keepForNextPage(std::move(start.walk), cursor);
     observer.finishEnumeratingUpToPage(cursor);
     return {};
   }

@@ -17,8 +17,9 @@
 namespace mirabel {
 
 /// Lists the files of one container page by page and tells what changed in it: an ordinary
-/// folder, the working set, or all directories. It keeps no state between pages; everything that
-/// is needed to go on, in another process too, is in the cursor. Any thread may call it.
+/// folder, the working set, or all directories. It keeps no state between pages: another
+/// enumerator of the container, in another process too, goes on at a cursor at the same cost. Any
+/// thread may call it.
 class LocalFileEnumerator final : public VesselEnumerator,
                                   public std::enable_shared_from_this<LocalFileEnumerator> {
  public:
@@ -69,7 +70,11 @@ class LocalFileEnumerator final : public VesselEnumerator,
   [[nodiscard]] Result<void> gatherPhase(VesselEnumerationObserver& observer,
                                          const std::optional<FSChangeToken>& cursor);
   [[nodiscard]] Result<Start> resume(const FSChangeToken& cursor);
-  [[nodiscard]] bool startsOver(FSDirectoryWalk* walk, const GatherPhaseResumeCheck& check) const;
+  [[nodiscard]] Result<bool> isWhereItStood(std::unique_ptr<FSDirectoryWalk>& walk,
+                                            const FSChangeToken& cursor,
+                                            const GatherPhaseResumeCheck& check) const;
+  [[nodiscard]] std::optional<WalkPosition> keptPosition(const Data& cursor) const;
+  void keepForNextPage(std::unique_ptr<FSDirectoryWalk> walk, const Data& cursor) const;
   [[nodiscard]] Result<void> finishPage(VesselEnumerationObserver& observer, Start start,
                                         const UUID& deviceUUID, std::uint64_t counter);
   [[nodiscard]] bool hasFolderMovedSince(std::uint64_t eventID) const;

@@ -16,6 +16,10 @@ void logFailure(std::string_view step, const URL& directory, const Error& error)
   });
 }
 
+bool isComponent(std::string_view name) {
+  return !name.empty() && name != "." && name != ".." && !name.contains('/');
+}
+
 }  // namespace
 
 FSDirectoryWalk::FSDirectoryWalk(Plan plan, DirectoryStreams& directories,
@@ -64,6 +68,75 @@ bool FSDirectoryWalk::resume() {
   if (!descent_) return true;
   descent_->url = levels_.back().url.appendingPathComponent(descent_->url.lastPathComponent());
   return true;
+}
+
+std::optional<WalkPosition> FSDirectoryWalk::position() {
+  WalkPosition at{planDigest(), nextRoot_, {}, {}};
+  for (const Level& level : levels_) {
+    const Number* fileID = level.fileID ? std::get_if<Number>(&*level.fileID) : nullptr;
+    const auto known = fileID == nullptr ? std::nullopt : fileID->asUnsigned();
+    const auto position = level.stream->position();
+    if (!known || !position) return {};
+    const std::string_view name =
+        at.folders.empty() ? level.url.path() : level.url.lastPathComponent();
+    at.folders.push_back({std::string(name), *known, *position});
+  }
+  if (descent_) at.descent = descent_->url.lastPathComponent();
+  return at;
+}
+
+Result<bool> FSDirectoryWalk::restore(const WalkPosition& position) {
+  if (position.plan != planDigest() || position.nextRoot > plan_.urls.size()) return false;
+  if (position.nextRoot == 0 && !position.folders.empty()) return false;
+  if (position.descent && (position.folders.empty() || !isComponent(*position.descent))) {
+    return false;
+  }
+  nextRoot_ = position.nextRoot;
+  for (const WalkPosition::Folder& folder : position.folders) {
+    const bool isRoot = levels_.empty();
+    if (!isRoot && !isComponent(folder.name)) return false;
+    URL url =
+        isRoot ? plan_.urls[nextRoot_ - 1] : levels_.back().url.appendingPathComponent(folder.name);
+    if (isRoot && url.path() != folder.name) return false;
+    auto restored = restoreLevel(folder, std::move(url));
+    if (!restored || !*restored) return restored;
+  }
+  if (!position.descent) return true;
+  const Level& level = levels_.back();
+  descent_ = Descent{level.url.appendingPathComponent(*position.descent), level.options};
+  return true;
+}
+
+/// False when another object lies there, or none that can be reached.
+Result<bool> FSDirectoryWalk::restoreLevel(const WalkPosition::Folder& folder, URL url) {
+  auto fileID = reader_.value(ResourceKey::fileIdentifier, url);
+  if (!fileID && plan_.leavesOut && !plan_.leavesOut(url, fileID.error())) {
+    return fail(fileID.error());
+  }
+  if (!fileID || *fileID != ResourceValue(Number::of(folder.fileID))) return false;
+  auto stream = directories_.openAt(url, folder.position);
+  if (!stream) {
+    logFailure("open", url, stream.error());
+    if (plan_.leavesOut && plan_.leavesOut(url, stream.error())) return false;
+    return fail(stream.error());
+  }
+  const EnumeratorOptions options = optionsFor(url);
+  levels_.push_back({std::move(url), *std::move(stream), options, *std::move(fileID)});
+  return true;
+}
+
+/// FNV-1a over the paths, each with a byte behind it that no path has.
+std::uint64_t FSDirectoryWalk::planDigest() const {
+  std::uint64_t digest = 0xCBF29CE484222325;
+  const auto add = [&](char byte) {
+    digest = (digest ^ static_cast<unsigned char>(byte)) * 0x100000001B3;
+  };
+  for (const URL& url : plan_.urls) {
+    for (const char byte : url.path())
+      add(byte);
+    add('\0');
+  }
+  return digest;
 }
 
 /// The next entry that counts; nothing at the end of the walk.

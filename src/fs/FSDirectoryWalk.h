@@ -10,6 +10,7 @@
 #include "foundation/ResourceValues.h"
 #include "foundation/URL.h"
 #include "fs/EnumeratorOptions.h"
+#include "fs/WalkPosition.h"
 #include "platform/DirectoryStreams.h"
 
 namespace mirabel {
@@ -53,6 +54,14 @@ class FSDirectoryWalk {
   /// looked for in the wrong place.
   [[nodiscard]] bool resume();
 
+  /// Where a paused walk stands; nothing where a directory can't tell, or was not there to be
+  /// noted.
+  [[nodiscard]] std::optional<WalkPosition> position();
+  /// Takes up, with a walk that was not begun yet, where one of the same plan stood. False when a
+  /// directory no longer lies where it lay then; the walk is of no more use. POSIX errors of a
+  /// directory that is there and can't be opened.
+  [[nodiscard]] Result<bool> restore(const WalkPosition& position);
+
   [[nodiscard]] std::size_t openDirectories() const { return levels_.size(); }
 
  private:
@@ -74,6 +83,8 @@ class FSDirectoryWalk {
   [[nodiscard]] EnumeratorOptions optionsFor(const URL& directory) const;
   [[nodiscard]] Result<void> descend(const Descent& descent);
   [[nodiscard]] std::optional<ResourceValue> fileIDAt(const URL& directory) const;
+  [[nodiscard]] std::uint64_t planDigest() const;
+  [[nodiscard]] Result<bool> restoreLevel(const WalkPosition::Folder& folder, URL url);
 
   Plan plan_;
   DirectoryStreams& directories_;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <string_view>
@@ -23,6 +24,10 @@ class DirectoryStream {
   virtual ~DirectoryStream() = default;
   /// Nothing at the end; a read error ends the stream too.
   [[nodiscard]] virtual std::optional<DirectoryEntry> next() = 0;
+  /// Where the next entry is to be found by another stream of the same folder, in another process
+  /// too: what has not changed in the meantime comes from one of the two, once. Nothing where the
+  /// file system promises nothing of the kind.
+  [[nodiscard]] virtual std::optional<std::uint64_t> position() = 0;
   /// POSIX errors. The destructor closes silently when this was not called.
   [[nodiscard]] virtual Result<void> close() = 0;
 };
@@ -34,6 +39,9 @@ class DirectoryStreams {
   /// A symbolic link below a monitored folder is not followed (POSIX error ELOOP or ENOTDIR), and
   /// neither is the mount point of another file system entered (EXDEV).
   [[nodiscard]] virtual Result<std::unique_ptr<DirectoryStream>> open(const URL& folder) = 0;
+  /// The same, for a page of the names that come from such a position on.
+  [[nodiscard]] virtual Result<std::unique_ptr<DirectoryStream>> openAt(const URL& folder,
+                                                                        std::uint64_t position) = 0;
 };
 
 }  // namespace mirabel

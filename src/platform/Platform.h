@@ -9,6 +9,7 @@
 #include "platform/FileObjects.h"
 #include "platform/FileOperations.h"
 #include "platform/GenerationalStore.h"
+#include "platform/ListingPositions.h"
 #include "platform/VesselManager.h"
 #include "platform/VolumeHistory.h"
 
@@ -28,6 +29,7 @@ struct Platform {
   VesselManager& manager;
   VolumeHistory& history;
   Clock& clock;
+  ListingPositions& positions;
 };
 
 }  // namespace mirabel

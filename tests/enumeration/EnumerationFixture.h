@@ -136,7 +136,7 @@ class EnumerationTest : public ::testing::Test {
     EXPECT_EQ(observer.page.batches, observer.page.error ? observer.page.batches : 1);
     return observer.page;
   }
-  /// As another process would: no walk is kept.
+  /// As another process has it: no walk stands open.
   void forgetWalks() {
     for (std::size_t i = 0; i < OpenWalks::mostWalks; ++i) {
       walks.keep(
@@ -144,6 +144,12 @@ class EnumerationTest : public ::testing::Test {
           std::make_unique<FSDirectoryWalk>(FSDirectoryWalk::Plan{}, fake.platform().directories,
                                             fake.platform().resources));
     }
+  }
+
+  /// As another process has it where no position was kept either.
+  void forgetListings() {
+    forgetWalks();
+    fake.positions.kept.clear();
   }
 
   FakePlatform fake;

@@ -39,6 +39,23 @@ class FSDirectoryWalkTest : public ::testing::Test {
     return seen;
   }
 
+  /// The whole walk, each step made by a walk of its own.
+  std::vector<std::string> takenUpAnewAfterEach(std::size_t step) {
+    std::vector<std::string> seen;
+    std::optional<WalkPosition> position;
+    for (;;) {
+      FSDirectoryWalk part = walk();
+      EXPECT_TRUE(!position || part.restore(*position).value());
+      const auto names = take(part, step);
+      seen.insert(seen.end(), names.begin(), names.end());
+      if (names.size() < step) return seen;
+      part.pause();
+      position = part.position();
+      EXPECT_TRUE(position);
+      if (!position) return seen;
+    }
+  }
+
   FakePlatform fake;
 };
 
@@ -59,6 +76,7 @@ TEST_F(FSDirectoryWalkTest, StepsOfAnySizeMakeUpTheWholeWalk) {
     }
     EXPECT_EQ(seen, all) << step;
     EXPECT_EQ(parts.openDirectories(), 0U);
+    EXPECT_EQ(takenUpAnewAfterEach(step), all) << step;
   }
 }
 

@@ -344,6 +344,47 @@ TEST_P(PlatformConformance, DirectoryStreamGivesEachNameOnceWithItsKind) {
   EXPECT_TRUE(stream->close());
 }
 
+TEST_P(PlatformConformance, PositionLeadsToWhatAStreamHasNotGiven) {
+  volume->makeFolder("folder");
+  std::vector<std::string> files = {".", ".."};
+  for (int i = 0; i < 300; ++i)
+    files.push_back(std::to_string(i) + std::string(40, 'n'));
+  for (std::size_t i = 2; i < files.size(); ++i)
+    volume->writeFile("folder/" + files[i], "");
+  for (const std::size_t taken : {0U, 1U, 2U, 150U, 301U, 302U}) {
+    std::vector<std::string> seen;
+    auto first = platform().directories.open(at("folder")).value();
+    for (std::size_t i = 0; i < taken; ++i)
+      seen.emplace_back(first->next().value().name);
+    const auto position = first->position();
+    if (!position) GTEST_SKIP() << "this file system keeps no positions";
+    // Others come, go and change their names in between.
+    for (int i = 0; i < 100; ++i)
+      volume->writeFile("folder/other" + std::to_string(i), "");
+    for (int i = 0; i < 100; i += 2)
+      volume->rename("folder/other" + std::to_string(i), "folder/moved" + std::to_string(i));
+    for (int i = 1; i < 100; i += 2)
+      volume->remove("folder/other" + std::to_string(i));
+    const auto second = platform().directories.openAt(at("folder"), *position).value();
+    while (const auto entry = second->next())
+      if (!entry->name.starts_with("moved")) seen.emplace_back(entry->name);
+    EXPECT_THAT(seen, ::testing::UnorderedElementsAreArray(files)) << taken;
+    for (int i = 0; i < 100; i += 2)
+      volume->remove("folder/moved" + std::to_string(i));
+  }
+}
+
+TEST_P(PlatformConformance, KeptPositionsOfListingsAreFound) {
+  ListingPositions& positions = platform().positions;
+  EXPECT_FALSE(positions.find("a", {1}));
+  ASSERT_TRUE(positions.keep("a", {1}, {7}));
+  ASSERT_TRUE(positions.keep("a", {1}, {8, 0, 255}));
+  ASSERT_TRUE(positions.keep("b", {1}, {}));
+  EXPECT_EQ(positions.find("a", {1}), (Data{8, 0, 255}));
+  EXPECT_EQ(positions.find("b", {1}), Data{});
+  EXPECT_FALSE(positions.find("a", {2}));
+}
+
 TEST_P(PlatformConformance, DirectoryStreamsOpenFoldersOnly) {
   volume->writeFile("file", "");
   volume->makeFolder("folder");

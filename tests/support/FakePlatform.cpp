@@ -227,13 +227,27 @@ class Documents final : public GenerationalStore {
   Core& core_;
 };
 
-/// The names as they were when the folder was opened.
+/// The names as they were when the folder was opened. A position is the place of the entry behind
+/// it, or one more than the last.
 class OpenDirectory final : public DirectoryStream {
  public:
-  OpenDirectory(Core& core, const FakeNode& folder) : core_(core) {
+  OpenDirectory(Core& core, const FakeNode& folder) : core_(core), places_{0, 1} {
     names_ = {{".", FileKind::folder}, {"..", FileKind::folder}};
-    for (const auto& [name, node] : folder.entries)
+    for (const auto& [name, node] : folder.entries) {
       names_.emplace_back(name, node->kind);
+      places_.push_back(node->place);
+    }
+  }
+
+  void seek(std::uint64_t position) {
+    // As on a disk: where that entry has gone, its place is between the others.
+    while (next_ < places_.size() && places_[next_] < position)
+      ++next_;
+  }
+
+  std::optional<std::uint64_t> position() override {
+    if (next_ < places_.size()) return places_[next_];
+    return places_.back() + 1;
   }
 
   std::optional<DirectoryEntry> next() override {
@@ -251,6 +265,7 @@ class OpenDirectory final : public DirectoryStream {
  private:
   Core& core_;
   std::vector<std::pair<std::string, FileKind>> names_;
+  std::vector<std::uint64_t> places_;
   std::size_t next_ = 0;
 };
 
@@ -259,11 +274,18 @@ class Directories final : public DirectoryStreams {
   explicit Directories(Core& core) : core_(core) {}
 
   Result<std::unique_ptr<DirectoryStream>> open(const URL& folder) override {
+    return openAt(folder, 0);
+  }
+
+  Result<std::unique_ptr<DirectoryStream>> openAt(const URL& folder,
+                                                  std::uint64_t position) override {
     const std::lock_guard lock(core_.mutex);
     const auto node = core_.look(Op::openDirectory, folder);
     if (!node) return fail(node.error());
     if ((*node)->kind != FileKind::folder) return fail(Error::posix(ENOTDIR));
-    return std::make_unique<OpenDirectory>(core_, **node);
+    auto stream = std::make_unique<OpenDirectory>(core_, **node);
+    stream->seek(position);
+    return stream;
   }
 
  private:
@@ -361,6 +383,18 @@ std::optional<BundleProxy> FakeApplications::proxyAt(const URL& url) {
   return {};
 }
 
+Result<void> FakePositions::keep(std::string_view container, const Data& cursor,
+                                 const Data& position) {
+  if (auto error = faults_.hit(Op::keepPosition)) return fail(*std::move(error));
+  kept.insert_or_assign({std::string(container), cursor}, position);
+  return {};
+}
+
+std::optional<Data> FakePositions::find(std::string_view container, const Data& cursor) {
+  const auto found = kept.find({std::string(container), cursor});
+  return found == kept.end() ? std::nullopt : std::optional(found->second);
+}
+
 struct FakePlatform::Interfaces {
   Interfaces(FakePlatform& owner, URL documentStorage)
       : core{owner.volume, owner.faults, {}},
@@ -385,7 +419,7 @@ FakePlatform::FakePlatform(std::string_view documentStorage)
           Platform{interfaces_->resources, interfaces_->attributes, interfaces_->objects,
                    interfaces_->documents, interfaces_->directories, interfaces_->sizes,
                    interfaces_->operations, applications, interfaces_->manager,
-                   interfaces_->history, clock})) {
+                   interfaces_->history, clock, positions})) {
   volume.makeFolder(documentStorage);
 }
 

@@ -7,6 +7,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "platform/DiagnosticReporter.h"
@@ -53,6 +54,20 @@ class FakeDiagnostics final : public DiagnosticReporter {
   std::vector<std::string> reports;
 };
 
+/// Keeps all of them.
+class FakePositions final : public ListingPositions {
+ public:
+  explicit FakePositions(FaultScript& faults) : faults_(faults) {}
+
+  Result<void> keep(std::string_view container, const Data& cursor, const Data& position) override;
+  std::optional<Data> find(std::string_view container, const Data& cursor) override;
+
+  std::map<std::pair<std::string, Data>, Data> kept;
+
+ private:
+  FaultScript& faults_;
+};
+
 /// Every interface of the platform over a volume in memory: what the Linux layer promises, kept
 /// without a disk, with failures as scripted. The interfaces may be called from any thread; the
 /// volume is set up while nothing else runs.
@@ -77,6 +92,7 @@ class FakePlatform {
   FakeClock clock;
   FakeSignals signals;
   FakeDiagnostics diagnostics;
+  FakePositions positions{faults};
   UUID historyUUID = UUID::fromString("11111111-2222-3333-4444-555555555555").value();
 
  private:

@@ -184,6 +184,7 @@ FakeNode& FakeVolume::add(std::string_view path, FileKind kind) {
 
 void FakeVolume::enter(std::string_view path, std::shared_ptr<FakeNode> node) {
   ++node->names;
+  node->place = nextPlace_++;
   at(split(path).parent).entries.emplace_back(split(path).name, std::move(node));
 }
 

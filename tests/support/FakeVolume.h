@@ -21,6 +21,7 @@ struct FakeNode {
   std::uint64_t fileID = 0;
   std::uint32_t documentID = 0;
   std::uint32_t names = 0;  ///< hard links; kept by the volume
+  std::uint64_t place = 0;  ///< of its newest name among the entries of the folder; only grows
   Data contents;
   Date created{1'700'000'000, 0};
   Date modified{1'700'000'100, 500'000'000};
@@ -71,6 +72,7 @@ class FakeVolume {
 
   std::shared_ptr<FakeNode> root_;
   std::uint64_t nextFileID_ = 100;
+  std::uint64_t nextPlace_ = 2;
   std::uint32_t nextDocumentID_ = 1;
 };
 

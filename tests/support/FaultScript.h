@@ -34,6 +34,7 @@ enum class Op {
   closeDirectory,
   directorySize,
   createDirectory,
+  keepPosition,
   historyUUID,
 };
 

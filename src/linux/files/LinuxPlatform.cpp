@@ -13,6 +13,7 @@
 #include "linux/files/LinuxVolumeHistory.h"
 #include "linux/files/PackageTypes.h"
 #include "linux/files/SystemClock.h"
+#include "linux/volume/StoredListingPositions.h"
 
 namespace mirabel {
 
@@ -39,8 +40,9 @@ struct LinuxPlatform::Parts {
   LinuxVolumeHistory history{*index};
   LinuxEventStreams events{*index};
   SystemClock clock;
+  StoredListingPositions positions{index->stateFolder()};
   Platform platform{resources,  attributes,   objects, documents, directories, sizes,
-                    operations, applications, manager, history,   clock};
+                    operations, applications, manager, history,   clock,       positions};
 };
 
 Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {

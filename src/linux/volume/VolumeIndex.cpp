@@ -149,6 +149,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
   UUID historyUUID() const override { return state_->history(); }
+  const StateFolder& stateFolder() const override { return state_->folder(); }
 
   std::uint32_t device() const override {
     const auto folded = static_cast<std::uint32_t>(device_ ^ (device_ >> 32));

@@ -17,6 +17,7 @@
 #include "linux/volume/EventJournal.h"
 #include "linux/volume/FollowStatus.h"
 #include "linux/volume/JournalBell.h"
+#include "linux/volume/StateFolder.h"
 #include "linux/watch/FolderWatcher.h"
 
 namespace mirabel {
@@ -104,6 +105,8 @@ class VolumeIndex {
   [[nodiscard]] virtual Status status() = 0;
 
   [[nodiscard]] virtual UUID historyUUID() const = 0;
+  /// Where the state of the volume is kept, for as long as the index is open.
+  [[nodiscard]] virtual const StateFolder& stateFolder() const = 0;
   /// The volume's number as the system sees it; never 0.
   [[nodiscard]] virtual std::uint32_t device() const = 0;
 };

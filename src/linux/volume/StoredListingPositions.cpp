@@ -1,0 +1,169 @@
+#include "linux/volume/StoredListingPositions.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <utility>
+
+namespace mirabel {
+namespace {
+
+constexpr const char* fileName = "listings";
+constexpr std::string_view magic = "MRBLIST1";
+constexpr std::size_t digestOffset = 8;
+constexpr std::size_t numberOffset = 16;
+constexpr std::size_t lengthsOffset = 24;
+constexpr std::size_t headerSize = 36;
+
+template <class Integer>
+void put(Data& bytes, std::size_t offset, Integer value) {
+  for (std::size_t i = 0; i < sizeof(Integer); ++i)
+    bytes[offset + i] = static_cast<std::uint8_t>(value >> (8 * i));
+}
+
+template <class Integer>
+Integer get(const Data& bytes, std::size_t offset) {
+  Integer value = 0;
+  for (std::size_t i = 0; i < sizeof(Integer); ++i)
+    value = static_cast<Integer>(value | (Integer{bytes[offset + i]} << (8 * i)));
+  return value;
+}
+
+// FNV-1a: finds out accidents, not attackers.
+std::uint64_t digestOf(const Data& bytes, std::size_t size) {
+  std::uint64_t digest = 0xCBF29CE484222325;
+  for (std::size_t i = numberOffset; i < size; ++i)
+    digest = (digest ^ bytes[i]) * 0x100000001B3;
+  return digest;
+}
+
+Result<void> writeAt(int file, const Data& bytes, std::size_t offset) {
+  for (std::size_t done = 0; done < bytes.size();) {
+    const ssize_t count =
+        ::pwrite(file, bytes.data() + done, bytes.size() - done, static_cast<off_t>(offset + done));
+    if (count < 0 && errno == EINTR) continue;
+    if (count <= 0) return fail(Error::posix(count < 0 ? errno : EIO));
+    done += static_cast<std::size_t>(count);
+  }
+  return {};
+}
+
+}  // namespace
+
+Result<void> StoredListingPositions::keep(std::string_view container, const Data& cursor,
+                                          const Data& position) {
+  const std::scoped_lock lock(mutex_);
+  if (container.size() + cursor.size() + position.size() > slotSize - headerSize) {
+    return fail(Error::posix(EMSGSIZE));
+  }
+  load();
+  if (!file_) {
+    if (auto made = make(); !made) return made;
+  }
+  Slot& slot = slotFor(container, cursor);
+  // Whatever becomes of the write, what was in the slot is gone.
+  slot = {};
+  Slot kept{++lastNumber_, std::string(container), cursor, position};
+  const auto at = static_cast<std::size_t>(&slot - slots_.data()) * slotSize;
+  if (auto written = writeAt(file_.get(), bytesOf(kept), at); !written) return written;
+  if (::fdatasync(file_.get()) != 0) return fail(Error::posix(errno, folder_.file(fileName)));
+  slot = std::move(kept);
+  return {};
+}
+
+std::optional<Data> StoredListingPositions::find(std::string_view container, const Data& cursor) {
+  const std::scoped_lock lock(mutex_);
+  load();
+  const auto found = std::ranges::find_if(slots_, [&](const Slot& slot) {
+    return slot.number != 0 && slot.container == container && slot.cursor == cursor;
+  });
+  if (found == slots_.end()) return std::nullopt;
+  return found->position;
+}
+
+/// A file that is not there, or not of this size, holds nothing and is made anew when it is needed.
+void StoredListingPositions::load() {
+  if (std::exchange(isLoaded_, true)) return;
+  UniqueFd file(::openat(folder_.descriptor(), fileName, O_RDWR | O_NOFOLLOW | O_CLOEXEC));
+  struct stat status {};
+  if (!file || ::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode) ||
+      status.st_size != static_cast<off_t>(slotCount * slotSize)) {
+    return;
+  }
+  Data bytes(slotSize);
+  for (std::size_t i = 0; i < slotCount; ++i) {
+    const ssize_t count =
+        ::pread(file.get(), bytes.data(), slotSize, static_cast<off_t>(i * slotSize));
+    if (count != static_cast<ssize_t>(slotSize)) continue;
+    slots_[i] = slotFrom(bytes);
+    lastNumber_ = std::max(lastNumber_, slots_[i].number);
+  }
+  file_ = std::move(file);
+}
+
+/// Filled with zeros, so that writing a slot changes no more than its bytes.
+Result<void> StoredListingPositions::make() {
+  const auto failure = [&] { return fail(Error::posix(errno, folder_.file(fileName))); };
+  const int directory = folder_.descriptor();
+  if (::unlinkat(directory, fileName, 0) != 0 && errno != ENOENT) return failure();
+  UniqueFd file(
+      ::openat(directory, fileName, O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
+  if (!file) return failure();
+  if (auto written = writeAt(file.get(), Data(slotCount * slotSize), 0); !written) return written;
+  if (::fsync(file.get()) != 0 || ::fsync(directory) != 0) return failure();
+  file_ = std::move(file);
+  return {};
+}
+
+/// The one of the same cursor, else a free one, else the oldest: of this container where that has
+/// enough, or of all.
+StoredListingPositions::Slot& StoredListingPositions::slotFor(std::string_view container,
+                                                              const Data& cursor) {
+  const auto isOfIt = [&](const Slot& slot) {
+    return slot.number != 0 && slot.container == container;
+  };
+  for (Slot& slot : slots_)
+    if (isOfIt(slot) && slot.cursor == cursor) return slot;
+  const bool hasEnough =
+      std::ranges::count_if(slots_, isOfIt) >= static_cast<std::ptrdiff_t>(mostOfOne);
+  Slot* oldest = nullptr;
+  for (Slot& slot : slots_) {
+    if (hasEnough && !isOfIt(slot)) continue;
+    if (oldest == nullptr || slot.number < oldest->number) oldest = &slot;
+  }
+  return *oldest;
+}
+
+Data StoredListingPositions::bytesOf(const Slot& slot) {
+  Data bytes(headerSize);
+  std::ranges::copy(magic, bytes.begin());
+  put(bytes, numberOffset, slot.number);
+  put(bytes, lengthsOffset, static_cast<std::uint32_t>(slot.container.size()));
+  put(bytes, lengthsOffset + 4, static_cast<std::uint32_t>(slot.cursor.size()));
+  put(bytes, lengthsOffset + 8, static_cast<std::uint32_t>(slot.position.size()));
+  bytes.insert(bytes.end(), slot.container.begin(), slot.container.end());
+  bytes.insert(bytes.end(), slot.cursor.begin(), slot.cursor.end());
+  bytes.insert(bytes.end(), slot.position.begin(), slot.position.end());
+  put(bytes, digestOffset, digestOf(bytes, bytes.size()));
+  return bytes;
+}
+
+/// A free slot where the bytes are none that were written whole.
+StoredListingPositions::Slot StoredListingPositions::slotFrom(const Data& bytes) {
+  if (!stringView(bytes).starts_with(magic)) return {};
+  const std::size_t container = get<std::uint32_t>(bytes, lengthsOffset);
+  const std::size_t cursor = get<std::uint32_t>(bytes, lengthsOffset + 4);
+  const std::size_t position = get<std::uint32_t>(bytes, lengthsOffset + 8);
+  const std::size_t size = headerSize + container + cursor + position;
+  if (size > bytes.size() || get<std::uint64_t>(bytes, digestOffset) != digestOf(bytes, size)) {
+    return {};
+  }
+  const std::string_view text = stringView(bytes);
+  return {get<std::uint64_t>(bytes, numberOffset), std::string(text.substr(headerSize, container)),
+          dataFromString(text.substr(headerSize + container, cursor)),
+          dataFromString(text.substr(headerSize + container + cursor, position))};
+}
+
+}  // namespace mirabel

@@ -1,0 +1,24 @@
+#include <gtest/gtest.h>
+
+#include "fs/WalkPosition.h"
+
+namespace mirabel::testing {
+namespace {
+
+TEST(WalkPosition, IsTheSameAfterItWasWrittenAndRead) {
+  const std::uint64_t most = ~std::uint64_t{0};
+  for (const WalkPosition& position :
+       {WalkPosition{}, WalkPosition{most, most, {{"/home/me", most, most}}, "a"},
+        WalkPosition{7, 1, {{"/", 1, 0}, {"\xff\n", 2, 3}, {"h\xc3\xb6", 4, 5}}, "\xfe"}}) {
+    EXPECT_EQ(WalkPosition::decode(position.encode()), position);
+  }
+}
+
+TEST(WalkPosition, CutShortIsNone) {
+  const Data whole = WalkPosition{7, 1, {{"/home", 1, 9}, {"a", 2, 3}}, "b"}.encode();
+  for (std::size_t size = 0; size < whole.size(); ++size)
+    EXPECT_FALSE(WalkPosition::decode(std::span(whole).first(size))) << size;
+}
+
+}  // namespace
+}  // namespace mirabel::testing
