@@ -58,5 +58,6 @@ void print(const Comparison& comparison);
 void require(bool condition, const char* what);
 
 void runListingBenchmarks(const Scale& scale);
+void runPagesBenchmarks(const Scale& scale);
 
 }  // namespace mirabel::bench

@@ -17,5 +17,6 @@ int main(int count, char** arguments) {
     }
   }
   mirabel::bench::runListingBenchmarks(scale);
+  mirabel::bench::runPagesBenchmarks(scale);
   return 0;
 }
