@@ -1,6 +1,7 @@
 #include "BenchHome.h"
 
 #include <algorithm>
+#include <array>
 #include <cstdio>
 #include <cstdlib>
 #include <fcntl.h>
@@ -11,10 +12,37 @@ namespace mirabel::bench {
 
 namespace fs = std::filesystem;
 
-BenchHome::BenchHome() {
+namespace {
+
+constexpr const char* memoryFolder = "/dev/shm";
+
+fs::path parentFolder(BenchHome::Where where) {
   const char* given = std::getenv("MIRABEL_BENCH_DIR");
-  std::string pattern =
-      (given != nullptr ? fs::path(given) : fs::temp_directory_path()) / "mirabel-bench-XXXXXX";
+  if (given != nullptr) return given;
+  const bool isInMemory = where == BenchHome::Where::memory && fs::is_directory(memoryFolder);
+  return isInMemory ? memoryFolder : fs::temp_directory_path();
+}
+
+std::string text(double value, Unit unit) {
+  std::array<char, 32> buffer;
+  switch (unit) {
+    case Unit::seconds:
+      std::snprintf(buffer.data(), buffer.size(), "%.2f ms", 1000 * value);
+      break;
+    case Unit::kibibytes:
+      std::snprintf(buffer.data(), buffer.size(), "%.0f KiB", value);
+      break;
+    case Unit::perSecond:
+      std::snprintf(buffer.data(), buffer.size(), "%.0f /s", value);
+      break;
+  }
+  return buffer.data();
+}
+
+}  // namespace
+
+BenchHome::BenchHome(Where where) {
+  std::string pattern = parentFolder(where) / "mirabel-bench-XXXXXX";
   require(::mkdtemp(pattern.data()) != nullptr, "a temporary home can be made");
   path_ = fs::canonical(pattern);
   fs::create_directory(documents());
@@ -53,11 +81,19 @@ double median(std::vector<double> values) {
 }
 
 std::size_t residentKiB() {
-  std::ifstream status("/proc/self/statm");
+  return residentKiB(::getpid());
+}
+
+std::size_t residentKiB(pid_t process) {
+  std::ifstream status("/proc/" + std::to_string(process) + "/statm");
   std::size_t total = 0;
   std::size_t resident = 0;
   status >> total >> resident;
   return resident * static_cast<std::size_t>(::sysconf(_SC_PAGESIZE)) / 1024;
+}
+
+void printHeading(const std::string& text) {
+  std::printf("%s\n%-54s %14s %14s   %s\n", text.c_str(), "", "ours", "reference", "ratio");
 }
 
 void print(const Comparison& comparison) {
@@ -66,16 +102,17 @@ void print(const Comparison& comparison) {
     ratios.push_back(comparison.ours[i] / comparison.reference[i]);
   }
   const double ratio = median(ratios);
-  std::printf("%-52s %9.1f ms %9.1f ms   %5.2f  (at most %.1f)%s\n", comparison.name.c_str(),
-              1000 * median(comparison.ours), 1000 * median(comparison.reference), ratio,
-              comparison.target, ratio <= comparison.target ? "" : "  MISSED");
+  const bool isAtMost = comparison.bound == Bound::atMost;
+  const bool holds = isAtMost ? ratio <= comparison.target : ratio >= comparison.target;
+  std::printf("%-54s %14s %14s   %5.2f  (%s %.2f)%s\n", comparison.name.c_str(),
+              text(median(comparison.ours), comparison.unit).c_str(),
+              text(median(comparison.reference), comparison.unit).c_str(), ratio,
+              isAtMost ? "at most" : "at least", comparison.target, holds ? "" : "  MISSED");
   std::fflush(stdout);
 }
 
 void require(bool condition, const char* what) {
-  if (condition) return;
-  std::fprintf(stderr, "benchmark: it does not hold that %s\n", what);
-  std::exit(1);
+  if (!condition) throw Failure{what};
 }
 
 }  // namespace mirabel::bench

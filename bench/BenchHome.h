@@ -1,18 +1,23 @@
 #pragma once
 
+#include <algorithm>
 #include <chrono>
 #include <filesystem>
 #include <functional>
+#include <initializer_list>
 #include <string>
 #include <string_view>
+#include <sys/types.h>
 #include <vector>
 
 namespace mirabel::bench {
 
-/// A temporary home below $MIRABEL_BENCH_DIR, or else below the temporary folder.
+/// A temporary home below $MIRABEL_BENCH_DIR. Where that is not set: below the temporary folder, or
+/// in memory, for what makes and removes so much that the disk would be all that is measured.
 class BenchHome {
  public:
-  BenchHome();
+  enum class Where { temporaryFolder, memory };
+  explicit BenchHome(Where where = Where::temporaryFolder);
   ~BenchHome();
   BenchHome(const BenchHome&) = delete;
   BenchHome& operator=(const BenchHome&) = delete;
@@ -36,28 +41,44 @@ struct Scale {
   [[nodiscard]] bool includes(std::string_view name) const {
     return name.find(only) != std::string_view::npos;
   }
+  /// Whether anything of a table is: what it is measured on need not be made otherwise.
+  [[nodiscard]] bool includesAny(std::initializer_list<std::string_view> names) const {
+    return std::ranges::any_of(names, [this](std::string_view name) { return includes(name); });
+  }
 };
 
-/// One comparison: seconds of ours and of the plain loop, in turn, so that a machine whose speed
-/// drifts is the same for both.
+enum class Unit { seconds, kibibytes, perSecond };
+enum class Bound { atMost, atLeast };
+
+/// One comparison: what was measured of ours and of the reference, in turn, so that a machine whose
+/// speed drifts is the same for both.
 struct Comparison {
   std::string name;
   std::vector<double> ours;
   std::vector<double> reference;
-  double target;  ///< greatest ratio of the medians that was promised
+  double target;  ///< of the median of the ratios: what was promised
+  Unit unit = Unit::seconds;
+  Bound bound = Bound::atMost;
 };
 
 [[nodiscard]] double secondsOf(const std::function<void()>& work);
 [[nodiscard]] double median(std::vector<double> values);
-/// Resident memory of this process in KiB, now.
+/// Resident memory of this process, or of another, in KiB, now.
 [[nodiscard]] std::size_t residentKiB();
-/// Prints one row of the table.
+[[nodiscard]] std::size_t residentKiB(pid_t process);
+/// The heading of a table, and one row of it.
+void printHeading(const std::string& text);
 void print(const Comparison& comparison);
 
-/// Ends the program with a message: a benchmark whose result is wrong measures nothing.
+/// What `require` throws, so that homes are removed and children are ended on the way out.
+struct Failure {
+  const char* what;
+};
+/// A benchmark whose result is wrong measures nothing.
 void require(bool condition, const char* what);
 
 void runListingBenchmarks(const Scale& scale);
 void runPagesBenchmarks(const Scale& scale);
+void runFollowingBenchmarks(const Scale& scale);
 
 }  // namespace mirabel::bench

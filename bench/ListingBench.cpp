@@ -22,6 +22,10 @@ namespace mirabel::bench {
 namespace {
 
 constexpr std::size_t batchSize = 10000;
+constexpr const char* firstSightRow = "full items on first sight / statx + listxattr";
+constexpr const char* knownRow = "full items when known / statx + listxattr";
+constexpr const char* walkerRow = "walker alone / getdents64";
+constexpr const char* memoryRow = "resident memory, small folder then large";
 
 struct LinuxEntry {
   std::uint64_t inode;
@@ -110,7 +114,7 @@ class Provider {
 };
 
 void benchFirstSight(const BenchHome& home, const std::string& folder, const Scale& scale) {
-  Comparison comparison{"full items on first sight / statx + listxattr", {}, {}, 3.0};
+  Comparison comparison{firstSightRow, {}, {}, 3.0};
   if (!scale.includes(comparison.name)) return;
   for (int round = 0; round < scale.rounds; ++round) {
     home.forgetState();
@@ -123,7 +127,7 @@ void benchFirstSight(const BenchHome& home, const std::string& folder, const Sca
 }
 
 void benchKnown(Provider& provider, const std::string& folder, const Scale& scale) {
-  Comparison comparison{"full items when known / statx + listxattr", {}, {}, 1.5};
+  Comparison comparison{knownRow, {}, {}, 1.5};
   if (!scale.includes(comparison.name)) return;
   for (int round = 0; round < scale.rounds; ++round) {
     comparison.reference.push_back(secondsOf([&] { plainLoop(folder, Each::statAndAttributes); }));
@@ -134,7 +138,7 @@ void benchKnown(Provider& provider, const std::string& folder, const Scale& scal
 }
 
 void benchWalker(Provider& provider, const std::string& folder, const Scale& scale) {
-  Comparison comparison{"walker alone / getdents64", {}, {}, 1.3};
+  Comparison comparison{walkerRow, {}, {}, 1.3};
   if (!scale.includes(comparison.name)) return;
   const auto visit = [](const URL&) -> Result<void> { return {}; };
   for (int round = 0; round < scale.rounds; ++round) {
@@ -151,24 +155,24 @@ void benchMemory(Provider& provider, const BenchHome& home, const std::string& l
   const std::size_t before = residentKiB();
   provider.list(large);
   const std::size_t after = residentKiB();
-  std::printf("%-52s %6zu KiB before, %zu KiB after\n", "resident memory, small folder then large",
-              before, after);
+  std::printf("%-54s %6zu KiB before, %zu KiB after\n", memoryRow, before, after);
   require(after < before + 16 * 1024, "memory does not grow with the folder");
 }
 
 }  // namespace
 
 void runListingBenchmarks(const Scale& scale) {
+  if (!scale.includesAny({firstSightRow, knownRow, walkerRow, memoryRow})) return;
   const BenchHome home;
   const std::string folder = home.makeFolder("large", scale.files);
   require(plainLoop(folder, Each::nothing) == scale.files, "the folder holds its files");
-  std::printf("one folder of %zu files, median of %d rounds\n", scale.files, scale.rounds);
-  std::printf("%-52s %12s %12s   %s\n", "", "ours", "reference", "ratio");
+  printHeading("one folder of " + std::to_string(scale.files) + " files, median of " +
+               std::to_string(scale.rounds) + " rounds");
   benchFirstSight(home, folder, scale);
   Provider provider(home);
   benchKnown(provider, folder, scale);
   benchWalker(provider, folder, scale);
-  benchMemory(provider, home, folder);
+  if (scale.includes(memoryRow)) benchMemory(provider, home, folder);
 }
 
 }  // namespace mirabel::bench

@@ -1,9 +1,17 @@
 #include <cstdio>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "BenchHome.h"
+#include "Roles.h"
 
-int main(int count, char** arguments) {
+namespace {
+
+int run(int count, char** arguments) {
+  if (count > 2 && std::string_view(arguments[1]) == "--role") {
+    return mirabel::bench::runRole({arguments + 2, arguments + count});
+  }
   mirabel::bench::Scale scale;
   for (int i = 1; i < count; ++i) {
     if (std::string_view(arguments[i]) == "--short") {
@@ -18,5 +26,17 @@ int main(int count, char** arguments) {
   }
   mirabel::bench::runListingBenchmarks(scale);
   mirabel::bench::runPagesBenchmarks(scale);
+  mirabel::bench::runFollowingBenchmarks(scale);
   return 0;
+}
+
+}  // namespace
+
+int main(int count, char** arguments) {
+  try {
+    return run(count, arguments);
+  } catch (const mirabel::bench::Failure& failure) {
+    std::fprintf(stderr, "benchmark: it does not hold that %s\n", failure.what);
+    return 1;
+  }
 }
