@@ -135,6 +135,8 @@ void FSChangesEnumerator::stopReader() {
   }
   if (!reader) return;
   SerialQueue readerQueue = reader->streamQueue();
+  // Submitted behind the delivery that is under way, the end would come after all of the history.
+  if (readerQueue.isCurrent()) reader->endTelling();
   readerQueue.async([reader] {
     if (reader->isRunning()) reader->stop();
   });

@@ -85,6 +85,11 @@ void FSEventReader::stop() {
   logWhenVerbose([&] { return "stopped " + description(); });
 }
 
+void FSEventReader::endTelling() {
+  hasToldEnough_ = true;
+  if (stream_) stream_->stop();
+}
+
 Result<std::unique_ptr<EventStream>> FSEventReader::createStream() {
   // A batch that is under way when the owner lets go of the reader finds nobody.
   auto callback = [weak = weak_from_this()](std::span<const FileSystemEvent> events) {
@@ -106,10 +111,10 @@ Result<std::unique_ptr<EventStream>> FSEventReader::createStream() {
 }
 
 void FSEventReader::processBatch(std::span<const FileSystemEvent> events) {
-  if (!stream_) return;
+  if (!stream_ || hasToldEnough_) return;
   logWhenVerbose([&] { return "fsevent: received " + std::to_string(events.size()) + " events"; });
   const EventPlaces places(events, hiddenTest_, look_, context_.platform.resources);
-  for (std::size_t index = 0; index < events.size(); ++index) {
+  for (std::size_t index = 0; index < events.size() && !hasToldEnough_; ++index) {
     currentEvent_ = &events[index];
     process(index, events[index], places[index]);
   }

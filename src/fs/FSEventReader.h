@@ -44,6 +44,9 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
   void start();
   /// Ends the subscription and lets go of the delegate.
   void stop();
+  /// For the delegate, while it is told of an event: it has heard enough. The rest of the history
+  /// is neither read nor looked at, and nothing further is told. `stop` is still to come.
+  void endTelling();
   [[nodiscard]] bool isRunning() const { return stream_ != nullptr; }
 
   void setDelegate(std::weak_ptr<FSEventReaderDelegate> delegate);
@@ -95,6 +98,7 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
   FSEventReaderMode mode_;
   Verbosity verbosity_;
   std::weak_ptr<FSEventReaderDelegate> delegate_;
+  bool hasToldEnough_ = false;
   HiddenTest hiddenTest_;
   ItemLook look_;
   const FileSystemEvent* currentEvent_ = nullptr;

@@ -105,6 +105,27 @@ TEST_F(FSEventReaderTest, DiskDecidesWhatAnEventMeans) {
   EXPECT_EQ(reader->lastProcessedFSEventID(), 7U);
 }
 
+TEST_F(FSEventReaderTest, NothingIsToldAfterTheDelegateHasHeardEnough) {
+  class EnoughAtFirst final : public ReaderLog {
+   public:
+    void didUpdateItem(FSEventReader& reader, const std::shared_ptr<LocalItem>& item,
+                       const URL& url) override {
+      ReaderLog::didUpdateItem(reader, item, url);
+      reader.endTelling();
+    }
+  };
+  start(pathBased);
+  delegate = std::make_shared<EnoughAtFirst>();
+  onQueue([&] { reader->setDelegate(delegate); });
+  const std::string path = fake.path("folder");
+  events.append(path, folderID);
+  events.append(path);
+  EXPECT_THAT(told(), ElementsAre("update " + folder + " at " + path, "batch"));
+  EXPECT_EQ(reader->lastProcessedFSEventID(), 1U);
+  events.append(path);
+  EXPECT_THAT(told(), IsEmpty());
+}
+
 TEST_F(FSEventReaderTest, ABatchIsLookedAtInOneGo) {
   start(pathBased);
   for (int i = 0; i < 50; ++i) {

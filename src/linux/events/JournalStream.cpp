@@ -11,7 +11,10 @@
 namespace mirabel {
 namespace {
 
-constexpr std::size_t batchSize = 1000;
+// Whoever replays mostly wants a hundred changes, and each record that is delivered is looked at;
+// who goes on after that reads through to the end.
+constexpr std::size_t firstBatch = 128;
+constexpr std::size_t largestBatch = 1024;
 
 bool isAtOrBelow(std::string_view path, std::string_view folder) {
   return path.starts_with(folder) &&
@@ -81,8 +84,8 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
 
   /// Delivers what there is; false when the history has a gap there.
   bool deliver() {
-    while (!isStopped) {
-      auto records = services.index.events(since, batchSize);
+    for (std::size_t size = firstBatch; !isStopped; size = std::min(2 * size, largestBatch)) {
+      auto records = services.index.events(since, size);
       if (!records) lose(records.error());
       if (!records) return false;
       if (records->empty()) return true;
