@@ -71,7 +71,9 @@ Result<void> Follower::followRound(const Transaction& transaction, LookList::Fol
   auto later = places_.look(transaction, *watcher_, std::move(looks));
   if (!later) return fail(later.error());
   later_.merge(std::move(*later));
-  return scanArrived(transaction);
+  auto scanned = scanArrived(transaction);
+  if (!scan_.watchFailure()) scan_.clear();
+  return scanned;
 }
 
 Result<void> Follower::settle(const Transaction& transaction) {
@@ -128,13 +130,13 @@ Result<void> Follower::addByID(std::uint64_t folder) {
   return {};
 }
 
+/// Goes through what is to be scanned, and through what comes up with it elsewhere.
 Result<void> Follower::scanArrived(const Transaction& transaction) {
   while (true) {
     if (auto scanned = scan_.run(transaction); !scanned) return scanned;
     if (auto added = addArrived(); !added) return added;
     if (scan_.isEmpty()) break;
   }
-  if (!scan_.watchFailure()) scan_.clear();
   return {};
 }
 
@@ -186,7 +188,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   }
   static_cast<void>(context_.learner.takeArrivedFolders());
   auto added = transaction([&] { return scan_.addRoots(); });
-  if (added) added = scan_.run(transaction);
+  if (added) added = scanArrived(transaction);
   if (!added) return added;
   foldersNeeded_ = scan_.foldersRead();
   comparedAt_ = std::chrono::steady_clock::now();

@@ -132,4 +132,8 @@ bool isBackupName(std::string_view name, std::string_view original) {
                              [](unsigned char c) { return std::isdigit(c) != 0; });
 }
 
+bool isBackupOf(const Location& place, const Location& original) {
+  return place.folder == original.folder && isBackupName(place.name, original.name);
+}
+
 }  // namespace mirabel

@@ -50,5 +50,7 @@ void refresh(ObjectRow& row, const ObjectStatus& status);
 /// Whether `name` is what editors call the former version of `original` while they save:
 /// "name~", "name.bak", "name.orig", "name.~1~", or any hidden name.
 [[nodiscard]] bool isBackupName(std::string_view name, std::string_view original);
+/// The same of two places, which must be in one folder.
+[[nodiscard]] bool isBackupOf(const Location& place, const Location& original);
 
 }  // namespace mirabel

@@ -71,6 +71,8 @@ Result<void> TreeScan::readBatch() {
   while (!pending_.empty() && entriesRead_ < entriesPerTransaction) {
     const Folder folder = std::move(pending_.back());
     pending_.pop_back();
+    // It was watched from before it was read: what came since is told.
+    if (read_.contains(folder.id)) continue;
     auto done = read(folder);
     if (!done && isDisturbance(done.error())) {
       disturbed_.push_back(folder.id);
