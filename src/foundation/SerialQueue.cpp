@@ -155,6 +155,19 @@ void SerialQueue::sync(const std::function<void()>& block) {
   block();
 }
 
+void SerialQueue::syncWithWhatFollows(const std::function<void()>& block) {
+  const std::shared_ptr<State> state = state_;
+  if (State::Turn::isOn(*state)) {
+    fatalError("sync on queue \"" + state->label + "\" from one of its own blocks");
+  }
+  state->takeTurn();
+  {
+    const State::Turn turn(*state);
+    block();
+  }
+  state->drain();
+}
+
 bool SerialQueue::isCurrent() const {
   return State::Turn::isOn(*state_);
 }

@@ -23,6 +23,10 @@ class SerialQueue {
   /// what it throws comes out here. On an idle queue that is at once. Calling it from a block of
   /// the same queue is fatal (a deadlock).
   void sync(const std::function<void()>& block);
+  /// The same, and what is submitted in the meantime runs on the calling thread too, until nothing
+  /// is left or another caller of `sync` comes next: for who waits for what follows from `block`,
+  /// without waking others for it. `block` must not throw.
+  void syncWithWhatFollows(const std::function<void()>& block);
 
   /// Whether the calling code is a block of this queue, or was called by `sync` of another queue
   /// from such a block.

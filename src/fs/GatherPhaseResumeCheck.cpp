@@ -100,7 +100,7 @@ GatherPhaseResumeCheck canResumeGatherPhase(const ItemContext& context, EventStr
   reader->setDelegate(checker);
   SerialQueue queue = reader->streamQueue();
   // On this thread, which waits for it anyway: waking others costs as much as a short replay.
-  queue.sync([&] {
+  queue.syncWithWhatFollows([&] {
     reader->start();
     if (!reader->isRunning()) checker->didNotStart();
   });

@@ -71,6 +71,30 @@ TEST(SerialQueue, SyncRunsOnTheCallingThreadAndAnIdleQueueNeedsNoOther) {
   EXPECT_EQ(pool.threadCount(), 0u);
 }
 
+TEST(SerialQueue, WhatFollowsRunsOnTheCallingThreadInOrder) {
+  ThreadPool pool;
+  SerialQueue queue("following", pool);
+  std::vector<int> order;
+  const auto note = [&](int number) {
+    EXPECT_TRUE(queue.isCurrent());
+    order.push_back(number);
+  };
+  queue.syncWithWhatFollows([&] {
+    queue.async([&] {
+      note(2);
+      queue.async([&] { note(4); });
+    });
+    queue.async([&] { note(3); });
+    note(1);
+  });
+  EXPECT_EQ(order, (std::vector{1, 2, 3, 4}));
+  EXPECT_EQ(pool.threadCount(), 0u);
+  // The turn is free again, and one that others have is waited for.
+  queue.async([&] { note(5); });
+  queue.syncWithWhatFollows([&] { note(6); });
+  EXPECT_EQ(order.back(), 6);
+}
+
 TEST(SerialQueue, IsCurrentOnlyInItsOwnBlocksAndThoseCalledFromThem) {
   SerialQueue outer("outer");
   SerialQueue inner("inner");
