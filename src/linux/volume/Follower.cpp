@@ -184,7 +184,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   if (watcher_) {
     // What was queued so far will be seen by the comparison.
     LookList seenAnyway;
-    if (auto drained = watcher_->drain(seenAnyway); !drained) return fail(drained.error());
+    if (auto drained = watcher_->drain(seenAnyway); !drained) giveUpWatching(drained.error());
   }
   static_cast<void>(context_.learner.takeArrivedFolders());
   auto added = transaction([&] { return scan_.addRoots(); });

@@ -147,7 +147,9 @@ Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occ
     if (auto told = recorder_.gone(occupant, from); !told) return fail(told.error());
     return inherited;
   }
-  if (auto told = recorder_.changed(before, from); !told) return fail(told.error());
+  const bool changedKind =
+      objectKind(found->status.kind, isPackageName_(found->name)) != before.kind;
+  if (auto told = recorder_.changed(before, from, changedKind); !told) return fail(told.error());
   auto moved = placeFound(std::move(occupant), *found);
   if (!moved) return fail(moved.error());
   return inherited;
