@@ -125,7 +125,9 @@ Result<void> ChangeRecorder::goneLinks(std::uint64_t folder, const std::string& 
     auto row = store_.objectInSlot(slot);
     if (!row) return fail(row.error());
     if (!*row) continue;
-    if (auto told = append(**row, {folder, name}, path + "/" + name, false); !told) return told;
+    std::string place = path;
+    place.append("/").append(name);
+    if (auto told = append(**row, {folder, name}, std::move(place), false); !told) return told;
   }
   return {};
 }

@@ -38,7 +38,8 @@ Result<std::optional<std::string>> IndexedPaths::folderPath(std::uint64_t folder
   }
   for (; !above.empty(); above.pop_back()) {
     const ObjectRow& row = above.back();
-    path = row.location->folder == 0 ? row.location->name : path + "/" + row.location->name;
+    if (row.location->folder != 0) path.append("/");
+    path.append(row.location->name);
     known.add(row.fileID, *row.location, path);
   }
   return path;

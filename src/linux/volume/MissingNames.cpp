@@ -1,6 +1,5 @@
 #include "linux/volume/MissingNames.h"
 
-#include <algorithm>
 #include <utility>
 
 namespace mirabel {
@@ -18,9 +17,11 @@ Result<void> MissingNames::add(std::uint64_t folder, const std::string& name) {
 Result<void> MissingNames::settle() {
   auto names = std::exchange(missing_, {});
   // Further names first: an object must not go on under one that is not shown any more.
-  std::ranges::stable_partition(names, &Missing::isLink);
-  for (const Missing& missing : names) {
-    if (auto settled = settle(missing); !settled) return settled;
+  for (const bool isLink : {true, false}) {
+    for (const Missing& missing : names) {
+      if (missing.isLink != isLink) continue;
+      if (auto settled = settle(missing); !settled) return settled;
+    }
   }
   return {};
 }
