@@ -291,7 +291,16 @@ TEST_F(DamagedBytes, ThatLeaveTheTimesOfTheFileAloneAreNotBelieved) {
       }
     }
     opened->reset();
-    // The first that met it left word for the next.
+    // The first that meets it fails, and leaves word for the next.
+    const auto isMet = [&] {
+      if (!index().currentEventID()) return true;
+      return std::ranges::any_of(identities_, [&](const auto& known) {
+        const std::string place = "folder/" + known.first;
+        const auto seen = statusOf(path(place));
+        return seen && !index().learnPath(path(place), *seen, false);
+      });
+    };
+    if (isMet()) close();
     expectRightOrStartOver("page " + std::to_string(page));
   }
   EXPECT_GT(startedOver_, 0);

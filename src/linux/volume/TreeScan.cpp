@@ -99,9 +99,13 @@ Result<void> TreeScan::read(const Folder& folder) {
   auto id = context_.learner.folderID(folder.path, opened->get());
   if (!id) return fail(id.error());
   watch(opened->get(), *id);
+  // Open anew, now that it is watched: btrfs gives what was there when a folder was opened, and
+  // what came between that and the mark would be in neither.
+  UniqueFd reading(::openat(opened->get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!reading) return fail(Error::posix(errno));
   const Folder itself{folder.path, *id, folder.depth};
   auto done = lookAtItself(itself, opened->get());
-  if (done) done = readEntries(itself, std::move(*opened));
+  if (done) done = readEntries(itself, std::move(reading));
   if (!done) {
     // Who is watched is known: whoever meets it under its new name reads it.
     if (watcher_ != nullptr) watcher_->forget(*id);
