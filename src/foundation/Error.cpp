@@ -139,6 +139,12 @@ Error Error::invalidParameter(std::string_view parameter, std::string_view value
   return error;
 }
 
+Error Error::collision(std::string_view collidingItemIdentifier) {
+  Error error = vessel(VesselErrorCode::collision);
+  error.userInfo.emplace(errorkey::collidingItem, collidingItemIdentifier);
+  return error;
+}
+
 std::string Error::description() const {
   std::string text(titleOf(domain));
   text += ' ';

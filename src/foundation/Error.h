@@ -44,7 +44,7 @@ enum class LocalVesselError : std::int64_t {
 /// Keys of `Error::userInfo`.
 namespace errorkey {
 inline constexpr std::string_view collidingURL = "collidingURL";
-inline constexpr std::string_view collidingItem = "collidingItem";
+inline constexpr std::string_view collidingItem = "collidingItem";  ///< its identifier
 inline constexpr std::string_view itemIdentifier = "itemIdentifier";
 inline constexpr std::string_view parameter = "parameter";
 inline constexpr std::string_view value = "value";
@@ -67,6 +67,8 @@ struct Error {
   static Error syncAnchorExpired() { return vessel(VesselErrorCode::syncAnchorExpired); }
   static Error nonExistentItem(std::string_view identifier);
   static Error invalidParameter(std::string_view parameter, std::string_view value);
+  /// The name is taken by the item of that identifier.
+  static Error collision(std::string_view collidingItemIdentifier);
 
   [[nodiscard]] bool isPosix(int errnoValue) const {
     return domain == ErrorDomain::posix && code == errnoValue;
