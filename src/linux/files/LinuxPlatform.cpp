@@ -6,13 +6,13 @@
 #include "linux/files/LinuxDirectoryStreams.h"
 #include "linux/files/LinuxExtendedAttributes.h"
 #include "linux/files/LinuxFileObjects.h"
-#include "linux/files/LinuxFileOperations.h"
 #include "linux/files/LinuxGenerationalStore.h"
 #include "linux/files/LinuxResourceValues.h"
 #include "linux/files/LinuxVesselManager.h"
 #include "linux/files/LinuxVolumeHistory.h"
 #include "linux/files/PackageTypes.h"
 #include "linux/files/SystemClock.h"
+#include "linux/operations/LinuxFileOperations.h"
 #include "linux/volume/StoredListingPositions.h"
 
 namespace mirabel {
@@ -20,8 +20,11 @@ namespace mirabel {
 // In the order in which they need each other.
 struct LinuxPlatform::Parts {
   Parts(HomeLayout where, std::unique_ptr<MonitoredRoots> folders,
-        std::unique_ptr<VolumeIndex> volumeIndex)
-      : layout(std::move(where)), roots(std::move(folders)), index(std::move(volumeIndex)) {}
+        std::unique_ptr<VolumeIndex> volumeIndex, FileCalls::Check check)
+      : layout(std::move(where)),
+        roots(std::move(folders)),
+        index(std::move(volumeIndex)),
+        operations(*roots, *index, attributes, {PackageTypes::isPackageName, std::move(check)}) {}
 
   HomeLayout layout;
   std::unique_ptr<MonitoredRoots> roots;
@@ -29,12 +32,12 @@ struct LinuxPlatform::Parts {
   TypeTable types;
   LookContext context{*roots, *index, types};
   LinuxResourceValues resources{context};
-  LinuxExtendedAttributes attributes{*roots};
+  LinuxExtendedAttributes attributes{context};
   LinuxFileObjects objects{context};
   LinuxGenerationalStore documents{context};
   LinuxDirectoryStreams directories{*roots};
   LinuxDirectorySizer sizes{*roots};
-  LinuxFileOperations operations{*roots};
+  LinuxFileOperations operations;
   NoApplications applications;
   LinuxVesselManager manager{URL::fileURL(layout.documents)};
   LinuxVolumeHistory history{*index};
@@ -65,8 +68,8 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   indexOptions.notice = std::move(options.notice);
   auto index = VolumeIndex::open(*roots, std::move(indexOptions));
   if (!index) return fail(index.error());
-  return std::unique_ptr<LinuxPlatform>(new LinuxPlatform(
-      std::make_unique<Parts>(std::move(*layout), std::move(roots), std::move(*index))));
+  return std::unique_ptr<LinuxPlatform>(new LinuxPlatform(std::make_unique<Parts>(
+      std::move(*layout), std::move(roots), std::move(*index), std::move(options.checkFileCall))));
 }
 
 LinuxPlatform::LinuxPlatform(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
@@ -75,6 +78,10 @@ LinuxPlatform::~LinuxPlatform() = default;
 
 EventStreams& LinuxPlatform::events() const {
   return parts_->events;
+}
+
+const OperationProgress& LinuxPlatform::progress() const {
+  return parts_->operations.progress();
 }
 
 const Platform& LinuxPlatform::platform() const {

@@ -10,6 +10,7 @@
 
 #include "foundation/Error.h"
 #include "linux/files/LinuxVesselManager.h"
+#include "linux/operations/OperationProgress.h"
 #include "linux/volume/VolumeIndex.h"
 #include "linux/watch/FolderWatcher.h"
 #include "platform/EventStreams.h"
@@ -37,6 +38,8 @@ class LinuxPlatform {
     std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher = [] {
       return mirabel::makeWatcher();
     };
+    /// Asked before each system call of an operation, see `FileCalls`.
+    std::function<int(std::string_view call)> checkFileCall{};
     /// How long to wait for another process that owns the volume.
     std::chrono::milliseconds timeout{30'000};
     /// Told what a person should know: that it has to wait, that a damaged database was set aside.
@@ -57,6 +60,8 @@ class LinuxPlatform {
   [[nodiscard]] EventStreams& events() const;
   /// Gives the signals to whoever listens.
   [[nodiscard]] LinuxVesselManager& manager() const;
+  /// How far the operations on files have come.
+  [[nodiscard]] const OperationProgress& progress() const;
   /// How changes are followed, and what the history holds.
   [[nodiscard]] VolumeIndex& index() const;
   /// Absolute and resolved.

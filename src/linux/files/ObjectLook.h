@@ -5,8 +5,8 @@
 
 #include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
-#include "linux/files/EntryPlace.h"
 #include "linux/files/TypeTable.h"
+#include "linux/kernel/EntryPlace.h"
 #include "linux/volume/VolumeIndex.h"
 
 namespace mirabel {

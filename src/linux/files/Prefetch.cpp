@@ -13,8 +13,9 @@
 
 #include "foundation/SplitWork.h"
 #include "foundation/URL.h"
-#include "linux/files/AttributeCalls.h"
+#include "linux/files/LinuxExtendedAttributes.h"
 #include "linux/files/PackageTypes.h"
+#include "linux/kernel/AttributeCalls.h"
 
 namespace mirabel {
 namespace {
@@ -174,12 +175,14 @@ class FolderPrefetch {
   }
 
   void fillCaches() {
+    const KeptAttributes& kept = context_.index.keptAttributes();
     for (std::size_t i = 0; i < looks_.size(); ++i) {
       ResourceCache& cache = looks_[i].url->resources();
       const Sighting& sighting = sightings_[i];
       // Gone or changed meanwhile: the next read of it looks again.
       if (sighting.fileID == 0 || sighting.status.changeTime != looks_[i].changeTime) continue;
       cache.fill(valuesOf(context_.types, sighting.name, sighting, looks_[i].isWritable));
+      if (!kept.isEmpty()) mergeNames(looks_[i].attributeNames, kept.of(sighting.fileID));
       if (looks_[i].hasAttributeNames) {
         cache.setAttributeNames(std::move(looks_[i].attributeNames));
       }

@@ -41,6 +41,9 @@ CREATE TABLE IF NOT EXISTS handovers(
   folder INTEGER NOT NULL, name BLOB NOT NULL, document_id INTEGER NOT NULL,
   kind INTEGER NOT NULL, PRIMARY KEY(folder, name)) WITHOUT ROWID;
 CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
+CREATE TABLE IF NOT EXISTS kept_attributes(
+  file_id INTEGER NOT NULL, name BLOB NOT NULL, value BLOB,
+  PRIMARY KEY(file_id, name)) WITHOUT ROWID;
 )";
 
 #define OBJECT_COLUMNS                                                                        \

@@ -37,6 +37,14 @@ class StoredVolumeIndex final : public VolumeIndex {
 
   ~StoredVolumeIndex() override { thread_.reset(); }
 
+  Result<void> loadKeptAttributes() {
+    return keptAttributes_.load([this](std::uint64_t fileID) -> Result<bool> {
+      auto row = state_->store().objectByFileID(fileID);
+      if (!row) return fail(row.error());
+      return *row && (*row)->location;
+    });
+  }
+
   Result<void> learn(const std::string& folderPath, int folder,
                      std::span<Sighting> sightings) override {
     const Ringing ringing(*this);
@@ -138,6 +146,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
   JournalBell& bell() override { return bell_; }
+  KeptAttributes& keptAttributes() override { return keptAttributes_; }
 
   Status status() override {
     const std::scoped_lock lock(mutex_);
@@ -232,6 +241,10 @@ class StoredVolumeIndex final : public VolumeIndex {
   bool followsInBackground_;
   std::uint64_t device_;
   JournalBell bell_;
+  KeptAttributes keptAttributes_{[this](const auto& work) {
+    const std::scoped_lock lock(mutex_);
+    return inTransaction([&] { return work(state_->database()); });
+  }};
   std::atomic<std::uint64_t> lastEventID_ = 0;
   std::unique_ptr<FollowThread> thread_;
 };
@@ -253,7 +266,10 @@ Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(MonitoredRoots& roots, Op
   auto state = VolumeState::open(std::move(*folder), options.notice);
   if (!state) return fail(state.error());
   if (!options.isPackageName) options.isPackageName = [](std::string_view) { return false; };
-  return std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
+  auto index =
+      std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
+  if (auto loaded = index->loadKeptAttributes(); !loaded) return fail(loaded.error());
+  return index;
 }
 
 }  // namespace mirabel

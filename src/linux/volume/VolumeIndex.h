@@ -17,6 +17,7 @@
 #include "linux/volume/EventJournal.h"
 #include "linux/volume/FollowStatus.h"
 #include "linux/volume/JournalBell.h"
+#include "linux/volume/KeptAttributes.h"
 #include "linux/volume/StateFolder.h"
 #include "linux/watch/FolderWatcher.h"
 
@@ -103,6 +104,9 @@ class VolumeIndex {
     std::uint64_t lastEventID = 0;
   };
   [[nodiscard]] virtual Status status() = 0;
+
+  /// What is remembered of objects by file ID.
+  [[nodiscard]] virtual KeptAttributes& keptAttributes() = 0;
 
   [[nodiscard]] virtual UUID historyUUID() const = 0;
   /// Where the state of the volume is kept, for as long as the index is open.

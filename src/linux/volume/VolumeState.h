@@ -51,6 +51,7 @@ class VolumeState {
   [[nodiscard]] IdentityStore& store() { return *store_; }
   [[nodiscard]] IdentifierAllocator& allocator() { return *allocator_; }
   [[nodiscard]] EventJournal& journal() { return *journal_; }
+  [[nodiscard]] Database& database() { return *database_; }
   [[nodiscard]] const StateFolder& folder() const { return folder_; }
   [[nodiscard]] const UUID& history() const { return witness_.history; }
 

@@ -1,4 +1,4 @@
-#include "linux/files/EntryPlace.h"
+#include "linux/kernel/EntryPlace.h"
 
 #include <cerrno>
 #include <fcntl.h>

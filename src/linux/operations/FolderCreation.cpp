@@ -1,4 +1,4 @@
-#include "linux/files/LinuxFileOperations.h"
+#include "linux/operations/FolderCreation.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -54,11 +54,11 @@ Result<void> createBelow(UniqueFd folder, std::string_view relative, Links links
 
 }  // namespace
 
-Result<void> LinuxFileOperations::createDirectory(const URL& url) {
+Result<void> createFolder(const MonitoredRoots& roots, const URL& url) {
   const std::string& path = url.path();
   if (path.empty()) return fail(Error::posix(EINVAL));
-  const auto place = roots_.locate(path);
-  auto start = roots_.open(place ? roots_.paths()[place->root] : "/", O_PATH | O_DIRECTORY);
+  const auto place = roots.locate(path);
+  auto start = roots.open(place ? roots.paths()[place->root] : "/", O_PATH | O_DIRECTORY);
   if (!start) return fail(start.error());
   return place ? createBelow(std::move(*start), place->relative, Links::refused)
                : createBelow(std::move(*start), std::string_view(path).substr(1), Links::followed);

@@ -1,4 +1,4 @@
-#include "linux/files/AttributeCalls.h"
+#include "linux/kernel/AttributeCalls.h"
 
 #include <algorithm>
 #include <cerrno>

@@ -1,0 +1,68 @@
+#include "linux/operations/ItemImport.h"
+
+#include <cerrno>
+#include <fcntl.h>
+
+#include "linux/operations/TreeCopy.h"
+#include "platform/FileOperations.h"
+
+namespace mirabel {
+namespace {
+
+/// Whether `folder` is the object with that status, or lies below it.
+Result<bool> liesWithin(const FileCalls& calls, int folder, const ObjectStatus& object) {
+  UniqueFd current;
+  for (int descriptor = folder;;) {
+    const auto here = calls.status(descriptor);
+    if (!here) return fail(here.error());
+    if (here->inode == object.inode && here->device == object.device) return true;
+    auto parent = calls.open(descriptor, "..", O_PATH | O_DIRECTORY);
+    if (!parent) return fail(parent.error());
+    const auto above = calls.status(parent->get());
+    if (!above) return fail(above.error());
+    if (above->inode == here->inode && above->device == here->device) return false;
+    current = std::move(*parent);
+    descriptor = current.get();
+  }
+}
+
+Result<void> canBeCopied(const OperationContext& context, const EntryPlace& source,
+                         const OpenFolder& folder) {
+  const auto status = context.calls.status(source.folder.get(), source.name);
+  if (!status) return fail(status.error());
+  if (status->kind != FileKind::folder) return {};
+  const auto within = liesWithin(context.calls, folder.descriptor.get(), *status);
+  if (!within) return fail(within.error());
+  if (*within) return fail(Error::posix(EINVAL, "a folder can't be copied into itself"));
+  return {};
+}
+
+}  // namespace
+
+Result<URL> importItem(const OperationContext& context, const URL& source, const URL& folder) {
+  const std::string name(source.lastPathComponent());
+  if (auto refusal = whyNoName(name)) return fail(*std::move(refusal));
+  auto from = placeOf(context.roots, source);
+  if (!from) return fail(from.error());
+  auto target = openFolder(context, folder);
+  if (!target) return fail(target.error());
+  const URL url = target->url(name);
+  const int descriptor = target->descriptor.get();
+  // Told before anything is copied; the rename makes sure.
+  if (context.calls.status(descriptor, name)) return fail(fileExists(url));
+  if (auto possible = canBeCopied(context, *from, *target); !possible)
+    return fail(possible.error());
+  auto copy = context.pending.temporaryName(target->path);
+  if (!copy) return fail(copy.error());
+  auto done = TreeCopy(context.calls, context.progress, CopyKind::copy)
+                  .run(from->folder.get(), from->name, descriptor, *copy);
+  if (done) done = context.calls.rename(descriptor, *copy, descriptor, name);
+  if (!done) {
+    removeTemporary(context, *target, *copy);
+    return fail(operationError(done.error(), url));
+  }
+  if (auto synced = syncFolder(context, descriptor); !synced) return fail(synced.error());
+  return url;
+}
+
+}  // namespace mirabel

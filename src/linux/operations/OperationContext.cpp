@@ -1,0 +1,69 @@
+#include "linux/operations/OperationContext.h"
+
+#include <cerrno>
+#include <fcntl.h>
+
+#include "foundation/Log.h"
+#include "linux/operations/TreeRemoval.h"
+#include "platform/FileOperations.h"
+
+namespace mirabel {
+
+Result<ItemPlace> itemPlaceOf(const OperationContext& context, const URL& item) {
+  auto place = placeOf(context.roots, item);
+  if (!place) return fail(place.error());
+  if (place->name.empty()) {
+    return fail(Error::posix(EPERM, "it is not something in the documents that can be changed"));
+  }
+  return ItemPlace{{std::move(place->folder), std::move(place->folderPath)},
+                   std::move(place->name)};
+}
+
+Result<OpenFolder> openFolder(const OperationContext& context, const URL& url) {
+  if (!url.isFileURL() || url.path().empty()) return fail(Error::posix(EINVAL));
+  if (auto checked = context.calls.check("open folder"); !checked) return fail(checked.error());
+  auto opened = context.roots.open(url.path(), O_PATH | O_DIRECTORY);
+  if (!opened) return fail(opened.error());
+  return OpenFolder{std::move(*opened), url.path()};
+}
+
+Result<void> syncFolder(const OperationContext& context, int folder) {
+  auto opened = context.calls.open(folder, ".", O_RDONLY | O_DIRECTORY);
+  if (!opened && opened.error().isPosix(EACCES)) return {};
+  if (!opened) return fail(opened.error());
+  return context.calls.sync(opened->get());
+}
+
+Error operationError(Error error, const URL& url) {
+  return error.isPosix(EEXIST) ? fileExists(url) : std::move(error);
+}
+
+NameOf kindOfName(const OperationContext& context, const ObjectStatus& status,
+                  std::string_view name) {
+  const bool isPlainFolder = status.kind == FileKind::folder && !context.isPackageName(name);
+  return isPlainFolder ? NameOf::plainFolder : NameOf::file;
+}
+
+Result<void> removeWhole(const OperationContext& context, int folder, const std::string& name) {
+  const FileCalls& calls = context.calls;
+  const auto status = calls.status(folder, name);
+  if (!status) return fail(status.error());
+  if (status->kind != FileKind::folder) return calls.remove(folder, name, 0);
+  auto top = calls.openBelow(folder, name, O_PATH | O_DIRECTORY, FileCalls::Mounts::refused);
+  if (!top) return fail(top.error());
+  TreeRemoval removal(calls, context.progress);
+  if (auto examined = removal.examine(top->get()); !examined) return examined;
+  if (auto emptied = removal.run(top->get()); !emptied) return emptied;
+  return calls.remove(folder, name, AT_REMOVEDIR);
+}
+
+void removeTemporary(const OperationContext& context, const OpenFolder& folder,
+                     const std::string& name) {
+  auto removed = removeWhole(context, folder.descriptor.get(), name);
+  if (removed || removed.error().isPosix(ENOENT)) return;
+  context.pending.keepOnRecord(folder.path);
+  logError("can't remove \"" + folder.url(name).path() + "\" yet; " +
+           removed.error().description());
+}
+
+}  // namespace mirabel

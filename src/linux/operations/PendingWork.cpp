@@ -1,0 +1,180 @@
+#include "linux/operations/PendingWork.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "foundation/Log.h"
+#include "linux/kernel/LongPath.h"
+
+namespace mirabel {
+namespace {
+
+constexpr const char* fileName = "pending";
+constexpr const char* newFileName = "pending.new";
+// More than that was not written by this program.
+constexpr std::size_t largestFile = 16u << 20;
+constexpr std::string_view keptPrefix = ".mirabel-kept-";
+
+std::string removedPrefix() {
+  std::string id = UUID::random().description();
+  std::erase(id, '-');
+  return ".mirabel-" + id.substr(0, 16) + "-";
+}
+
+Result<Data> readFile(int folder) {
+  UniqueFd file(::openat(folder, fileName, O_RDONLY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK));
+  if (!file) return fail(Error::posix(errno));
+  struct stat status {};
+  if (::fstat(file.get(), &status) != 0) return fail(Error::posix(errno));
+  if (!S_ISREG(status.st_mode) || static_cast<std::size_t>(status.st_size) > largestFile) {
+    return fail(Error::posix(EINVAL));
+  }
+  Data bytes(static_cast<std::size_t>(status.st_size));
+  errno = EIO;
+  if (::pread(file.get(), bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
+    return fail(Error::posix(errno));
+  }
+  return bytes;
+}
+
+Result<void> replaceFile(int folder, const Data& bytes) {
+  ::unlinkat(folder, newFileName, 0);
+  UniqueFd file(::openat(folder, newFileName, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+  if (!file) return fail(Error::posix(errno));
+  errno = EIO;
+  if (::write(file.get(), bytes.data(), bytes.size()) != static_cast<ssize_t>(bytes.size()) ||
+      ::fsync(file.get()) != 0 || ::renameat(folder, newFileName, folder, fileName) != 0 ||
+      ::fsync(folder) != 0) {
+    return fail(Error::posix(errno));
+  }
+  return {};
+}
+
+template <class Record>
+void append(std::vector<Record>& to, const std::vector<Record>& from) {
+  to.insert(to.end(), from.begin(), from.end());
+}
+
+}  // namespace
+
+PendingWork::PendingWork(VolumeIndex& index, const FileCalls& calls)
+    : index_(index), calls_(calls), prefix_(removedPrefix()) {}
+
+PendingRecords PendingWork::load() {
+  const std::scoped_lock lock(mutex_);
+  const auto bytes = readFile(index_.stateFolder().descriptor());
+  if (!bytes && bytes.error().isPosix(ENOENT)) return {};
+  auto records = bytes ? PendingRecords::decode(*bytes) : std::nullopt;
+  if (!records) {
+    logError("can't read what operations left behind; " +
+             (bytes ? std::string("the file is damaged") : bytes.error().description()));
+    return {};
+  }
+  before_ = *std::move(records);
+  return before_;
+}
+
+void PendingWork::settle(PendingRecords remaining) {
+  const std::scoped_lock lock(mutex_);
+  if (remaining == before_) return;
+  before_ = std::move(remaining);
+  if (auto written = write(); !written) {
+    logError("can't note what operations left behind; " + written.error().description());
+  }
+}
+
+std::string PendingWork::nextName(std::string_view prefix) {
+  return std::string(prefix) + std::to_string(++count_);
+}
+
+Result<std::string> PendingWork::temporaryName(const std::string& path) {
+  const std::scoped_lock lock(mutex_);
+  const auto isNoted = [&](const PendingRemovals& each) { return each.folder.path == path; };
+  if (std::ranges::none_of(records_.removals, isNoted)) {
+    auto folder = folderAt(path);
+    if (!folder) return fail(folder.error());
+    records_.removals.push_back({*std::move(folder), prefix_});
+    if (auto written = write(); !written) {
+      records_.removals.pop_back();
+      return fail(written.error());
+    }
+  }
+  return nextName(prefix_);
+}
+
+std::string PendingWork::hiddenName() {
+  const std::scoped_lock lock(mutex_);
+  return nextName(std::string(keptPrefix) + prefix_.substr(std::string_view(".mirabel-").size()));
+}
+
+Result<PendingFolder> PendingWork::folderAt(const std::string& path) {
+  if (auto checked = calls_.check("find folder"); !checked) return fail(checked.error());
+  const auto status = statusOf(path);
+  if (!status) return fail(status.error());
+  const auto sighting = index_.learnPath(path, *status, false);
+  if (!sighting) return fail(sighting.error());
+  return PendingFolder{path, sighting->fileID};
+}
+
+Result<void> PendingWork::begin(const PendingMove& move) {
+  const std::scoped_lock lock(mutex_);
+  records_.moves.push_back(move);
+  auto written = write();
+  if (!written) records_.moves.pop_back();
+  return written;
+}
+
+void PendingWork::end(const PendingMove& move) {
+  const std::scoped_lock lock(mutex_);
+  std::erase(records_.moves, move);
+  // Found once more by the next start, it is seen to be done.
+  static_cast<void>(write());
+}
+
+Result<void> PendingWork::begin(const PendingRename& rename) {
+  const std::scoped_lock lock(mutex_);
+  records_.renames.push_back(rename);
+  auto written = write();
+  if (!written) records_.renames.pop_back();
+  return written;
+}
+
+void PendingWork::end(const PendingRename& rename) {
+  const std::scoped_lock lock(mutex_);
+  std::erase(records_.renames, rename);
+  static_cast<void>(write());
+}
+
+void PendingWork::keepOnRecord(const std::string& path) {
+  const std::scoped_lock lock(mutex_);
+  kept_.push_back(path);
+}
+
+void PendingWork::close() {
+  const std::scoped_lock lock(mutex_);
+  const auto isDone = [&](const PendingRemovals& each) {
+    return std::ranges::find(kept_, each.folder.path) == kept_.end();
+  };
+  if (std::erase_if(records_.removals, isDone) > 0) static_cast<void>(write());
+}
+
+Result<void> PendingWork::write() {
+  if (auto checked = calls_.check("note"); !checked) return checked;
+  const int folder = index_.stateFolder().descriptor();
+  PendingRecords all = before_;
+  append(all.removals, records_.removals);
+  append(all.moves, records_.moves);
+  append(all.renames, records_.renames);
+  if (all.isEmpty()) {
+    if (::unlinkat(folder, fileName, 0) != 0 && errno != ENOENT) return fail(Error::posix(errno));
+    return ::fsync(folder) == 0 ? Result<void>() : fail(Error::posix(errno));
+  }
+  auto bytes = all.encode();
+  if (!bytes) return fail(bytes.error());
+  return replaceFile(folder, *bytes);
+}
+
+}  // namespace mirabel

@@ -1,0 +1,16 @@
+#pragma once
+
+#include <string>
+
+#include "foundation/Error.h"
+#include "linux/operations/FileCalls.h"
+
+namespace mirabel {
+
+/// Whether two objects look like copies of each other: the same kinds and names all the way down,
+/// files with the same size and modification time, links with the same target. Contents are not
+/// read. POSIX errors.
+[[nodiscard]] Result<bool> looksAlike(const FileCalls& calls, int folder, const std::string& name,
+                                      int otherFolder, const std::string& otherName);
+
+}  // namespace mirabel

@@ -1,0 +1,165 @@
+#include <cerrno>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "linux/operations/OperationsFixture.h"
+
+namespace mirabel::testing {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// One operation on a home that is made for it, and what may be seen of it afterwards.
+struct Case {
+  const char* name;
+  /// Whether the first rename is to find that it leads to another file system.
+  bool crosses = false;
+};
+
+/// Each operation with each of its system calls failing, and with the process killed before each of
+/// them: whatever happens, the items are as they were or as they should be.
+class InterruptedOperations : public OperationsTest, public ::testing::WithParamInterface<Case> {
+ protected:
+  void SetUp() override {
+    makeTree();
+    before_ = tree();
+    // Always in another process: what is forked has none of the threads of this one.
+    EXPECT_EQ(inProcess([this] { return run() ? 1 : 0; }), 0);
+    after_ = tree();
+    ASSERT_NE(before_, after_);
+  }
+
+  /// What it exits with; -1 when it is killed.
+  int inProcess(const std::function<int()>& work) {
+    const pid_t child = ::fork();
+    if (child == 0) {
+      const int code = work();
+      close();
+      ::_exit(code);
+    }
+    int status = 0;
+    EXPECT_EQ(::waitpid(child, &status, 0), child);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+  }
+
+  void makeTree() {
+    if (home_) clear();
+    home_ = true;
+    fs::create_directories(home.path() + "/outside/tree/sub");
+    write(home.path() + "/outside/file", "imported");
+    write(home.path() + "/outside/tree/one", "1");
+    write(home.path() + "/outside/tree/sub/two", "2");
+    makeFolder("folder/sub/deep");
+    home.writeFile("folder/a", "A");
+    home.writeFile("folder/sub/b", "B");
+    home.writeFile("folder/sub/deep/c", "C");
+    home.makeSymlink("folder/link", "a");
+    makeFolder("target");
+    makeFolder(".Trash");
+    home.writeFile("doc", "document");
+  }
+
+  void clear() {
+    fs::remove_all(home.path() + "/outside");
+    fs::remove_all(home.documents());
+    fs::create_directory(home.documents());
+  }
+
+  static void write(const std::string& path, std::string_view contents) {
+    std::ofstream(path) << contents;
+  }
+
+  /// The error, if there was one.
+  std::optional<Error> run() {
+    const std::string_view name = GetParam().name;
+    const auto errorOf = [](const Result<URL>& result) {
+      return result ? std::nullopt : std::optional(result.error());
+    };
+    if (name == "ImportFile") return errorOf(import(home.path() + "/outside/file", ""));
+    if (name == "ImportTree") return errorOf(import(home.path() + "/outside/tree", "target"));
+    if (name == "CreateFolder") return errorOf(createFolder("folder", "new"));
+    if (name == "Rename") return errorOf(rename("folder", "renamed"));
+    if (name == "DeleteFile") return remove("doc");
+    if (name == "DeleteTree") return remove("folder");
+    if (name == "Trash") return errorOf(trash("folder"));
+    if (name == "MoveFileAcross") return errorOf(move("doc", "target"));
+    return errorOf(move("folder", "target", "moved"));
+  }
+
+  /// Runs it with something happening at the `number`th call; whether it came that far.
+  bool interrupt(int number, const std::function<int()>& happening) {
+    int calls = 0;
+    bool hasCrossed = !GetParam().crosses;
+    setCheck([=, this, &calls](std::string_view call) mutable {
+      if (call == "rename" && !hasCrossed) {
+        hasCrossed = true;
+        return EXDEV;
+      }
+      return ++calls == number ? happening() : 0;
+    });
+    error_ = run();
+    setCheck({});
+    return calls >= number;
+  }
+
+  void expectWhole(int number) {
+    const Tree now = tree();
+    EXPECT_TRUE(now == before_ || now == after_)
+        << "call " << number << ": " << ::testing::PrintToString(now);
+  }
+
+  void expectNothingLeft(int number) {
+    static_cast<void>(opened());
+    expectWhole(number);
+    EXPECT_THAT(hiddenNames(), ::testing::IsEmpty()) << "call " << number;
+    close();
+    EXPECT_FALSE(hasPendingWork()) << "call " << number;
+  }
+
+  bool home_ = false;
+  Tree before_;
+  Tree after_;
+  std::optional<Error> error_;
+};
+
+TEST_P(InterruptedOperations, LeaveItemsWholeWhicheverSystemCallFails) {
+  for (int number = 1;; ++number) {
+    makeTree();
+    if (!interrupt(number, [=] { return number % 2 == 0 ? EIO : ENOSPC; })) break;
+    // What is said to be done is done.
+    if (!error_) {
+      EXPECT_EQ(tree(), after_) << "call " << number;
+    }
+    expectWhole(number);
+    close();
+    expectNothingLeft(number);
+    ASSERT_LT(number, 1000);
+  }
+}
+
+TEST_P(InterruptedOperations, LeaveItemsWholeWhereverTheProcessIsKilled) {
+  for (int number = 1;; ++number) {
+    makeTree();
+    close();
+    const int code =
+        inProcess([=, this] { return interrupt(number, [] { return ::raise(SIGKILL); }) ? 1 : 0; });
+    if (code == 0) break;
+    ASSERT_EQ(code, -1);
+    expectNothingLeft(number);
+    ASSERT_LT(number, 1000);
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(Each, InterruptedOperations,
+                         ::testing::Values(Case{"ImportFile"}, Case{"ImportTree"},
+                                           Case{"CreateFolder"}, Case{"Rename"}, Case{"DeleteFile"},
+                                           Case{"DeleteTree"}, Case{"Trash"},
+                                           Case{"MoveFileAcross", true},
+                                           Case{"MoveTreeAcross", true}),
+                         [](const auto& instance) { return std::string(instance.param.name); });
+
+}  // namespace
+}  // namespace mirabel::testing

@@ -1,0 +1,145 @@
+#include <cerrno>
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <sys/stat.h>
+#include <sys/xattr.h>
+
+#include "linux/operations/OperationsFixture.h"
+#include "support/OrdinaryUser.h"
+
+namespace mirabel::testing {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// What only a real disk has: permissions, sparse files, several names of one file, odd names.
+class OperationsOnDisk : public OperationsTest {
+ protected:
+  struct stat statusOf(std::string_view name) const {
+    struct stat status {};
+    EXPECT_EQ(::lstat(home.at(name).c_str(), &status), 0) << name;
+    return status;
+  }
+};
+
+TEST_F(OperationsOnDisk, AnImportedTreeIsLikeItsSource) {
+  const std::string source = home.path() + "/source";
+  fs::create_directories(source + "/sub/\xFF");
+  std::ofstream(source + "/sub/\xFF/file") << "contents";
+  fs::create_hard_link(source + "/sub/\xFF/file", source + "/second name");
+  fs::create_symlink("../away", source + "/sub/link");
+  ASSERT_EQ(::mkfifo((source + "/fifo").c_str(), 0600), 0);
+  {
+    std::ofstream sparse(source + "/sparse");
+    sparse.seekp(64 << 20);
+    sparse << "end";
+  }
+  ASSERT_EQ(::chmod((source + "/sub/\xFF/file").c_str(), 0440), 0);
+  ASSERT_EQ(::chmod((source + "/sub").c_str(), 0550), 0);
+  const timespec times[] = {{1'000'000, 1}, {2'000'000, 123'456'789}};
+  ASSERT_EQ(::utimensat(AT_FDCWD, (source + "/sub").c_str(), times, 0), 0);
+  const bool hasAttributes = ::setxattr((source + "/sub").c_str(), "user.mine", "value", 5, 0) == 0;
+
+  const auto imported = import(source, "");
+  ASSERT_TRUE(imported) << imported.error().description();
+  EXPECT_EQ(imported->path(), home.at("source"));
+  EXPECT_EQ(tree("source").at("sub/\xFF/file"), "contents");
+  EXPECT_EQ(tree("source").at("sub/link"), "-> ../away");
+  EXPECT_EQ(tree("source").at("fifo"), "special");
+  EXPECT_EQ(statusOf("source/sub/\xFF/file").st_ino, statusOf("source/second name").st_ino);
+  EXPECT_EQ(statusOf("source/sub/\xFF/file").st_mode & 07777, 0440U);
+  EXPECT_EQ(statusOf("source/sub").st_mode & 07777, 0550U);
+  EXPECT_EQ(statusOf("source/sub").st_mtim.tv_sec, 2'000'000);
+  EXPECT_EQ(statusOf("source/sub").st_mtim.tv_nsec, 123'456'789);
+  EXPECT_EQ(statusOf("source/sparse").st_size, (64 << 20) + 3);
+  EXPECT_LT(statusOf("source/sparse").st_blocks, 2048);
+  char value[8];
+  if (hasAttributes) {
+    EXPECT_EQ(::getxattr(home.at("source/sub").c_str(), "user.mine", value, sizeof value), 5);
+  }
+  fs::permissions(source + "/sub", fs::perms::owner_all);
+  fs::permissions(home.at("source/sub"), fs::perms::owner_all);
+}
+
+TEST_F(OperationsOnDisk, WhatMayNotBeChangedStaysWhole) {
+  makeFolder("closed/sub");
+  home.writeFile("closed/file", "1");
+  makeFolder("open/closed");
+  home.writeFile("open/a", "A");
+  home.writeFile("open/closed/file", "2");
+  makeFolder("target");
+  home.setMode("open/closed", 0555);
+  home.setMode("closed", 0555);
+  if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
+  {
+    const OrdinaryUser user;
+    const Tree before = tree();
+    // A folder in the midst of it that may not be emptied: nothing of the rest goes either.
+    EXPECT_TRUE(remove("open")->isPosix(EACCES));
+    EXPECT_TRUE(remove("closed/file")->isPosix(EACCES));
+    EXPECT_EQ(failureOf(trash("closed/file")), EACCES);
+    EXPECT_EQ(failureOf(move("closed/file", "target")), EACCES);
+    EXPECT_EQ(failureOf(rename("closed/file", "other")), EACCES);
+    EXPECT_EQ(failureOf(createFolder("closed", "new")), EACCES);
+    EXPECT_EQ(failureOf(import(home.at("open/a"), "closed")), EACCES);
+    Tree after = tree();
+    after.erase(".Trash");
+    EXPECT_EQ(after, before);
+    EXPECT_THAT(hiddenNames(), ::testing::IsEmpty());
+  }
+  home.setMode("closed", 0755);
+  home.setMode("open/closed", 0755);
+}
+
+TEST_F(OperationsOnDisk, RootsAndWhatLiesOutsideThemAreNotChanged) {
+  std::ofstream(home.path() + "/outside") << "mine";
+  fs::create_directory(home.path() + "/folder");
+  makeFolder("sub");
+  home.makeSymlink("way out", home.path());
+  EXPECT_EQ(failureOf(rename("", "Other")), EPERM);
+  EXPECT_EQ(failureOf(rename("../outside", "other")), EXDEV);
+  EXPECT_TRUE(remove("")->isPosix(EPERM));
+  EXPECT_TRUE(remove("../outside")->isPosix(EXDEV));
+  EXPECT_TRUE(remove("sub/.")->isPosix(EPERM));
+  EXPECT_TRUE(remove("way out/outside"));
+  EXPECT_FALSE(createFolder("way out", "new"));
+  EXPECT_FALSE(import(home.path() + "/outside", "way out"));
+  EXPECT_TRUE(fs::exists(home.path() + "/outside"));
+  EXPECT_TRUE(fs::exists(home.at("sub")));
+  // As a source it may be anywhere.
+  EXPECT_TRUE(import(home.path() + "/outside", "sub"));
+}
+
+TEST_F(OperationsOnDisk, ManyOfOneNameFindFreeNamesQuickly) {
+  makeFolder("from");
+  int looks = 0;
+  for (int i = 1; i <= 300; ++i) {
+    home.writeFile("from/same.txt", std::to_string(i));
+    looks = 0;
+    setCheck([&](std::string_view) { return ++looks, 0; });
+    ASSERT_TRUE(trash("from/same.txt"));
+    setCheck({});
+  }
+  EXPECT_EQ(tree(".Trash").size(), 300U);
+  EXPECT_EQ(tree(".Trash").at("same.txt"), "1");
+  EXPECT_EQ(tree(".Trash").at("same 300.txt"), "300");
+  EXPECT_LT(looks, 100);
+  const std::string longest(255, 'n');
+  home.writeFile("from/" + longest, "first");
+  ASSERT_TRUE(trash("from/" + longest));
+  home.writeFile("from/" + longest, "second");
+  EXPECT_EQ(trash("from/" + longest)->lastPathComponent(), std::string(253, 'n') + " 2");
+}
+
+TEST_F(OperationsOnDisk, AnotherNameOfTheSameFileIsTaken) {
+  home.writeFile("one", "x");
+  home.link("one", "two");
+  const auto renamed = rename("one", "two");
+  ASSERT_FALSE(renamed);
+  EXPECT_TRUE(renamed.error().is(FileErrorCode::fileExists));
+  EXPECT_EQ(tree().size(), 2U);
+}
+
+}  // namespace
+}  // namespace mirabel::testing
