@@ -81,4 +81,11 @@ void logError(std::string_view message) {
   logMessage(LogLevel::error, message);
 }
 
+std::string quoted(std::string_view text) {
+  std::string line;
+  line.reserve(text.size() + 2);
+  line.append(1, '"').append(text).append(1, '"');
+  return line;
+}
+
 }  // namespace mirabel

@@ -69,6 +69,9 @@ void logMessage(LogLevel level, Build&& build) {
   if (Log::shared().isEnabled(level)) logMessage(level, std::string_view(build()));
 }
 
+/// What a message is about, in its double quotes.
+[[nodiscard]] std::string quoted(std::string_view text);
+
 /// A numbered bracket around a step: writes "[DEBUG] ┏N label" when made and "[DEBUG] ┗N" when it
 /// goes out of scope, on every path. Numbers start at 0 and are unique in the process.
 class LogSection {

@@ -2,6 +2,8 @@
 
 #include <sstream>
 
+#include "foundation/Log.h"
+
 namespace mirabel {
 namespace {
 
@@ -13,10 +15,6 @@ std::string listOf(const std::vector<Each>& elements, Text text) {
     list += text(element);
   }
   return list + "]";
-}
-
-std::string quoted(const std::string& text) {
-  return "\"" + text + "\"";
 }
 
 }  // namespace

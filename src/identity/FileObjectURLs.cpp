@@ -27,10 +27,6 @@ std::nullopt_t nothing(LogLevel level, Build&& build) {
   return std::nullopt;
 }
 
-std::string quoted(std::string_view text) {
-  return "\"" + std::string(text) + "\"";
-}
-
 std::string errnoText(const Error& error) {
   return "; " + std::to_string(error.code);
 }

@@ -6,16 +6,13 @@
 
 #include "foundation/KeyedArchive.h"
 #include "foundation/Log.h"
+#include "items/AttributeNames.h"
 #include "items/TagData.h"
 
 namespace mirabel {
 namespace {
 
 constexpr std::string_view folderType = "inode/directory";
-constexpr std::string_view lastUsedDateAttribute = "com.norvane.lastuseddate#PS";
-constexpr std::string_view tagsAttribute = "com.norvane.metadata:_kMDItemUserTags";
-constexpr std::string_view favoriteRankAttribute = "com.norvane.favorite-rank.number#PS";
-constexpr std::string_view putBackAttribute = "com.norvane.trash.putback#PS";
 /// Documents of these two suites are folders whose size is worth the walk.
 constexpr std::string_view sizedPackageTypes[] = {"com.norvane.quillsuite",
                                                   "com.norvane.lumenbeat"};
@@ -166,10 +163,12 @@ void LocalItem::buildUserMetadata() {
     return extendedAttribute(context_.platform.attributes, name, fileURL_);
   };
   if (!isAppLibrary()) {
-    lastUsedDate_ = decoded<Date>(attribute(lastUsedDateAttribute), keyedarchive::unarchiveDate);
+    lastUsedDate_ =
+        decoded<Date>(attribute(attributename::lastUsedDate), keyedarchive::unarchiveDate);
   }
-  tagData_ = tagDataFrom(attribute(tagsAttribute));
-  favoriteRank_ = decoded<Number>(attribute(favoriteRankAttribute), keyedarchive::unarchiveNumber);
+  tagData_ = tagDataFrom(attribute(attributename::tags));
+  favoriteRank_ =
+      decoded<Number>(attribute(attributename::favoriteRank), keyedarchive::unarchiveNumber);
 }
 
 void LocalItem::buildStatus() {
@@ -216,7 +215,7 @@ const std::optional<URL>& LocalItem::putBackURL() const {
 
 std::optional<URL> LocalItem::computedPutBackURL() const {
   const auto attribute =
-      extendedAttribute(context_.platform.attributes, putBackAttribute, fileURL_);
+      extendedAttribute(context_.platform.attributes, attributename::putBack, fileURL_);
   if (!attribute) {
     logDebug("couldn't find putback xattr for " + fileURL_.path());
     return {};

@@ -14,10 +14,6 @@ namespace {
 
 constexpr std::string_view temporaryLocalFolderName = ".TemporaryLocalFolder";
 
-std::string quoted(std::string_view text) {
-  return "\"" + std::string(text) + "\"";
-}
-
 /// The caller may have kept its URL for long, and with it what was cached of the file.
 URL uncached(const URL& url) {
   return url.isFileURL() ? URL::fileURL(url.path()) : url;
