@@ -1,4 +1,5 @@
 #include "platform/Conformance.h"
+#include "platform/FileOperationsConformance.h"
 #include "support/FakePlatform.h"
 
 namespace mirabel::testing {
@@ -30,9 +31,12 @@ class FakeVolumeUnderTest final : public Volume {
   FakePlatform fake_;
 };
 
-INSTANTIATE_TEST_SUITE_P(Fake, PlatformConformance, ::testing::Values([] {
-                           return std::unique_ptr<Volume>(std::make_unique<FakeVolumeUnderTest>());
-                         }));
+std::unique_ptr<Volume> makeFakeVolume() {
+  return std::make_unique<FakeVolumeUnderTest>();
+}
+
+INSTANTIATE_TEST_SUITE_P(Fake, PlatformConformance, ::testing::Values(makeFakeVolume));
+INSTANTIATE_TEST_SUITE_P(Fake, FileOperationsConformance, ::testing::Values(makeFakeVolume));
 
 }  // namespace
 }  // namespace mirabel::testing

@@ -6,26 +6,15 @@
 #include <mutex>
 #include <utility>
 
+#include "support/FakeCore.h"
+#include "support/FakeFileOperations.h"
+
 namespace mirabel::testing {
 namespace {
 
 using NodePointer = std::shared_ptr<FakeNode>;
 
-/// What the interfaces share.
-struct Core {
-  FakeVolume& volume;
-  FaultScript& faults;
-  std::mutex mutex;
-
-  Result<NodePointer> look(Op op, const URL& url) {
-    if (auto error = faults.hit(op)) return fail(*std::move(error));
-    return volume.find(url.path());
-  }
-};
-
-bool holdsAttributes(const FakeNode& node) {
-  return node.kind == FileKind::regular || node.kind == FileKind::folder;
-}
+using Core = FakeCore;
 
 std::vector<std::string> attributeNames(const FakeNode& node) {
   std::vector<std::string> names;
@@ -62,33 +51,6 @@ class Resources final : public ResourceValueSource {
   Core& core_;
 };
 
-class OpenAttributes final : public AttributeTarget {
- public:
-  OpenAttributes(Core& core, NodePointer node) : core_(core), node_(std::move(node)) {}
-
-  Result<void> set(std::string_view name, const Data& value) override {
-    const std::lock_guard lock(core_.mutex);
-    if (auto error = core_.faults.hit(Op::attributeSet)) return fail(*std::move(error));
-    if (!holdsAttributes(*node_)) return fail(Error::posix(EPERM));
-    if (!node_->isWritable) return fail(Error::posix(EACCES));
-    node_->attributes[std::string(name)] = value;
-    return {};
-  }
-
-  Result<void> remove(std::string_view name) override {
-    const std::lock_guard lock(core_.mutex);
-    if (auto error = core_.faults.hit(Op::attributeRemove)) return fail(*std::move(error));
-    if (!holdsAttributes(*node_)) return fail(Error::posix(EPERM));
-    if (!node_->isWritable) return fail(Error::posix(EACCES));
-    if (node_->attributes.erase(std::string(name)) == 0) return fail(Error::posix(ENODATA));
-    return {};
-  }
-
- private:
-  Core& core_;
-  NodePointer node_;
-};
-
 class Attributes final : public ExtendedAttributeStore {
  public:
   explicit Attributes(Core& core) : core_(core) {}
@@ -118,7 +80,7 @@ class Attributes final : public ExtendedAttributeStore {
     const std::lock_guard lock(core_.mutex);
     const auto node = core_.look(Op::attributeOpen, url);
     if (!node) return fail(node.error());
-    return std::make_unique<OpenAttributes>(core_, *node);
+    return std::make_unique<FakeAttributeTarget>(core_, *node);
   }
 
  private:
@@ -314,24 +276,6 @@ class Sizer final : public DirectorySizer {
   Core& core_;
 };
 
-class Operations final : public FileOperations {
- public:
-  explicit Operations(Core& core) : core_(core) {}
-
-  Result<void> createDirectory(const URL& url) override {
-    const std::lock_guard lock(core_.mutex);
-    if (auto error = core_.faults.hit(Op::createDirectory)) return fail(*std::move(error));
-    const auto existing = core_.volume.find(url.path());
-    if (existing && (*existing)->kind != FileKind::folder) return fail(Error::posix(EEXIST));
-    if (!existing && !existing.error().isPosix(ENOENT)) return fail(existing.error());
-    core_.volume.makeFolder(url.path());
-    return {};
-  }
-
- private:
-  Core& core_;
-};
-
 class Manager final : public VesselManager {
  public:
   Manager(URL documentStorage, FakeSignals& signals)
@@ -398,17 +342,19 @@ std::optional<Data> FakePositions::find(std::string_view container, const Data& 
 struct FakePlatform::Interfaces {
   Interfaces(FakePlatform& owner, URL documentStorage)
       : core{owner.volume, owner.faults, {}},
+        reports(owner.reports),
         manager(std::move(documentStorage), owner.signals),
         history(core, owner.historyUUID) {}
 
   Core core;
+  FakeReports& reports;
   Resources resources{core};
   Attributes attributes{core};
   Objects objects{core};
   Documents documents{core};
   Directories directories{core};
   Sizer sizes{core};
-  Operations operations{core};
+  FakeFileOperations operations{core, reports};
   Manager manager;
   History history;
 };

@@ -12,6 +12,7 @@
 
 #include "platform/DiagnosticReporter.h"
 #include "platform/Platform.h"
+#include "support/FakeReports.h"
 #include "support/FakeVolume.h"
 #include "support/FaultScript.h"
 
@@ -93,6 +94,7 @@ class FakePlatform {
   FakeSignals signals;
   FakeDiagnostics diagnostics;
   FakePositions positions{faults};
+  FakeReports reports;
   UUID historyUUID = UUID::fromString("11111111-2222-3333-4444-555555555555").value();
 
  private:

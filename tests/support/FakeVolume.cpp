@@ -57,6 +57,12 @@ void loseName(FakeNode& node) {
     loseName(*child);
 }
 
+void gainName(FakeNode& node) {
+  ++node.names;
+  for (const auto& [name, child] : node.entries)
+    gainName(*child);
+}
+
 }  // namespace
 
 FakeVolume::FakeVolume() : root_(std::make_shared<FakeNode>()) {
@@ -108,6 +114,20 @@ void FakeVolume::remove(std::string_view path) {
   const auto entry = entryNamed(folder, split(path).name);
   loseName(*entry->second);
   folder.entries.erase(entry);
+}
+
+void FakeVolume::copy(std::string_view from, std::string_view to) {
+  enter(to, copyOf(at(from)));
+}
+
+std::shared_ptr<FakeNode> FakeVolume::copyOf(const FakeNode& original) {
+  auto node = std::make_shared<FakeNode>(original);
+  node->fileID = nextFileID_++;
+  node->documentID = 0;
+  node->names = 0;
+  for (auto& [name, child] : node->entries)
+    child = copyOf(*child);
+  return node;
 }
 
 FakeNode& FakeVolume::at(std::string_view path) {
@@ -183,7 +203,7 @@ FakeNode& FakeVolume::add(std::string_view path, FileKind kind) {
 }
 
 void FakeVolume::enter(std::string_view path, std::shared_ptr<FakeNode> node) {
-  ++node->names;
+  gainName(*node);
   node->place = nextPlace_++;
   at(split(path).parent).entries.emplace_back(split(path).name, std::move(node));
 }

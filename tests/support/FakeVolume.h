@@ -50,6 +50,9 @@ class FakeVolume {
   void rename(std::string_view from, std::string_view to);
   /// With everything below it.
   void remove(std::string_view path);
+  /// Enters a copy of the object, with everything below it, under new file IDs and without
+  /// document IDs. `to` must be free.
+  void copy(std::string_view from, std::string_view to);
 
   /// The object at `path`, which must exist.
   [[nodiscard]] FakeNode& at(std::string_view path);
@@ -68,6 +71,7 @@ class FakeVolume {
 
  private:
   FakeNode& add(std::string_view path, FileKind kind);
+  std::shared_ptr<FakeNode> copyOf(const FakeNode& original);
   void enter(std::string_view path, std::shared_ptr<FakeNode> node);
 
   std::shared_ptr<FakeNode> root_;

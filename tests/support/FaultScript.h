@@ -34,6 +34,13 @@ enum class Op {
   closeDirectory,
   directorySize,
   createDirectory,
+  importUnderFolder,
+  createSubFolder,
+  renameWithNewName,
+  reparentUnderFolder,
+  trashUnderFolder,
+  deleteItem,
+  readWriteAccess,
   keepPosition,
   historyUUID,
 };
