@@ -2,6 +2,12 @@
 
 namespace mirabel {
 
+std::string BundleProxy::description() const {
+  return "<BundleProxy bundleIdentifier: " + bundleIdentifier.value_or("(null)") +
+         ", dataContainerURL: " +
+         (dataContainerURL ? dataContainerURL->description() : std::string("(null)")) + ">";
+}
+
 std::optional<BundleProxy> NoApplications::proxyForBundleIdentifier(std::string_view) {
   return {};
 }

@@ -13,6 +13,9 @@ struct BundleProxy {
   std::optional<std::string> bundleIdentifier;
   std::optional<URL> dataContainerURL;
   std::optional<std::string> localizedName;
+
+  /// One line for logs: identifier and data container.
+  [[nodiscard]] std::string description() const;
 };
 
 /// The applications installed on this machine. Any thread may call it.

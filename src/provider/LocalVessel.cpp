@@ -31,6 +31,7 @@ LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
 
 LocalVessel::~LocalVessel() {
   liveUpdates_.stop();
+  underway_.wait();
 }
 
 std::optional<URL> LocalVessel::URLForItemWithPersistentIdentifier(
@@ -79,8 +80,7 @@ std::optional<std::string> LocalVessel::identifierForURL(const URL& url) const {
   return item->itemIdentifier();
 }
 
-Result<std::shared_ptr<LocalItem>> LocalVessel::itemForIdentifier(
-    std::string_view identifier) const {
+LocalVessel::ItemResult LocalVessel::itemForIdentifier(std::string_view identifier) const {
   const LogSection section("fetching item's properties for " + quoted(identifier));
   auto item = lookUpItem(identifier);
   if (!item) {
@@ -91,7 +91,7 @@ Result<std::shared_ptr<LocalItem>> LocalVessel::itemForIdentifier(
   return item;
 }
 
-Result<std::shared_ptr<LocalItem>> LocalVessel::_propertiesForItemAtURL(const URL& url) const {
+LocalVessel::ItemResult LocalVessel::_propertiesForItemAtURL(const URL& url) const {
   const auto identifier = _persistentIdentifierForItemAt(url);
   if (!identifier) {
     logError("identifier lookup failed for URL " + quoted(url.path()));

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "enumeration/EnumerationServices.h"
+#include "foundation/DispatchGroup.h"
 #include "fs/FSChangesEnumerator.h"
 #include "identity/FileObjectURLs.h"
 #include "items/LocalItem.h"
@@ -16,21 +17,28 @@
 
 namespace mirabel {
 
-/// The principal object that the host calls. Entry points may be called from any thread; the
-/// lookups hold no lock and keep no cache.
+/// The principal object that the host calls. Entry points may be called from any thread; lookups
+/// and operations hold no lock and keep no cache.
 class LocalVessel {
  public:
   /// Everything passed in outlives the provider. Without `changes` it has no enumerators.
   LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
               const AppLibraryOwners& owners, std::optional<ChangeServices> changes = {});
-  /// Ends the live updates of its enumerators.
+  /// Ends the live updates of its enumerators, and waits until the operations that were started
+  /// have reported: so it must not be called from a completion handler.
   ~LocalVessel();
   LocalVessel(const LocalVessel&) = delete;
   LocalVessel& operator=(const LocalVessel&) = delete;
 
+  using ItemResult = Result<std::shared_ptr<LocalItem>>;
+  /// Completion handlers are called exactly once: on a thread of the host's file operations, or
+  /// on the caller's before the call returns.
+  using ItemHandler = std::function<void(ItemResult)>;
   using ErrorHandler = std::function<void(std::optional<Error>)>;
 
-  /// Host entry points. The two lookups answer nothing where there is nothing, with a log line.
+  // Lookups.
+
+  /// Nothing where there is nothing, with a log line.
   [[nodiscard]] std::optional<URL> URLForItemWithPersistentIdentifier(
       std::string_view identifier) const;
   [[nodiscard]] std::optional<URL> _urlForItemWithPersistentIdentifier(
@@ -38,9 +46,8 @@ class LocalVessel {
   [[nodiscard]] std::optional<std::string> persistentIdentifierForItemAtURL(const URL& url) const;
   [[nodiscard]] std::optional<std::string> _persistentIdentifierForItemAt(const URL& url) const;
   /// Error: `LocalVesselError::invalidItemIdentifier`.
-  [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemForIdentifier(
-      std::string_view identifier) const;
-  [[nodiscard]] Result<std::shared_ptr<LocalItem>> _propertiesForItemAtURL(const URL& url) const;
+  [[nodiscard]] ItemResult itemForIdentifier(std::string_view identifier) const;
+  [[nodiscard]] ItemResult _propertiesForItemAtURL(const URL& url) const;
 
   /// The enumerator of a container, with its live updates started where they are wanted. It must
   /// not outlive the provider. Errors: those of `urlForIdentifier`; POSIX ENOTSUP for a provider
@@ -48,13 +55,66 @@ class LocalVessel {
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumeratorForContainerItemIdentifier(
       std::string_view identifier, LiveUpdates liveUpdates = LiveUpdates::wanted);
 
+  // Operations on items. Each answers with the item as it is afterwards, read anew. Errors: the
+  // host's no-such-item error for an identifier that leads nowhere; the host's collision error
+  // for a name that is taken, and the file error `fileExists` where what is in the way is no item;
+  // the file error `writeNotPermitted` for a place in the root container, which holds the app
+  // libraries; else those of `FileOperations`. Where the change was made and its item cannot be
+  // built, the error is the lookup's, and the change stays.
+
+  /// Copies what lies at `source`, anywhere, into the parent.
+  void importDocumentAtURL(const URL& source, std::string_view toParentItemIdentifier,
+                           ItemHandler completionHandler);
+  void createDirectoryWithName(std::string_view name, std::string_view inParentItemIdentifier,
+                               ItemHandler completionHandler);
+  void renameItemWithIdentifier(std::string_view identifier, std::string_view toName,
+                                ItemHandler completionHandler);
+  /// Where parent and item are both unknown, the error names the parent.
+  void reparentItemWithIdentifier(std::string_view identifier,
+                                  std::string_view toParentItemWithIdentifier,
+                                  std::optional<std::string> newName,
+                                  ItemHandler completionHandler);
+  /// A folder with everything in it.
+  void deleteItemWithIdentifier(std::string_view identifier, ErrorHandler completionHandler);
+  /// The document folder of an application. Error: invalid parameter `bundleIdentifier`.
+  void _defaultApplicationContainerForBundleIdentifier(std::string_view bundleIdentifier,
+                                                       const ItemHandler& completionHandler) const;
+
+  // Trash.
+
+  /// Moves the item into the trash folder of its documents, and notes on it when that was and,
+  /// where it lies in the document folder of an application, where it came from. These notes may
+  /// fail unheard. Error: invalid parameter `sourceURL` where no folder "Documents" holds it.
+  void trashItemWithIdentifier(std::string_view identifier, ItemHandler completionHandler);
+  /// Moves the item out of the trash: into the parent, if one is given and is not in the trash
+  /// itself; else to where it came from; else to the top of its application's document folder. It
+  /// gets `formerName`, or else the name that it had there, or else keeps its own; where that is
+  /// taken, one made from it. Documents of no application have no note of where they came from:
+  /// a host that wants them to go back remembers parent and name. Error: invalid parameter
+  /// `itemIdentifier` for an item that is not in the trash, or that has no place to go.
+  void untrashItemWithIdentifier(std::string_view identifier,
+                                 std::optional<std::string> toParentItemIdentifier,
+                                 ItemHandler completionHandler,
+                                 std::optional<std::string> formerName = {});
+
+  // The user's metadata, each kept in an attribute of the file; nothing given clears it. A write
+  // that fails leaves the attribute as it was, with a POSIX error.
+
+  void setLastUsedDate(const std::optional<Date>& date, std::string_view forItemIdentifier,
+                       const ItemHandler& completionHandler);
+  /// Tags in the host's encoding, see items/TagData.h. Anything else is an empty list of tags.
+  void setTagData(const std::optional<Data>& tagData, std::string_view forItemIdentifier,
+                  const ItemHandler& completionHandler);
+  void setFavoriteRank(const std::optional<Number>& rank, std::string_view forItemIdentifier,
+                       const ItemHandler& completionHandler);
+
   /// All content is local: these complete at once, without an error.
   void providePlaceholderAtURL(const URL& url, const ErrorHandler& completionHandler) const;
   void startProvidingItemAtURL(const URL& url, const ErrorHandler& completionHandler) const;
   void stopProvidingItemAtURL(const URL& url) const;
   void itemChangedAtURL(const URL& url) const;
 
-  /// Lookups that the operations share. `urlForIdentifier` fails with the host's no-such-item
+  /// Lookups that others share. `urlForIdentifier` fails with the host's no-such-item
   /// error; `lookUpItem` logs nothing of its own. Items refer to this provider and to what was
   /// passed to it until their `putBackURL` was asked for.
   [[nodiscard]] Result<URL> urlForIdentifier(std::string_view identifier) const;
@@ -68,6 +128,31 @@ class LocalVessel {
   [[nodiscard]] std::optional<std::string> identifierForURL(const URL& url) const;
   [[nodiscard]] Result<std::vector<URL>> foldersOf(std::string_view container) const;
 
+  using AfterSuccess = std::function<void(const URL&)>;
+  [[nodiscard]] FileOperations::URLHandler completion(ItemHandler completionHandler,
+                                                      AfterSuccess afterSuccess = {});
+  [[nodiscard]] ItemResult itemOfOutcome(const Result<URL>& outcome,
+                                         const AfterSuccess& afterSuccess) const;
+  [[nodiscard]] Error mappedError(const Error& error) const;
+  [[nodiscard]] std::optional<Error> writeAttribute(std::string_view name,
+                                                    const std::optional<Data>& value,
+                                                    const URL& url) const;
+
+  void setTrashDate(const URL& url, const std::optional<Date>& date) const;
+  void setPutBackString(const URL& preTrashURL, const URL& trashedURL) const;
+  [[nodiscard]] std::optional<URL> untrashDestination(
+      const LocalItem& item, const std::optional<std::string>& parentIdentifier) const;
+  [[nodiscard]] std::optional<URL> providedParent(std::string_view identifier) const;
+  [[nodiscard]] std::optional<URL> putBackFolder(const LocalItem& item) const;
+  [[nodiscard]] std::optional<URL> appLibraryRoot(const LocalItem& item) const;
+
+  [[nodiscard]] ItemResult storeLastUsedDate(const std::optional<Date>& date,
+                                             std::string_view identifier) const;
+  [[nodiscard]] ItemResult storeTagData(const std::optional<Data>& tagData,
+                                        std::string_view identifier) const;
+  [[nodiscard]] ItemResult storeFavoriteRank(const std::optional<Number>& rank,
+                                             std::string_view identifier) const;
+
   Platform platform_;
   const AppLibraryRoots& roots_;
   FileObjectURLs identity_;
@@ -75,6 +160,7 @@ class LocalVessel {
   std::optional<ChangeServices> changes_;
   OpenWalks walks_;
   RunningReaders liveUpdates_;
+  DispatchGroup underway_;  ///< operations that have not reported yet
 };
 
 }  // namespace mirabel

@@ -5,10 +5,10 @@
 #include <string>
 #include <vector>
 
+#include "provider/Lines.h"
 #include "provider/LocalVessel.h"
 #include "support/FakeAppLibraries.h"
 #include "support/FakePlatform.h"
-#include "support/LogCapture.h"
 
 namespace mirabel::testing {
 namespace {
@@ -18,13 +18,6 @@ using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
 const Error invalidIdentifier = Error::local(LocalVesselError::invalidItemIdentifier);
-
-LogLine debug(const std::string& text) {
-  return {LogLevel::debug, "[DEBUG] " + text};
-}
-LogLine error(const std::string& text) {
-  return {LogLevel::error, "[ERROR] " + text};
-}
 
 class LocalVesselTest : public ::testing::Test {
  protected:

@@ -92,7 +92,7 @@ std::optional<Error> FakeFileOperations::vs_withReadWriteAccess(const URL& url,
 }
 
 void FakeFileOperations::report(Result<URL> outcome, URLHandler completionHandler) {
-  if (outcome) outcome = reports_.wrongOutcome.value_or(*outcome);
+  if (outcome) outcome = reports_.outcome.value_or(*outcome);
   reports_.make([completionHandler = std::move(completionHandler), outcome = std::move(outcome)] {
     completionHandler(outcome);
   });

@@ -23,8 +23,8 @@ class FakeReports {
   /// Passes on a report of the platform's.
   void make(std::function<void()> report);
 
-  /// What every operation that succeeds names as its outcome, against all promises.
-  std::optional<URL> wrongOutcome;
+  /// What every operation that succeeds reports in place of its own URL.
+  std::optional<URL> outcome;
 
  private:
   mutable std::mutex mutex_;

@@ -1,0 +1,75 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "provider/Lines.h"
+#include "provider/TrashPlaces.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::ElementsAre;
+
+TEST(TrashPlacesTest, TrashFolderLiesInTheFirstFolderNamedDocuments) {
+  const std::pair<const char*, const char*> cases[] = {
+      {"/a/Documents/x", "/a/Documents/.Trash"},
+      {"/a/Documents/Sub/Documents/x", "/a/Documents/.Trash"},
+      {"/Documents", "/Documents/.Trash"},
+      {"/a/Documents/.Trash/x", "/a/Documents/.Trash"},
+      {"/a/MyDocuments/Documents/x", "/a/MyDocuments/Documents/.Trash"},
+      {"/a/100%\n/Documents/x", "/a/100%\n/Documents/.Trash"},
+      {"/a/documents/Documents2/x", nullptr},
+      {"/a", nullptr},
+      {"/", nullptr},
+  };
+  for (const auto& [item, trash] : cases) {
+    LogCapture log;
+    const auto folder = trashFolderFor(URL::fileURL(item));
+    if (trash != nullptr) {
+      EXPECT_EQ(folder, URL::fileURL(trash)) << item;
+      continue;
+    }
+    ASSERT_FALSE(folder) << item;
+    EXPECT_EQ(folder.error(), Error::invalidParameter("sourceURL", "file://" + std::string(item)));
+    EXPECT_THAT(log.lines(), ElementsAre(error("no Documents directory found in path \"" +
+                                               std::string(item) + "\"")));
+  }
+}
+
+TEST(TrashPlacesTest, ComponentsThatNameNoFileAreRefusedWithTheirList) {
+  const std::pair<std::vector<std::string>, std::string> cases[] = {
+      {{}, "[]"},
+      {{"Documents", ".Trash"}, R"(["Documents", ".Trash"])"},
+      {{"/", std::string("a\0", 2), ".Trash"}, std::string("[\"/\", \"a\0\", \".Trash\"]", 21)},
+  };
+  for (const auto& [components, list] : cases) {
+    LogCapture log;
+    const auto folder = trashFolderAt(components);
+    ASSERT_FALSE(folder) << list;
+    EXPECT_EQ(folder.error(), Error::invalidParameter("trashComponents", list));
+    EXPECT_THAT(log.lines(),
+                ElementsAre(error("can't build trash URL from components \"" + list + "\"")));
+  }
+}
+
+TEST(TrashPlacesTest, PutBackStringIsThePathBehindTheLibrary) {
+  struct Case {
+    const char* item;
+    const char* library;
+    std::optional<std::string> string;
+  };
+  const Case cases[] = {
+      {"/apps/draw/Documents/Notes/a.txt", "/apps/draw/Documents", "Notes/a.txt"},
+      {"/apps/draw/Documents/a.txt", "/apps/draw/Documents", "a.txt"},
+      {"/apps/draw/Documents/new\nline/100%", "/apps/draw/Documents", "new\nline/100%"},
+      {"/private/var/draw/Documents/a", "/var/draw/Documents", "a"},
+      {"/apps/draw/Documents", "/apps/draw/Documents", ""},
+      {"/apps/draw/Documents2/a", "/apps/draw/Documents", std::nullopt},
+      {"/apps/draw", "/apps/draw/Documents", std::nullopt},
+      {"/home/me/Documents/a", "/apps/draw/Documents", std::nullopt},
+  };
+  for (const Case& c : cases)
+    EXPECT_EQ(putBackString(URL::fileURL(c.item), URL::fileURL(c.library)), c.string) << c.item;
+}
+
+}  // namespace
+}  // namespace mirabel::testing
