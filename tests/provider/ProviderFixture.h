@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "provider/Lines.h"
@@ -45,6 +46,16 @@ class Completions {
   }
 
   std::vector<LocalVessel::ItemResult> results;
+};
+
+/// Says of every place that this application has it.
+class OneOwner final : public AppLibraryOwners {
+ public:
+  explicit OneOwner(BundleProxy owner) : owner_(std::move(owner)) {}
+  std::optional<BundleProxy> applicationOwning(const URL&) const override { return owner_; }
+
+ private:
+  BundleProxy owner_;
 };
 
 /// A provider of a document storage with a folder and a file, and of one app library.

@@ -32,16 +32,6 @@ class TrashTest : public ProviderFixture {
   std::string file;
 };
 
-/// Says of every place that this application has it.
-class OneOwner final : public AppLibraryOwners {
- public:
-  explicit OneOwner(BundleProxy owner) : owner_(std::move(owner)) {}
-  std::optional<BundleProxy> applicationOwning(const URL&) const override { return owner_; }
-
- private:
-  BundleProxy owner_;
-};
-
 TEST_F(TrashTest, TheItemIsMovedWithANoteOfWhenAndFromWhere) {
   vessel->trashItemWithIdentifier(file, done.handler());
   EXPECT_EQ(done.item()->itemIdentifier(), file);

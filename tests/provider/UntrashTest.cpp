@@ -32,7 +32,10 @@ class UntrashTest : public ProviderFixture {
     done.results.clear();
     vessel->untrashItemWithIdentifier(file, parent, done.handler(), formerName);
   }
-  std::string pathAfterwards() { return done.item()->fileURL().path(); }
+  std::string pathAfterwards() {
+    const auto item = done.item();
+    return item ? item->fileURL().path() : std::string();
+  }
 
   const std::string library = "/apps/draw/Documents";
   const std::string putBack = "file:///apps/draw/Documents/Notes/a.txt";
@@ -180,6 +183,15 @@ TEST_F(UntrashTest, WhatHasNoPlaceToGoStays) {
   vessel->untrashItemWithIdentifier(id(".Trash/a.txt"), id("folder"), Completions().handler(),
                                     "former.txt");
   EXPECT_TRUE(exists("folder/former.txt"));
+}
+
+TEST_F(UntrashTest, ALibraryInTheTrashDoesNotGoIntoItself) {
+  fake.volume.makeFolder(fake.path(".Trash"));
+  const OneOwner owners(fake.install("org.example.trashed", fake.path(".Trash/app"), "Trashed"));
+  LocalVessel other(fake.platform(), libraries, owners);
+  other.untrashItemWithIdentifier("#org.example.trashed", {}, done.handler());
+  EXPECT_EQ(done.error(), Error::invalidParameter("itemIdentifier", "#org.example.trashed"));
+  EXPECT_EQ(fake.faults.calls(Op::reparentUnderFolder), 0U);
 }
 
 TEST_F(UntrashTest, AFailedMoveLeavesTheDate) {
