@@ -80,5 +80,6 @@ void require(bool condition, const char* what);
 void runListingBenchmarks(const Scale& scale);
 void runPagesBenchmarks(const Scale& scale);
 void runFollowingBenchmarks(const Scale& scale);
+void runOperationBenchmarks(const Scale& scale);
 
 }  // namespace mirabel::bench

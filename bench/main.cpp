@@ -27,6 +27,7 @@ int run(int count, char** arguments) {
   mirabel::bench::runListingBenchmarks(scale);
   mirabel::bench::runPagesBenchmarks(scale);
   mirabel::bench::runFollowingBenchmarks(scale);
+  mirabel::bench::runOperationBenchmarks(scale);
   return 0;
 }
 

@@ -5,6 +5,7 @@
 #include <memory>
 
 #include "cli/Commands.h"
+#include "cli/ItemCommandLine.h"
 #include "foundation/Log.h"
 #include "foundation/StandardErrorSink.h"
 #include "linux/log/JournalSink.h"
@@ -30,6 +31,7 @@ constexpr const char* pathHelp =
 constexpr const char* exitCodeHelp =
     "Exit codes: 0 done, 1 failed, 2 usage, 3 no such item, 4 start over, 5 not permitted,\n"
     "6 name taken, 7 busy.";
+const std::string globalHelp = "Global options: see mirabel --help.";
 constexpr double longestTimeout = 86'400;
 
 /// Everything that the command line may say.
@@ -42,6 +44,7 @@ struct Arguments {
   ChangesOptions changes;
   WatchOptions watch;
   std::string container = "root";
+  ItemArguments items;
   bool showVersion = false;
 };
 
@@ -62,7 +65,7 @@ void addGlobalOptions(CLI::App& app, Arguments& arguments) {
 CLI::App* addCommand(CLI::App& app, const char* name, const char* description,
                      const std::string& argumentHelp) {
   CLI::App* command = app.add_subcommand(name, description);
-  command->footer(argumentHelp + "Global options: see mirabel --help.");
+  command->footer(argumentHelp + globalHelp);
   return command;
 }
 
@@ -108,6 +111,7 @@ void addCommands(CLI::App& app, Arguments& arguments) {
       ->add_option("--since", arguments.watch.since,
                    "First print what changed since an anchor that was printed before")
       ->type_name("ANCHOR");
+  addItemCommands(app, arguments.items, itemHelp + globalHelp);
   addCommand(app, "status", "Say how changes are followed, and what the history holds", "");
   addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
   addCommand(app, "demo", "A guided tour in a temporary home", "");
@@ -121,6 +125,7 @@ ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& argume
   if (app.got_subcommand("anchor")) return runAnchor(program, arguments.container);
   if (app.got_subcommand("changes")) return runChanges(program, arguments.changes);
   if (app.got_subcommand("watch")) return runWatch(program, arguments.watch);
+  if (const auto code = runItemCommand(app, program, arguments.items)) return *code;
   if (app.got_subcommand("status")) return runStatus(program);
   if (app.got_subcommand("doctor")) return runDoctor(program);
   return runDemo(program);

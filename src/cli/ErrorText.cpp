@@ -51,7 +51,9 @@ std::string posixText(const Error& error) {
 
 std::string fileText(const Error& error) {
   if (error.is(FileErrorCode::noSuchFile)) return std::string(nothingThere);
-  if (error.is(FileErrorCode::writeNotPermitted)) return "it may not be written";
+  if (error.is(FileErrorCode::writeNotPermitted)) {
+    return "nothing can be put into the root itself; choose a folder in it";
+  }
   if (error.is(FileErrorCode::fileExists)) return "a file of that name is there already";
   return error.description();
 }

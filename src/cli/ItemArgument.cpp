@@ -89,6 +89,12 @@ Result<std::shared_ptr<LocalItem>> ItemArgument::item(const Session& session) co
   return isIdentifier() ? itemByIdentifier(session) : itemAtPath(session, text_);
 }
 
+Result<URL> ItemArgument::urlOfPath(const std::string& path) {
+  const auto place = resolved(path);
+  if (!place) return fail(place.error());
+  return URL::fileURL(*place);
+}
+
 Result<std::shared_ptr<LocalItem>> ItemArgument::itemByIdentifier(const Session& session) const {
   if (!hasForm(text_)) {
     return fail(withDetail(Error::local(LocalVesselError::invalidItemIdentifier),

@@ -25,6 +25,10 @@ class ItemArgument {
   [[nodiscard]] static Result<std::shared_ptr<LocalItem>> itemAtPath(const Session& session,
                                                                      const std::string& path);
 
+  /// Where a path leads, inside the documents or outside, its links resolved but for the last
+  /// component. POSIX errors.
+  [[nodiscard]] static Result<URL> urlOfPath(const std::string& path);
+
  private:
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemByIdentifier(const Session& session) const;
 

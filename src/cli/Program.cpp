@@ -37,6 +37,10 @@ void Program::note(std::string_view text) const {
   }
 }
 
+void Program::showProgress(std::string_view text) const {
+  streams_.err << "\r\033[K" << text << std::flush;
+}
+
 ExitCode Program::report(const Error& error, std::string_view what) {
   const std::string message = std::string(what) + "; " + explanation(error);
   reportFailure(streams_.err, options_.json, domainName(error.domain), error.code, message);

@@ -49,6 +49,9 @@ class Program {
 
   /// Tells something beside the answer, on standard error; with --json as {"notice":…}.
   void note(std::string_view text) const;
+  /// Shows how far something has come on standard error, in place of what it showed before; an
+  /// empty text takes that away. For a terminal.
+  void showProgress(std::string_view text) const;
   /// Reports on standard error, for people or, with --json, for programs. `what` says what was
   /// tried, in lower case without a full stop. Answers the code to end with.
   ExitCode report(const Error& error, std::string_view what);

@@ -21,6 +21,8 @@ Result<std::unique_ptr<Session>> Session::open(Options options) {
   session->provider_ = std::make_unique<LocalVessel>(
       session->platform(), session->roots_, session->owners_,
       ChangeServices{events, session->diagnostics_, *session->enumerations_});
+  session->trash_ = std::make_unique<HostTrash>(*session->provider_,
+                                                session->platform_->index().keptAttributes());
   return session;
 }
 

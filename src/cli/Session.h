@@ -9,6 +9,7 @@
 
 #include "foundation/Error.h"
 #include "fs/FSChangesEnumerator.h"
+#include "host/HostTrash.h"
 #include "linux/files/LinuxPlatform.h"
 #include "linux/log/LoggingDiagnosticReporter.h"
 #include "provider/LocalVessel.h"
@@ -28,6 +29,8 @@ class Session {
   [[nodiscard]] static Result<std::unique_ptr<Session>> open(Options options);
 
   [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
+  [[nodiscard]] LocalVessel& provider() { return *provider_; }
+  [[nodiscard]] HostTrash& trash() { return *trash_; }
   /// Lists the container and tells its changes, when it is asked. Errors: see `LocalVessel`.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(
       std::string_view container, LiveUpdates liveUpdates = LiveUpdates::unwanted) {
@@ -44,6 +47,7 @@ class Session {
   LoggingDiagnosticReporter diagnostics_;
   std::unique_ptr<FileObjectURLs> identity_;
   std::unique_ptr<FSChangesEnumerations> enumerations_;
+  std::unique_ptr<HostTrash> trash_;  // what the provider has begun may still report to it
   std::unique_ptr<LocalVessel> provider_;
 };
 

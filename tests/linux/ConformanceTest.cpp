@@ -1,5 +1,6 @@
 #include "linux/files/LinuxPlatform.h"
 #include "platform/Conformance.h"
+#include "platform/FileOperationsConformance.h"
 #include "support/TempHome.h"
 
 namespace mirabel::testing {
@@ -28,9 +29,12 @@ class LinuxVolumeUnderTest final : public Volume {
   std::unique_ptr<LinuxPlatform> linux_ = LinuxPlatform::open({.home = home_.path()}).value();
 };
 
-INSTANTIATE_TEST_SUITE_P(Linux, PlatformConformance, ::testing::Values([] {
-                           return std::unique_ptr<Volume>(std::make_unique<LinuxVolumeUnderTest>());
-                         }));
+std::unique_ptr<Volume> makeLinuxVolume() {
+  return std::make_unique<LinuxVolumeUnderTest>();
+}
+
+INSTANTIATE_TEST_SUITE_P(Linux, PlatformConformance, ::testing::Values(makeLinuxVolume));
+INSTANTIATE_TEST_SUITE_P(Linux, FileOperationsConformance, ::testing::Values(makeLinuxVolume));
 
 }  // namespace
 }  // namespace mirabel::testing

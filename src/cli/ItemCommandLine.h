@@ -1,0 +1,35 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "cli/ItemCommands.h"
+
+namespace CLI {
+class App;
+}
+
+namespace mirabel {
+
+/// What the command line may say to the commands that change items.
+struct ItemArguments {
+  CreateOptions create;
+  ImportOptions import;
+  RenameOptions rename;
+  MoveOptions move;
+  RemoveOptions remove;
+  std::vector<std::string> trash;
+  RestoreOptions restore;
+  TagOptions tag;
+  FavoriteOptions favorite;
+  UsedOptions used;
+};
+
+/// Adds those commands; `arguments` outlives the parser. `footer` is what their help ends with.
+void addItemCommands(CLI::App& app, ItemArguments& arguments, const std::string& footer);
+/// Runs the one that was given, if one of them was.
+[[nodiscard]] std::optional<ExitCode> runItemCommand(const CLI::App& app, Program& program,
+                                                     const ItemArguments& arguments);
+
+}  // namespace mirabel

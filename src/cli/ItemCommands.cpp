@@ -1,0 +1,66 @@
+#include "cli/ItemCommands.h"
+
+#include <utility>
+
+#include "cli/ItemArgument.h"
+#include "cli/OperationRun.h"
+
+namespace mirabel {
+
+ExitCode runMakeFolder(Program& program, const CreateOptions& options) {
+  return runOnItem(program, options.parent, "can't make the folder " + options.name,
+                   [&](const std::string& parent, auto done) {
+                     program.session()->provider().createDirectoryWithName(options.name, parent,
+                                                                           std::move(done));
+                   });
+}
+
+ExitCode runImport(Program& program, const ImportOptions& options) {
+  Session* session = program.session();
+  if (session == nullptr) return program.exitCode();
+  const auto parent = ItemArgument(options.parent).item(*session);
+  if (!parent) return program.report(parent.error(), "can't find " + options.parent);
+  const OperationRun run(program, *session);
+  // All at once, for they wait for the disk most of the time, and told in their order.
+  std::vector<std::pair<std::string, OperationRun::Begun>> begun;
+  for (const std::string& file : options.files) {
+    const auto source = ItemArgument::urlOfPath(file);
+    begun.emplace_back(file, OperationRun::begin([&](auto done) {
+                         if (!source) return done(fail(source.error()));
+                         session->provider().importDocumentAtURL(
+                             *source, (*parent)->itemIdentifier(), std::move(done));
+                       }));
+  }
+  Outcomes outcomes;
+  for (auto& [file, operation] : begun) {
+    const auto result = run.wait(std::move(operation));
+    if (!result) {
+      outcomes.add(program.report(result.error(), "can't import " + file));
+    } else {
+      printOutcome(program, **result);
+    }
+  }
+  return outcomes.exitCode();
+}
+
+ExitCode runRename(Program& program, const RenameOptions& options) {
+  return runOnItem(program, options.item, "can't rename " + options.item + " to " + options.name,
+                   [&](const std::string& item, auto done) {
+                     program.session()->provider().renameItemWithIdentifier(item, options.name,
+                                                                            std::move(done));
+                   });
+}
+
+ExitCode runMove(Program& program, const MoveOptions& options) {
+  Session* session = program.session();
+  if (session == nullptr) return program.exitCode();
+  const auto parent = ItemArgument(options.parent).item(*session);
+  if (!parent) return program.report(parent.error(), "can't find " + options.parent);
+  return runOnItem(program, options.item, "can't move " + options.item + " to " + options.parent,
+                   [&](const std::string& item, auto done) {
+                     session->provider().reparentItemWithIdentifier(
+                         item, (*parent)->itemIdentifier(), options.name, std::move(done));
+                   });
+}
+
+}  // namespace mirabel

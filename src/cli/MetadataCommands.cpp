@@ -1,0 +1,101 @@
+#include <cerrno>
+#include <charconv>
+#include <nlohmann/json.hpp>
+#include <ostream>
+#include <utility>
+
+#include "cli/ItemArgument.h"
+#include "cli/ItemCommands.h"
+#include "cli/ItemJSON.h"
+#include "cli/OperationRun.h"
+#include "cli/Printing.h"
+#include "items/TagData.h"
+
+namespace mirabel {
+namespace {
+
+std::optional<Number> numberFrom(const std::string& text) {
+  const char* const end = text.data() + text.size();
+  std::int64_t integer = 0;
+  if (const auto read = std::from_chars(text.data(), end, integer);
+      read.ec == std::errc() && read.ptr == end)
+    return Number::of(integer);
+  std::uint64_t large = 0;
+  if (const auto read = std::from_chars(text.data(), end, large);
+      read.ec == std::errc() && read.ptr == end)
+    return Number::of(large);
+  double real = 0;
+  const auto read = std::from_chars(text.data(), end, real, std::chars_format::general);
+  if (read.ec == std::errc() && read.ptr == end && real - real == 0) return Number::of(real);
+  return {};
+}
+
+ExitCode tellTags(Program& program, const std::string& item) {
+  Session* session = program.session();
+  if (session == nullptr) return program.exitCode();
+  const auto found = ItemArgument(item).item(*session);
+  if (!found) return program.report(found.error(), "can't find " + item);
+  if (program.options().json) {
+    program.out() << itemJSON(**found).dump() << '\n';
+    return ExitCode::done;
+  }
+  if (const auto& data = (*found)->tagData()) {
+    for (const Tag& tag : decodeTagData(*data).value_or(std::vector<Tag>()))
+      program.out() << printable(tag.label) << '\n';
+  }
+  return ExitCode::done;
+}
+
+ExitCode refuse(Program& program, const std::string& text, std::string_view what) {
+  program.report(Error::posix(EINVAL, text), what);
+  return ExitCode::usage;
+}
+
+}  // namespace
+
+ExitCode runTag(Program& program, const TagOptions& options) {
+  if (options.labels.empty() && !options.clears) return tellTags(program, options.item);
+  std::optional<Data> tagData;
+  if (!options.clears) {
+    std::vector<Tag> tags;
+    for (const std::string& label : options.labels)
+      tags.push_back({label});
+    auto encoded = encodeTagData(tags);
+    if (!encoded)
+      return refuse(program, "labels are text in UTF-8, 64 KiB in all at most", "can't use them");
+    tagData = *std::move(encoded);
+  }
+  return runOnItem(program, options.item, "can't tag " + options.item,
+                   [&](const std::string& identifier, const auto& done) {
+                     program.session()->provider().setTagData(tagData, identifier, done);
+                   });
+}
+
+ExitCode runFavorite(Program& program, const FavoriteOptions& options) {
+  std::optional<Number> rank;
+  if (!options.clears) {
+    rank = options.rank ? numberFrom(*options.rank) : Number::of(std::int64_t{1});
+    if (!rank) return refuse(program, "a rank is a number", "can't use " + *options.rank);
+  }
+  return runOnItem(program, options.item, "can't rank " + options.item,
+                   [&](const std::string& identifier, const auto& done) {
+                     program.session()->provider().setFavoriteRank(rank, identifier, done);
+                   });
+}
+
+ExitCode runUsed(Program& program, const UsedOptions& options) {
+  std::optional<Date> date;
+  if (!options.clears) {
+    date = options.date ? Date::fromRFC3339(*options.date) : Date::now();
+    if (!date) {
+      return refuse(program, "a date is written like 2026-11-21 or 2026-11-21T09:30:00Z",
+                    "can't use " + *options.date);
+    }
+  }
+  return runOnItem(program, options.item, "can't note when " + options.item + " was used",
+                   [&](const std::string& identifier, const auto& done) {
+                     program.session()->provider().setLastUsedDate(date, identifier, done);
+                   });
+}
+
+}  // namespace mirabel

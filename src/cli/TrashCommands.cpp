@@ -1,0 +1,68 @@
+#include <utility>
+
+#include "cli/ItemArgument.h"
+#include "cli/ItemCommands.h"
+#include "cli/OperationRun.h"
+
+namespace mirabel {
+namespace {
+
+/// What a refusal means for this item, in words that say what to do.
+Error explained(Error error, bool isTrashed) {
+  if (!error.is(VesselErrorCode::invalidParameter)) return error;
+  error.userInfo[std::string(errorkey::detail)] =
+      isTrashed ? "the folder that it came from is gone or in the trash itself, or not known; say "
+                  "with --to where it shall go"
+                : "it is not in the trash";
+  return error;
+}
+
+ExitCode restoreOne(Program& program, const std::string& item,
+                    const std::optional<std::string>& parent) {
+  Session& session = *program.session();
+  const auto found = ItemArgument(item).item(session);
+  if (!found) return program.report(found.error(), "can't find " + item);
+  const auto result = OperationRun(program, session).item([&](auto done) {
+    session.trash().restore((*found)->itemIdentifier(), parent, std::move(done));
+  });
+  if (!result) {
+    return program.report(explained(result.error(), (*found)->isTrashed()),
+                          "can't restore " + item);
+  }
+  printOutcome(program, **result);
+  return ExitCode::done;
+}
+
+}  // namespace
+
+ExitCode runTrash(Program& program, const std::vector<std::string>& items) {
+  Outcomes outcomes;
+  for (const std::string& item : items) {
+    outcomes.add(runOnItem(program, item, "can't trash " + item,
+                           [&](const std::string& identifier, auto done) {
+                             program.session()->trash().trash(identifier, std::move(done));
+                           }));
+  }
+  return outcomes.exitCode();
+}
+
+ExitCode runRestore(Program& program, const RestoreOptions& options) {
+  Session* session = program.session();
+  if (session == nullptr) return program.exitCode();
+  std::optional<std::string> parent;
+  if (options.parent) {
+    const auto found = ItemArgument(*options.parent).item(*session);
+    if (!found) return program.report(found.error(), "can't find " + *options.parent);
+    if ((*found)->isTrashed()) {
+      return program.report(Error::invalidParameter("parent", (*found)->itemIdentifier()),
+                            "can't restore to " + *options.parent + ", which is in the trash");
+    }
+    parent = (*found)->itemIdentifier();
+  }
+  Outcomes outcomes;
+  for (const std::string& item : options.items)
+    outcomes.add(restoreOne(program, item, parent));
+  return outcomes.exitCode();
+}
+
+}  // namespace mirabel

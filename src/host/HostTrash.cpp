@@ -1,0 +1,47 @@
+#include "host/HostTrash.h"
+
+#include <utility>
+
+#include "foundation/Log.h"
+
+namespace mirabel {
+
+void HostTrash::trash(std::string_view identifier, LocalVessel::ItemHandler completionHandler) {
+  const auto item = provider_.lookUpItem(identifier);
+  // Applications' documents carry their own note, and what is in the trash came from elsewhere.
+  const bool isRemembered =
+      item && item->fileID() && !item->isTrashed() && !item->vs_appContainerBundleIdentifier();
+  if (!isRemembered)
+    return provider_.trashItemWithIdentifier(identifier, std::move(completionHandler));
+  const std::uint64_t fileID = *item->fileID();
+  auto remembered = origins_.remember(fileID, {item->parentItemIdentifier(), item->filename()});
+  if (!remembered)
+    logError("can't remember where an item came from; " + remembered.error().description());
+  provider_.trashItemWithIdentifier(
+      identifier, [this, fileID, done = std::move(completionHandler)](auto result) {
+        if (!result) origins_.forget(fileID);
+        done(std::move(result));
+      });
+}
+
+void HostTrash::restore(std::string_view identifier,
+                        std::optional<std::string> toParentItemIdentifier,
+                        LocalVessel::ItemHandler completionHandler) {
+  const auto item = provider_.lookUpItem(identifier);
+  const auto fileID = item ? item->fileID() : std::nullopt;
+  const auto origin = fileID ? origins_.find(*fileID) : std::nullopt;
+  if (!origin) {
+    return provider_.untrashItemWithIdentifier(identifier, std::move(toParentItemIdentifier),
+                                               std::move(completionHandler));
+  }
+  if (!toParentItemIdentifier) toParentItemIdentifier = origin->parentItemIdentifier;
+  provider_.untrashItemWithIdentifier(
+      identifier, std::move(toParentItemIdentifier),
+      [this, fileID, done = std::move(completionHandler)](auto result) {
+        if (result) origins_.forget(*fileID);
+        done(std::move(result));
+      },
+      origin->filename);
+}
+
+}  // namespace mirabel

@@ -1,0 +1,32 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "host/TrashOrigins.h"
+#include "provider/LocalVessel.h"
+
+namespace mirabel {
+
+/// The trash as a host uses it: the provider's, and where things came from that no application
+/// owns. Any thread may call it; it outlives the completion handlers that it was given.
+class HostTrash {
+ public:
+  /// Both outlive it.
+  HostTrash(LocalVessel& provider, KeptAttributes& kept) : provider_(provider), origins_(kept) {}
+
+  /// See `LocalVessel::trashItemWithIdentifier`. Where the item came from is on disk before it is
+  /// moved.
+  void trash(std::string_view identifier, LocalVessel::ItemHandler completionHandler);
+  /// See `LocalVessel::untrashItemWithIdentifier`; without a parent, an item goes back to the one
+  /// that it had, under its own name.
+  void restore(std::string_view identifier, std::optional<std::string> toParentItemIdentifier,
+               LocalVessel::ItemHandler completionHandler);
+
+ private:
+  LocalVessel& provider_;
+  TrashOrigins origins_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,255 @@
+#include <filesystem>
+#include <fstream>
+#include <functional>
+
+#include "cli/CommandLineFixture.h"
+
+namespace mirabel::testing {
+namespace {
+
+namespace fs = std::filesystem;
+
+using ::testing::Contains;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+
+/// The commands that change items.
+class ItemCommands : public CommandLineFixture {
+ protected:
+  void SetUp() override {
+    home.makeFolder("folder");
+    home.makeFolder("target");
+    home.writeFile("folder/doc.txt", "text");
+    std::ofstream(home.path() + "/source.txt") << "imported";
+  }
+
+  std::string idOf(std::string_view name) const {
+    return run({"--json", "id", home.at(name)}).json().at("itemIdentifier");
+  }
+  nlohmann::json item(std::vector<std::string> arguments) const {
+    arguments.insert(arguments.begin(), "--json");
+    const Answer answer = run(std::move(arguments));
+    EXPECT_EQ(answer.code, 0) << answer.err;
+    return answer.json();
+  }
+  std::string anchor() const { return run({"--json", "anchor", "workingset"}).json().at("anchor"); }
+  bool exists(std::string_view name) const { return fs::exists(fs::symlink_status(home.at(name))); }
+
+  /// What the working set is told of since the anchor: identifiers, by how it is told of them.
+  struct Told {
+    std::vector<std::string> updated;
+    std::vector<std::string> deleted;
+  };
+  Told toldSince(const std::string& anchor) const {
+    const auto batch = run({"--json", "changes", "--since", anchor, "workingset"}).json();
+    Told told;
+    for (const auto& each : batch.at("updated"))
+      told.updated.push_back(each.at("itemIdentifier"));
+    for (const auto& each : batch.at("deleted"))
+      told.deleted.push_back(each);
+    return told;
+  }
+};
+
+TEST_F(ItemCommands, HandBackTheItemThatAListingShowsAndTheChangesName) {
+  const std::vector<std::vector<std::string>> commands = {
+      {"mkdir", "new", "--in", home.at("folder")},
+      {"import", home.path() + "/source.txt", "--in", home.at("folder")},
+      {"rename", home.at("folder/doc.txt"), "letter.txt"},
+      {"mv", home.at("folder/letter.txt"), home.at("target"), "--name", "moved.txt"},
+      {"tag", home.at("target/moved.txt"), "red", "blue"},
+      {"favorite", home.at("target/moved.txt"), "7"},
+      {"used", home.at("target/moved.txt"), "2026-11-21"},
+      {"trash", home.at("target/moved.txt")},
+      {"restore", home.at(".Trash/moved.txt")},
+  };
+  const std::string document = idOf("folder/doc.txt");
+  for (const auto& command : commands) {
+    const std::string before = anchor();
+    const nlohmann::json handedBack = item(command);
+    EXPECT_EQ(item({"info", handedBack.at("itemIdentifier")}), handedBack) << command[0];
+    EXPECT_THAT(toldSince(before).updated,
+                Contains(handedBack.at("itemIdentifier").get<std::string>()))
+        << command[0];
+    if (command[0] != "mkdir" && command[0] != "import") {
+      EXPECT_EQ(handedBack.at("itemIdentifier"), document) << command[0];
+    }
+  }
+  const nlohmann::json last = item({"info", document});
+  EXPECT_EQ(last.at("path"), home.at("target/moved.txt"));
+  EXPECT_EQ(last.at("tags"), nlohmann::json({"red", "blue"}));
+  EXPECT_EQ(last.at("favoriteRank"), "7");
+  EXPECT_EQ(last.at("lastUsedDate"), "2026-11-21T00:00:00Z");
+
+  const std::string before = anchor();
+  EXPECT_EQ(item({"rm", home.at("target/moved.txt")}), nlohmann::json({{"deleted", {document}}}));
+  EXPECT_THAT(toldSince(before).deleted, Contains(document));
+  EXPECT_FALSE(exists("target/moved.txt"));
+}
+
+TEST_F(ItemCommands, MetadataIsClearedAndTagsArePrinted) {
+  const std::string doc = home.at("folder/doc.txt");
+  EXPECT_EQ(run({"tag", doc, "red", "late\nr"}).code, 0);
+  EXPECT_EQ(run({"tag", doc}).out, "red\nlate\\nr\n");
+  EXPECT_EQ(item({"tag", doc, "--clear"}).at("tags"), nlohmann::json::array());
+  EXPECT_EQ(item({"favorite", doc}).at("favoriteRank"), "1");
+  EXPECT_EQ(item({"favorite", doc, "2.5"}).at("favoriteRank"), 2.5);
+  EXPECT_FALSE(item({"favorite", doc, "--clear"}).contains("favoriteRank"));
+  EXPECT_TRUE(item({"used", doc}).contains("lastUsedDate"));
+  EXPECT_FALSE(item({"used", doc, "--clear"}).contains("lastUsedDate"));
+}
+
+TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
+  home.writeFile("target/doc.txt", "in the way");
+  const std::string doc = home.at("folder/doc.txt");
+  const std::string taker = idOf("target/doc.txt");
+  struct Row {
+    std::vector<std::string> arguments;
+    int code;
+    std::string message;
+  };
+  const Row rows[] = {
+      {{"mkdir", "new", "--in", "root"}, 5, "choose a folder in it"},
+      {{"mkdir", "a/b", "--in", home.at("folder")}, 1, "a name can't hold \"/\""},
+      {{"mkdir", std::string(256, 'x'), "--in", home.at("folder")}, 1, "file name too long"},
+      {{"mkdir", "new", "--in", doc}, 1, "not a folder"},
+      {{"mkdir", "new", "--in", home.at("nowhere")}, 3, "no such file"},
+      {{"import", home.path() + "/nothing", "--in", home.at("folder")}, 3, "no such file"},
+      {{"rename", "did=999", "name"}, 3, "no item has this identifier"},
+      {{"mv", doc, home.at("target")}, 6, "the name is taken by " + taker},
+      {{"mv", doc, "root"}, 5, "choose a folder in it"},
+      {{"mv", home.at("folder"), home.at("folder")}, 1, "invalid argument"},
+      {{"rm", "root"}, 5, "not something in the documents that can be changed"},
+      {{"restore", doc}, 1, "it is not in the trash"},
+      {{"favorite", doc, "many"}, 2, "a rank is a number"},
+      {{"used", doc, "yesterday"}, 2, "a date is written like"},
+  };
+  for (const Row& row : rows) {
+    SCOPED_TRACE(row.arguments[0] + " " + row.arguments[1]);
+    expectFailure(run(row.arguments), row.code, row.message);
+  }
+  EXPECT_EQ(run({"tag", doc, "red", "--clear"}).code, 2);
+  EXPECT_EQ(run({"mkdir", "new"}).code, 2);
+  EXPECT_TRUE(exists("folder/doc.txt"));
+}
+
+TEST_F(ItemCommands, OfSeveralItemsOneFailureDoesNotStopTheOthers) {
+  std::ofstream(home.path() + "/second.txt") << "2";
+  const Answer answer = run({"import", home.path() + "/source.txt", home.path() + "/missing",
+                             home.path() + "/second.txt", "--in", home.at("folder")});
+  EXPECT_EQ(answer.code, 3);
+  EXPECT_TRUE(exists("folder/source.txt"));
+  EXPECT_TRUE(exists("folder/second.txt"));
+  EXPECT_EQ(run({"rm", home.at("nowhere"), home.at("folder/second.txt")}).code, 3);
+  EXPECT_FALSE(exists("folder/second.txt"));
+}
+
+TEST_F(ItemCommands, ADryRunSaysWhatWouldGoAndLeavesIt) {
+  home.writeFile("folder/second.txt", "12345");
+  const Answer answer = run({"rm", "--dry-run", home.at("folder")});
+  EXPECT_EQ(answer.code, 0);
+  EXPECT_THAT(answer.out, HasSubstr("would remove " + idOf("folder")));
+  EXPECT_THAT(answer.out, HasSubstr("(3 entries, 9 B)"));
+  EXPECT_TRUE(exists("folder/doc.txt"));
+}
+
+/// What every user's trash has to stand.
+class TrashCommands : public ItemCommands {
+ protected:
+  std::string trash(std::string_view name) const {
+    return item({"trash", home.at(name)}).at("itemIdentifier");
+  }
+  std::string restore(const std::string& identifier) const {
+    return item({"restore", identifier}).at("path");
+  }
+};
+
+TEST_F(TrashCommands, EverythingComesBackToItsPlaceUnderItsOwnName) {
+  home.makeFolder("folder/sub");
+  home.writeFile("folder/sub/file", "inside");
+  home.makeFolder("folder/letter.quill");
+  home.writeFile("folder/letter.quill/text", "page");
+  home.makeSymlink("folder/link", "nowhere");
+  home.writeFile("folder/" + std::string(255, 'n'), "long");
+  home.writeFile("folder/read-only", "r");
+  home.setMode("folder/read-only", 0444);
+  home.writeFile("top", "in the document storage itself");
+  std::vector<std::pair<std::string, std::string>> trashed;
+  for (const std::string name :
+       {std::string("folder/sub"), std::string("folder/letter.quill"), std::string("folder/link"),
+        "folder/" + std::string(255, 'n'), std::string("folder/read-only"), std::string("top")}) {
+    trashed.emplace_back(name, trash(name));
+    EXPECT_FALSE(exists(name)) << name;
+  }
+  for (const auto& [name, identifier] : trashed) {
+    EXPECT_EQ(restore(identifier), home.at(name));
+    EXPECT_TRUE(exists(name)) << name;
+  }
+  EXPECT_TRUE(exists("folder/sub/file"));
+  EXPECT_THAT(run({"--json", "ls", home.at(".Trash")}).json().at("items"), IsEmpty());
+}
+
+TEST_F(TrashCommands, ThingsOfOneNameKeepApart) {
+  const std::string first = trash("folder/doc.txt");
+  home.writeFile("folder/doc.txt", "second");
+  const std::string second = trash("folder/doc.txt");
+  EXPECT_NE(first, second);
+  EXPECT_TRUE(exists(".Trash/doc 2.txt"));
+  EXPECT_EQ(restore(second), home.at("folder/doc.txt"));
+  // Its name is taken now, and it bounces.
+  EXPECT_EQ(restore(first), home.at("folder/doc 2.txt"));
+}
+
+TEST_F(TrashCommands, TheFolderThatItCameFromIsFoundWhereverItIsNow) {
+  const std::string moved = trash("folder/doc.txt");
+  home.rename("folder", "target/elsewhere");
+  EXPECT_EQ(restore(moved), home.at("target/elsewhere/doc.txt"));
+}
+
+TEST_F(TrashCommands, WhereThatFolderCanTakeNothingTheUserIsAsked) {
+  home.makeFolder("replaced");
+  home.makeFolder("trashed");
+  home.makeFolder("gone");
+  std::vector<std::string> items;
+  for (const std::string folder : {"replaced", "trashed", "gone"}) {
+    home.writeFile(folder + "/" + folder, "x");
+    items.push_back(trash(folder + "/" + folder));
+  }
+  home.remove("replaced");
+  home.writeFile("replaced", "a file now");
+  trash("trashed");
+  home.remove("gone");
+  for (const std::string& identifier : items) {
+    const Answer refused = run({"restore", identifier});
+    EXPECT_EQ(refused.code, 1);
+    EXPECT_THAT(refused.err, HasSubstr("say with --to where it shall go"));
+    EXPECT_EQ(run({"restore", identifier, "--to", home.at("target")}).code, 0);
+  }
+  EXPECT_TRUE(exists("target/replaced"));
+  EXPECT_TRUE(exists("target/trashed"));
+  EXPECT_TRUE(exists("target/gone"));
+}
+
+TEST_F(TrashCommands, TwoProcessesThatTrashAndRestoreAtOnceLoseNothing) {
+  for (int i = 0; i < 6; ++i)
+    home.writeFile("folder/f" + std::to_string(i), std::to_string(i));
+  const Answer answer = shell(R"(
+    work() {
+      for round in 1 2 3; do
+        for i in "$@"; do
+          id=$("$mirabel" --home "$home" id "$documents/folder/f$i") || return 1
+          "$mirabel" --home "$home" trash "$id" || return 1
+          "$mirabel" --home "$home" restore "$id" || return 1
+        done
+      done
+    }
+    work 0 1 2 & first=$!
+    work 3 4 5 & second=$!
+    wait $first && wait $second)");
+  EXPECT_EQ(answer.code, 0) << answer.err;
+  for (int i = 0; i < 6; ++i)
+    EXPECT_TRUE(exists("folder/f" + std::to_string(i))) << i;
+}
+
+}  // namespace
+}  // namespace mirabel::testing
