@@ -93,7 +93,7 @@ class LocalVessel {
   /// a host that wants them to go back remembers parent and name. Error: invalid parameter
   /// `itemIdentifier` for an item that is not in the trash, or that has no place to go.
   void untrashItemWithIdentifier(std::string_view identifier,
-                                 std::optional<std::string> toParentItemIdentifier,
+                                 const std::optional<std::string>& toParentItemIdentifier,
                                  ItemHandler completionHandler,
                                  std::optional<std::string> formerName = {});
 

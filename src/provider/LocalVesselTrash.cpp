@@ -66,10 +66,9 @@ void LocalVessel::setPutBackString(const URL& preTrashURL, const URL& trashedURL
            error->description());
 }
 
-void LocalVessel::untrashItemWithIdentifier(std::string_view identifier,
-                                            std::optional<std::string> toParentItemIdentifier,
-                                            ItemHandler completionHandler,
-                                            std::optional<std::string> formerName) {
+void LocalVessel::untrashItemWithIdentifier(
+    std::string_view identifier, const std::optional<std::string>& toParentItemIdentifier,
+    ItemHandler completionHandler, std::optional<std::string> formerName) {
   const LogSection section("untrash item " + quoted(identifier));
   const auto url = _urlForItemWithPersistentIdentifier(identifier);
   const auto item = url ? lookUpItem(identifier) : nullptr;
@@ -103,7 +102,7 @@ std::optional<URL> LocalVessel::untrashDestination(
 }
 
 std::optional<URL> LocalVessel::providedParent(std::string_view identifier) const {
-  const auto parent = _urlForItemWithPersistentIdentifier(identifier);
+  auto parent = _urlForItemWithPersistentIdentifier(identifier);
   if (!parent || !isInTrash(*parent)) return parent;
   logDebug([&] {
     return "can't use provided parent item " + std::string(identifier) + " because it's trashed; " +
@@ -119,7 +118,7 @@ std::optional<URL> LocalVessel::putBackFolder(const LocalItem& item) const {
     logDebug("no putback url");
     return {};
   }
-  const URL folder = URL::fileURL(putBack->deletingLastPathComponent().path());
+  URL folder = URL::fileURL(putBack->deletingLastPathComponent().path());
   const auto isFolder = ResourceReader(platform_.resources).value(ResourceKey::isDirectory, folder);
   if (isInTrash(folder) || !isFolder || *isFolder != ResourceValue(true)) {
     logDebug([&] { return "putback url is not reachable; " + putBack->description(); });
