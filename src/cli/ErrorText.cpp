@@ -63,6 +63,12 @@ std::string vesselText(const Error& error) {
     return "it is no longer valid; start over, with a new listing or a new anchor";
   }
   if (error.is(VesselErrorCode::noSuchItem)) return "no item has this identifier";
+  if (error.is(VesselErrorCode::collision)) {
+    const auto taker = error.userInfo.find(errorkey::collidingItem);
+    return "the name is taken" +
+           (taker == error.userInfo.end() ? std::string() : " by " + taker->second);
+  }
+  if (std::string detail = detailOf(error); !detail.empty()) return detail;
   return error.description();
 }
 

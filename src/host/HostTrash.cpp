@@ -17,11 +17,13 @@ void HostTrash::trash(std::string_view identifier, LocalVessel::ItemHandler comp
   auto remembered = origins_.remember(fileID, {item->parentItemIdentifier(), item->filename()});
   if (!remembered)
     logError("can't remember where an item came from; " + remembered.error().description());
-  provider_.trashItemWithIdentifier(
-      identifier, [this, fileID, done = std::move(completionHandler)](auto result) {
-        if (!result) origins_.forget(fileID);
-        done(std::move(result));
-      });
+  provider_.trashItemWithIdentifier(identifier, [this, fileID, identifier = std::string(identifier),
+                                                 done = std::move(completionHandler)](auto result) {
+    // An error may come after the move; what is remembered for nothing does no harm.
+    const auto left = result ? nullptr : provider_.lookUpItem(identifier);
+    if (left && !left->isTrashed()) origins_.forget(fileID);
+    done(std::move(result));
+  });
 }
 
 void HostTrash::restore(std::string_view identifier,

@@ -18,9 +18,10 @@ enum class Bouncing { refused, allowed };
 /// the URL that they are asked of first. Any thread may call them.
 ///
 /// Those with a handler report exactly once, on a thread of their own choosing that is not the
-/// caller's, or at once on the caller's for what is refused before anything is touched. When a
-/// handler is called with success, the change is on disk. A failure leaves the item whole and in
-/// one place, the one where it was unless the operation says otherwise.
+/// caller's, or at once on the caller's for what is refused before anything is touched. A handler
+/// must not wait for another operation. When it is called with success, the change is on disk. A
+/// failure leaves the item whole and in one place: the one where it was, or, where no more failed
+/// than to have the change on disk, the one where it should be.
 ///
 /// No name is ever replaced. Where the name is taken (and bouncing is refused), the error is
 /// `FileErrorCode::fileExists`, with the URL of what is in the way (`vs_collidingURL`). A name that

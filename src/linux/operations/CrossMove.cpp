@@ -13,23 +13,24 @@ namespace mirabel {
 
 Result<void> CrossMove::run(const ItemPlace& item, const OpenFolder& folder,
                             const std::string& name) const {
-  if (auto allowed = mayBeTakenAway(item); !allowed) return allowed;
   if (context_.calls.status(folder.descriptor.get(), name)) return fail(Error::posix(EEXIST));
+  if (auto allowed = mayBeTakenAway(item); !allowed) return allowed;
   auto copy = context_.pending.temporaryName(folder.path);
   if (!copy) return fail(copy.error());
   auto done = TreeCopy(context_.calls, context_.progress, CopyKind::move)
                   .run(item.folder.descriptor.get(), item.name, folder.descriptor.get(), *copy);
   auto record = done ? recordOf(item, folder, name, *copy) : fail(done.error());
   if (record) done = context_.pending.begin(*record);
-  if (!record || !done) {
+  if (!record) done = fail(record.error());
+  if (done) done = exchange(item, folder, *copy, *record);
+  if (!done) {
     removeTemporary(context_, folder, *copy);
-    return fail(record ? done.error() : record.error());
+    return done;
   }
-  done = exchange(item, folder, *copy, *record);
   // From here on the hidden item is nothing but something to be removed.
   context_.pending.end(*record);
-  if (done) removeTemporary(context_, item.folder, record->hiddenSource);
-  return done;
+  removeTemporary(context_, item.folder, record->hiddenSource);
+  return {};
 }
 
 /// Refused before anything is copied, since it could not be finished.
@@ -47,50 +48,54 @@ Result<void> CrossMove::mayBeTakenAway(const ItemPlace& item) const {
 
 Result<PendingMove> CrossMove::recordOf(const ItemPlace& item, const OpenFolder& folder,
                                         const std::string& name, const std::string& copy) const {
-  auto source = context_.calls.status(item.folder.descriptor.get(), item.name);
   auto made = context_.calls.status(folder.descriptor.get(), copy);
-  if (!source || !made) return fail(source ? made.error() : source.error());
+  if (!made) return fail(made.error());
   auto hidden = context_.pending.temporaryName(item.folder.path);
+  if (!hidden) return fail(hidden.error());
   auto from = context_.pending.folderAt(item.folder.path);
   auto to = context_.pending.folderAt(folder.path);
-  if (!hidden) return fail(hidden.error());
   if (!from || !to) return fail(from ? to.error() : from.error());
-  return PendingMove{*std::move(from), item.name,  *std::move(hidden), *std::move(to), name,
-                     source->inode,    made->inode};
+  return PendingMove{*std::move(from), item.name, *std::move(hidden),
+                     *std::move(to),   name,      made->inode};
 }
 
+/// After a failure the item has its name, and the copy has none.
 Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder,
                                  const std::string& copy, const PendingMove& record) const {
   const FileCalls& calls = context_.calls;
   const int from = item.folder.descriptor.get();
   const int to = folder.descriptor.get();
-  if (auto named = calls.rename(to, copy, to, record.name); !named) {
-    removeTemporary(context_, folder, copy);
-    return named;
-  }
-  auto done = syncFolder(context_, to);
-  if (done) done = calls.rename(from, item.name, from, record.hiddenSource);
+  auto done = calls.rename(from, item.name, from, record.hiddenSource);
   if (!done) {
-    takeBack(folder, record.name, copy);
+    context_.pending.end(record);
     return done;
   }
-  // Nobody comes by its name to it any more: what it is now is what has to be in the copy.
-  const auto alike = looksAlike(calls, from, record.hiddenSource, to, record.name);
-  if (!alike || !*alike) {
-    if (auto back = calls.rename(from, record.hiddenSource, from, item.name); back)
-      takeBack(folder, record.name, copy);
-    return fail(alike ? Error::posix(EAGAIN, "it was changed while it was moved") : alike.error());
+  done = compare(item, folder, copy, record);
+  if (done) done = calls.rename(to, copy, to, record.name);
+  if (done) {
+    // The item goes only when it is known that its copy stays.
+    if (auto synced = syncFolder(context_, to); !synced) {
+      done = synced;
+      if (!calls.rename(to, record.name, to, copy)) return done;
+    }
   }
-  if (auto synced = syncFolder(context_, from); !synced)
-    logError("can't synchronise \"" + item.folder.path + "\"; " + synced.error().description());
-  return {};
+  if (done) return {};
+  if (giveNameBack(context_, item.folder, record.hiddenSource, item.name)) {
+    context_.pending.end(record);
+  } else {
+    logError("\"" + item.folder.url(item.name).path() +
+             "\" has a hidden name until the next start");
+  }
+  return done;
 }
 
-void CrossMove::takeBack(const OpenFolder& folder, const std::string& name,
-                         const std::string& copy) const {
-  const int descriptor = folder.descriptor.get();
-  if (context_.calls.rename(descriptor, name, descriptor, copy))
-    removeTemporary(context_, folder, copy);
+Result<void> CrossMove::compare(const ItemPlace& item, const OpenFolder& folder,
+                                const std::string& copy, const PendingMove& record) const {
+  const auto alike = looksAlike(context_.calls, item.folder.descriptor.get(), record.hiddenSource,
+                                folder.descriptor.get(), copy);
+  if (!alike) return fail(alike.error());
+  if (!*alike) return fail(Error::posix(EAGAIN, "it was changed while it was moved"));
+  return {};
 }
 
 }  // namespace mirabel

@@ -7,9 +7,11 @@
 namespace mirabel {
 
 /// Moves an item to a place where a rename can't bring it: another file system. It is copied under
-/// a hidden name, compared, given its name, and then taken away from where it was, in an order in
-/// which it is whole in one of the places at any time; where a crash leaves it in both, the next
-/// start finishes or undoes the move. What was written to it meanwhile undoes it, with EAGAIN.
+/// a hidden name; then the item itself gets a hidden name, so that nobody comes by its own to it
+/// any more, and is compared with its copy; then the copy gets its name, and the item is removed.
+/// The copy is seen only when nothing can undo it any more. What was written to the item meanwhile
+/// undoes the move, with EAGAIN. Where the process is killed, the next start gives the item its
+/// name back, or removes it when its copy has one.
 class CrossMove {
  public:
   explicit CrossMove(const OperationContext& context) : context_(context) {}
@@ -25,7 +27,8 @@ class CrossMove {
                                              const std::string& copy) const;
   [[nodiscard]] Result<void> exchange(const ItemPlace& item, const OpenFolder& folder,
                                       const std::string& copy, const PendingMove& record) const;
-  void takeBack(const OpenFolder& folder, const std::string& name, const std::string& copy) const;
+  [[nodiscard]] Result<void> compare(const ItemPlace& item, const OpenFolder& folder,
+                                     const std::string& copy, const PendingMove& record) const;
 
   const OperationContext& context_;
 };

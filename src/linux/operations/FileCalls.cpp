@@ -169,6 +169,15 @@ void FileCalls::beginWriting(int file) const {
   ::sync_file_range(file, 0, 0, SYNC_FILE_RANGE_WRITE);
 }
 
+std::string pathBelow(const std::string& folder, const std::string& name) {
+  return folder.empty() ? name : folder + "/" + name;
+}
+
+Error withPath(Error error, const std::string& path) {
+  if (!path.empty()) error.userInfo.emplace(errorkey::detail, path);
+  return error;
+}
+
 Result<std::vector<FolderEntry>> entriesOf(const FileCalls& calls, int folder) {
   auto opened = calls.open(folder, ".", O_RDONLY | O_DIRECTORY);
   if (!opened) return fail(opened.error());

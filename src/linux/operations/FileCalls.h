@@ -15,8 +15,9 @@
 
 namespace mirabel {
 
-/// The system calls that operations are made of. All of them go through here, so that a test can
-/// have any one of them fail, or do something just before it. Errors are POSIX errors. Any thread.
+/// The system calls that operations are made of: all that change something and all that find the
+/// way go through here, so that a test can have any one of them fail, or do something just before
+/// it. Errors are POSIX errors. Any thread.
 class FileCalls {
  public:
   /// Asked before each call, with its name; the errno that it has to fail with, 0 to go on.
@@ -71,6 +72,11 @@ class FileCalls {
  private:
   Check check_;
 };
+
+/// The path of an entry of a folder below the top of a tree, which is "".
+[[nodiscard]] std::string pathBelow(const std::string& folder, const std::string& name);
+/// The error, with the path below the top for people, unless it has one already.
+[[nodiscard]] Error withPath(Error error, const std::string& path);
 
 /// Reads the names in an open folder, "." and ".." left out, each with its DT_… type. The
 /// descriptor is opened anew, so that it may be O_PATH and is read from the start.

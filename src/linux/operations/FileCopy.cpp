@@ -15,11 +15,11 @@
 namespace mirabel {
 namespace {
 
+// Descriptors that are open for it: a few such operations run at once.
 constexpr std::size_t mostUnsynced = 128;
+constexpr std::size_t mostUnsyncedPairs = 32;
 constexpr std::size_t bufferSize = 64u << 10;
 constexpr int mostAttempts = 3;
-// The bits that let a program run as somebody else are not handed on with a copy.
-constexpr mode_t permissions = 0777;
 
 bool isUnchanged(const ObjectStatus& before, const ObjectStatus& after) {
   return before.size == after.size && before.modificationTime == after.modificationTime &&
@@ -61,6 +61,8 @@ Result<void> FileCopy::copy(UniqueFd source, int folder, const std::string& name
     const auto before = calls_.status(source.get());
     if (!before) return fail(before.error());
     if (before->kind != FileKind::regular) return fail(Error::posix(EAGAIN));
+    // Of an attempt before this one.
+    if (attempt > 1 && ::ftruncate(made->get(), 0) != 0) return fail(Error::posix(errno));
     if (auto copied = copyContents(source.get(), *before, made->get()); !copied) return copied;
     const auto after = calls_.status(source.get());
     if (!after) return fail(after.error());
@@ -74,7 +76,8 @@ Result<void> FileCopy::copy(UniqueFd source, int folder, const std::string& name
   calls_.beginWriting(made->get());
   progress_.entriesCopied.fetch_add(1, std::memory_order_relaxed);
   unsynced_.push_back({kind_ == CopyKind::move ? std::move(source) : UniqueFd(), std::move(*made)});
-  return unsynced_.size() < mostUnsynced ? Result<void>() : flush();
+  const std::size_t most = kind_ == CopyKind::move ? mostUnsyncedPairs : mostUnsynced;
+  return unsynced_.size() < most ? Result<void>() : flush();
 }
 
 Result<void> FileCopy::flush() {
@@ -157,7 +160,7 @@ Result<void> FileCopy::copyProperties(int source, const ObjectStatus& status, in
     // Only root may, and only root gets at what belongs to others.
     static_cast<void>(::fchown(copy, status.owner, static_cast<gid_t>(-1)));
   }
-  if (auto set = calls_.setMode(copy, status.mode & permissions); !set) return set;
+  if (auto set = calls_.setMode(copy, status.mode & copiedPermissions); !set) return set;
   return calls_.setTime(copy, {}, status.modificationTime);
 }
 

@@ -13,6 +13,9 @@ namespace mirabel {
 /// is compared with its source once it is on disk.
 enum class CopyKind { copy, move };
 
+/// What is copied of a mode: the bits that let a program run as somebody else are not handed on.
+inline constexpr std::uint16_t copiedPermissions = 0777;
+
 /// Copies the contents of files and what goes with them. Files are synchronised some at a time,
 /// since the file system then writes them out together. Used by one thread.
 class FileCopy {

@@ -6,6 +6,7 @@
 #include <string>
 #include <string_view>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "linux/kernel/LongPath.h"
 #include "linux/kernel/ObjectStatus.h"
@@ -32,18 +33,28 @@ bool isSameFileSystem(int folder, int next) {
   return above && below && above->device == below->device;
 }
 
+Result<void> syncNames(int folder) {
+  const UniqueFd opened(::openat(folder, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!opened) return errno == EACCES ? Result<void>() : fail(Error::posix(errno));
+  return ::fsync(opened.get()) == 0 ? Result<void>() : fail(Error::posix(errno));
+}
+
 // Step by step on descriptors, so that a folder which is swapped meanwhile leads nowhere.
 Result<void> createBelow(UniqueFd folder, std::string_view relative, Links links) {
   while (!relative.empty()) {
     const std::string name(relative.substr(0, relative.find('/')));
     relative.remove_prefix(std::min(relative.size(), name.size() + 1));
-    if (::mkdirat(folder.get(), name.c_str(), permissions) != 0 && errno != EEXIST) {
+    const bool isMade = ::mkdirat(folder.get(), name.c_str(), permissions) == 0;
+    if (!isMade && errno != EEXIST) {
       // A folder that may not be written can still hold the next one of the way.
       const int failure = errno;
       if (!openStep(folder.get(), name, links)) return fail(Error::posix(failure));
     }
     auto next = openStep(folder.get(), name, links);
     if (!next) return fail(next.error());
+    if (isMade) {
+      if (auto synced = syncNames(folder.get()); !synced) return synced;
+    }
     if (links == Links::refused && !isSameFileSystem(folder.get(), next->get())) {
       return fail(Error::posix(EXDEV));
     }

@@ -55,9 +55,10 @@ Result<URL> ItemMove::respell(const ItemPlace& item, const std::string& newName)
       return fail(operationError(done.error(), item.folder.url(newName)));
     }
   }
+  auto synced = syncFolder(context_, folder);
   context_.pending.end(record);
   if (!done) return fail(operationError(done.error(), item.folder.url(newName)));
-  if (auto synced = syncFolder(context_, folder); !synced) return fail(synced.error());
+  if (!synced) return fail(synced.error());
   return item.folder.url(newName);
 }
 

@@ -25,6 +25,12 @@ class FolderRemoval {
     // Whoever removes something on a full disk wants to make room.
     if (!taken && isFull(taken.error())) return removeInPlace();
     if (!taken) return taken;
+    if (auto same = isExamined(*hidden); !same) {
+      if (!giveNameBack(context_, item_.folder, *hidden, item_.name)) {
+        logError("can't give \"" + item_.folder.url(item_.name).path() + "\" its name back");
+      }
+      return same;
+    }
     auto done = syncFolder(context_, item_.folder.descriptor.get());
     if (done) done = emptyAndRemove(*hidden);
     // It is gone already as far as anybody can see.
@@ -41,6 +47,15 @@ class FolderRemoval {
  private:
   static bool isFull(const Error& error) {
     return error.isPosix(ENOSPC) || error.isPosix(EDQUOT) || error.domain == ErrorDomain::store;
+  }
+
+  /// Somebody may have put another folder under the name since it was looked at.
+  [[nodiscard]] Result<void> isExamined(const std::string& name) const {
+    const auto named = context_.calls.status(item_.folder.descriptor.get(), name);
+    const auto examined = context_.calls.status(top_.get());
+    if (!named || !examined) return fail(named ? examined.error() : named.error());
+    if (named->inode == examined->inode && named->device == examined->device) return {};
+    return fail(Error::posix(EAGAIN, "it was replaced while it was deleted"));
   }
 
   [[nodiscard]] Result<void> rename(const std::string& from, const std::string& to) const {

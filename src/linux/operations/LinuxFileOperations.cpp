@@ -96,9 +96,12 @@ void LinuxFileOperations::vs_deleteWithCompletionHandler(const URL& item,
 
 std::optional<Error> LinuxFileOperations::vs_withReadWriteAccess(const URL& url,
                                                                  const AccessBlock& block) {
-  auto target = attributes_.open(url);
-  std::optional<Error> error = target ? block(**target) : std::optional(target.error());
-  if (error && error->domain == ErrorDomain::posix) errno = static_cast<int>(error->code);
+  std::optional<Error> error;
+  {
+    auto target = attributes_.open(url);
+    error = target ? block(**target) : std::optional(target.error());
+  }
+  if (error) errno = error->domain == ErrorDomain::posix ? static_cast<int>(error->code) : EIO;
   return error;
 }
 

@@ -22,6 +22,9 @@ Result<ItemPlace> itemPlaceOf(const OperationContext& context, const URL& item) 
 Result<OpenFolder> openFolder(const OperationContext& context, const URL& url) {
   if (!url.isFileURL() || url.path().empty()) return fail(Error::posix(EINVAL));
   if (auto checked = context.calls.check("open folder"); !checked) return fail(checked.error());
+  if (!context.roots.locate(url.path())) {
+    return fail(Error::posix(EPERM, "it is not a folder of the documents"));
+  }
   auto opened = context.roots.open(url.path(), O_PATH | O_DIRECTORY);
   if (!opened) return fail(opened.error());
   return OpenFolder{std::move(*opened), url.path()};
@@ -42,6 +45,19 @@ NameOf kindOfName(const OperationContext& context, const ObjectStatus& status,
                   std::string_view name) {
   const bool isPlainFolder = status.kind == FileKind::folder && !context.isPackageName(name);
   return isPlainFolder ? NameOf::plainFolder : NameOf::file;
+}
+
+bool giveNameBack(const OperationContext& context, const OpenFolder& folder,
+                  const std::string& hidden, const std::string& name) {
+  constexpr std::uint64_t mostTried = 100;
+  const int descriptor = folder.descriptor.get();
+  auto done = context.calls.rename(descriptor, hidden, descriptor, name);
+  for (std::uint64_t number = 2; !done && number < mostTried; ++number) {
+    if (!done.error().isPosix(EEXIST)) return false;
+    done = context.calls.rename(descriptor, hidden, descriptor,
+                                numberedName(name, number, NameOf::file));
+  }
+  return done.has_value();
 }
 
 Result<void> removeWhole(const OperationContext& context, int folder, const std::string& name) {

@@ -42,7 +42,7 @@ struct ItemPlace {
 };
 [[nodiscard]] Result<ItemPlace> itemPlaceOf(const OperationContext& context, const URL& item);
 
-/// Opens the folder at `url`, beneath its root. POSIX errors.
+/// Opens the folder at `url`, beneath its root. POSIX errors, EPERM for one outside the roots.
 [[nodiscard]] Result<OpenFolder> openFolder(const OperationContext& context, const URL& url);
 
 /// Has the names in an open folder on disk. One that may not be read can't be synchronised, which
@@ -55,6 +55,10 @@ struct ItemPlace {
 /// How the name of what has this status is divided.
 [[nodiscard]] NameOf kindOfName(const OperationContext& context, const ObjectStatus& status,
                                 std::string_view name);
+
+/// Gives what has a hidden name its own, or one made from it where that is taken.
+[[nodiscard]] bool giveNameBack(const OperationContext& context, const OpenFolder& folder,
+                                const std::string& hidden, const std::string& name);
 
 /// Removes what lies at (`folder`, `name`), a folder with everything in it.
 [[nodiscard]] Result<void> removeWhole(const OperationContext& context, int folder,

@@ -80,7 +80,6 @@ void walk(Fields& fields, auto& record) requires requires {
   fields.field(record.hiddenSource);
   walkFolder(fields, record.folder);
   fields.field(record.name);
-  fields.field(record.sourceInode);
   fields.field(record.copyInode);
 }
 

@@ -27,15 +27,14 @@ struct PendingRemovals {
   friend bool operator==(const PendingRemovals&, const PendingRemovals&) = default;
 };
 
-/// An item on its way from one file system to another: its copy gets the name before the item
-/// itself is taken away, under a hidden name first.
+/// An item on its way from one file system to another. It gets a hidden name, then its copy gets
+/// the name that it is to have, and then the item is removed.
 struct PendingMove {
   PendingFolder sourceFolder;
   std::string sourceName;
   std::string hiddenSource;
   PendingFolder folder;
   std::string name;
-  std::uint64_t sourceInode = 0;
   std::uint64_t copyInode = 0;
 
   friend bool operator==(const PendingMove&, const PendingMove&) = default;

@@ -13,6 +13,7 @@ namespace mirabel {
 namespace {
 
 constexpr const char* fileName = "pending";
+constexpr const char* damagedFileName = "pending.damaged";
 constexpr const char* newFileName = "pending.new";
 // More than that was not written by this program.
 constexpr std::size_t largestFile = 16u << 20;
@@ -65,12 +66,19 @@ PendingWork::PendingWork(VolumeIndex& index, const FileCalls& calls)
 
 PendingRecords PendingWork::load() {
   const std::scoped_lock lock(mutex_);
-  const auto bytes = readFile(index_.stateFolder().descriptor());
+  const int folder = index_.stateFolder().descriptor();
+  const auto bytes = readFile(folder);
   if (!bytes && bytes.error().isPosix(ENOENT)) return {};
-  auto records = bytes ? PendingRecords::decode(*bytes) : std::nullopt;
+  if (!bytes) {
+    unreadable_ = bytes.error();
+    logError("can't read what operations left behind; " + bytes.error().description());
+    return {};
+  }
+  auto records = PendingRecords::decode(*bytes);
   if (!records) {
-    logError("can't read what operations left behind; " +
-             (bytes ? std::string("the file is damaged") : bytes.error().description()));
+    logError("what operations left behind is not known, the file is damaged");
+    if (::renameat(folder, fileName, folder, damagedFileName) != 0)
+      unreadable_ = Error::posix(errno);
     return {};
   }
   before_ = *std::move(records);
@@ -91,11 +99,11 @@ std::string PendingWork::nextName(std::string_view prefix) {
 }
 
 Result<std::string> PendingWork::temporaryName(const std::string& path) {
+  auto folder = folderAt(path);
+  if (!folder) return fail(folder.error());
   const std::scoped_lock lock(mutex_);
-  const auto isNoted = [&](const PendingRemovals& each) { return each.folder.path == path; };
+  const auto isNoted = [&](const PendingRemovals& each) { return each.folder == *folder; };
   if (std::ranges::none_of(records_.removals, isNoted)) {
-    auto folder = folderAt(path);
-    if (!folder) return fail(folder.error());
     records_.removals.push_back({*std::move(folder), prefix_});
     if (auto written = write(); !written) {
       records_.removals.pop_back();
@@ -155,13 +163,20 @@ void PendingWork::keepOnRecord(const std::string& path) {
 
 void PendingWork::close() {
   const std::scoped_lock lock(mutex_);
+  // What a move has hidden is removed as one of these, by the start that finishes the move.
+  const auto isMovedFrom = [&](const PendingFolder& folder) {
+    return std::ranges::any_of(records_.moves, [&](const PendingMove& move) {
+      return move.sourceFolder == folder || move.folder == folder;
+    });
+  };
   const auto isDone = [&](const PendingRemovals& each) {
-    return std::ranges::find(kept_, each.folder.path) == kept_.end();
+    return std::ranges::find(kept_, each.folder.path) == kept_.end() && !isMovedFrom(each.folder);
   };
   if (std::erase_if(records_.removals, isDone) > 0) static_cast<void>(write());
 }
 
 Result<void> PendingWork::write() {
+  if (unreadable_) return fail(*unreadable_);
   if (auto checked = calls_.check("note"); !checked) return checked;
   const int folder = index_.stateFolder().descriptor();
   PendingRecords all = before_;

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -22,8 +23,8 @@ class PendingWork {
   /// Both outlive it.
   PendingWork(VolumeIndex& index, const FileCalls& calls);
 
-  /// Reads what processes before this one left; to be called first. A file that can't be read
-  /// leaves nothing, with a line in the log.
+  /// Reads what processes before this one left; to be called first. A file that is damaged is set
+  /// aside as "pending.damaged"; where it can't be read, no work is begun that would replace it.
   [[nodiscard]] PendingRecords load();
   /// What of that is still to be done, by a later start.
   void settle(PendingRecords remaining);
@@ -54,9 +55,10 @@ class PendingWork {
   std::mutex mutex_;
   std::string prefix_;
   std::uint64_t count_ = 0;
-  PendingRecords records_;         ///< of this process
-  PendingRecords before_;          ///< of those before it
-  std::vector<std::string> kept_;  ///< paths of folders that stay on record
+  PendingRecords records_;           ///< of this process
+  PendingRecords before_;            ///< of those before it
+  std::optional<Error> unreadable_;  ///< why they are not known
+  std::vector<std::string> kept_;    ///< paths of folders that stay on record
 };
 
 }  // namespace mirabel

@@ -5,7 +5,6 @@
 #include <vector>
 
 #include "foundation/Log.h"
-#include "linux/operations/TreeComparison.h"
 
 namespace mirabel {
 namespace {
@@ -39,16 +38,15 @@ class OperationRecovery {
   }
 
  private:
-  /// Where the folder lies now. ENOENT only where it is not to be found for good.
+  /// Where the folder lies now. ENOENT where it is not to be found, ENODEV where its root is not
+  /// there, which may only be not mounted.
   Result<OpenFolder> open(const PendingFolder& folder) {
     const auto path = index_.pathOfFileID(folder.fileID);
     if (path) return openFolder(context_, URL::fileURL(*path));
-    auto opened = openFolder(context_, URL::fileURL(folder.path));
-    if (opened || !opened.error().isPosix(ENOENT)) return opened;
-    // A root that is not there may only be not mounted.
+    if (!path.error().isPosix(ENOENT)) return fail(path.error());
     const auto root = context_.roots.locate(folder.path);
-    const bool isMissing = root && context_.roots.descriptor(root->root) < 0;
-    return fail(Error::posix(isMissing ? ENODEV : ENOENT));
+    if (root && context_.roots.descriptor(root->root) < 0) return fail(Error::posix(ENODEV));
+    return openFolder(context_, URL::fileURL(folder.path));
   }
 
   static Outcome outcomeOf(const Error& error) {
@@ -81,44 +79,29 @@ class OperationRecovery {
     if (!folder) return outcomeOf(folder.error());
     if (!isThere(*folder, rename.hidden)) return Outcome::done;
     const int descriptor = folder->descriptor.get();
-    for (const std::string& name :
-         {rename.to, rename.from, numberedName(rename.to, 2, NameOf::file)}) {
-      if (calls_.rename(descriptor, rename.hidden, descriptor, name)) return Outcome::done;
-    }
-    return Outcome::notYet;
+    if (calls_.rename(descriptor, rename.hidden, descriptor, rename.to)) return Outcome::done;
+    return givenBack(*folder, rename.hidden, rename.from);
   }
 
+  /// The copy gets its name only when it is known to be like the item: where it has it, the item is
+  /// but something to be removed. Where that is not certain, the item stays.
   Outcome finish(const PendingMove& move) {
-    auto target = open(move.folder);
     auto source = open(move.sourceFolder);
-    if (!target || !source) return outcomeOf(target ? source.error() : target.error());
-    const auto copy = calls_.status(target->descriptor.get(), move.name);
-    const bool isNamed = copy && copy->inode == move.copyInode;
-    if (isThere(*source, move.hiddenSource)) return finishHidden(move, *source, *target, isNamed);
-    const auto item = calls_.status(source->descriptor.get(), move.sourceName);
-    if (!isNamed || !item || item->inode != move.sourceInode) return Outcome::done;
-    if (!isLike(*source, move.sourceName, *target, move.name)) return Outcome::done;
-    const int descriptor = source->descriptor.get();
-    auto hidden = calls_.rename(descriptor, move.sourceName, descriptor, move.hiddenSource);
-    return hidden ? Outcome::done : Outcome::notYet;
-  }
-
-  /// The item is hidden, and stays so when its copy is like it; else it gets its name back.
-  Outcome finishHidden(const PendingMove& move, const OpenFolder& source, const OpenFolder& target,
-                       bool isNamed) {
-    if (isNamed && isLike(source, move.hiddenSource, target, move.name)) return Outcome::done;
-    const int descriptor = source.descriptor.get();
-    for (const std::string& name :
-         {move.sourceName, numberedName(move.sourceName, 2, NameOf::file)}) {
-      if (calls_.rename(descriptor, move.hiddenSource, descriptor, name)) return Outcome::done;
+    if (!source) return outcomeOf(source.error());
+    if (!isThere(*source, move.hiddenSource)) return Outcome::done;
+    auto target = open(move.folder);
+    if (!target && !target.error().isPosix(ENOENT) && !target.error().isPosix(ENODEV))
+      return Outcome::notYet;
+    if (target) {
+      const auto copy = calls_.status(target->descriptor.get(), move.name);
+      if (!copy && !copy.error().isPosix(ENOENT)) return Outcome::notYet;
+      if (copy && copy->inode == move.copyInode) return Outcome::done;
     }
-    return Outcome::notYet;
+    return givenBack(*source, move.hiddenSource, move.sourceName);
   }
 
-  bool isLike(const OpenFolder& source, const std::string& name, const OpenFolder& target,
-              const std::string& copy) {
-    return looksAlike(calls_, source.descriptor.get(), name, target.descriptor.get(), copy)
-        .value_or(false);
+  Outcome givenBack(const OpenFolder& folder, const std::string& hidden, const std::string& name) {
+    return giveNameBack(context_, folder, hidden, name) ? Outcome::done : Outcome::notYet;
   }
 
   const OperationContext& context_;

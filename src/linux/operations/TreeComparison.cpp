@@ -4,8 +4,32 @@
 #include <fcntl.h>
 #include <vector>
 
+#include "linux/kernel/AttributeCalls.h"
+
 namespace mirabel {
 namespace {
+
+constexpr std::int64_t second = 1'000'000'000;
+
+/// Some file systems keep times to 100 nanoseconds, 10 milliseconds or whole seconds only.
+bool isSameTime(std::int64_t time, std::int64_t copied) {
+  constexpr std::int64_t steps[] = {1, 100, 1000, 10'000'000, second, 2 * second};
+  return std::ranges::any_of(steps, [&](std::int64_t step) {
+    return copied % step == 0 && time >= copied && time - copied < step;
+  });
+}
+
+Result<FileCalls::Attributes> userAttributesAt(const FileCalls& calls, int folder,
+                                               const std::string& name) {
+  auto opened = calls.open(folder, name, O_PATH);
+  if (!opened) return fail(opened.error());
+  auto attributes = calls.attributes(opened->get());
+  if (!attributes) return attributes;
+  std::erase_if(*attributes, [](const auto& attribute) {
+    return !attribute.first.starts_with(userAttributePrefix);
+  });
+  return attributes;
+}
 
 class Comparison {
  public:
@@ -19,10 +43,11 @@ class Comparison {
     if (!a || !b) return fail(a ? b.error() : a.error());
     if (a->kind != b->kind) return false;
     if (a->kind == FileKind::regular) {
-      return a->size == b->size && a->modificationTime == b->modificationTime;
+      if (a->size != b->size || !isSameTime(a->modificationTime, b->modificationTime)) return false;
     }
     if (a->kind == FileKind::folder) folders_.push_back(path);
-    if (a->kind != FileKind::symbolicLink) return true;
+    if (a->kind != FileKind::symbolicLink)
+      return sameAttributes(folder, name, otherFolder, otherName);
     const auto target = calls_.target(folder, name);
     const auto otherTarget = calls_.target(otherFolder, otherName);
     if (!target || !otherTarget) return fail(target ? otherTarget.error() : target.error());
@@ -42,6 +67,16 @@ class Comparison {
   }
 
  private:
+  Result<bool> sameAttributes(int folder, const std::string& name, int otherFolder,
+                              const std::string& otherName) const {
+    auto ours = userAttributesAt(calls_, folder, name);
+    auto others = userAttributesAt(calls_, otherFolder, otherName);
+    if (!ours || !others) return fail(ours ? others.error() : ours.error());
+    std::ranges::sort(*ours);
+    std::ranges::sort(*others);
+    return *ours == *others;
+  }
+
   [[nodiscard]] Result<UniqueFd> open(int top, const std::string& path) const {
     return calls_.openBelow(top, path, O_PATH | O_DIRECTORY, FileCalls::Mounts::refused);
   }
@@ -52,8 +87,7 @@ class Comparison {
     if (!names || !otherNames) return fail(names ? otherNames.error() : names.error());
     if (*names != *otherNames) return false;
     for (const std::string& name : *names) {
-      auto alike =
-          compare(folder, name, otherFolder, name, path.empty() ? name : path + "/" + name);
+      auto alike = compare(folder, name, otherFolder, name, pathBelow(path, name));
       if (!alike || !*alike) return alike;
     }
     return true;

@@ -6,20 +6,7 @@
 #include <sys/stat.h>
 
 namespace mirabel {
-namespace {
-
-constexpr mode_t permissions = 0777;
-
-Error at(Error error, const std::string& path) {
-  if (!path.empty()) error.userInfo.emplace(errorkey::detail, path);
-  return error;
-}
-
-std::string below(const std::string& folder, const std::string& name) {
-  return folder.empty() ? name : folder + "/" + name;
-}
-
-}  // namespace
+namespace {}  // namespace
 
 Result<void> TreeCopy::run(int sourceFolder, const std::string& source, int folder,
                            const std::string& name) {
@@ -46,13 +33,14 @@ Result<void> TreeCopy::copyTree(int source, int copy) {
   for (std::size_t i = 0; i < folders_.size(); ++i) {
     const std::string path = folders_[i];
     if (auto copied = copyFolder(source, copy, path); !copied)
-      return fail(at(copied.error(), path));
+      return fail(withPath(copied.error(), path));
   }
   if (auto flushed = files_.flush(); !flushed) return flushed;
   // Children first: a folder's time is set when nothing is added to it any more, and one that may
   // not be written is made so at last.
   for (auto path = folders_.rbegin(); path != folders_.rend(); ++path) {
-    if (auto done = finishFolder(source, copy, *path); !done) return fail(at(done.error(), *path));
+    if (auto done = finishFolder(source, copy, *path); !done)
+      return fail(withPath(done.error(), *path));
   }
   return {};
 }
@@ -68,10 +56,10 @@ Result<void> TreeCopy::copyFolder(int source, int copy, const std::string& path)
     const auto status = calls_.status(from->get(), entry.name);
     // Gone since the folder was read.
     if (!status && status.error().isPosix(ENOENT)) continue;
-    if (!status) return fail(at(status.error(), below(path, entry.name)));
+    if (!status) return fail(withPath(status.error(), pathBelow(path, entry.name)));
     auto copied = copyObject({from->get(), entry.name}, *status, {to->get(), entry.name},
-                             below(path, entry.name));
-    if (!copied) return fail(at(copied.error(), below(path, entry.name)));
+                             pathBelow(path, entry.name));
+    if (!copied) return fail(withPath(copied.error(), pathBelow(path, entry.name)));
   }
   return {};
 }
@@ -91,8 +79,8 @@ Result<void> TreeCopy::copyObject(Place from, const ObjectStatus& status, Place 
     auto made = calls_.makeLink(*target, to.folder, to.name);
     if (!made) return made;
   } else if (S_ISFIFO(status.mode) || S_ISSOCK(status.mode)) {
-    auto made =
-        calls_.makeNode(to.folder, to.name, (status.mode & S_IFMT) | (status.mode & permissions));
+    auto made = calls_.makeNode(to.folder, to.name,
+                                (status.mode & S_IFMT) | (status.mode & copiedPermissions));
     if (!made) return made;
   } else {
     return fail(Error::posix(EPERM, "a device can't be copied"));

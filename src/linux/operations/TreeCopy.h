@@ -21,7 +21,7 @@ namespace mirabel {
 class TreeCopy {
  public:
   TreeCopy(const FileCalls& calls, OperationProgress& progress, CopyKind kind)
-      : calls_(calls), progress_(progress), kind_(kind), files_(calls, progress, kind) {}
+      : calls_(calls), progress_(progress), files_(calls, progress, kind) {}
 
   /// Copies (`sourceFolder`, `source`) to (`folder`, `name`); an empty `source` is the object that
   /// the descriptor holds. After a failure what was made of the copy is left. POSIX errors, with
@@ -44,7 +44,6 @@ class TreeCopy {
 
   const FileCalls& calls_;
   OperationProgress& progress_;
-  CopyKind kind_;
   FileCopy files_;
   std::vector<std::string> folders_;  ///< below the top, a parent before its children
   /// Where the copy of a file with several names lies below the top, by device and inode.

@@ -8,15 +8,6 @@
 namespace mirabel {
 namespace {
 
-Error at(Error error, const std::string& path) {
-  if (!path.empty()) error.userInfo.emplace(errorkey::detail, path);
-  return error;
-}
-
-std::string below(const std::string& folder, const std::string& name) {
-  return folder.empty() ? name : folder + "/" + name;
-}
-
 bool isFolder(const FileCalls& calls, int folder, const FolderEntry& entry) {
   if (entry.type != DT_UNKNOWN) return entry.type == DT_DIR;
   const auto status = calls.status(folder, entry.name);
@@ -30,15 +21,15 @@ Result<void> TreeRemoval::examine(int top) {
   for (std::size_t i = 0; i < folders_.size(); ++i) {
     const std::string path = folders_[i];
     auto folder = calls_.openBelow(top, path, O_RDONLY | O_DIRECTORY, FileCalls::Mounts::refused);
-    if (!folder) return fail(at(folder.error(), path));
+    if (!folder) return fail(withPath(folder.error(), path));
     auto entries = entriesOf(calls_, folder->get());
-    if (!entries) return fail(at(entries.error(), path));
+    if (!entries) return fail(withPath(entries.error(), path));
     if (entries->empty()) continue;
     if (auto allowed = calls_.mayChange(folder->get()); !allowed) {
-      return fail(at(allowed.error(), path));
+      return fail(withPath(allowed.error(), path));
     }
     for (const FolderEntry& entry : *entries) {
-      if (isFolder(calls_, folder->get(), entry)) folders_.push_back(below(path, entry.name));
+      if (isFolder(calls_, folder->get(), entry)) folders_.push_back(pathBelow(path, entry.name));
     }
   }
   return {};
@@ -51,7 +42,7 @@ Result<void> TreeRemoval::run(int top) {
     auto folder = calls_.openBelow(top, *path, O_RDONLY | O_DIRECTORY, FileCalls::Mounts::refused);
     auto emptied = folder ? emptyFolder(folder->get()) : fail(folder.error());
     if (!emptied && first && !emptied.error().isPosix(ENOENT)) {
-      first = fail(at(emptied.error(), *path));
+      first = fail(withPath(emptied.error(), *path));
     }
   }
   return first;
@@ -81,8 +72,8 @@ Result<void> TreeRemoval::removeEntry(int folder, const FolderEntry& entry) {
   } else if (!removed && removed.error().isPosix(ENOTDIR)) {
     removed = calls_.remove(folder, entry.name, 0);
   }
+  if (removed) hasRemoved_ = true;
   if (!removed && !removed.error().isPosix(ENOENT)) return removed;
-  hasRemoved_ = true;
   progress_.entriesRemoved.fetch_add(1, std::memory_order_relaxed);
   return {};
 }
@@ -93,7 +84,9 @@ Result<void> TreeRemoval::removeNewFolder(int folder, const std::string& name) {
   TreeRemoval inner(calls_, progress_);
   inner.looksAgain_ = false;
   if (auto examined = inner.examine(opened->get()); !examined) return examined;
-  if (auto emptied = inner.run(opened->get()); !emptied) return emptied;
+  auto emptied = inner.run(opened->get());
+  hasRemoved_ = hasRemoved_ || inner.hasRemoved_;
+  if (!emptied) return emptied;
   return calls_.remove(folder, name, AT_REMOVEDIR);
 }
 

@@ -39,7 +39,6 @@ Result<void> removeRows(Database& database, std::uint64_t fileID) {
 
 Result<void> KeptAttributes::load(
     const std::function<Result<bool>(std::uint64_t fileID)>& isKnown) {
-  const std::scoped_lock lock(mutex_);
   return transact_([&](Database& database) -> Result<void> {
     auto all = readAll(database);
     if (!all) return fail(all.error());
@@ -69,7 +68,7 @@ KeptAttributes::Attributes KeptAttributes::of(std::uint64_t fileID) const {
 Result<void> KeptAttributes::set(std::uint64_t fileID, std::string_view name,
                                  const std::optional<Data>& value) {
   if (value && value->size() > largestValue) return fail(Error::posix(E2BIG));
-  const std::scoped_lock lock(mutex_);
+  const std::scoped_lock writing(writing_);
   auto done = transact_([&](Database& database) -> Result<void> {
     auto statement = database.prepare(
         "INSERT OR REPLACE INTO kept_attributes(file_id, name, value) VALUES(?1,?2,?3)");
@@ -83,6 +82,7 @@ Result<void> KeptAttributes::set(std::uint64_t fileID, std::string_view name,
     return statement->run();
   });
   if (!done) return done;
+  const std::scoped_lock lock(mutex_);
   attributes_[fileID].insert_or_assign(std::string(name), value);
   isEmpty_ = false;
   return {};
@@ -90,9 +90,8 @@ Result<void> KeptAttributes::set(std::uint64_t fileID, std::string_view name,
 
 Result<void> KeptAttributes::forget(std::uint64_t fileID, std::string_view name) {
   if (isEmpty_) return {};
-  const std::scoped_lock lock(mutex_);
-  const auto found = attributes_.find(fileID);
-  if (found == attributes_.end() || !found->second.contains(name)) return {};
+  const std::scoped_lock writing(writing_);
+  if (!of(fileID).contains(name)) return {};
   auto done = transact_([&](Database& database) -> Result<void> {
     auto statement =
         database.prepare("DELETE FROM kept_attributes WHERE file_id = ?1 AND name = ?2");
@@ -100,6 +99,8 @@ Result<void> KeptAttributes::forget(std::uint64_t fileID, std::string_view name)
     return statement->bind(1, fileID).bindBlob(2, name).run();
   });
   if (!done) return done;
+  const std::scoped_lock lock(mutex_);
+  const auto found = attributes_.find(fileID);
   found->second.erase(found->second.find(name));
   if (found->second.empty()) attributes_.erase(found);
   isEmpty_ = attributes_.empty();

@@ -44,7 +44,8 @@ class KeptAttributes {
 
  private:
   Transact transact_;
-  mutable std::mutex mutex_;
+  std::mutex writing_;        ///< one writer at a time, held while the database is written
+  mutable std::mutex mutex_;  ///< of what follows
   std::map<std::uint64_t, Attributes> attributes_;
   std::atomic<bool> isEmpty_ = true;
 };

@@ -41,7 +41,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     return keptAttributes_.load([this](std::uint64_t fileID) -> Result<bool> {
       auto row = state_->store().objectByFileID(fileID);
       if (!row) return fail(row.error());
-      return *row && (*row)->location;
+      return row->has_value();
     });
   }
 
@@ -251,12 +251,10 @@ class StoredVolumeIndex final : public VolumeIndex {
 
 }  // namespace
 
-Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(MonitoredRoots& roots, Options options) {
-  // Every change that is written down would be one more.
-  if (roots.locate(options.stateFolder)) {
-    return fail(Error::posix(EINVAL, "the state folder \"" + options.stateFolder +
-                                         "\" lies in the documents that it is to tell of"));
-  }
+namespace {
+
+Result<std::unique_ptr<VolumeIndex>> openOnce(MonitoredRoots& roots,
+                                              const VolumeIndex::Options& options) {
   auto status = statusOf(options.volumePath);
   if (!status) return fail(status.error());
   auto uuid = volumeUUID(options.volumePath);
@@ -265,10 +263,24 @@ Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(MonitoredRoots& roots, Op
   if (!folder) return fail(folder.error());
   auto state = VolumeState::open(std::move(*folder), options.notice);
   if (!state) return fail(state.error());
-  if (!options.isPackageName) options.isPackageName = [](std::string_view) { return false; };
   auto index =
       std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
   if (auto loaded = index->loadKeptAttributes(); !loaded) return fail(loaded.error());
+  return index;
+}
+
+}  // namespace
+
+Result<std::unique_ptr<VolumeIndex>> VolumeIndex::open(MonitoredRoots& roots, Options options) {
+  // Every change that is written down would be one more.
+  if (roots.locate(options.stateFolder)) {
+    return fail(Error::posix(EINVAL, "the state folder \"" + options.stateFolder +
+                                         "\" lies in the documents that it is to tell of"));
+  }
+  if (!options.isPackageName) options.isPackageName = [](std::string_view) { return false; };
+  auto index = openOnce(roots, options);
+  // Whoever meets damage leaves word for the next one, which sets the database aside.
+  if (!index && index.error().domain == ErrorDomain::store) index = openOnce(roots, options);
   return index;
 }
 

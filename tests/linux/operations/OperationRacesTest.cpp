@@ -88,6 +88,36 @@ TEST_F(OperationRaces, AMoveAcrossFileSystemsIsUndoneWhenTheItemIsWrittenToMeanw
   EXPECT_THAT(hiddenNames(), ::testing::IsEmpty());
 }
 
+TEST_F(OperationRaces, AFolderThatReplacesTheOneThatIsDeletedStays) {
+  makeFolder("package");
+  home.writeFile("package/old", "1");
+  beforeCall("rename", 1, [this] {
+    home.rename("package", "package~");
+    makeFolder("package");
+    home.writeFile("package/new", "2");
+  });
+  const auto error = remove("package");
+  setCheck({});
+  ASSERT_TRUE(error);
+  EXPECT_TRUE(error->isPosix(EAGAIN));
+  EXPECT_EQ(tree().at("package/new"), "2");
+  EXPECT_EQ(tree().at("package~/old"), "1");
+}
+
+TEST_F(OperationRaces, AFileThatShrinksWhileItIsCopiedIsCopiedAsItIsThen) {
+  const std::string source = home.path() + "/doc";
+  std::ofstream(source) << "long contents";
+  setCheck([&, copies = 0](std::string_view call) mutable {
+    // Behind its first copy.
+    if (call == "status" && copies == 1) std::ofstream(source, std::ios::trunc) << (++copies, "");
+    if (call == "copy contents") ++copies;
+    return 0;
+  });
+  ASSERT_TRUE(import(source, ""));
+  setCheck({});
+  EXPECT_EQ(tree(), (Tree{{"doc", ""}}));
+}
+
 TEST_F(OperationRaces, AFileThatKeepsChangingIsNotImportedHalfOldHalfNew) {
   const std::string source = home.path() + "/log";
   std::ofstream(source) << "begin";
