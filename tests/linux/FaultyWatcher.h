@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <utility>
 
@@ -15,6 +16,8 @@ struct WatcherFaults {
   std::size_t marks = 1'000'000;  ///< how many there are
   bool loses = false;             ///< the next reading finds that records were dropped
   int made = 0;                   ///< answered: watchers so far
+  /// Called around each watch that is added, on whichever thread does so.
+  std::function<void()> beforeWatch{}, afterWatch{};
 };
 
 /// A real watcher that can be made to lose records, or to have no more marks.
@@ -29,7 +32,10 @@ class FaultyWatcher final : public FolderWatcher {
     if (real_->watchedFolders() >= faults_->marks && !real_->isWatched(id)) {
       return fail(Error::posix(ENOSPC));
     }
-    return real_->watch(folder, id);
+    if (faults_->beforeWatch) faults_->beforeWatch();
+    auto watched = real_->watch(folder, id);
+    if (faults_->afterWatch) faults_->afterWatch();
+    return watched;
   }
   void forget(std::uint64_t id) override { real_->forget(id); }
   bool isWatched(std::uint64_t id) const override { return real_->isWatched(id); }

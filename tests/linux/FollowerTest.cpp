@@ -8,6 +8,7 @@
 #include <fstream>
 #include <functional>
 #include <map>
+#include <mutex>
 #include <set>
 #include <sys/stat.h>
 #include <thread>
@@ -110,6 +111,53 @@ TEST_P(FollowerTest, AnUnlinkedDocumentEndsAndASavedOneGoesOn) {
   EXPECT_EQ(document("saved"), saved);
   EXPECT_NE(document("unlinked"), unlinked);
   EXPECT_TRUE(index().fileIDOfDocument(unlinked).error().isPosix(ENOENT));
+}
+
+// Folders are read by another thread than the one that takes them in, some time before.
+TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadAheadIsTakenIn) {
+  constexpr int folders = 60;
+  const auto folder = [](int number) { return "d" + std::to_string(number % folders); };
+  for (int i = 0; i < folders; ++i) {
+    makeFolder(folder(i) + "/sub");
+    write(folder(i) + "/f");
+    write(folder(i) + "/sub/g");
+  }
+  std::mutex mutex;
+  int number = 0;
+  const auto disturb = [&] {
+    const std::scoped_lock lock(mutex);
+    const int now = number++;
+    if (now >= 2 * folders) return;
+    write(folder(now) + "/late" + std::to_string(now));
+    std::error_code gone;
+    fs::rename(path(folder(now) + "/f"), path(folder(now + 7) + "/moved"), gone);
+    if (now % 5 != 0) return;
+    // Another folder comes to the place of one that goes elsewhere.
+    fs::rename(path(folder(now + 11) + "/sub"), path(folder(now + 1) + "/gone"), gone);
+    makeFolder(folder(now + 11) + "/sub");
+    write(folder(now + 11) + "/sub/other");
+  };
+  faults_->beforeWatch = faults_->afterWatch = disturb;
+  const std::uint64_t since = anchor();
+  EXPECT_GE(number, folders);
+  faults_->beforeWatch = faults_->afterWatch = nullptr;
+  expectInStep("after the first look");
+  // The same while changes are followed: a tree comes in from elsewhere.
+  fs::create_directory(base_ + "/out");
+  for (int i = 0; i < folders; ++i)
+    fs::rename(path(folder(i)), base_ + "/out/" + folder(i));
+  anchor();
+  number = 2 * folders;
+  faults_->afterWatch = [&] {
+    const std::scoped_lock lock(mutex);
+    const int now = number++ - 2 * folders;
+    if (now < folders) write("in/" + folder(now) + "/later");
+  };
+  fs::rename(base_ + "/out", path("in"));
+  anchor();
+  faults_->afterWatch = nullptr;
+  expectInStep("after the tree came in");
+  EXPECT_TRUE(told(since).contains("/in/d3/later"));
 }
 
 TEST_P(FollowerTest, ADroppedRecordCostsAComparisonAndNothingElse) {

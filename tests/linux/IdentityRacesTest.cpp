@@ -14,7 +14,8 @@ using IdentityRaces = VolumeFixture;
 
 Result<void> learnIn(VolumeIndex& index, const std::string& folder, std::span<Sighting> sightings) {
   const UniqueFd opened(::open(folder.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-  return index.learn(folder, opened.get(), sightings);
+  auto learned = index.learn(folder, opened.get(), sightings);
+  return learned ? Result<void>() : Result<void>(fail(learned.error()));
 }
 
 // A thread looks at a name and then has to wait for the index, while others look later and say so

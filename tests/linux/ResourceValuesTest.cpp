@@ -30,6 +30,38 @@ TEST_F(ResourceValuesOnDisk, NamesOfAnyBytesAreReadAndFoundAgain) {
   }
 }
 
+TEST_F(ResourceValuesOnDisk, ReadingEntriesTogetherTellsOfTheirFolderTheSame) {
+  home.makeFolder("plain");
+  home.makeFolder("packed.package");
+  for (const char* name : {"plain", "packed.package"}) {
+    home.writeFile(std::string(name) + "/f");
+    const URL folder = home.url().appendingPathComponent(name);
+    const URL entry = folder.appendingPathComponent("f");
+    ASSERT_TRUE(platform().resources.prefetch({&entry, 1}));
+    const ResourceReader reader(platform().resources);
+    for (const ResourceKey key :
+         {ResourceKey::typeIdentifier, ResourceKey::creationDate,
+          ResourceKey::contentModificationDate, ResourceKey::isDirectory, ResourceKey::isPackage,
+          ResourceKey::isWritable, ResourceKey::fileIdentifier, ResourceKey::documentIdentifier,
+          ResourceKey::linkCount}) {
+      const URL fresh = URL::fileURL(folder.path());
+      EXPECT_EQ(reader.value(key, folder).value(), reader.value(key, fresh).value())
+          << name << " " << nameOf(key);
+    }
+  }
+}
+
+TEST_F(ResourceValuesOnDisk, ADocumentThatWasReadIsNotLookedAtOnceMoreToRefreshIt) {
+  home.writeFile("f");
+  const URL url = home.url().appendingPathComponent("f");
+  ASSERT_TRUE(platform().resources.prefetch({&url, 1}));
+  const std::uint32_t known = url.resources().snapshot()->documentID;
+  home.remove("f");
+  GenerationalStore& documents = platform().documents;
+  EXPECT_EQ(documents.permanentStorageForItemAtURL(url, Allocation::never).value_or(0), known);
+  EXPECT_FALSE(documents.permanentStorageForItemAtURL(url, Allocation::ifNone));
+}
+
 TEST_F(ResourceValuesOnDisk, EachKindHasItsTypeAndNothingBlocks) {
   home.makeFolder("folder");
   home.makeFolder("Letter.QUILL");

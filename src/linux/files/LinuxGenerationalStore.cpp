@@ -14,8 +14,13 @@ Result<std::uint32_t> LinuxGenerationalStore::permanentStorage(FileObject& objec
 
 Result<std::uint32_t> LinuxGenerationalStore::permanentStorageForItemAtURL(const URL& url,
                                                                            Allocation allocation) {
-  const auto values = lookAtObject(context_, url);
-  if (!values) return fail(values.error());
+  // Whoever has read that URL has had the index learn of it: there is no more to learn.
+  auto values = allocation == Allocation::never ? url.resources().snapshot() : std::nullopt;
+  if (!values) {
+    auto looked = lookAtObject(context_, url);
+    if (!looked) return fail(looked.error());
+    values = std::move(*looked);
+  }
   if (values->documentID == 0 && allocation == Allocation::ifNone) {
     return fail(Error::posix(EINVAL));
   }

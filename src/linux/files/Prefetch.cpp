@@ -28,7 +28,7 @@ constexpr std::size_t pieceSize = 32;
 struct Folder {
   std::string_view path;
   UniqueFd descriptor;
-  std::uint64_t device = 0;
+  ObjectStatus status;
   bool isReadOnly = false;
   std::vector<const URL*> entries;
 };
@@ -68,7 +68,8 @@ std::vector<Folder> groupByFolder(const MonitoredRoots& roots, std::span<const U
     const std::string_view path = folderPathOf(url);
     if (folders.empty() || folders.back().path != path) {
       const auto [found, isNew] = indexOfPath.emplace(path, folders.size());
-      if (isNew) folders.push_back(Folder{.path = path, .descriptor = {}, .entries = {}});
+      if (isNew)
+        folders.push_back(Folder{.path = path, .descriptor = {}, .status = {}, .entries = {}});
       folders[found->second].entries.push_back(&url);
       continue;
     }
@@ -84,7 +85,7 @@ bool openFolder(const MonitoredRoots& roots, Folder& folder) {
   const auto status = statusAt(folder.descriptor.get(), "");
   struct statvfs fileSystem;
   if (!status || ::fstatvfs(folder.descriptor.get(), &fileSystem) != 0) return false;
-  folder.device = status->device;
+  folder.status = *status;
   folder.isReadOnly = (fileSystem.f_flag & ST_RDONLY) != 0;
   return true;
 }
@@ -100,7 +101,7 @@ bool concernsThisFolder(const Error& error) {
 bool isWritable(const Folder& folder, const Sighting& sighting, uid_t user) {
   constexpr std::uint64_t fixed = STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND;
   const ObjectStatus& status = sighting.status;
-  if (!folder.isReadOnly && status.device == folder.device && status.owner == user &&
+  if (!folder.isReadOnly && status.device == folder.status.device && status.owner == user &&
       (status.mode & S_IWUSR) != 0 && (status.attributes & fixed) == 0) {
     return true;
   }
@@ -127,8 +128,9 @@ class FolderPrefetch {
     auto learned =
         context_.index.learn(std::string(folder_.path), folder_.descriptor.get(), sightings_);
     if (!learned && concernsThisFolder(learned.error())) return {};
-    if (!learned) return learned;
+    if (!learned) return fail(learned.error());
     fillCaches();
+    fillFolder(*learned);
     return {};
   }
 
@@ -187,6 +189,19 @@ class FolderPrefetch {
         cache.setAttributeNames(std::move(looks_[i].attributeNames));
       }
     }
+  }
+
+  // Items name the folder that they lie in. It was looked at when it was opened, and the index has
+  // said which it is.
+  void fillFolder(std::uint64_t fileID) {
+    const URL url = folder_.entries.front()->deletingLastPathComponent();
+    const std::string_view name = url.lastPathComponent();
+    // A package is a document as well, and a root has a way of its own.
+    if (url.resources().isFilled() || PackageTypes::isPackageName(name)) return;
+    if (!isEntryBelowRoot(context_.roots, url)) return;
+    const Sighting sighting{"", folder_.status, false, fileID};
+    url.resources().fill(
+        valuesOf(context_.types, name, sighting, isWritable(folder_, sighting, ::geteuid())));
   }
 
   const LookContext& context_;

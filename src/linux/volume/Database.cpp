@@ -101,6 +101,10 @@ std::int64_t Database::changeCount() const {
   return sqlite3_total_changes64(handle_);
 }
 
+void Database::releaseMemory() {
+  sqlite3_db_release_memory(handle_);
+}
+
 bool Database::metDamage() const {
   int met = 0;
   sqlite3_file_control(handle_, "main", metWrongPage, &met);

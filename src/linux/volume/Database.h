@@ -36,6 +36,8 @@ class Database {
   [[nodiscard]] std::int64_t changeCount() const;
   /// Whether a damaged page was met.
   [[nodiscard]] bool metDamage() const;
+  /// Gives back what it keeps in memory of pages; they are read again where they are needed.
+  void releaseMemory();
   /// How many pages the write-ahead log held after the last commit; it grows until a checkpoint.
   [[nodiscard]] int logPages() const { return logPages_; }
   /// Moves all that the write-ahead log holds into the database, durably; then the log is begun

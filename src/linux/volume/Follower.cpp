@@ -17,6 +17,10 @@ constexpr int mostRounds = 16;
 constexpr int mostComparisons = 3;
 constexpr std::chrono::minutes watchAgainAfter{1};
 
+Result<void> noPause() {
+  return {};
+}
+
 }  // namespace
 
 Follower::Follower(IndexContext context, Options options)
@@ -42,19 +46,24 @@ Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
   for (int round = 0; round < mostRounds; ++round) {
     auto isSound = drain();
     if (!isSound) return fail(isSound.error());
-    if (!*isSound) return Outcome::lost;
+    if (!*isSound || hasLost_) return Outcome::lost;
     if (auto added = addArrived(); !added) return fail(added.error());
     if (auto added = addDisturbed(); !added) return fail(added.error());
     if (looks_.isEmpty() && scan_.isEmpty()) break;
     looks_.merge(later_.take());
-    if (auto done = followRound(transaction, looks_.take()); !done) return fail(done.error());
+    // What is read after the last round would wait for the next record to wake somebody.
+    const bool isLast = round + 1 == mostRounds;
+    const Pause pause = isLast ? Pause(noPause) : [this] { return drainMeanwhile(); };
+    if (auto done = followRound(transaction, pause, looks_.take()); !done)
+      return fail(done.error());
     if (scan_.watchFailure()) return Outcome::lost;
   }
   if (auto settled = settle(transaction); !settled) return fail(settled.error());
   if (!later_.isEmpty() || scan_.wasDisturbed()) {
     // Mostly their folder is known by now to have gone.
     if (auto added = addDisturbed(); !added) return fail(added.error());
-    if (auto done = followRound(transaction, later_.take()); !done) return fail(done.error());
+    if (auto done = followRound(transaction, noPause, later_.take()); !done)
+      return fail(done.error());
     if (auto settled = settle(transaction); !settled) return fail(settled.error());
   }
   if (places_.hasOthers()) {
@@ -63,15 +72,17 @@ Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
   }
   recent_.clear();
   // A folder is elsewhere, and no record has told of that.
-  const bool isDone = later_.isEmpty() && !scan_.wasDisturbed() && !scan_.watchFailure();
+  const bool isDone =
+      later_.isEmpty() && !scan_.wasDisturbed() && !scan_.watchFailure() && !hasLost_;
   return isDone ? Outcome::inStep : Outcome::lost;
 }
 
-Result<void> Follower::followRound(const Transaction& transaction, LookList::Folders looks) {
-  auto later = places_.look(transaction, *watcher_, std::move(looks));
+Result<void> Follower::followRound(const Transaction& transaction, const Pause& pause,
+                                   LookList::Folders looks) {
+  auto later = places_.look(transaction, pause, *watcher_, std::move(looks));
   if (!later) return fail(later.error());
   later_.merge(std::move(*later));
-  auto scanned = scanArrived(transaction);
+  auto scanned = scanArrived(transaction, pause);
   if (!scan_.watchFailure()) scan_.clear();
   return scanned;
 }
@@ -79,6 +90,15 @@ Result<void> Follower::followRound(const Transaction& transaction, LookList::Fol
 Result<void> Follower::settle(const Transaction& transaction) {
   if (missing_.isEmpty()) return {};
   return transaction([&] { return missing_.settle(); });
+}
+
+// The kernel's queue is read before it is full: what it holds more than that is lost.
+Result<void> Follower::drainMeanwhile() {
+  if (!watcher_) return {};
+  auto isSound = drain();
+  if (!isSound) return fail(isSound.error());
+  if (!*isSound) hasLost_ = true;
+  return {};
 }
 
 /// False when records were dropped.
@@ -131,9 +151,9 @@ Result<void> Follower::addByID(std::uint64_t folder) {
 }
 
 /// Goes through what is to be scanned, and through what comes up with it elsewhere.
-Result<void> Follower::scanArrived(const Transaction& transaction) {
+Result<void> Follower::scanArrived(const Transaction& transaction, const Pause& pause) {
   while (true) {
-    if (auto scanned = scan_.run(transaction); !scanned) return scanned;
+    if (auto scanned = scan_.run(transaction, pause); !scanned) return scanned;
     if (auto added = addArrived(); !added) return added;
     if (scan_.isEmpty()) break;
   }
@@ -157,6 +177,7 @@ Result<void> Follower::compareAll(const Transaction& transaction) {
     auto outcome = follow(transaction);
     if (!outcome || *outcome == Outcome::lost) isInStep_ = false;
     if (!outcome) return fail(outcome.error());
+    if (*outcome == Outcome::inStep && options_.hasCompared) options_.hasCompared();
     if (*outcome == Outcome::inStep) return {};
     if (const auto& failure = scan_.watchFailure()) giveUpWatching(*failure);
   }
@@ -173,6 +194,7 @@ bool Follower::isComparisonDue() const {
 
 Result<void> Follower::scanAll(const Transaction& transaction) {
   const auto began = std::chrono::steady_clock::now();
+  hasLost_ = false;
   missing_.clear();
   recent_.clear();
   scan_.clear();
@@ -188,7 +210,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   }
   static_cast<void>(context_.learner.takeArrivedFolders());
   auto added = transaction([&] { return scan_.addRoots(); });
-  if (added) added = scanArrived(transaction);
+  if (added) added = scanArrived(transaction, [this] { return drainMeanwhile(); });
   if (!added) return added;
   foldersNeeded_ = scan_.foldersRead();
   comparedAt_ = std::chrono::steady_clock::now();

@@ -30,6 +30,8 @@ class Follower final : public RecentPlaces {
     std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher;
     /// Says whether a root is another folder than it was, which no record tells of.
     std::function<bool()> haveRootsChanged;
+    /// Called when everything was compared and changes are heard of from now on.
+    std::function<void()> hasCompared;
     /// Told, once, when folders can't be watched.
     std::function<void(std::string_view)> notice;
   };
@@ -55,10 +57,12 @@ class Follower final : public RecentPlaces {
  private:
   enum class Outcome { inStep, lost };
   [[nodiscard]] Result<Outcome> follow(const Transaction& transaction);
-  [[nodiscard]] Result<void> followRound(const Transaction& transaction, LookList::Folders looks);
+  [[nodiscard]] Result<void> followRound(const Transaction& transaction, const Pause& pause,
+                                         LookList::Folders looks);
   [[nodiscard]] Result<void> settle(const Transaction& transaction);
   [[nodiscard]] Result<bool> drain();
-  [[nodiscard]] Result<void> scanArrived(const Transaction& transaction);
+  [[nodiscard]] Result<void> drainMeanwhile();
+  [[nodiscard]] Result<void> scanArrived(const Transaction& transaction, const Pause& pause);
   [[nodiscard]] Result<void> addArrived();
   [[nodiscard]] Result<void> addDisturbed();
   [[nodiscard]] Result<void> addByID(std::uint64_t folder);
@@ -76,6 +80,7 @@ class Follower final : public RecentPlaces {
   LookList later_;  // places whose folder was not where the index has it
   std::shared_ptr<FolderWatcher> watcher_;
   bool isInStep_ = false;
+  bool hasLost_ = false;  // records, since the last full comparison began
   std::optional<Error> refusal_;
   std::optional<WatcherKind> refusedKind_;
   std::chrono::steady_clock::time_point retryAt_{};

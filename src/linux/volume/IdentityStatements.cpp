@@ -84,6 +84,9 @@ Result<std::unique_ptr<IdentityStatements>> IdentityStatements::prepare(Database
       "SELECT name, slot FROM links WHERE folder = ?1",
       "SELECT value FROM meta WHERE key = CAST(?1 AS TEXT)",
       "INSERT OR REPLACE INTO meta(key, value) VALUES(CAST(?1 AS TEXT), ?2)",
+      "UPDATE objects SET kind=?2, birth_time=?3, change_time=?4, settled=?5, "
+      "modification_time=?6, size=?7 WHERE slot=?1",
+      "SELECT 1 FROM objects WHERE folder = ?1 LIMIT 1",
   };
   std::vector<Statement> made;
   for (const char* text : sql) {

@@ -38,6 +38,8 @@ struct IdentityStatements {
   Statement& linksIn = all[24];
   Statement& meta = all[25];
   Statement& setMeta = all[26];
+  Statement& updateState = all[27];
+  Statement& anyChild = all[28];
 
   static const char* const schema;
   /// Errors: those of `Database::prepare`.

@@ -191,12 +191,31 @@ Result<bool> IdentityStore::isOccupied(std::uint64_t folder, std::string_view na
   return statement.step();
 }
 
+Result<bool> IdentityStore::hasNames(std::uint64_t folder) {
+  if (mayHaveLinks_ || mayHaveHandovers_) return true;
+  Statement& statement = statements_->anyChild.bind(1, folder);
+  StatementScope scope(statement);
+  return statement.step();
+}
+
 Result<void> IdentityStore::insert(const ObjectRow& row) {
   return write(statements_->insert, row);
 }
 
 Result<void> IdentityStore::put(const ObjectRow& row) {
   return write(statements_->update, row);
+}
+
+// The columns that are in indexes stay out of it: SQLite would write each index anew.
+Result<void> IdentityStore::putState(const ObjectRow& row) {
+  return statements_->updateState.bind(1, row.slot)
+      .bind(2, static_cast<std::int64_t>(row.kind))
+      .bind(3, row.birthTime)
+      .bind(4, row.changeTime)
+      .bind(5, std::int64_t{row.isSettled})
+      .bind(6, row.modificationTime)
+      .bind(7, row.size)
+      .run();
 }
 
 Result<void> IdentityStore::write(Statement& statement, const ObjectRow& row) {

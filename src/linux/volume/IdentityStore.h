@@ -66,9 +66,13 @@ class IdentityStore {
   void endComparing();
   /// Whether the index has anything under that name: an object, a link or a handover.
   [[nodiscard]] Result<bool> isOccupied(std::uint64_t folder, std::string_view name);
+  /// Whether it may have anything in that folder.
+  [[nodiscard]] Result<bool> hasNames(std::uint64_t folder);
   /// Writes a row that has its slot. Fails when another object has its document or its inode.
   [[nodiscard]] Result<void> insert(const ObjectRow& row);
   [[nodiscard]] Result<void> put(const ObjectRow& row);
+  /// Writes kind, times and size of a row whose place and identities have not changed.
+  [[nodiscard]] Result<void> putState(const ObjectRow& row);
   [[nodiscard]] Result<void> remove(std::uint64_t slot);
 
   /// Paths that follow from the rows; to be cleared after a rollback.

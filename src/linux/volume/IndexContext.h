@@ -30,4 +30,8 @@ using Transaction = std::function<Result<void>(const std::function<Result<void>(
 /// One transaction's worth of entries.
 inline constexpr std::size_t entriesPerTransaction = 4096;
 
+/// Something that has to be done every so many entries, in the middle of longer work.
+using Pause = std::function<Result<void>()>;
+inline constexpr std::size_t entriesPerPause = 1024;
+
 }  // namespace mirabel

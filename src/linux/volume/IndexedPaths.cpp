@@ -21,6 +21,13 @@ Result<std::optional<std::string>> IndexedPaths::pathOf(const Location& location
   return **folder + "/" + location.name;
 }
 
+Result<std::optional<std::string>> IndexedPaths::pathOfFolder(const ObjectRow& row) const {
+  if (const std::string* found = store_.folderPaths().find(row.fileID)) return *found;
+  auto path = pathOf(*row.location);
+  if (path && *path) store_.folderPaths().add(row.fileID, *row.location, **path);
+  return path;
+}
+
 // From the folder up to the first one whose path is known, and down again.
 Result<std::optional<std::string>> IndexedPaths::folderPath(std::uint64_t folder) const {
   FolderPaths& known = store_.folderPaths();

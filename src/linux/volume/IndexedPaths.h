@@ -21,6 +21,8 @@ class IndexedPaths {
 
   /// Where the index believes a place to be; nothing when a folder above it is detached.
   [[nodiscard]] Result<std::optional<std::string>> pathOf(const Location& location) const;
+  /// The same for the folder of a row that has a place; kept at hand for what lies in it.
+  [[nodiscard]] Result<std::optional<std::string>> pathOfFolder(const ObjectRow& row) const;
   /// File IDs of the folders above a place as the index has them, the outermost first.
   [[nodiscard]] Result<std::vector<std::uint64_t>> foldersAbove(const Location& location) const;
   /// The path of a place, if the disk has the object of `row` there.

@@ -41,17 +41,22 @@ Result<std::uint64_t> Learner::rootID(std::size_t root) {
 Result<std::uint64_t> Learner::folderID(const std::string& path, int folder) {
   auto status = statusAt(folder, "");
   if (!status) return fail(status.error());
-  SeenObject seen{folder, "", *status};
+  return folderID(path, folder, *status);
+}
+
+Result<std::uint64_t> Learner::folderID(const std::string& path, int folder,
+                                        const ObjectStatus& status) {
+  SeenObject seen{folder, "", status};
   auto slot = placer_.slotOf(seen);
   if (!slot) return fail(slot.error());
   if (slot->row && slot->row->location && compare(*slot->row, seen) == Match::same) {
-    auto known = paths_.pathOf(*slot->row->location);
+    auto known = paths_.pathOfFolder(*slot->row);
     if (!known) return fail(known.error());
     if (*known == path) return slot->row->fileID;
   }
   const auto place = roots_.locate(path);
   if (!place) {
-    auto learned = learnPath(path, *status, false);
+    auto learned = learnPath(path, status, false);
     if (!learned) return fail(learned.error());
     return learned->fileID;
   }
@@ -70,23 +75,42 @@ Result<std::uint64_t> Learner::folderID(const std::string& path, int folder) {
     id = row->fileID;
     // Another folder has come to the path since `folder` was opened by it.
     const bool isLast = end == path.size();
-    if (isLast && look->seen.status.inode != status->inode) return fail(Error::posix(ESTALE));
+    if (isLast && look->seen.status.inode != status.inode) return fail(Error::posix(ESTALE));
   }
   return id;
 }
 
 // Names seen ------------------------------------------------------------------------------------
 
-Result<void> Learner::learn(const std::string& folderPath, int folder,
-                            std::span<Sighting> sightings) {
+Result<std::uint64_t> Learner::learn(const std::string& folderPath, int folder,
+                                     std::span<Sighting> sightings) {
   finder_.forget();
   auto id = folderID(folderPath, folder);
   if (!id) return fail(id.error());
+  if (auto learned = learnIn({folderPath, folder, *id}, sightings); !learned) {
+    return fail(learned.error());
+  }
+  return *id;
+}
+
+Result<std::uint64_t> Learner::learn(const std::string& folderPath, int folder,
+                                     std::uint64_t knownID, std::span<Sighting> sightings) {
+  // What was learned meanwhile may have taken the folder elsewhere.
+  const std::string* path = store_.folderPaths().find(knownID);
+  if (path == nullptr || *path != folderPath) return learn(folderPath, folder, sightings);
+  finder_.forget();
+  if (auto learned = learnIn({folderPath, folder, knownID}, sightings); !learned) {
+    return fail(learned.error());
+  }
+  return knownID;
+}
+
+Result<void> Learner::learnIn(const Folder& folder, std::span<Sighting> sightings) {
   static_cast<void>(placer_.takenDocuments());
   // First what nothing has happened to, which is nearly all, then the rest.
   std::vector<Unsettled> rest;
   for (std::size_t i = 0; i < sightings.size(); ++i) {
-    auto knowledge = recognise(*id, sightings[i]);
+    auto knowledge = recognise(folder.id, sightings[i]);
     if (!knowledge) {
       store_.endComparing();
       return fail(knowledge.error());
@@ -96,13 +120,18 @@ Result<void> Learner::learn(const std::string& folderPath, int folder,
     }
   }
   store_.endComparing();
-  readHandles(folder, sightings, rest);
+  if (rest.empty()) return {};
+  readHandles(folder.descriptor, sightings, rest);
+  auto hasNames = store_.hasNames(folder.id);
+  if (!hasNames) return fail(hasNames.error());
+  Newcomers newcomers(*hasNames);
   for (Unsettled& entry : rest) {
     placer_.setOthers([&] {
-      return occupants(*id, sightings.subspan(entry.index)).value_or(std::vector<ObjectRow>());
+      return occupants(folder.id, sightings.subspan(entry.index))
+          .value_or(std::vector<ObjectRow>());
     });
     Sighting& sighting = sightings[entry.index];
-    auto placed = placeEntry({folderPath, folder, *id}, sighting, std::move(entry));
+    auto placed = placeEntry(folder, sighting, std::move(entry), newcomers);
     placer_.setOthers([] { return std::vector<ObjectRow>(); });
     if (!placed) return placed;
   }
@@ -140,23 +169,30 @@ Result<Knowledge> Learner::recognise(std::uint64_t folder, Sighting& sighting) {
   return Knowledge::unchanged;
 }
 
-void Learner::readHandles(int folder, std::span<const Sighting> sightings,
+void Learner::readHandles(int folder, std::span<Sighting> sightings,
                           std::vector<Unsettled>& entries) {
+  std::vector<Unsettled*> unread;
+  for (Unsettled& entry : entries) {
+    auto& handle = sightings[entry.index].handle;
+    if (entry.isNew && !handle) unread.push_back(&entry);
+    if (entry.isNew && handle) entry.handle = *std::move(handle);
+  }
   constexpr std::size_t piece = 64;
-  splitWork(entries.size(), piece, [&](std::size_t begin, std::size_t end) {
+  splitWork(unread.size(), piece, [&](std::size_t begin, std::size_t end) {
     for (std::size_t i = begin; i < end; ++i) {
-      if (!entries[i].isNew) continue;
-      const Sighting& sighting = sightings[entries[i].index];
-      entries[i].handle = handleAt(folder, sighting.name).value_or("");
+      Unsettled& entry = *unread[i];
+      const Sighting& sighting = sightings[entry.index];
+      entry.handle = handleAt(folder, sighting.name).value_or("");
       // The handle must be that of the object whose status was read a while ago.
       const auto now = statusAt(folder, sighting.name);
-      entries[i].isNew =
+      entry.isNew =
           now && now->inode == sighting.status.inode && now->birthTime == sighting.status.birthTime;
     }
   });
 }
 
-Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry) {
+Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry,
+                                 Newcomers& newcomers) {
   if (!entry.isNew) {
     // Since it was seen, others may have looked later and told the index more: what is placed now
     // must be what is there now.
@@ -165,20 +201,21 @@ Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unset
     sighting.status = *status;
     sighting.isPackage = status->kind == FileKind::folder && isPackageName_(sighting.name);
   }
-  auto occupied = store_.isOccupied(folder.id, sighting.name);
-  if (!occupied) return fail(occupied.error());
   Arrival arrival{{folder.descriptor, sighting.name, sighting.status},
                   folder.path,
                   {folder.id, sighting.name},
-                  objectKind(sighting.status.kind, sighting.isPackage),
-                  *occupied};
+                  objectKind(sighting.status.kind, sighting.isPackage)};
   arrival.isReported = sighting.isReported;
-  // Whoever is placed under a free name moves nobody, so what was new when the batch began is new
-  // still, unless the same inode number stands in it twice: a further link, or a fresh reuse.
-  if (entry.isNew && !*occupied && sighting.status.linkCount == 1) {
-    auto row = store_.objectByInode(sighting.status.inode);
-    if (!row) return fail(row.error());
-    if (!*row) arrival.newHandle = std::move(entry.handle);
+  // Several links are several arrivals of one object.
+  const bool mayBeNew = entry.isNew && sighting.status.linkCount == 1;
+  auto isNew = mayBeNew ? isNewcomer(folder, sighting, newcomers) : false;
+  if (!isNew) return fail(isNew.error());
+  if (*isNew) {
+    arrival.isOccupied = false;
+    arrival.newHandle = std::move(entry.handle);
+    newcomers.add(sighting.name, sighting.status.inode);
+  } else {
+    newcomers.addOther();
   }
   auto row = placer_.place(std::move(arrival));
   if (!row && row.error().isPosix(ESTALE)) return {};
@@ -186,6 +223,19 @@ Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unset
   sighting.fileID = row->fileID;
   sighting.documentID = isDocumentKind(row->kind) ? row->documentID : 0;
   return {};
+}
+
+/// Whether neither its name nor its inode number is in the index.
+Result<bool> Learner::isNewcomer(const Folder& folder, const Sighting& sighting,
+                                 const Newcomers& newcomers) {
+  if (!newcomers.isFree(sighting.name)) {
+    auto occupied = store_.isOccupied(folder.id, sighting.name);
+    if (!occupied || *occupied) return occupied ? Result<bool>(false) : occupied;
+  }
+  if (newcomers.isStillNew(sighting.status.inode)) return true;
+  auto row = store_.objectByInode(sighting.status.inode);
+  if (!row) return fail(row.error());
+  return !*row;
 }
 
 Result<std::vector<ObjectRow>> Learner::occupants(std::uint64_t folder,

@@ -11,6 +11,7 @@
 
 #include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
+#include "linux/volume/Newcomers.h"
 #include "linux/volume/Placer.h"
 #include "linux/volume/VolumeIndex.h"
 
@@ -29,11 +30,19 @@ class Learner final : private FolderIdentities {
   /// File ID of the folder at `path`, which is open as `folder`; learns it and the folders above
   /// where they are not known to lie there.
   [[nodiscard]] Result<std::uint64_t> folderID(const std::string& path, int folder) override;
+  /// The same where it was looked at already.
+  [[nodiscard]] Result<std::uint64_t> folderID(const std::string& path, int folder,
+                                               const ObjectStatus& status);
 
   /// Fills in the identities of names seen in that folder. A name that went away meanwhile is
   /// left with the file ID 0; of one that another object has taken, status and kind are renewed.
-  [[nodiscard]] Result<void> learn(const std::string& folderPath, int folder,
-                                   std::span<Sighting> sightings);
+  /// Answers the file ID of the folder.
+  [[nodiscard]] Result<std::uint64_t> learn(const std::string& folderPath, int folder,
+                                            std::span<Sighting> sightings);
+  /// The same for a folder that was seen, since the lock was taken, to be the object of that file
+  /// ID and to lie where the index has it.
+  [[nodiscard]] Result<std::uint64_t> learn(const std::string& folderPath, int folder,
+                                            std::uint64_t knownID, std::span<Sighting> sightings);
   [[nodiscard]] Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
                                            bool isPackage);
 
@@ -41,6 +50,8 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {
     return placer_.takeArrivedFolders();
   }
+  /// Whether the folder is among those that would be taken now.
+  [[nodiscard]] bool hasArrived(std::uint64_t folder) const { return placer_.hasArrived(folder); }
   /// Tells where names have changed of late; null, which it is at first: nobody does.
   void setRecentPlaces(RecentPlaces* places) { finder_.setRecentPlaces(places); }
   /// Where the index has the object, if it stands there; nothing is searched for.
@@ -67,13 +78,17 @@ class Learner final : private FolderIdentities {
     int descriptor;
     std::uint64_t id;
   };
+  [[nodiscard]] Result<void> learnIn(const Folder& folder, std::span<Sighting> sightings);
   [[nodiscard]] bool isOnVolume(const Sighting& sighting) const;
   /// Answers the identity where nothing has happened to the entry.
   [[nodiscard]] Result<Knowledge> recognise(std::uint64_t folder, Sighting& sighting);
-  /// Reads the handles of new entries, on two threads.
-  static void readHandles(int folder, std::span<const Sighting> sightings,
+  /// Reads the handles of new entries that come without, on two threads.
+  static void readHandles(int folder, std::span<Sighting> sightings,
                           std::vector<Unsettled>& entries);
-  [[nodiscard]] Result<void> placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry);
+  [[nodiscard]] Result<void> placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry,
+                                        Newcomers& newcomers);
+  [[nodiscard]] Result<bool> isNewcomer(const Folder& folder, const Sighting& sighting,
+                                        const Newcomers& newcomers);
 
   [[nodiscard]] Result<void> correctDocuments(std::span<Sighting> sightings);
 

@@ -21,9 +21,10 @@ bool hasEntryChange(const LookList::Names& names) {
 
 }  // namespace
 
-Result<LookList::Folders> PlaceLooks::look(const Transaction& transaction, FolderWatcher& watcher,
-                                           LookList::Folders folders) {
+Result<LookList::Folders> PlaceLooks::look(const Transaction& transaction, const Pause& pause,
+                                           FolderWatcher& watcher, LookList::Folders folders) {
   LookList::Folders later;
+  std::size_t sincePause = 0;
   auto next = folders.begin();
   while (next != folders.end()) {
     auto done = transaction([&]() -> Result<void> {
@@ -32,9 +33,13 @@ Result<LookList::Folders> PlaceLooks::look(const Transaction& transaction, Folde
         auto presence = lookInFolder(watcher, id, names);
         if (!presence) return fail(presence.error());
         looked += names.size();
+        sincePause += names.size();
         if (*presence == Presence::gone) watcher.forget(id);
         if (*presence == Presence::moved) later[id] = std::move(names);
         ++next;
+        if (sincePause < entriesPerPause) continue;
+        sincePause = 0;
+        if (auto paused = pause(); !paused) return paused;
       }
       return {};
     });
@@ -48,7 +53,7 @@ Result<PlaceLooks::Presence> PlaceLooks::open(std::uint64_t id, Folder& folder) 
   if (!row) return fail(row.error());
   // The folder has left, or went with one above it: whoever finds it again reads all of it.
   if (!*row || !(*row)->location) return Presence::gone;
-  auto path = context_.paths.pathOf(*(*row)->location);
+  auto path = context_.paths.pathOfFolder(**row);
   if (!path) return fail(path.error());
   if (!*path) return Presence::gone;
   folder.row = std::move(**row);
@@ -83,7 +88,7 @@ Result<PlaceLooks::Presence> PlaceLooks::lookInFolder(FolderWatcher& watcher, st
   }
   auto seen = sightings(folder, names);
   if (!seen) return fail(seen.error());
-  auto learned = context_.learner.learn(folder.path, folder.descriptor.get(), *seen);
+  auto learned = context_.learner.learn(folder.path, folder.descriptor.get(), id, *seen);
   if (!learned && isOutOfReach(learned.error())) return Presence::moved;
   if (!learned && learned.error().isPosix(ESTALE)) return Presence::moved;
   if (!learned) return fail(learned.error());

@@ -22,7 +22,8 @@ class PlaceLooks {
   /// Folders that nobody watches yet are added to the scan, names that are not there to those that
   /// are missing. Answers the places whose folder does not lie where the index has it, to be looked
   /// at again after further records.
-  [[nodiscard]] Result<LookList::Folders> look(const Transaction& transaction,
+  /// `pause` is called every so many names.
+  [[nodiscard]] Result<LookList::Folders> look(const Transaction& transaction, const Pause& pause,
                                                FolderWatcher& watcher, LookList::Folders folders);
   /// Looks at what was linked or unlinked somewhere under its other names; to be called when the
   /// places were looked at. What does not lie where the index has it is kept for the next time.

@@ -75,7 +75,8 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
 
 Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
   const bool changedKind = row.kind != arrival.kind;
-  bool isKnownName = row.location == arrival.location;
+  const bool isInPlace = row.location == arrival.location;
+  bool isKnownName = isInPlace;
   const bool changed =
       changedKind || hasChanged(row, arrival.seen.status) || (arrival.isReported && !row.isSettled);
   const bool stale = changed || isStale(row, arrival.seen.status);
@@ -92,7 +93,8 @@ Result<ObjectRow> Placer::placeKnown(const Arrival& arrival, ObjectRow row) {
     if (!*further) return moveTo(arrival, std::move(row), changedKind);
   }
   if (isKnownName && !stale && row.documentID == before) return row;
-  auto written = put(std::move(row));
+  auto written =
+      isInPlace && row.documentID == before ? putState(std::move(row)) : put(std::move(row));
   if (!written || (isKnownName && !changed)) return written;
   if (auto told = tellChange(*written, arrival.location, changedKind); !told) {
     return fail(told.error());
@@ -283,6 +285,11 @@ Result<void> Placer::ensureDocument(ObjectRow& row) {
   if (!next) return fail(next.error());
   row.documentID = *next;
   return {};
+}
+
+Result<ObjectRow> Placer::putState(ObjectRow row) {
+  if (auto written = store_.putState(row); !written) return fail(written.error());
+  return row;
 }
 
 Result<ObjectRow> Placer::put(ObjectRow row) {

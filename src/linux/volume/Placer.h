@@ -80,6 +80,9 @@ class Placer {
   [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {
     return std::exchange(arrivedFolders_, {});
   }
+  [[nodiscard]] bool hasArrived(std::uint64_t folder) const {
+    return arrivedFolders_.contains(folder);
+  }
 
   /// Puts an object that is not at its place where the finder has found it.
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);
@@ -125,6 +128,8 @@ class Placer {
   [[nodiscard]] Result<void> ensureDocument(ObjectRow& row);
   /// Writes the row and answers it.
   [[nodiscard]] Result<ObjectRow> put(ObjectRow row);
+  /// The same for one whose place and identities have not changed.
+  [[nodiscard]] Result<ObjectRow> putState(ObjectRow row);
 
   IdentityStore& store_;
   IdentifierAllocator& allocator_;

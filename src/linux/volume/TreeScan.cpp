@@ -1,23 +1,15 @@
 #include "linux/volume/TreeScan.h"
 
-#include <atomic>
 #include <cerrno>
 #include <fcntl.h>
 #include <optional>
 #include <utility>
 
-#include "foundation/SplitWork.h"
 #include "linux/kernel/RawDirectory.h"
 #include "linux/volume/ObjectMatcher.h"
 
 namespace mirabel {
 namespace {
-
-constexpr std::size_t pieceSize = 64;
-
-bool isDots(std::string_view name) {
-  return name == "." || name == "..";
-}
 
 // What was to be read has gone, or another folder has come to its path, since it was seen.
 bool isDisturbance(const Error& error) {
@@ -54,23 +46,56 @@ Result<void> TreeScan::addRoots() {
 
 void TreeScan::clear() {
   pending_.clear();
+  asked_.clear();
   read_.clear();
   watchFailure_.reset();
 }
 
-Result<void> TreeScan::run(const Transaction& transaction) {
-  while (!pending_.empty()) {
-    if (auto done = transaction([&] { return readBatch(); }); !done) return done;
+Result<void> TreeScan::run(const Transaction& transaction, const Pause& pause) {
+  Result<void> done;
+  while (done && !isEmpty()) {
+    done = transaction([&] { return readBatch(pause); });
   }
-  return {};
+  ahead_.stop();
+  for (Folder& folder : asked_)
+    folder.ticket.reset();
+  return done;
 }
 
-// Many small folders share a transaction, for each costs a write to disk.
-Result<void> TreeScan::readBatch() {
-  entriesRead_ = 0;
-  while (!pending_.empty() && entriesRead_ < entriesPerTransaction) {
-    const Folder folder = std::move(pending_.back());
+// What comes after it is read meanwhile by another thread, unless that is too little to share.
+TreeScan::Folder TreeScan::next() {
+  constexpr std::size_t mostAhead = 128;
+  constexpr std::size_t fewestToShare = 16;
+  const bool isShared = pending_.size() + asked_.size() >= fewestToShare;
+  const std::size_t wanted = !isShared ? 1 : asked_.size() <= mostAhead / 2 ? mostAhead : 0;
+  while (!pending_.empty() && asked_.size() < wanted) {
+    Folder folder = std::move(pending_.back());
     pending_.pop_back();
+    // The very next one is not worth the wait.
+    if (folder.seen && !asked_.empty() && !read_.contains(folder.id)) {
+      FolderRequest request{folder.path, folder.id, folder.seen->inode, folder.seen->birthTime,
+                            context_.learner.hasArrived(folder.id)};
+      folder.ticket = ahead_.ask(std::move(request), watchFailure_ ? nullptr : watcher_);
+    }
+    asked_.push_back(std::move(folder));
+  }
+  Folder folder = std::move(asked_.front());
+  asked_.pop_front();
+  return folder;
+}
+
+// Many small folders share a transaction: each costs a write to disk, and writes the pages of the
+// indexes that were touched, which for a whole tree are all of them.
+Result<void> TreeScan::readBatch(const Pause& pause) {
+  constexpr std::size_t mostEntries = 4 * entriesPerTransaction;
+  std::size_t nextPause = entriesPerPause;
+  entriesRead_ = 0;
+  while (!isEmpty() && entriesRead_ < mostEntries) {
+    if (entriesRead_ >= nextPause) {
+      if (auto paused = pause(); !paused) return paused;
+      nextPause = entriesRead_ + entriesPerPause;
+    }
+    const Folder folder = next();
     // It was watched from before it was read: what came since is told.
     if (read_.contains(folder.id)) continue;
     auto done = read(folder);
@@ -85,6 +110,15 @@ Result<void> TreeScan::readBatch() {
 
 Result<void> TreeScan::read(const Folder& folder) {
   ++entriesRead_;
+  auto reading = folder.ticket ? ahead_.take(folder.ticket) : std::nullopt;
+  if (reading) {
+    auto id = context_.learner.folderID(folder.path, reading->folder.get(), reading->status);
+    const bool isOurs = reading->status.device == context_.device;
+    if (id && *id == folder.id && isOurs) return takeIn(folder, std::move(*reading));
+    // It was watched under a number that is not, or no longer, its own.
+    if (watcher_ != nullptr) watcher_->forget(folder.id);
+    if (!id) return fail(id.error());
+  }
   auto opened = context_.roots.open(folder.path, O_RDONLY | O_DIRECTORY);
   if (!opened && !isClosedToUs(opened.error())) return fail(opened.error());
   if (!opened) {
@@ -96,36 +130,39 @@ Result<void> TreeScan::read(const Folder& folder) {
   if (!status) return fail(status.error());
   // What is mounted there, or is a volume of its own, is another's.
   if (status->device != context_.device) return findMissing(folder);
-  auto id = context_.learner.folderID(folder.path, opened->get());
+  auto id = context_.learner.folderID(folder.path, opened->get(), *status);
   if (!id) return fail(id.error());
   watch(opened->get(), *id);
-  // Open anew, now that it is watched: btrfs gives what was there when a folder was opened, and
-  // what came between that and the mark would be in neither.
-  UniqueFd reading(::openat(opened->get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!reading) return fail(Error::posix(errno));
+  auto begun = beginReading(std::move(*opened));
+  if (!begun) return fail(begun.error());
   const Folder itself{folder.path, *id, folder.depth};
-  auto done = lookAtItself(itself, opened->get());
-  if (done) done = readEntries(itself, std::move(reading));
-  if (!done) {
-    // Who is watched is known: whoever meets it under its new name reads it.
-    if (watcher_ != nullptr) watcher_->forget(*id);
-    return done;
-  }
-  unreadable_.erase(*id);
-  read_.insert(*id);
+  if (auto done = readNext(*begun); !done) return giveUp(itself, done.error());
+  return takeIn(itself, std::move(*begun));
+}
+
+/// Who is watched is known: whoever meets the folder under its new name reads it.
+Result<void> TreeScan::giveUp(const Folder& folder, const Error& error) {
+  if (watcher_ != nullptr) watcher_->forget(folder.id);
+  return fail(error);
+}
+
+Result<void> TreeScan::takeIn(const Folder& folder, FolderReading reading) {
+  auto done = lookAtItself(folder, reading.status);
+  if (done) done = takeInEntries(folder, reading);
+  if (!done) return giveUp(folder, done.error());
+  unreadable_.erase(folder.id);
+  read_.insert(folder.id);
   return {};
 }
 
 /// Since it was seen in the folder above, something may have come into it, or left.
-Result<void> TreeScan::lookAtItself(const Folder& folder, int descriptor) {
+Result<void> TreeScan::lookAtItself(const Folder& folder, const ObjectStatus& status) {
   auto row = context_.store.objectByFileID(folder.id);
   if (!row) return fail(row.error());
-  auto status = statusAt(descriptor, "");
-  if (!status) return fail(status.error());
   if (!*row || !(*row)->location || (*row)->location->folder == 0) return {};
-  if (!hasChanged(**row, *status)) return {};
+  if (!hasChanged(**row, status)) return {};
   const bool isPackage = context_.isPackageName((*row)->location->name);
-  auto learned = context_.learner.learnPath(folder.path, *status, isPackage);
+  auto learned = context_.learner.learnPath(folder.path, status, isPackage);
   if (!learned) return fail(learned.error());
   return {};
 }
@@ -137,62 +174,34 @@ void TreeScan::watch(int folder, std::uint64_t id) {
   if (!watched && !watched.error().isPosix(EACCES)) watchFailure_ = watched.error();
 }
 
-Result<void> TreeScan::readEntries(const Folder& folder, UniqueFd opened) {
-  const int descriptor = opened.get();
-  RawDirectory directory(std::move(opened));
+Result<void> TreeScan::takeInEntries(const Folder& folder, FolderReading& reading) {
   std::uint64_t names = 0;
-  std::vector<Sighting> batch;
   while (true) {
-    auto entry = directory.next();
-    if (!entry) return fail(entry.error());
-    if (*entry && !isDots((*entry)->name)) {
-      batch.push_back({std::string((*entry)->name), {}, false});
-    }
-    if (batch.size() < entriesPerTransaction && *entry) continue;
-    auto taken = takeIn(folder, descriptor, batch);
-    if (!taken) return fail(taken.error());
-    names += *taken;
-    entriesRead_ += batch.size();
-    batch.clear();
-    if (!*entry) break;
+    auto placed = takeInBatch(folder, reading);
+    if (!placed) return fail(placed.error());
+    names += *placed;
+    entriesRead_ += reading.entries.size();
+    if (reading.isAtEnd()) break;
+    if (auto done = readNext(reading); !done) return done;
   }
   auto known = context_.store.nameCount(folder.id);
   if (!known) return fail(known.error());
   return *known == names ? Result<void>() : findMissing(folder);
 }
 
-Result<std::uint64_t> TreeScan::takeIn(const Folder& folder, int descriptor,
-                                       std::vector<Sighting>& batch) {
-  std::vector<char> isThere(batch.size(), 0);
-  std::atomic<int> failure = 0;
-  splitWork(batch.size(), pieceSize, [&](std::size_t begin, std::size_t end) {
-    for (std::size_t i = begin; i < end; ++i) {
-      auto status = statusAt(descriptor, batch[i].name);
-      if (!status && !status.error().isPosix(ENOENT) && !status.error().isPosix(EACCES)) {
-        failure = static_cast<int>(status.error().code);
-      }
-      if (!status) continue;
-      isThere[i] = 1;
-      batch[i].status = *status;
-    }
-  });
-  if (failure != 0) return fail(Error::posix(failure));
-  std::size_t kept = 0;
-  for (std::size_t i = 0; i < batch.size(); ++i) {
-    if (isThere[i] == 0) continue;
-    if (kept != i) batch[kept] = std::move(batch[i]);
-    Sighting& sighting = batch[kept++];
+/// Answers how many of them have a place now.
+Result<std::uint64_t> TreeScan::takeInBatch(const Folder& folder, FolderReading& reading) {
+  for (Sighting& sighting : reading.entries) {
     // What was looked at right after a change may have had another one since.
     sighting.isReported = timesAreCoarse();
     sighting.isPackage =
         sighting.status.kind == FileKind::folder && context_.isPackageName(sighting.name);
   }
-  batch.resize(kept);
-  if (auto learned = context_.learner.learn(folder.path, descriptor, batch); !learned) {
-    return fail(learned.error());
-  }
+  auto learned =
+      context_.learner.learn(folder.path, reading.folder.get(), folder.id, reading.entries);
+  if (!learned) return fail(learned.error());
   std::uint64_t placed = 0;
-  for (const Sighting& sighting : batch) {
+  for (const Sighting& sighting : reading.entries) {
     if (sighting.fileID == 0) continue;
     ++placed;
     const bool isFolder =
@@ -200,7 +209,8 @@ Result<std::uint64_t> TreeScan::takeIn(const Folder& folder, int descriptor,
     if (!isFolder) continue;
     const bool isFollowed = watcher_ != nullptr && watcher_->isWatched(sighting.fileID);
     if (folder.depth == Depth::folder && isFollowed) continue;
-    add(folder.path + "/" + sighting.name, sighting.fileID, Depth::everything);
+    pending_.push_back({folder.path + "/" + sighting.name, sighting.fileID, Depth::everything,
+                        Seen{sighting.status.inode, sighting.status.birthTime}});
   }
   return placed;
 }

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <deque>
 #include <optional>
 #include <string>
 #include <unordered_set>
@@ -9,6 +10,7 @@
 #include <vector>
 
 #include "foundation/Error.h"
+#include "linux/volume/FolderReading.h"
 #include "linux/volume/IndexContext.h"
 #include "linux/volume/MissingNames.h"
 #include "linux/watch/FolderWatcher.h"
@@ -22,7 +24,7 @@ namespace mirabel {
 class TreeScan {
  public:
   TreeScan(const IndexContext& context, MissingNames& missing)
-      : context_(context), missing_(missing) {}
+      : context_(context), missing_(missing), ahead_(context.roots) {}
 
   /// Null: nobody watches.
   void setWatcher(FolderWatcher* watcher) { watcher_ = watcher; }
@@ -33,13 +35,14 @@ class TreeScan {
   };
   void add(std::string path, std::uint64_t id, Depth depth);
   [[nodiscard]] Result<void> addRoots();
-  [[nodiscard]] bool isEmpty() const { return pending_.empty(); }
+  [[nodiscard]] bool isEmpty() const { return pending_.empty() && asked_.empty(); }
   void clear();
 
   /// Goes through what was added. When it returns without an error, the index shows what the disk
   /// showed at some moment since the call, for each entry that did not change meanwhile; names
   /// that are missing are still to be settled. An error leaves what was taken in.
-  [[nodiscard]] Result<void> run(const Transaction& transaction);
+  /// `pause` is called every so many entries.
+  [[nodiscard]] Result<void> run(const Transaction& transaction, const Pause& pause);
 
   /// Whether that folder was gone through since the last `clear`.
   [[nodiscard]] bool hasRead(std::uint64_t id) const { return read_.contains(id); }
@@ -54,24 +57,35 @@ class TreeScan {
   [[nodiscard]] std::size_t unreadableFolders() const { return unreadable_.size(); }
 
  private:
+  /// The object that had the name.
+  struct Seen {
+    std::uint64_t inode;
+    std::int64_t birthTime;
+  };
   struct Folder {
     std::string path;
     std::uint64_t id;
     Depth depth;
+    std::optional<Seen> seen = std::nullopt;
+    FolderReadAhead::Ticket ticket = nullptr;
   };
-  [[nodiscard]] Result<void> readBatch();
+  [[nodiscard]] Folder next();
+  [[nodiscard]] Result<void> readBatch(const Pause& pause);
   [[nodiscard]] Result<void> read(const Folder& folder);
-  [[nodiscard]] Result<void> readEntries(const Folder& folder, UniqueFd opened);
-  [[nodiscard]] Result<std::uint64_t> takeIn(const Folder& folder, int descriptor,
-                                             std::vector<Sighting>& batch);
+  [[nodiscard]] Result<void> giveUp(const Folder& folder, const Error& error);
+  [[nodiscard]] Result<void> takeIn(const Folder& folder, FolderReading reading);
+  [[nodiscard]] Result<void> takeInEntries(const Folder& folder, FolderReading& reading);
+  [[nodiscard]] Result<std::uint64_t> takeInBatch(const Folder& folder, FolderReading& reading);
   [[nodiscard]] Result<void> findMissing(const Folder& folder);
-  [[nodiscard]] Result<void> lookAtItself(const Folder& folder, int descriptor);
+  [[nodiscard]] Result<void> lookAtItself(const Folder& folder, const ObjectStatus& status);
   void watch(int folder, std::uint64_t id);
 
   const IndexContext& context_;
   MissingNames& missing_;
   FolderWatcher* watcher_ = nullptr;
   std::vector<Folder> pending_;
+  std::deque<Folder> asked_;  // comes before what is pending
+  FolderReadAhead ahead_;
   std::unordered_set<std::uint64_t> read_;
   std::size_t entriesRead_ = 0;  // in the transaction under way
   std::vector<std::uint64_t> disturbed_;

@@ -29,7 +29,8 @@ class StoredVolumeIndex final : public VolumeIndex {
                  options.isPackageName),
         follower_(
             {learner_, state_->store(), recorder_, paths_, roots, device, options.isPackageName},
-            {options.makeWatcher, [&roots] { return roots.refresh(); }, options.notice}),
+            {options.makeWatcher, [&roots] { return roots.refresh(); },
+             [this] { state_->releaseMemory(); }, options.notice}),
         followsInBackground_(options.followsInBackground && options.makeWatcher),
         device_(device) {
     learner_.setRecentPlaces(&follower_);
@@ -45,12 +46,20 @@ class StoredVolumeIndex final : public VolumeIndex {
     });
   }
 
-  Result<void> learn(const std::string& folderPath, int folder,
-                     std::span<Sighting> sightings) override {
+  Result<std::uint64_t> learn(const std::string& folderPath, int folder,
+                              std::span<Sighting> sightings) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     const std::string path = plainPath(folderPath);
-    return inTransaction([&] { return learner_.learn(path, folder, sightings); });
+    std::uint64_t folderID = 0;
+    auto done = inTransaction([&]() -> Result<void> {
+      auto learned = learner_.learn(path, folder, sightings);
+      if (!learned) return fail(learned.error());
+      folderID = *learned;
+      return {};
+    });
+    if (!done) return fail(done.error());
+    return folderID;
   }
 
   Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,

@@ -33,6 +33,8 @@ struct Sighting {
   /// A record says that it was written to, or its attributes were: true also where times are too
   /// coarse to show it.
   bool isReported = false;
+  /// Where it was read together with the status: the object's handle, empty where there is none.
+  std::optional<std::string> handle{};
 };
 
 /// The lasting identities of one volume: which object has which file ID, which document has which
@@ -69,8 +71,9 @@ class VolumeIndex {
 
   /// Gives identities to names seen in the folder that is open as `folder` (O_PATH will do) and
   /// lies at `folderPath`. What it had not seen it learns; document IDs are allocated at once.
-  [[nodiscard]] virtual Result<void> learn(const std::string& folderPath, int folder,
-                                           std::span<Sighting> sightings) = 0;
+  /// Answers the folder's own file ID.
+  [[nodiscard]] virtual Result<std::uint64_t> learn(const std::string& folderPath, int folder,
+                                                    std::span<Sighting> sightings) = 0;
   /// The same for one object by path: a root, something below one, or outside them all.
   [[nodiscard]] virtual Result<Sighting> learnPath(const std::string& path,
                                                    const ObjectStatus& status, bool isPackage) = 0;

@@ -1,6 +1,7 @@
 #include "linux/volume/VolumeState.h"
 
 #include <algorithm>
+#include <malloc.h>
 #include <sqlite3.h>
 #include <utility>
 
@@ -161,6 +162,13 @@ Result<void> VolumeState::transaction(const std::function<Result<void>()>& work)
   store_->folderPaths().clear();
   if (auto reloaded = journal_->reload(); !reloaded) broken_ = reloaded.error();
   return done;
+}
+
+void VolumeState::releaseMemory() {
+  database_->releaseMemory();
+  store_->folderPaths().clear();
+  // The allocator keeps what was freed in between other things, unless it is told.
+  ::malloc_trim(0);
 }
 
 Result<void> VolumeState::commit(std::int64_t changesBefore) {

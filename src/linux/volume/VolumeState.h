@@ -58,6 +58,8 @@ class VolumeState {
   /// Runs `work` in a transaction. What it wrote is on disk when this returns without an error,
   /// and nothing of it otherwise. After an I/O error of the database every call fails.
   [[nodiscard]] Result<void> transaction(const std::function<Result<void>()>& work);
+  /// Gives back the memory that longer work has left full. Not inside a transaction.
+  void releaseMemory();
 
  private:
   explicit VolumeState(StateFolder folder) : folder_(std::move(folder)), files_(folder_) {}

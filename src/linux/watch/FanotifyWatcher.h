@@ -1,9 +1,11 @@
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <mutex>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -22,8 +24,8 @@ class FanotifyWatcher final : public FolderWatcher {
 
   [[nodiscard]] Result<void> watch(int folder, std::uint64_t id) override;
   void forget(std::uint64_t id) override;
-  [[nodiscard]] bool isWatched(std::uint64_t id) const override { return handles_.contains(id); }
-  [[nodiscard]] std::size_t watchedFolders() const override { return handles_.size(); }
+  [[nodiscard]] bool isWatched(std::uint64_t id) const override;
+  [[nodiscard]] std::size_t watchedFolders() const override;
   [[nodiscard]] Result<Drained> drain(LookList& looks) override;
   [[nodiscard]] int descriptor() const override { return group_.get(); }
   [[nodiscard]] WatcherKind kind() const override { return kind_; }
@@ -40,9 +42,10 @@ class FanotifyWatcher final : public FolderWatcher {
   };
   UniqueFd group_;
   WatcherKind kind_;
-  bool hasFileSystemMark_ = false;
+  std::atomic<bool> hasFileSystemMark_ = false;
+  mutable std::mutex mutex_;  // of the two tables
   std::unordered_map<std::string, std::uint64_t, Hash, std::equal_to<>> folders_;  // by handle
-  std::unordered_map<std::uint64_t, std::string> handles_;
+  std::unordered_map<std::uint64_t, const std::string*> handles_;  // keys of the other, one each
   std::unique_ptr<std::byte[]> buffer_;
 };
 

@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <mutex>
 #include <unordered_map>
 
 #include "linux/kernel/UniqueFd.h"
@@ -17,17 +18,19 @@ class InotifyWatcher final : public FolderWatcher {
 
   [[nodiscard]] Result<void> watch(int folder, std::uint64_t id) override;
   void forget(std::uint64_t id) override;
-  [[nodiscard]] bool isWatched(std::uint64_t id) const override { return watches_.contains(id); }
-  [[nodiscard]] std::size_t watchedFolders() const override { return watches_.size(); }
+  [[nodiscard]] bool isWatched(std::uint64_t id) const override;
+  [[nodiscard]] std::size_t watchedFolders() const override;
   [[nodiscard]] Result<Drained> drain(LookList& looks) override;
   [[nodiscard]] int descriptor() const override { return instance_.get(); }
   [[nodiscard]] WatcherKind kind() const override { return WatcherKind::inotify; }
 
  private:
   explicit InotifyWatcher(UniqueFd instance);
+  void end(std::uint64_t id);
   void drop(int watch);
 
   UniqueFd instance_;
+  mutable std::mutex mutex_;                        // of the two tables
   std::unordered_map<int, std::uint64_t> folders_;  // by watch
   std::unordered_map<std::uint64_t, int> watches_;
   std::unique_ptr<std::byte[]> buffer_;
