@@ -67,6 +67,12 @@ class ResourceValueSource {
   /// file error `noSuchFile` where nothing is there, else a POSIX error.
   [[nodiscard]] virtual Result<ResourceValues> readValues(const URL& url) = 0;
 
+  /// Whether a folder of that name can be a package at all. False spares a look, and is for ever.
+  [[nodiscard]] virtual bool mayBePackage(std::string_view name) const {
+    static_cast<void>(name);
+    return true;
+  }
+
   /// Looks at many names at once and leaves what it saw in the resource caches of `urls`
   /// (values and attribute names). The URLs should be children of few folders. A URL that cannot
   /// be looked at keeps an empty cache: the next read of it tells the error. Returning means that
@@ -90,6 +96,11 @@ class ResourceReader {
   /// The value whatever its type, with the error instead of a log line. Fills the URL's cache
   /// on the first call.
   [[nodiscard]] Result<ResourceValue> value(ResourceKey key, const URL& url) const;
+
+  /// See `ResourceValueSource`.
+  [[nodiscard]] bool mayBePackage(std::string_view name) const {
+    return source_.mayBePackage(name);
+  }
 
  private:
   ResourceValueSource& source_;

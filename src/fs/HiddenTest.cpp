@@ -74,6 +74,8 @@ bool HiddenTest::isHiddenBelow(std::string_view relative, const URL& url) const 
 }
 
 bool HiddenTest::isPackage(const URL& folder) const {
+  // Nearly every folder: its name alone tells, whatever has become of it.
+  if (!reader_.mayBePackage(folder.lastPathComponent())) return false;
   const auto holds = [&](ResourceKey key) {
     const auto value = reader_.value(key, folder);
     return value && *value == ResourceValue(true);

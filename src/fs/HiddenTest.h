@@ -23,8 +23,9 @@ class HiddenTest {
 
   /// Whether the URL is one of the folders or lies below one, in sight or not.
   [[nodiscard]] bool isMonitored(const URL& url) const;
-  /// True as well for what is not monitored. Reads the folders between the monitored one and the
-  /// URL through their resource caches; one that cannot be read is taken for no package.
+  /// True as well for what is not monitored. Reads those folders between the monitored one and the
+  /// URL whose names may be a package's, through their resource caches; one that cannot be read is
+  /// taken for no package.
   [[nodiscard]] bool isHidden(const URL& url) const;
 
  private:

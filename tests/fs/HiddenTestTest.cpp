@@ -52,6 +52,33 @@ TEST_F(HiddenTestTest, OnlyWhatStandsBelowAMonitoredFolderCounts) {
   }
 }
 
+/// A platform that tells packages by their name.
+class NamedPackages final : public ResourceValueSource {
+ public:
+  explicit NamedPackages(ResourceValueSource& source) : source_(source) {}
+  Result<ResourceValues> readValues(const URL& url) override {
+    ++reads;
+    return source_.readValues(url);
+  }
+  bool mayBePackage(std::string_view name) const override { return name.ends_with(".bundle"); }
+  Result<void> prefetch(std::span<const URL> urls) override { return source_.prefetch(urls); }
+
+  int reads = 0;
+
+ private:
+  ResourceValueSource& source_;
+};
+
+TEST_F(HiddenTestTest, FoldersWhoseNameTellsThatTheyAreNoPackagesAreNotRead) {
+  fake.volume.makeFolder(fake.path("a/b/pack.bundle/sub"));
+  NamedPackages named(resources());
+  const HiddenTest test({fake.url()}, named);
+  EXPECT_FALSE(test.isHidden(fake.url("a/b/c")));
+  EXPECT_EQ(named.reads, 0);
+  EXPECT_TRUE(test.isHidden(fake.url("a/b/pack.bundle/sub/c")));
+  EXPECT_EQ(named.reads, 1);
+}
+
 TEST_F(HiddenTestTest, PathsAreComparedByComponentsInCanonicalForm) {
   const HiddenTest test({URL::fileURL("/var/x"), URL::fileURL("/y/.in/z"), URL::fileURL("/y")},
                         resources());

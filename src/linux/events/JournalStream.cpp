@@ -13,7 +13,7 @@ namespace {
 
 // Whoever replays mostly wants a hundred changes, and each record that is delivered is looked at;
 // who goes on after that reads through to the end.
-constexpr std::size_t firstBatch = 128;
+constexpr std::size_t firstBatch = 100;
 constexpr std::size_t largestBatch = 1024;
 
 bool isAtOrBelow(std::string_view path, std::string_view folder) {

@@ -2,6 +2,7 @@
 
 #include "foundation/ResourceValues.h"
 #include "linux/files/ObjectLook.h"
+#include "linux/files/PackageTypes.h"
 
 namespace mirabel {
 
@@ -14,6 +15,9 @@ class LinuxResourceValues final : public ResourceValueSource {
 
   /// `noSuchFile` where the name, or a folder on the way to it, is not there.
   Result<ResourceValues> readValues(const URL& url) override;
+  bool mayBePackage(std::string_view name) const override {
+    return PackageTypes::isPackageName(name);
+  }
   Result<void> prefetch(std::span<const URL> urls) override;
 
  private:
