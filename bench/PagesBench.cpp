@@ -19,6 +19,9 @@
 namespace mirabel::bench {
 namespace {
 
+constexpr const char* allRow = "all pages of 200 / one pass over the open folder";
+constexpr const char* oneProcessRow = "last pages / first pages, one process";
+constexpr const char* newProvidersRow = "last pages / first pages, a new provider each";
 constexpr std::uint64_t pageSize = 200;
 
 class Page final : public VesselEnumerationObserver {
@@ -106,8 +109,8 @@ double endOf(const Listing& listing, bool last) {
 }
 
 void benchOneProcess(const BenchHome& home, const std::string& folder, const Scale& scale) {
-  Comparison all{"all pages of 200 / one pass over the open folder", {}, {}, 1.2};
-  Comparison ends{"last pages / first pages, one process", {}, {}, 1.5};
+  Comparison all{allRow, {}, {}, 1.2};
+  Comparison ends{oneProcessRow, {}, {}, 1.5};
   if (!scale.includes(all.name) && !scale.includes(ends.name)) return;
   Provider provider(home);
   const auto enumerator = provider.enumerator(provider.containerOf(folder));
@@ -133,7 +136,7 @@ void benchOneProcess(const BenchHome& home, const std::string& folder, const Sca
 /// The first and the last pages of a listing in providers of their own, those between in one go. A
 /// page is measured behind the look at the volume that a new provider begins with.
 void benchNewProviders(const BenchHome& home, const std::string& folder, const Scale& scale) {
-  Comparison ends{"last pages / first pages, a new provider each", {}, {}, 1.5};
+  Comparison ends{newProvidersRow, {}, {}, 1.5};
   if (!scale.includes(ends.name)) return;
   const std::size_t pages = scale.files / pageSize;
   const std::size_t few = std::min<std::size_t>(20, pages / 2);
@@ -162,6 +165,7 @@ void benchNewProviders(const BenchHome& home, const std::string& folder, const S
 }  // namespace
 
 void runPagesBenchmarks(const Scale& scale) {
+  if (!scale.includesAny({allRow, oneProcessRow, newProvidersRow})) return;
   const BenchHome home;
   const std::string folder = home.makeFolder("paged", scale.files);
   benchOneProcess(home, folder, scale);
