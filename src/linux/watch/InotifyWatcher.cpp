@@ -38,7 +38,9 @@ Result<void> InotifyWatcher::watch(int folder, std::uint64_t id) {
   if (const auto known = watches_.find(id); known != watches_.end() && known->second != watch) {
     end(id);
   }
-  folders_[watch] = id;
+  // A folder that had another number is not to be ended under that.
+  const auto [entry, isNew] = folders_.try_emplace(watch, id);
+  if (!isNew && entry->second != id) watches_.erase(std::exchange(entry->second, id));
   watches_[id] = watch;
   return {};
 }

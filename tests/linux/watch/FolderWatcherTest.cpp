@@ -63,6 +63,15 @@ class FolderWatcherTest : public testing::TestWithParam<WatcherKind> {
   std::unique_ptr<FolderWatcher> watcher_;
 };
 
+TEST_P(FolderWatcherTest, AFolderThatGotAnotherNumberIsHeardOfUnderThatAlone) {
+  ASSERT_TRUE(watch("a", 7));
+  watcher_->forget(1);
+  std::ofstream(at("a/f")) << "longer";
+  const LookList looks = drain();
+  EXPECT_TRUE(has(looks, 7, "f"));
+  EXPECT_FALSE(has(looks, 1, "f"));
+}
+
 TEST_P(FolderWatcherTest, HearsOfEveryCallThatHasReturned) {
   struct Case {
     const char* what;
