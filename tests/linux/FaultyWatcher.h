@@ -16,7 +16,7 @@ struct WatcherFaults {
   std::size_t marks = 1'000'000;  ///< how many there are
   bool loses = false;             ///< the next reading finds that records were dropped
   int made = 0;                   ///< answered: watchers so far
-  /// Called around each watch that is added, on whichever thread does so.
+  /// Called around each watch that is added.
   std::function<void()> beforeWatch{}, afterWatch{};
 };
 

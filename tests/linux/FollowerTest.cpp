@@ -8,7 +8,6 @@
 #include <fstream>
 #include <functional>
 #include <map>
-#include <mutex>
 #include <set>
 #include <sys/stat.h>
 #include <thread>
@@ -113,8 +112,7 @@ TEST_P(FollowerTest, AnUnlinkedDocumentEndsAndASavedOneGoesOn) {
   EXPECT_TRUE(index().fileIDOfDocument(unlinked).error().isPosix(ENOENT));
 }
 
-// Folders are read by another thread than the one that takes them in, some time before.
-TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadAheadIsTakenIn) {
+TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadIsTakenIn) {
   constexpr int folders = 60;
   const auto folder = [](int number) { return "d" + std::to_string(number % folders); };
   for (int i = 0; i < folders; ++i) {
@@ -122,10 +120,8 @@ TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadAheadIsTakenIn) {
     write(folder(i) + "/f");
     write(folder(i) + "/sub/g");
   }
-  std::mutex mutex;
   int number = 0;
   const auto disturb = [&] {
-    const std::scoped_lock lock(mutex);
     const int now = number++;
     if (now >= 2 * folders) return;
     write(folder(now) + "/late" + std::to_string(now));
@@ -149,7 +145,6 @@ TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadAheadIsTakenIn) {
   anchor();
   number = 2 * folders;
   faults_->afterWatch = [&] {
-    const std::scoped_lock lock(mutex);
     const int now = number++ - 2 * folders;
     if (now < folders) write("in/" + folder(now) + "/later");
   };

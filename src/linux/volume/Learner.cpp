@@ -169,23 +169,17 @@ Result<Knowledge> Learner::recognise(std::uint64_t folder, Sighting& sighting) {
   return Knowledge::unchanged;
 }
 
-void Learner::readHandles(int folder, std::span<Sighting> sightings,
+void Learner::readHandles(int folder, std::span<const Sighting> sightings,
                           std::vector<Unsettled>& entries) {
-  std::vector<Unsettled*> unread;
-  for (Unsettled& entry : entries) {
-    auto& handle = sightings[entry.index].handle;
-    if (entry.isNew && !handle) unread.push_back(&entry);
-    if (entry.isNew && handle) entry.handle = *std::move(handle);
-  }
   constexpr std::size_t piece = 64;
-  splitWork(unread.size(), piece, [&](std::size_t begin, std::size_t end) {
+  splitWork(entries.size(), piece, [&](std::size_t begin, std::size_t end) {
     for (std::size_t i = begin; i < end; ++i) {
-      Unsettled& entry = *unread[i];
-      const Sighting& sighting = sightings[entry.index];
-      entry.handle = handleAt(folder, sighting.name).value_or("");
+      if (!entries[i].isNew) continue;
+      const Sighting& sighting = sightings[entries[i].index];
+      entries[i].handle = handleAt(folder, sighting.name).value_or("");
       // The handle must be that of the object whose status was read a while ago.
       const auto now = statusAt(folder, sighting.name);
-      entry.isNew =
+      entries[i].isNew =
           now && now->inode == sighting.status.inode && now->birthTime == sighting.status.birthTime;
     }
   });

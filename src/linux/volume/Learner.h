@@ -50,8 +50,6 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {
     return placer_.takeArrivedFolders();
   }
-  /// Whether the folder is among those that would be taken now.
-  [[nodiscard]] bool hasArrived(std::uint64_t folder) const { return placer_.hasArrived(folder); }
   /// Tells where names have changed of late; null, which it is at first: nobody does.
   void setRecentPlaces(RecentPlaces* places) { finder_.setRecentPlaces(places); }
   /// Where the index has the object, if it stands there; nothing is searched for.
@@ -82,8 +80,8 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] bool isOnVolume(const Sighting& sighting) const;
   /// Answers the identity where nothing has happened to the entry.
   [[nodiscard]] Result<Knowledge> recognise(std::uint64_t folder, Sighting& sighting);
-  /// Reads the handles of new entries that come without, on two threads.
-  static void readHandles(int folder, std::span<Sighting> sightings,
+  /// Reads the handles of new entries, on two threads.
+  static void readHandles(int folder, std::span<const Sighting> sightings,
                           std::vector<Unsettled>& entries);
   [[nodiscard]] Result<void> placeEntry(const Folder& folder, Sighting& sighting, Unsettled entry,
                                         Newcomers& newcomers);

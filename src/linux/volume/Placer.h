@@ -80,9 +80,6 @@ class Placer {
   [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {
     return std::exchange(arrivedFolders_, {});
   }
-  [[nodiscard]] bool hasArrived(std::uint64_t folder) const {
-    return arrivedFolders_.contains(folder);
-  }
 
   /// Puts an object that is not at its place where the finder has found it.
   [[nodiscard]] Result<ObjectRow> placeFound(ObjectRow row, const ObjectFinder::Found& found);

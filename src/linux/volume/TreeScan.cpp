@@ -46,42 +46,15 @@ Result<void> TreeScan::addRoots() {
 
 void TreeScan::clear() {
   pending_.clear();
-  asked_.clear();
   read_.clear();
   watchFailure_.reset();
 }
 
 Result<void> TreeScan::run(const Transaction& transaction, const Pause& pause) {
-  Result<void> done;
-  while (done && !isEmpty()) {
-    done = transaction([&] { return readBatch(pause); });
+  while (!pending_.empty()) {
+    if (auto done = transaction([&] { return readBatch(pause); }); !done) return done;
   }
-  ahead_.stop();
-  for (Folder& folder : asked_)
-    folder.ticket.reset();
-  return done;
-}
-
-// What comes after it is read meanwhile by another thread, unless that is too little to share.
-TreeScan::Folder TreeScan::next() {
-  constexpr std::size_t mostAhead = 128;
-  constexpr std::size_t fewestToShare = 16;
-  const bool isShared = pending_.size() + asked_.size() >= fewestToShare;
-  const std::size_t wanted = !isShared ? 1 : asked_.size() <= mostAhead / 2 ? mostAhead : 0;
-  while (!pending_.empty() && asked_.size() < wanted) {
-    Folder folder = std::move(pending_.back());
-    pending_.pop_back();
-    // The very next one is not worth the wait.
-    if (folder.seen && !asked_.empty() && !read_.contains(folder.id)) {
-      FolderRequest request{folder.path, folder.id, folder.seen->inode, folder.seen->birthTime,
-                            context_.learner.hasArrived(folder.id)};
-      folder.ticket = ahead_.ask(std::move(request), watchFailure_ ? nullptr : watcher_);
-    }
-    asked_.push_back(std::move(folder));
-  }
-  Folder folder = std::move(asked_.front());
-  asked_.pop_front();
-  return folder;
+  return {};
 }
 
 // Many small folders share a transaction: each costs a write to disk, and writes the pages of the
@@ -90,12 +63,13 @@ Result<void> TreeScan::readBatch(const Pause& pause) {
   constexpr std::size_t mostEntries = 4 * entriesPerTransaction;
   std::size_t nextPause = entriesPerPause;
   entriesRead_ = 0;
-  while (!isEmpty() && entriesRead_ < mostEntries) {
+  while (!pending_.empty() && entriesRead_ < mostEntries) {
     if (entriesRead_ >= nextPause) {
       if (auto paused = pause(); !paused) return paused;
       nextPause = entriesRead_ + entriesPerPause;
     }
-    const Folder folder = next();
+    const Folder folder = std::move(pending_.back());
+    pending_.pop_back();
     // It was watched from before it was read: what came since is told.
     if (read_.contains(folder.id)) continue;
     auto done = read(folder);
@@ -110,15 +84,6 @@ Result<void> TreeScan::readBatch(const Pause& pause) {
 
 Result<void> TreeScan::read(const Folder& folder) {
   ++entriesRead_;
-  auto reading = folder.ticket ? ahead_.take(folder.ticket) : std::nullopt;
-  if (reading) {
-    auto id = context_.learner.folderID(folder.path, reading->folder.get(), reading->status);
-    const bool isOurs = reading->status.device == context_.device;
-    if (id && *id == folder.id && isOurs) return takeIn(folder, std::move(*reading));
-    // It was watched under a number that is not, or no longer, its own.
-    if (watcher_ != nullptr) watcher_->forget(folder.id);
-    if (!id) return fail(id.error());
-  }
   auto opened = context_.roots.open(folder.path, O_RDONLY | O_DIRECTORY);
   if (!opened && !isClosedToUs(opened.error())) return fail(opened.error());
   if (!opened) {
@@ -133,9 +98,9 @@ Result<void> TreeScan::read(const Folder& folder) {
   auto id = context_.learner.folderID(folder.path, opened->get(), *status);
   if (!id) return fail(id.error());
   watch(opened->get(), *id);
-  auto begun = beginReading(std::move(*opened));
-  if (!begun) return fail(begun.error());
   const Folder itself{folder.path, *id, folder.depth};
+  auto begun = beginReading(std::move(*opened));
+  if (!begun) return giveUp(itself, begun.error());
   if (auto done = readNext(*begun); !done) return giveUp(itself, done.error());
   return takeIn(itself, std::move(*begun));
 }
@@ -209,8 +174,7 @@ Result<std::uint64_t> TreeScan::takeInBatch(const Folder& folder, FolderReading&
     if (!isFolder) continue;
     const bool isFollowed = watcher_ != nullptr && watcher_->isWatched(sighting.fileID);
     if (folder.depth == Depth::folder && isFollowed) continue;
-    pending_.push_back({folder.path + "/" + sighting.name, sighting.fileID, Depth::everything,
-                        Seen{sighting.status.inode, sighting.status.birthTime}});
+    add(folder.path + "/" + sighting.name, sighting.fileID, Depth::everything);
   }
   return placed;
 }

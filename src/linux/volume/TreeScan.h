@@ -2,7 +2,6 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <deque>
 #include <optional>
 #include <string>
 #include <unordered_set>
@@ -24,7 +23,7 @@ namespace mirabel {
 class TreeScan {
  public:
   TreeScan(const IndexContext& context, MissingNames& missing)
-      : context_(context), missing_(missing), ahead_(context.roots) {}
+      : context_(context), missing_(missing) {}
 
   /// Null: nobody watches.
   void setWatcher(FolderWatcher* watcher) { watcher_ = watcher; }
@@ -35,7 +34,7 @@ class TreeScan {
   };
   void add(std::string path, std::uint64_t id, Depth depth);
   [[nodiscard]] Result<void> addRoots();
-  [[nodiscard]] bool isEmpty() const { return pending_.empty() && asked_.empty(); }
+  [[nodiscard]] bool isEmpty() const { return pending_.empty(); }
   void clear();
 
   /// Goes through what was added. When it returns without an error, the index shows what the disk
@@ -57,19 +56,11 @@ class TreeScan {
   [[nodiscard]] std::size_t unreadableFolders() const { return unreadable_.size(); }
 
  private:
-  /// The object that had the name.
-  struct Seen {
-    std::uint64_t inode;
-    std::int64_t birthTime;
-  };
   struct Folder {
     std::string path;
     std::uint64_t id;
     Depth depth;
-    std::optional<Seen> seen = std::nullopt;
-    FolderReadAhead::Ticket ticket = nullptr;
   };
-  [[nodiscard]] Folder next();
   [[nodiscard]] Result<void> readBatch(const Pause& pause);
   [[nodiscard]] Result<void> read(const Folder& folder);
   [[nodiscard]] Result<void> giveUp(const Folder& folder, const Error& error);
@@ -84,8 +75,6 @@ class TreeScan {
   MissingNames& missing_;
   FolderWatcher* watcher_ = nullptr;
   std::vector<Folder> pending_;
-  std::deque<Folder> asked_;  // comes before what is pending
-  FolderReadAhead ahead_;
   std::unordered_set<std::uint64_t> read_;
   std::size_t entriesRead_ = 0;  // in the transaction under way
   std::vector<std::uint64_t> disturbed_;

@@ -33,8 +33,6 @@ struct Sighting {
   /// A record says that it was written to, or its attributes were: true also where times are too
   /// coarse to show it.
   bool isReported = false;
-  /// Where it was read together with the status: the object's handle, empty where there is none.
-  std::optional<std::string> handle{};
 };
 
 /// The lasting identities of one volume: which object has which file ID, which document has which

@@ -40,7 +40,6 @@ Result<void> FanotifyWatcher::watch(int folder, std::uint64_t id) {
   if (!handle) return fail(Error::posix(EOPNOTSUPP));
   // Marked first: what is known to be watched is heard of.
   if (auto marked = mark(folder); !marked) return marked;
-  const std::lock_guard lock(mutex_);
   if (const auto known = handles_.find(id); known != handles_.end()) {
     if (*known->second == *handle) return {};
     folders_.erase(folders_.find(*known->second));
@@ -64,17 +63,14 @@ Result<void> FanotifyWatcher::mark(int folder) {
 }
 
 bool FanotifyWatcher::isWatched(std::uint64_t id) const {
-  const std::lock_guard lock(mutex_);
   return handles_.contains(id);
 }
 
 std::size_t FanotifyWatcher::watchedFolders() const {
-  const std::lock_guard lock(mutex_);
   return handles_.size();
 }
 
 void FanotifyWatcher::forget(std::uint64_t id) {
-  const std::lock_guard lock(mutex_);
   const auto known = handles_.find(id);
   if (known == handles_.end()) return;
   folders_.erase(folders_.find(*known->second));
@@ -82,7 +78,6 @@ void FanotifyWatcher::forget(std::uint64_t id) {
 }
 
 Result<FolderWatcher::Drained> FanotifyWatcher::drain(LookList& looks) {
-  const std::lock_guard lock(mutex_);
   Drained drained;
   int queued = 0;
   if (::ioctl(group_.get(), FIONREAD, &queued) != 0) return fail(Error::posix(errno));

@@ -1,11 +1,9 @@
 #pragma once
 
-#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -42,8 +40,7 @@ class FanotifyWatcher final : public FolderWatcher {
   };
   UniqueFd group_;
   WatcherKind kind_;
-  std::atomic<bool> hasFileSystemMark_ = false;
-  mutable std::mutex mutex_;  // of the two tables
+  bool hasFileSystemMark_ = false;
   std::unordered_map<std::string, std::uint64_t, Hash, std::equal_to<>> folders_;  // by handle
   std::unordered_map<std::uint64_t, const std::string*> handles_;  // keys of the other, one each
   std::unique_ptr<std::byte[]> buffer_;

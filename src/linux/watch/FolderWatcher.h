@@ -20,7 +20,7 @@ enum class WatcherKind {
 
 /// Hears from the kernel what happens in folders of one file system. The kernel has queued the
 /// record of every call that has returned, so whoever has drained the queue knows of all that was
-/// done before. One thread at a time drains it; any thread may call the others.
+/// done before. Used by one thread at a time, but for `descriptor`.
 class FolderWatcher {
  public:
   virtual ~FolderWatcher() = default;

@@ -34,7 +34,6 @@ Result<void> InotifyWatcher::watch(int folder, std::uint64_t id) {
   const std::string path = "/proc/self/fd/" + std::to_string(folder);
   const int watch = ::inotify_add_watch(instance_.get(), path.c_str(), everything);
   if (watch < 0) return fail(Error::posix(errno));
-  const std::lock_guard lock(mutex_);
   if (const auto known = watches_.find(id); known != watches_.end() && known->second != watch) {
     end(id);
   }
@@ -46,17 +45,14 @@ Result<void> InotifyWatcher::watch(int folder, std::uint64_t id) {
 }
 
 bool InotifyWatcher::isWatched(std::uint64_t id) const {
-  const std::lock_guard lock(mutex_);
   return watches_.contains(id);
 }
 
 std::size_t InotifyWatcher::watchedFolders() const {
-  const std::lock_guard lock(mutex_);
   return watches_.size();
 }
 
 void InotifyWatcher::forget(std::uint64_t id) {
-  const std::lock_guard lock(mutex_);
   end(id);
 }
 
@@ -76,7 +72,6 @@ void InotifyWatcher::drop(int watch) {
 }
 
 Result<FolderWatcher::Drained> InotifyWatcher::drain(LookList& looks) {
-  const std::lock_guard lock(mutex_);
   Drained drained;
   int queued = 0;
   if (::ioctl(instance_.get(), FIONREAD, &queued) != 0) return fail(Error::posix(errno));

@@ -3,7 +3,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <mutex>
 #include <unordered_map>
 
 #include "linux/kernel/UniqueFd.h"
@@ -30,7 +29,6 @@ class InotifyWatcher final : public FolderWatcher {
   void drop(int watch);
 
   UniqueFd instance_;
-  mutable std::mutex mutex_;                        // of the two tables
   std::unordered_map<int, std::uint64_t> folders_;  // by watch
   std::unordered_map<std::uint64_t, int> watches_;
   std::unique_ptr<std::byte[]> buffer_;
