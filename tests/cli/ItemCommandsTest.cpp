@@ -99,6 +99,17 @@ TEST_F(ItemCommands, MetadataIsClearedAndTagsArePrinted) {
   EXPECT_FALSE(item({"used", doc, "--clear"}).contains("lastUsedDate"));
 }
 
+// ext4 has room for 4 KiB of attributes, other file systems for more.
+TEST_F(ItemCommands, TagsThatDoNotFitLeaveThoseThatWereThere) {
+  const std::string doc = home.at("folder/doc.txt");
+  ASSERT_EQ(run({"tag", doc, "red"}).code, 0);
+  const Answer answer = run({"--verbose", "tag", doc, std::string(60'000, 'x')});
+  if (answer.code == 0) GTEST_SKIP() << "this file system has room for it";
+  EXPECT_EQ(answer.code, 1);
+  EXPECT_THAT(answer.err, HasSubstr("can't tag " + doc));
+  EXPECT_EQ(run({"tag", doc}).out, "red\n");
+}
+
 TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
   home.writeFile("target/doc.txt", "in the way");
   const std::string doc = home.at("folder/doc.txt");

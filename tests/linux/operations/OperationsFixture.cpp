@@ -28,6 +28,7 @@ LinuxPlatform& OperationsTest::opened() {
   if (!platform_) {
     LinuxPlatform::Options options;
     options.home = home.path();
+    options.furtherRoots = furtherRoots_;
     options.checkFileCall = [this](std::string_view call) { return check_ ? check_(call) : 0; };
     platform_ = LinuxPlatform::open(std::move(options)).value();
   }
@@ -58,9 +59,13 @@ Result<URL> OperationsTest::rename(std::string_view item, std::string_view name)
 
 Result<URL> OperationsTest::move(std::string_view item, std::string_view folder,
                                  std::optional<std::string> name, Bouncing bouncing) {
-  return wait([&](auto done) {
-    operations().vs_reparentUnderFolder(home.url(item), home.url(folder), name, bouncing, done);
-  });
+  return moveURL(home.url(item), home.url(folder), std::move(name), bouncing);
+}
+
+Result<URL> OperationsTest::moveURL(const URL& item, const URL& folder,
+                                    std::optional<std::string> name, Bouncing bouncing) {
+  return wait(
+      [&](auto done) { operations().vs_reparentUnderFolder(item, folder, name, bouncing, done); });
 }
 
 Result<URL> OperationsTest::trash(std::string_view item) {

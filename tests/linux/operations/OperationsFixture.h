@@ -9,6 +9,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "linux/FilesFixture.h"
 
@@ -29,11 +30,16 @@ class OperationsTest : public ::testing::Test {
   /// Asked before each system call of an operation from now on.
   void setCheck(std::function<int(std::string_view)> check) { check_ = std::move(check); }
 
+  /// Before it is opened.
+  void addRoot(const std::string& path) { furtherRoots_.push_back(path); }
+
   Result<URL> import(const std::string& source, std::string_view folder);
   Result<URL> createFolder(std::string_view folder, std::string_view name);
   Result<URL> rename(std::string_view item, std::string_view name);
   Result<URL> move(std::string_view item, std::string_view folder,
                    std::optional<std::string> name = {}, Bouncing bouncing = Bouncing::refused);
+  Result<URL> moveURL(const URL& item, const URL& folder, std::optional<std::string> name,
+                      Bouncing bouncing);
   Result<URL> trash(std::string_view item);
   std::optional<Error> remove(std::string_view item);
 
@@ -50,6 +56,7 @@ class OperationsTest : public ::testing::Test {
   Result<URL> wait(const std::function<void(FileOperations::URLHandler)>& operation);
 
   std::function<int(std::string_view)> check_;
+  std::vector<std::string> furtherRoots_;
   std::unique_ptr<LinuxPlatform> platform_;
 };
 

@@ -1,4 +1,5 @@
 #include <cerrno>
+#include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
@@ -130,6 +131,59 @@ TEST_F(OperationsOnDisk, ManyOfOneNameFindFreeNamesQuickly) {
   ASSERT_TRUE(trash("from/" + longest));
   home.writeFile("from/" + longest, "second");
   EXPECT_EQ(trash("from/" + longest)->lastPathComponent(), std::string(253, 'n') + " 2");
+}
+
+/// A second root, on another file system than the home where this machine has one in memory.
+class OtherFileSystem : public OperationsTest {
+ protected:
+  void SetUp() override {
+    struct stat here {};
+    struct stat there {};
+    if (::stat("/dev/shm", &there) != 0 || ::stat(home.path().c_str(), &here) != 0 ||
+        here.st_dev == there.st_dev || ::mkdtemp(other_.data()) == nullptr) {
+      GTEST_SKIP() << "no other file system here";
+    }
+    isMade_ = true;
+    addRoot(other_);
+  }
+  void TearDown() override {
+    close();
+    if (isMade_) fs::remove_all(other_);
+  }
+
+  Result<URL> moveTo(const std::string& item, const std::string& folder,
+                     std::optional<std::string> name = {}) {
+    const URL url = item.starts_with('/') ? URL::fileURL(item) : home.url(item);
+    return moveURL(url, URL::fileURL(folder), std::move(name), Bouncing::refused);
+  }
+
+  std::string other_ = "/dev/shm/mirabel-home-XXXXXX";
+  bool isMade_ = false;
+};
+
+TEST_F(OtherFileSystem, TakesItemsWholeAndGivesThemBack) {
+  makeFolder("folder/sub");
+  home.writeFile("folder/sub/file", "contents");
+  home.makeSymlink("folder/link", "sub/file");
+  home.writeFile("doc", "document");
+  home.setMode("doc", 0440);
+  const Tree before = tree();
+  ASSERT_TRUE(moveTo("folder", other_));
+  const auto doc = moveTo("doc", other_, "letter");
+  ASSERT_TRUE(doc) << doc.error().description();
+  EXPECT_EQ(tree(), Tree());
+  EXPECT_EQ(fs::read_symlink(other_ + "/folder/link"), "sub/file");
+  struct stat status {};
+  ASSERT_EQ(::stat((other_ + "/letter").c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777, 0440U);
+  EXPECT_EQ(failureOf(moveTo("doc", other_)), ENOENT);
+  home.writeFile("letter", "another");
+  EXPECT_TRUE(moveTo("letter", other_).error().is(FileErrorCode::fileExists));
+  home.remove("letter");
+  EXPECT_TRUE(moveTo(other_ + "/folder", home.documents()));
+  EXPECT_TRUE(moveTo(other_ + "/letter", home.documents(), "doc"));
+  EXPECT_EQ(tree(), before);
+  EXPECT_TRUE(fs::is_empty(other_));
 }
 
 TEST_F(OperationsOnDisk, AnotherNameOfTheSameFileIsTaken) {
