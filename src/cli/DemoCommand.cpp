@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include "cli/Commands.h"
+#include "cli/ItemCommands.h"
 #include "cli/Printing.h"
 #include "linux/kernel/UniqueFd.h"
 
@@ -45,7 +46,7 @@ class Tour {
   bool run() {
     say("A temporary home with a few documents.");
     return makeDocuments() && list() && rename() && save() && moveAndReuse() &&
-           changesWhileNothingRan();
+           changesWhileNothingRan() && trashAndPutBack();
   }
 
  private:
@@ -140,6 +141,21 @@ class Tour {
     if (!isAllThatChanged(told, bread)) return false;
     say("That is all of it, and nothing else: the folder is told too, for what it holds changed.");
     return true;
+  }
+
+  bool trashAndPutBack() {
+    say("Trash it, rename the folder that it came from, and put it back: it finds its way.");
+    const auto trash = [](Program& program, const std::string& item) {
+      return runTrash(program, {item});
+    };
+    const auto restore = [](Program& program, const std::string& item) {
+      return runRestore(program, {{item}, {}});
+    };
+    if (command("trash " + letter_, trash, letter_).empty()) return false;
+    shell("mv ~/Documents/Recipes ~/Documents/Kitchen");
+    fs::rename(documents_ / "Recipes", documents_ / "Kitchen");
+    if (command("restore " + letter_, restore, letter_).empty()) return false;
+    return expectAt("Kitchen/thanks.txt");
   }
 
   bool changeAFewThings() {

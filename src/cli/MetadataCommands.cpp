@@ -1,4 +1,3 @@
-#include <cerrno>
 #include <charconv>
 #include <nlohmann/json.hpp>
 #include <ostream>
@@ -46,11 +45,6 @@ ExitCode tellTags(Program& program, const std::string& item) {
   return ExitCode::done;
 }
 
-ExitCode refuse(Program& program, const std::string& text, std::string_view what) {
-  program.report(Error::posix(EINVAL, text), what);
-  return ExitCode::usage;
-}
-
 }  // namespace
 
 ExitCode runTag(Program& program, const TagOptions& options) {
@@ -61,8 +55,7 @@ ExitCode runTag(Program& program, const TagOptions& options) {
     for (const std::string& label : options.labels)
       tags.push_back({label});
     auto encoded = encodeTagData(tags);
-    if (!encoded)
-      return refuse(program, "labels are text in UTF-8, 64 KiB in all at most", "can't use them");
+    if (!encoded) return program.reportUsage("labels are text in UTF-8, 64 KiB in all at most");
     tagData = *std::move(encoded);
   }
   return runOnItem(program, options.item, "can't tag " + options.item,
@@ -75,7 +68,7 @@ ExitCode runFavorite(Program& program, const FavoriteOptions& options) {
   std::optional<Number> rank;
   if (!options.clears) {
     rank = options.rank ? numberFrom(*options.rank) : Number::of(std::int64_t{1});
-    if (!rank) return refuse(program, "a rank is a number", "can't use " + *options.rank);
+    if (!rank) return program.reportUsage("can't use " + *options.rank + "; a rank is a number");
   }
   return runOnItem(program, options.item, "can't rank " + options.item,
                    [&](const std::string& identifier, const auto& done) {
@@ -88,8 +81,8 @@ ExitCode runUsed(Program& program, const UsedOptions& options) {
   if (!options.clears) {
     date = options.date ? Date::fromRFC3339(*options.date) : Date::now();
     if (!date) {
-      return refuse(program, "a date is written like 2026-11-21 or 2026-11-21T09:30:00Z",
-                    "can't use " + *options.date);
+      return program.reportUsage("can't use " + *options.date +
+                                 "; a date is written like 2026-11-21 or 2026-11-21T09:30:00Z");
     }
   }
   return runOnItem(program, options.item, "can't note when " + options.item + " was used",

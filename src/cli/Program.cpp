@@ -47,6 +47,12 @@ ExitCode Program::report(const Error& error, std::string_view what) {
   return exitCodeFor(error);
 }
 
+ExitCode Program::reportUsage(std::string_view text) {
+  constexpr ExitCode code = ExitCode::usage;
+  reportFailure(streams_.err, options_.json, "usage", static_cast<int>(code), text);
+  return code;
+}
+
 void reportFailure(std::ostream& err, bool asJSON, std::string_view domain, std::int64_t code,
                    std::string_view message) {
   if (!asJSON) {

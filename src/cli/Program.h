@@ -55,6 +55,8 @@ class Program {
   /// Reports on standard error, for people or, with --json, for programs. `what` says what was
   /// tried, in lower case without a full stop. Answers the code to end with.
   ExitCode report(const Error& error, std::string_view what);
+  /// The same for an argument that is not what it should be; answers `ExitCode::usage`.
+  ExitCode reportUsage(std::string_view text);
 
  private:
   GlobalOptions options_;

@@ -116,6 +116,7 @@ TEST_F(Answers, TheDemonstrationFindsItsDocumentToTheEnd) {
   EXPECT_EQ(answer.code, 0) << answer.out << answer.err;
   EXPECT_THAT(answer.out, HasSubstr("/Documents/Recipes/thanks.txt\n"));
   EXPECT_THAT(answer.out, HasSubstr("$ mirabel changes workingset --since"));
+  EXPECT_THAT(answer.out, HasSubstr("/Documents/Kitchen/thanks.txt\n"));
   EXPECT_THAT(answer.out, HasSubstr("The home was temporary and is gone."));
 }
 

@@ -139,6 +139,7 @@ TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
     SCOPED_TRACE(row.arguments[0] + " " + row.arguments[1]);
     expectFailure(run(row.arguments), row.code, row.message);
   }
+  EXPECT_EQ(run({"--json", "used", doc, "yesterday"}).error().at("domain"), "usage");
   EXPECT_EQ(run({"tag", doc, "red", "--clear"}).code, 2);
   EXPECT_EQ(run({"mkdir", "new"}).code, 2);
   EXPECT_TRUE(exists("folder/doc.txt"));
