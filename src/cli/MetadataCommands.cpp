@@ -52,6 +52,7 @@ ExitCode runTag(Program& program, const TagOptions& options) {
   std::optional<Data> tagData;
   if (!options.clears) {
     std::vector<Tag> tags;
+    tags.reserve(options.labels.size());
     for (const std::string& label : options.labels)
       tags.push_back({label});
     auto encoded = encodeTagData(tags);

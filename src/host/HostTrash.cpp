@@ -33,12 +33,12 @@ void HostTrash::restore(std::string_view identifier,
   const auto fileID = item ? item->fileID() : std::nullopt;
   const auto origin = fileID ? origins_.find(*fileID) : std::nullopt;
   if (!origin) {
-    return provider_.untrashItemWithIdentifier(identifier, std::move(toParentItemIdentifier),
+    return provider_.untrashItemWithIdentifier(identifier, toParentItemIdentifier,
                                                std::move(completionHandler));
   }
   if (!toParentItemIdentifier) toParentItemIdentifier = origin->parentItemIdentifier;
   provider_.untrashItemWithIdentifier(
-      identifier, std::move(toParentItemIdentifier),
+      identifier, toParentItemIdentifier,
       [this, fileID, done = std::move(completionHandler)](auto result) {
         if (result) origins_.forget(*fileID);
         done(std::move(result));

@@ -46,7 +46,7 @@ Result<URL> importItem(const OperationContext& context, const URL& source, const
   if (!from) return fail(from.error());
   auto target = openFolder(context, folder);
   if (!target) return fail(target.error());
-  const URL url = target->url(name);
+  URL url = target->url(name);
   const int descriptor = target->descriptor.get();
   // Told before anything is copied; the rename makes sure.
   if (context.calls.status(descriptor, name)) return fail(fileExists(url));

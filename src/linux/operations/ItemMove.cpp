@@ -24,7 +24,7 @@ Result<URL> ItemMove::rename(const URL& item, const std::string& newName) const 
   const int folder = place->folder.descriptor.get();
   const auto status = context_.calls.status(folder, place->name);
   if (!status) return fail(status.error());
-  const URL renamed = place->folder.url(newName);
+  URL renamed = place->folder.url(newName);
   if (newName == place->name) return renamed;
   auto done = context_.calls.rename(folder, place->name, folder, newName);
   if (!done && done.error().isPosix(EEXIST)) {
@@ -90,7 +90,7 @@ Result<URL> ItemMove::moveUnder(const URL& item, const URL& folder,
     moved = bounced ? Result<void>() : fail(bounced.error());
     if (bounced) name = *std::move(bounced);
   }
-  const URL url = target->url(name);
+  URL url = target->url(name);
   if (!moved) return fail(operationError(moved.error(), url));
   // First where it is, then where it is no more: after a loss of power it may be in both places,
   // but it is in one of them.

@@ -21,7 +21,7 @@ Result<URL> createSubFolder(const OperationContext& context, const URL& parent,
   if (auto refusal = whyNoName(name)) return fail(*std::move(refusal));
   auto folder = openFolder(context, parent);
   if (!folder) return fail(folder.error());
-  const URL url = folder->url(name);
+  URL url = folder->url(name);
   const int descriptor = folder->descriptor.get();
   auto made = context.calls.makeFolder(descriptor, name, folderPermissions);
   if (!made) return fail(operationError(made.error(), url));

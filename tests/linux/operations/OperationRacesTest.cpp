@@ -162,7 +162,7 @@ class ManyPrograms : public OperationsTest {
     }
   }
 
-  // A minute's worth of them takes some 200,000.
+  // A minute's worth of them takes some 600,000.
   const int saves_ = std::getenv("MIRABEL_TEST_SAVES") == nullptr
                          ? 1000
                          : std::atoi(std::getenv("MIRABEL_TEST_SAVES"));
