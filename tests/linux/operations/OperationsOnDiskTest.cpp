@@ -3,8 +3,10 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
+#include <unistd.h>
 
 #include "linux/operations/OperationsFixture.h"
 #include "support/OrdinaryUser.h"
@@ -131,6 +133,52 @@ TEST_F(OperationsOnDisk, ManyOfOneNameFindFreeNamesQuickly) {
   ASSERT_TRUE(trash("from/" + longest));
   home.writeFile("from/" + longest, "second");
   EXPECT_EQ(trash("from/" + longest)->lastPathComponent(), std::string(253, 'n') + " 2");
+}
+
+/// Where one folder answers to two spellings of its name, as in a folder that takes them for the
+/// same: here it is mounted at the second as well.
+class TwoSpellings : public OperationsTest {
+ protected:
+  void SetUp() override {
+    makeFolder("readme/inside");
+    makeFolder("README");
+    const std::string spelling = home.at("README");
+    if (::mount(home.at("readme").c_str(), spelling.c_str(), nullptr, MS_BIND, nullptr) != 0)
+      GTEST_SKIP() << "nothing may be mounted here";
+    isMounted_ = true;
+  }
+  void TearDown() override { endSecond(); }
+
+  void endSecond() {
+    if (!isMounted_) return;
+    isMounted_ = false;
+    EXPECT_EQ(::umount2(home.at("README").c_str(), MNT_DETACH), 0);
+    EXPECT_EQ(::rmdir(home.at("README").c_str()), 0);
+  }
+
+  bool isMounted_ = false;
+};
+
+TEST_F(TwoSpellings, AreExchangedByWayOfAHiddenName) {
+  setCheck([this, renames = 0](std::string_view call) mutable {
+    // The old spelling is gone when the item is hidden, and the other with it.
+    if (call == "rename" && ++renames == 3) endSecond();
+    return 0;
+  });
+  const auto renamed = rename("readme", "README");
+  setCheck({});
+  ASSERT_TRUE(renamed) << renamed.error().description();
+  EXPECT_EQ(tree(), (Tree{{"README", "/"}, {"README/inside", "/"}}));
+  close();
+  EXPECT_FALSE(hasPendingWork());
+}
+
+TEST_F(TwoSpellings, StayAsTheyAreWhereThatFails) {
+  EXPECT_FALSE(rename("readme", "README"));
+  close();
+  EXPECT_FALSE(hasPendingWork());
+  endSecond();
+  EXPECT_EQ(tree(), (Tree{{"readme", "/"}, {"readme/inside", "/"}}));
 }
 
 /// A second root, on another file system than the home where this machine has one in memory.
