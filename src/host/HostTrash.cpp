@@ -2,8 +2,6 @@
 
 #include <utility>
 
-#include "foundation/Log.h"
-
 namespace mirabel {
 
 void HostTrash::trash(std::string_view identifier, LocalVessel::ItemHandler completionHandler) {
@@ -15,8 +13,8 @@ void HostTrash::trash(std::string_view identifier, LocalVessel::ItemHandler comp
     return provider_.trashItemWithIdentifier(identifier, std::move(completionHandler));
   const std::uint64_t fileID = *item->fileID();
   auto remembered = origins_.remember(fileID, {item->parentItemIdentifier(), item->filename()});
-  if (!remembered)
-    logError("can't remember where an item came from; " + remembered.error().description());
+  // Better left where it is than not to be put back.
+  if (!remembered) return completionHandler(fail(remembered.error()));
   provider_.trashItemWithIdentifier(identifier, [this, fileID, identifier = std::string(identifier),
                                                  done = std::move(completionHandler)](auto result) {
     // An error may come after the move; what is remembered for nothing does no harm.

@@ -17,7 +17,7 @@ class HostTrash {
   HostTrash(LocalVessel& provider, KeptAttributes& kept) : provider_(provider), origins_(kept) {}
 
   /// See `LocalVessel::trashItemWithIdentifier`. Where the item came from is on disk before it is
-  /// moved.
+  /// moved; where that can't be, it is not moved. Errors of `ErrorDomain::store` too.
   void trash(std::string_view identifier, LocalVessel::ItemHandler completionHandler);
   /// See `LocalVessel::untrashItemWithIdentifier`; without a parent, an item goes back to the one
   /// that it had, under its own name.

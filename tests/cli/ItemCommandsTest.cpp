@@ -165,6 +165,27 @@ TEST_F(ItemCommands, ADryRunSaysWhatWouldGoAndLeavesIt) {
   EXPECT_TRUE(exists("folder/doc.txt"));
 }
 
+// As root, on a file system of three megabytes.
+TEST_F(ItemCommands, OnAFullDiskThingsAreTrashedPutBackAndDeleted) {
+  const Answer answer = shell(R"sh(
+    mkdir "$home/small" && mount -t tmpfs -o size=3M tmpfs "$home/small" || exit 77
+    trap 'umount "$home/small"' EXIT
+    mkdir -p "$home/small/Documents/folder/sub" && echo x > "$home/small/Documents/folder/sub/new"
+    say() { "$mirabel" --home "$home/small" "$@"; }
+    say ls > /dev/null
+    dd if=/dev/zero of="$home/small/filler" bs=64k 2>/dev/null
+    say import /bin/sh --in "$home/small/Documents/folder" && exit 1
+    say trash "$home/small/Documents/folder/sub/new" || exit 2
+    say restore "$home/small/Documents/.Trash/new" || exit 3
+    say rm "$home/small/Documents/folder" || exit 4
+    find "$home/small/Documents" -mindepth 1 ! -name .Trash)sh");
+  if (answer.code == 77) GTEST_SKIP() << "nothing may be mounted here";
+  EXPECT_EQ(answer.code, 0) << answer.err;
+  EXPECT_THAT(answer.out, ::testing::Not(HasSubstr("/.mirabel-")));
+  EXPECT_THAT(answer.out, HasSubstr("removed "));
+  EXPECT_THAT(answer.err, HasSubstr("no space left on device"));
+}
+
 /// What every user's trash has to stand.
 class TrashCommands : public ItemCommands {
  protected:

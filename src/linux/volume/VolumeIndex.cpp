@@ -11,6 +11,7 @@
 #include "linux/volume/FollowThread.h"
 #include "linux/volume/Follower.h"
 #include "linux/volume/Learner.h"
+#include "linux/volume/Reserve.h"
 #include "linux/volume/VolumeState.h"
 #include "linux/volume/VolumeUUID.h"
 
@@ -34,6 +35,7 @@ class StoredVolumeIndex final : public VolumeIndex {
         followsInBackground_(options.followsInBackground && options.makeWatcher),
         device_(device) {
     learner_.setRecentPlaces(&follower_);
+    reserve_.make();
   }
 
   ~StoredVolumeIndex() override { thread_.reset(); }
@@ -52,7 +54,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     const std::scoped_lock lock(mutex_);
     const std::string path = plainPath(folderPath);
     std::uint64_t folderID = 0;
-    auto done = inTransaction([&]() -> Result<void> {
+    auto done = inTransactionAtLast([&]() -> Result<void> {
       auto learned = learner_.learn(path, folder, sightings);
       if (!learned) return fail(learned.error());
       folderID = *learned;
@@ -67,7 +69,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     Result<Sighting> answer = fail(Error::posix(ENOENT));
-    auto done = inTransaction([&]() -> Result<void> {
+    auto done = inTransactionAtLast([&]() -> Result<void> {
       answer = learner_.learnPath(plainPath(path), status, isPackage);
       if (!answer) return fail(answer.error());
       return {};
@@ -84,7 +86,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     auto done = follower_.isInStep() ? stand(fileID, path) : Result<void>();
     if (done && !path && follower_.isInStep()) done = follower_.catchUp(transactions());
     if (done && !path) {
-      done = inTransaction([&]() -> Result<void> { return find(fileID, path); });
+      done = inTransactionAtLast([&]() -> Result<void> { return find(fileID, path); });
     }
     if (!done) return fail(done.error());
     if (!path) return fail(Error::posix(ENOENT));
@@ -92,9 +94,10 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
   Result<std::vector<std::string>> pathsOfFileID(std::uint64_t fileID) override {
+    const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     std::vector<std::string> paths;
-    auto done = state_->transaction([&]() -> Result<void> {
+    auto done = inTransactionAtLast([&]() -> Result<void> {
       auto row = state_->store().objectByFileID(fileID);
       if (!row) return fail(row.error());
       if (!*row) return {};
@@ -118,7 +121,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     std::optional<std::uint64_t> fileID;
     auto done = follower_.isInStep() ? follower_.catchUp(transactions()) : Result<void>();
     if (!done) return fail(done.error());
-    done = inTransaction([&]() -> Result<void> {
+    done = inTransactionAtLast([&]() -> Result<void> {
       auto holder = learner_.holderOf(documentID);
       if (!holder) return fail(holder.error());
       fileID = *holder;
@@ -193,6 +196,13 @@ class StoredVolumeIndex final : public VolumeIndex {
     return done;
   }
 
+  /// For what has to be written before something can be deleted, and may be done twice.
+  Result<void> inTransactionAtLast(const std::function<Result<void>()>& work) {
+    auto done = inTransaction(work);
+    if (done || !reserve_.releaseAfter(done.error())) return done;
+    return inTransaction(work);
+  }
+
   Transaction transactions() {
     return [this](const std::function<Result<void>()>& work) { return inTransaction(work); };
   }
@@ -242,6 +252,7 @@ class StoredVolumeIndex final : public VolumeIndex {
 
   std::mutex mutex_;
   std::unique_ptr<VolumeState> state_;
+  Reserve reserve_{state_->folder()};
   const MonitoredRoots& roots_;
   IndexedPaths paths_;
   ChangeRecorder recorder_;
@@ -252,7 +263,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   JournalBell bell_;
   KeptAttributes keptAttributes_{[this](const auto& work) {
     const std::scoped_lock lock(mutex_);
-    return inTransaction([&] { return work(state_->database()); });
+    return inTransactionAtLast([&] { return work(state_->database()); });
   }};
   std::atomic<std::uint64_t> lastEventID_ = 0;
   std::unique_ptr<FollowThread> thread_;
