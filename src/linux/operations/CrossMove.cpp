@@ -74,7 +74,7 @@ Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder
   if (done) done = calls.rename(to, copy, to, record.name);
   if (done) {
     // The item goes only when it is known that its copy stays.
-    if (auto synced = syncFolder(context_, to); !synced) {
+    if (auto synced = syncFolder(context_, to, Unreadable::refused); !synced) {
       done = synced;
       if (!calls.rename(to, record.name, to, copy)) return done;
     }

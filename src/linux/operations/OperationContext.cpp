@@ -30,9 +30,10 @@ Result<OpenFolder> openFolder(const OperationContext& context, const URL& url) {
   return OpenFolder{std::move(*opened), url.path()};
 }
 
-Result<void> syncFolder(const OperationContext& context, int folder) {
+Result<void> syncFolder(const OperationContext& context, int folder, Unreadable unreadable) {
   auto opened = context.calls.open(folder, ".", O_RDONLY | O_DIRECTORY);
-  if (!opened && opened.error().isPosix(EACCES)) return {};
+  const bool isPassedOver = unreadable == Unreadable::passedOver;
+  if (!opened && isPassedOver && opened.error().isPosix(EACCES)) return {};
   if (!opened) return fail(opened.error());
   return context.calls.sync(opened->get());
 }

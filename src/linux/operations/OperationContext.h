@@ -46,8 +46,10 @@ struct ItemPlace {
 [[nodiscard]] Result<OpenFolder> openFolder(const OperationContext& context, const URL& url);
 
 /// Has the names in an open folder on disk. One that may not be read can't be synchronised, which
-/// is no error.
-[[nodiscard]] Result<void> syncFolder(const OperationContext& context, int folder);
+/// is an error only where something depends on it.
+enum class Unreadable { passedOver, refused };
+[[nodiscard]] Result<void> syncFolder(const OperationContext& context, int folder,
+                                      Unreadable unreadable = Unreadable::passedOver);
 
 /// Takes the error of a call for the operation's own: `fileExists` for EEXIST at `url`.
 [[nodiscard]] Error operationError(Error error, const URL& url);
