@@ -16,4 +16,13 @@ std::optional<BundleProxy> NoApplications::proxyAt(const URL&) {
   return {};
 }
 
+Result<void> NoApplications::enumerateApplicationsOfType(ApplicationType, const EnumerationBlock&) {
+  return {};
+}
+
+std::optional<PropertyList> NoApplications::infoDictionaryValues(
+    const BundleProxy&, std::span<const std::string_view>) {
+  return PropertyList(PropertyList::Dictionary());
+}
+
 }  // namespace mirabel

@@ -3,6 +3,7 @@
 #include "foundation/ExtendedAttributes.h"
 #include "foundation/ResourceValues.h"
 #include "platform/ApplicationRegistry.h"
+#include "platform/CacheFiles.h"
 #include "platform/Clock.h"
 #include "platform/DirectorySizer.h"
 #include "platform/DirectoryStreams.h"
@@ -30,6 +31,7 @@ struct Platform {
   VolumeHistory& history;
   Clock& clock;
   ListingPositions& positions;
+  CacheFiles& caches;
 };
 
 }  // namespace mirabel

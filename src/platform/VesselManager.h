@@ -2,7 +2,9 @@
 
 #include <functional>
 #include <optional>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "foundation/URL.h"
@@ -35,6 +37,13 @@ class VesselManager {
   /// refused.
   virtual void signalEnumeratorForContainerItemIdentifier(std::string_view container,
                                                           SignalHandler completionHandler) = 0;
+
+  using DeletionHandler = std::function<void(std::optional<Error>)>;
+  /// Has everything that was indexed under these domains taken out of the search index; a domain
+  /// that has no entries is no error. The handler is called once, on any thread, perhaps before
+  /// this returns, when that is done or failed.
+  virtual void deleteSearchableItemsWithDomainIdentifiers(
+      const std::vector<std::string>& domainIdentifiers, DeletionHandler completionHandler) = 0;
 };
 
 }  // namespace mirabel

@@ -1,4 +1,5 @@
 #include "linux/files/LinuxPlatform.h"
+#include "platform/CacheFilesConformance.h"
 #include "platform/Conformance.h"
 #include "platform/FileOperationsConformance.h"
 #include "support/TempHome.h"

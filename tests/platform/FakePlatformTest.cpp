@@ -1,3 +1,4 @@
+#include "platform/CacheFilesConformance.h"
 #include "platform/Conformance.h"
 #include "platform/FileOperationsConformance.h"
 #include "support/FakePlatform.h"

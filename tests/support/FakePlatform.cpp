@@ -291,6 +291,13 @@ class Manager final : public VesselManager {
                                                          : std::optional(refusal->second));
   }
 
+  void deleteSearchableItemsWithDomainIdentifiers(const std::vector<std::string>& domains,
+                                                  DeletionHandler completionHandler) override {
+    signals_.deletedDomains.push_back(domains);
+    if (!signals_.answers) return signals_.waiting.push_back(std::move(completionHandler));
+    completionHandler(signals_.deletionRefusal);
+  }
+
  private:
   URL documentStorage_;
   FakeSignals& signals_;
@@ -311,21 +318,6 @@ class History final : public VolumeHistory {
 };
 
 }  // namespace
-
-std::optional<BundleProxy> FakeApplications::proxyForBundleIdentifier(std::string_view identifier) {
-  const auto found = std::ranges::find_if(
-      installed, [&](const BundleProxy& proxy) { return proxy.bundleIdentifier == identifier; });
-  return found == installed.end() ? std::nullopt : std::optional(*found);
-}
-
-std::optional<BundleProxy> FakeApplications::proxyAt(const URL& url) {
-  for (const BundleProxy& proxy : installed) {
-    if (!proxy.dataContainerURL) continue;
-    const URL documents = proxy.dataContainerURL->appendingPathComponent("Documents");
-    if (documents.properURL() == url.properURL()) return proxy;
-  }
-  return {};
-}
 
 Result<void> FakePositions::keep(std::string_view container, const Data& cursor,
                                  const Data& position) {
@@ -365,7 +357,7 @@ FakePlatform::FakePlatform(std::string_view documentStorage)
           Platform{interfaces_->resources, interfaces_->attributes, interfaces_->objects,
                    interfaces_->documents, interfaces_->directories, interfaces_->sizes,
                    interfaces_->operations, applications, interfaces_->manager,
-                   interfaces_->history, clock, positions})) {
+                   interfaces_->history, clock, positions, caches})) {
   volume.makeFolder(documentStorage);
 }
 

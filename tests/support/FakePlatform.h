@@ -12,20 +12,13 @@
 
 #include "platform/DiagnosticReporter.h"
 #include "platform/Platform.h"
+#include "support/FakeApplications.h"
+#include "support/FakeCacheFiles.h"
 #include "support/FakeReports.h"
 #include "support/FakeVolume.h"
 #include "support/FaultScript.h"
 
 namespace mirabel::testing {
-
-/// Installed applications, as the test lists them.
-class FakeApplications final : public ApplicationRegistry {
- public:
-  std::optional<BundleProxy> proxyForBundleIdentifier(std::string_view identifier) override;
-  std::optional<BundleProxy> proxyAt(const URL& url) override;
-
-  std::vector<BundleProxy> installed;
-};
 
 /// Stands still but for sleeping, which it writes down instead of doing it.
 class FakeClock final : public Clock {
@@ -43,8 +36,11 @@ struct FakeSignals {
   /// What it answers, by container.
   std::map<std::string, Error, std::less<>> refusals;
   bool answers = true;
-  /// The handlers of signals that were not answered.
+  /// The handlers of signals and deletions that were not answered.
   std::vector<VesselManager::SignalHandler> waiting;
+  /// The domains that were to leave the search index, call by call, and the answer to each.
+  std::vector<std::vector<std::string>> deletedDomains;
+  std::optional<Error> deletionRefusal;
 };
 
 /// Writes the reports down.
@@ -89,7 +85,8 @@ class FakePlatform {
 
   FakeVolume volume;
   FaultScript faults;
-  FakeApplications applications;
+  FakeApplications applications{faults};
+  FakeCacheFiles caches{faults};
   FakeClock clock;
   FakeSignals signals;
   FakeDiagnostics diagnostics;

@@ -42,6 +42,12 @@ enum class Op {
   deleteItem,
   readWriteAccess,
   keepPosition,
+  enumerateApplications,
+  infoDictionary,
+  cacheRead,
+  cacheFolder,
+  cacheReplace,
+  claimVersion,
   historyUUID,
 };
 

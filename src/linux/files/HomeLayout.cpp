@@ -73,10 +73,10 @@ Result<std::string> documentFolder(const std::string& path) {
 }
 
 // Relative paths in XDG variables are to be ignored.
-std::string stateHome(const std::string& home, bool usesEnvironment) {
-  const auto variable = usesEnvironment ? environment("XDG_STATE_HOME") : std::nullopt;
+std::string folderOf(const char* variableName, const std::string& standIn, bool usesEnvironment) {
+  const auto variable = usesEnvironment ? environment(variableName) : std::nullopt;
   if (variable && variable->starts_with('/')) return *variable;
-  return home + "/.local/state";
+  return standIn;
 }
 
 }  // namespace
@@ -106,13 +106,17 @@ Result<HomeLayout> HomeLayout::resolve(const Choices& choices) {
   auto documents =
       documentFolder(choices.documents.value_or(*home + "/" + std::string(documentsName)));
   if (!documents) return fail(documents.error());
+  const bool usesEnvironment = !choices.home.has_value();
+  std::string applicationSupport =
+      folderOf("XDG_DATA_HOME", *home + "/.local/share", usesEnvironment);
   // The folder itself stays unresolved: whether it is a link must still be seen when it is opened.
-  const std::filesystem::path state =
-      choices.stateFolder.value_or(stateHome(*home, !choices.home.has_value()) + "/mirabel");
+  const std::filesystem::path state = choices.stateFolder.value_or(
+      folderOf("XDG_STATE_HOME", *home + "/.local/state", usesEnvironment) + "/mirabel");
   auto above = resolvedPath(state.parent_path());
   if (!above) return fail(above.error());
   return HomeLayout{std::move(*home), std::move(*documents),
-                    std::filesystem::path(*above) / state.filename()};
+                    std::filesystem::path(*above) / state.filename(),
+                    std::move(applicationSupport)};
 }
 
 }  // namespace mirabel

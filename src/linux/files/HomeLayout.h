@@ -13,6 +13,8 @@ struct HomeLayout {
   std::string home;
   std::string documents;
   std::string stateFolder;
+  /// $XDG_DATA_HOME, or what stands for it below a home that was given. Need not exist.
+  std::string applicationSupport;
 
   /// The choices that a person may make; see `LinuxPlatform::Options`.
   struct Choices {

@@ -2,6 +2,7 @@
 
 #include "linux/events/LinuxEventStreams.h"
 #include "linux/files/HomeLayout.h"
+#include "linux/files/LinuxCacheFiles.h"
 #include "linux/files/LinuxDirectorySizer.h"
 #include "linux/files/LinuxDirectoryStreams.h"
 #include "linux/files/LinuxExtendedAttributes.h"
@@ -44,8 +45,9 @@ struct LinuxPlatform::Parts {
   LinuxEventStreams events{*index};
   SystemClock clock;
   StoredListingPositions positions{index->stateFolder()};
-  Platform platform{resources,  attributes,   objects, documents, directories, sizes,
-                    operations, applications, manager, history,   clock,       positions};
+  LinuxCacheFiles caches{URL::fileURL(layout.applicationSupport), layout.stateFolder};
+  Platform platform{resources,    attributes, objects, documents, directories, sizes, operations,
+                    applications, manager,    history, clock,     positions,   caches};
 };
 
 Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {

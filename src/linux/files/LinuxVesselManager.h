@@ -3,8 +3,10 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <string>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 #include "foundation/URL.h"
 #include "platform/VesselManager.h"
@@ -33,6 +35,12 @@ class LinuxVesselManager final : public VesselManager {
   void signalEnumeratorForContainerItemIdentifier(std::string_view container,
                                                   SignalHandler completionHandler) override {
     if (const auto listener = currentListener()) return (*listener)(container, completionHandler);
+    completionHandler(std::nullopt);
+  }
+
+  /// Nothing is indexed yet, so that nothing is left of any domain.
+  void deleteSearchableItemsWithDomainIdentifiers(const std::vector<std::string>&,
+                                                  DeletionHandler completionHandler) override {
     completionHandler(std::nullopt);
   }
 

@@ -1,0 +1,136 @@
+#include "linux/files/LinuxCacheFiles.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <fcntl.h>
+#include <filesystem>
+#include <limits>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <system_error>
+#include <unistd.h>
+
+#include "linux/kernel/UniqueFd.h"
+
+namespace mirabel {
+namespace {
+
+constexpr std::uint64_t largestVersion = std::numeric_limits<std::uint64_t>::max();
+// A number of 20 digits and a newline.
+constexpr std::size_t largestVersionFile = 21;
+
+Result<std::optional<Data>> readAt(int folder, const std::string& name, std::size_t limit) {
+  // Without O_NONBLOCK a FIFO under that name would keep us waiting.
+  const UniqueFd file(
+      ::openat(folder, name.c_str(), O_RDONLY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK));
+  if (!file && errno == ENOENT) return std::nullopt;
+  struct stat status {};
+  if (!file || ::fstat(file.get(), &status) != 0) return fail(Error::posix(errno));
+  if (!S_ISREG(status.st_mode)) return fail(Error::posix(EINVAL));
+  Data bytes;
+  Data piece(64u << 10);
+  while (true) {
+    const ssize_t count = ::read(file.get(), piece.data(), piece.size());
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return fail(Error::posix(errno));
+    if (count == 0) return bytes;
+    bytes.insert(bytes.end(), piece.begin(), piece.begin() + count);
+    if (bytes.size() > limit) return fail(Error::posix(EFBIG));
+  }
+}
+
+Result<void> writeAll(int file, const Data& bytes) {
+  for (std::size_t done = 0; done < bytes.size();) {
+    const ssize_t count = ::write(file, bytes.data() + done, bytes.size() - done);
+    if (count < 0 && errno == EINTR) continue;
+    if (count <= 0) return fail(Error::posix(count < 0 ? errno : EIO));
+    done += static_cast<std::size_t>(count);
+  }
+  return {};
+}
+
+/// The folder must be locked.
+Result<void> replaceAt(int folder, const std::string& name, const Data& bytes) {
+  const std::string temporary = name + ".new";
+  // What is there is left from a crash, or was put there by somebody.
+  ::unlinkat(folder, temporary.c_str(), 0);
+  const UniqueFd file(
+      ::openat(folder, temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+  if (!file) return fail(Error::posix(errno));
+  auto written = writeAll(file.get(), bytes);
+  if (written && ::fsync(file.get()) != 0) written = fail(Error::posix(errno));
+  if (written && ::renameat(folder, temporary.c_str(), folder, name.c_str()) != 0) {
+    written = fail(Error::posix(errno));
+  }
+  if (!written) {
+    ::unlinkat(folder, temporary.c_str(), 0);
+    return written;
+  }
+  if (::fsync(folder) != 0) return fail(Error::posix(errno));
+  return {};
+}
+
+/// Locked until it is closed. Processes hold it for no longer than one file is written.
+Result<UniqueFd> lockedFolder(const std::string& path) {
+  UniqueFd folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!folder) return fail(Error::posix(errno));
+  while (::flock(folder.get(), LOCK_EX) != 0)
+    if (errno != EINTR) return fail(Error::posix(errno));
+  return folder;
+}
+
+/// Nothing for bytes that are no such number.
+std::optional<std::uint64_t> versionFrom(const Data& bytes) {
+  const std::string_view text = stringView(bytes);
+  std::uint64_t version = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), version);
+  const bool isWhole = error == std::errc() && end + 1 == text.data() + text.size() && *end == '\n';
+  return isWhole ? std::optional(version) : std::nullopt;
+}
+
+std::uint64_t versionFromTime() {
+  return static_cast<std::uint64_t>(std::max<std::int64_t>(Date::now().seconds, 0)) << 20;
+}
+
+}  // namespace
+
+Result<std::optional<Data>> LinuxCacheFiles::read(const URL& file, std::size_t limit) {
+  if (file.path().empty()) return fail(Error::posix(EINVAL));
+  return readAt(AT_FDCWD, file.path(), limit);
+}
+
+Result<void> LinuxCacheFiles::createDirectory(const URL& folder) {
+  std::error_code error;
+  std::filesystem::create_directories(folder.path(), error);
+  if (error) return fail(Error::posix(error.value()));
+  return {};
+}
+
+Result<void> LinuxCacheFiles::replace(const URL& file, const Data& bytes) {
+  const auto folder = lockedFolder(file.deletingLastPathComponent().path());
+  if (!folder) return fail(folder.error());
+  return replaceAt(folder->get(), std::string(file.lastPathComponent()), bytes);
+}
+
+Result<std::uint64_t> LinuxCacheFiles::claimVersion(std::string_view name, std::uint64_t after) {
+  const std::string fileName = "version-" + std::string(name);
+  const auto folder = lockedFolder(stateFolder_);
+  if (!folder) return fail(folder.error());
+  const auto stored = readAt(folder->get(), fileName, largestVersionFile);
+  // A file that is too long is as damaged as one without a number.
+  if (!stored && !stored.error().isPosix(EFBIG)) return fail(stored.error());
+  std::uint64_t greatest = after;
+  if (!stored || *stored) {
+    const auto version = stored ? versionFrom(**stored) : std::nullopt;
+    greatest = std::max(greatest, version ? *version : versionFromTime());
+  }
+  if (greatest == largestVersion) return fail(Error::posix(EOVERFLOW));
+  const std::string text = std::to_string(greatest + 1) + "\n";
+  if (auto written = replaceAt(folder->get(), fileName, dataFromString(text)); !written) {
+    return fail(written.error());
+  }
+  return greatest + 1;
+}
+
+}  // namespace mirabel
