@@ -1,0 +1,206 @@
+#include <cerrno>
+#include <cstdint>
+#include <limits>
+
+#include "applibrary/AppLibraryFixture.h"
+#include "applibrary/LocalAppLibraryCache.h"
+#include "foundation/KeyedArchive.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::ElementsAreArray;
+using ::testing::StartsWith;
+using Increment = LocalAppLibraryCache::Increment;
+
+constexpr std::uint64_t largest = std::numeric_limits<std::uint64_t>::max();
+
+class LocalAppLibraryCacheTest : public AppLibraryFixture {
+ protected:
+  void write(const PropertyList::Dictionary& root) {
+    fake.caches.files[mainCachePath] = keyedarchive::archiveDictionary(root).value();
+  }
+  static std::pair<std::string, PropertyList> token(Number number) {
+    return {"versionToken", PropertyList(number)};
+  }
+  static std::pair<std::string, PropertyList> proxies(PropertyList::Array array) {
+    return {"bundleProxy", PropertyList(std::move(array))};
+  }
+  std::string size() const { return std::to_string(fake.caches.files.at(mainCachePath).size()); }
+
+  std::vector<BundleProxy> records = {recordOf("org.a", "/apps/a", "A"),
+                                      recordOf("org.b", "/apps/b")};
+  AppLibraryCaches caches{fake.caches};
+  LocalAppLibraryCache& main = caches.main;
+};
+
+TEST_F(LocalAppLibraryCacheTest, SavedRecordsAreLoadedByTheNextProcess) {
+  EXPECT_EQ(main.versionToken(), 0U);
+  EXPECT_EQ(main.save(records, 7, Increment::yes).value(), 1U);
+  EXPECT_EQ(main.save(records, 7, Increment::yes).value(), 2U);
+  EXPECT_EQ(main.save(records, 7, Increment::no).value(), 7U);
+  EXPECT_EQ(main.versionToken(), 7U);
+  EXPECT_THAT(log.sectionLabels(), ::testing::Each("saving bundle proxies to main cache"));
+  EXPECT_EQ(messages().back(), "[DEBUG] wrote on disk " + size() + " bytes at " + mainCachePath);
+
+  AppLibraryCaches next(fake.caches);
+  const auto content = next.main.load();
+  ASSERT_TRUE(content);
+  EXPECT_EQ(content->versionToken, 7U);
+  EXPECT_THAT(shown(content->records), ElementsAre("org.a /apps/a A", "org.b /apps/b -"));
+  EXPECT_EQ(next.main.versionToken(), 7U);
+  EXPECT_THAT(log.sectionLabels(), ElementsAre("loading bundle proxies from main cache"));
+  EXPECT_THAT(messages(),
+              ElementsAre("[DEBUG] read from disk " + size() + " bytes at " + mainCachePath,
+                          "[DEBUG] loaded 2 app library items from data",
+                          "[DEBUG] version token was set to 7 after load"));
+}
+
+TEST_F(LocalAppLibraryCacheTest, CachesHaveFilesAndTokensOfTheirOwn) {
+  ASSERT_TRUE(main.save(records, 3, Increment::no));
+  ASSERT_TRUE(caches.workingSet.save({}, 5, Increment::no));
+  EXPECT_EQ(main.versionToken(), 3U);
+  EXPECT_EQ(caches.workingSet.versionToken(), 5U);
+  EXPECT_THAT(log.sectionLabels(), ElementsAre("saving bundle proxies to main cache",
+                                               "saving bundle proxies to working-set cache"));
+  EXPECT_TRUE(fake.caches.files.contains(workingSetCachePath));
+  EXPECT_EQ(&caches.of(LocalAppLibraryCacheSource::main), &main);
+  EXPECT_EQ(&caches.of(LocalAppLibraryCacheSource::workingSet), &caches.workingSet);
+  EXPECT_TRUE(caches.workingSet.load()->records.empty());
+}
+
+TEST_F(LocalAppLibraryCacheTest, WhatIsStoredComesBackByteForByte) {
+  records = {recordOf("a/../\"\xff\n", "/apps/\xff\xfe", std::string("N\0me", 4)), BundleProxy{},
+             recordOf("", "/", std::string(100'000, 'n'))};
+  ASSERT_TRUE(main.save(records, 1, Increment::no));
+  EXPECT_EQ(shown(main.load()->records), shown(records));
+}
+
+TEST_F(LocalAppLibraryCacheTest, TokenNeverGoesDownOnLoad) {
+  ASSERT_TRUE(main.save(records, 5, Increment::no));
+  main.setVersionToken(7);
+  messages();
+  const auto content = main.load();
+  ASSERT_TRUE(content);
+  EXPECT_EQ(content->versionToken, 5U);
+  EXPECT_EQ(main.versionToken(), 7U);
+  EXPECT_EQ(messages().back(), "[DEBUG] loaded 2 app library items from data");
+}
+
+TEST_F(LocalAppLibraryCacheTest, WhatCannotBeUnderstoodIsNothing) {
+  const auto record = [](std::string key, PropertyList value) {
+    return PropertyList(PropertyList::Dictionary{{std::move(key), std::move(value)}});
+  };
+  const PropertyList text(std::string("5"));
+  const PropertyList number(Number::of(std::int64_t{5}));
+  const std::string invalidToken =
+      "[DEBUG] version token invalid; data on disk is corrupted let's reset";
+  const std::string invalidProxies =
+      "[DEBUG] bundle proxies invalid; data on disk is corrupted let's reset";
+  const std::pair<PropertyList::Dictionary, std::string> cases[] = {
+      {{}, invalidToken},
+      {{proxies({})}, invalidToken},
+      {{{"versionToken", text}, proxies({})}, invalidToken},
+      {{token(Number::of(5.0)), proxies({})}, invalidToken},
+      {{token(Number::of(std::int64_t{-1})), proxies({})}, invalidToken},
+      {{token(Number::of(std::int64_t{5}))}, invalidProxies},
+      {{token(Number::of(std::int64_t{5})), {"bundleProxy", text}}, invalidProxies},
+      {{token(Number::of(std::int64_t{5})), proxies({text})}, invalidProxies},
+      {{token(Number::of(std::int64_t{5})), proxies({record("bundleIdentifier", number)})},
+       invalidProxies},
+      {{token(Number::of(std::int64_t{5})), proxies({record("localizedName", number)})},
+       invalidProxies},
+      {{token(Number::of(std::int64_t{5})), proxies({record("dataContainerURL", text)})},
+       invalidProxies},
+  };
+  for (const auto& [root, message] : cases) {
+    write(root);
+    EXPECT_FALSE(main.load());
+    EXPECT_EQ(messages().back(), message);
+  }
+  EXPECT_EQ(main.versionToken(), 0U);
+  write({token(Number::of(largest)), proxies({record("unknown", number)})});
+  EXPECT_EQ(main.load()->versionToken, largest);
+}
+
+TEST_F(LocalAppLibraryCacheTest, MissingOrUnreadableFileIsNothing) {
+  main.setVersionToken(3);
+  EXPECT_FALSE(main.load());
+  EXPECT_THAT(messages(), ElementsAre("[DEBUG] nothing cached on disk"));
+
+  fake.faults.fail(Op::cacheRead, Error::posix(EIO));
+  EXPECT_FALSE(main.load());
+  EXPECT_THAT(messages(), ElementsAre("[DEBUG] can't load cache from disk let's reset; " +
+                                      Error::posix(EIO).description()));
+
+  fake.caches.files[mainCachePath] = keyedarchive::archiveString("another class").value();
+  EXPECT_FALSE(main.load());
+  EXPECT_THAT(messages(),
+              ElementsAre(StartsWith("[DEBUG] can't load cache from disk let's reset; ")));
+  EXPECT_EQ(main.versionToken(), 3U);
+}
+
+TEST_F(LocalAppLibraryCacheTest, FileCutAtAnyByteIsNothingAndIsWrittenAnew) {
+  ASSERT_TRUE(main.save(records, 0, Increment::yes));
+  const Data whole = fake.caches.files.at(mainCachePath);
+  for (std::size_t length = 0; length < whole.size(); ++length) {
+    fake.caches.files[mainCachePath] = Data(whole.begin(), whole.begin() + length);
+    AppLibraryCaches next(fake.caches);
+    ASSERT_FALSE(next.main.load()) << length;
+    ASSERT_EQ(next.main.versionToken(), 0U) << length;
+    // The numbers go on where the lost file had left them.
+    ASSERT_EQ(next.main.save(records, 0, Increment::yes).value(), length + 2);
+    ASSERT_EQ(next.main.load()->records.size(), 2U);
+  }
+}
+
+TEST_F(LocalAppLibraryCacheTest, TwoProcessesNeverGiveOneNumberToTwoContents) {
+  AppLibraryCaches other(fake.caches);
+  ASSERT_EQ(main.save(records, 0, Increment::yes).value(), 1U);
+  EXPECT_EQ(other.main.save({}, 0, Increment::yes).value(), 2U);
+  EXPECT_EQ(main.load()->versionToken, 2U);
+  EXPECT_EQ(main.versionToken(), 2U);
+
+  // The other process writes while this one is about to: the later number is overwritten.
+  fake.caches.afterClaim = [&] { ASSERT_EQ(other.main.save({}, 0, Increment::yes).value(), 4U); };
+  EXPECT_EQ(main.save(records, 0, Increment::yes).value(), 3U);
+  EXPECT_EQ(other.main.load()->versionToken, 3U);
+  EXPECT_EQ(other.main.versionToken(), 4U);
+  EXPECT_EQ(main.save(records, 0, Increment::yes).value(), 5U);
+}
+
+TEST_F(LocalAppLibraryCacheTest, FailedSaveLeavesFileAndToken) {
+  ASSERT_TRUE(main.save(records, 0, Increment::yes));
+  const Data before = fake.caches.files.at(mainCachePath);
+  for (const Op op : {Op::claimVersion, Op::cacheFolder, Op::cacheReplace}) {
+    fake.faults.fail(op, Error::posix(ENOSPC));
+    messages();
+    const auto written = main.save({}, 0, Increment::yes);
+    ASSERT_FALSE(written);
+    EXPECT_EQ(written.error(), Error::posix(ENOSPC));
+    EXPECT_EQ(fake.caches.files.at(mainCachePath), before);
+    EXPECT_EQ(main.versionToken(), 1U);
+    EXPECT_TRUE(messages().empty());
+  }
+  // More than an archive holds.
+  const auto written =
+      main.save({recordOf("a", "/a", std::string(20u << 20, 'n'))}, 0, Increment::yes);
+  ASSERT_FALSE(written);
+  EXPECT_EQ(written.error().domain, ErrorDomain::propertyList);
+  EXPECT_EQ(fake.caches.files.at(mainCachePath), before);
+}
+
+TEST_F(LocalAppLibraryCacheTest, LargestTokenCannotBeIncremented) {
+  main.setVersionToken(largest);
+  EXPECT_EQ(main.save(records, largest, Increment::no).value(), largest);
+  EXPECT_DEATH(
+      {
+        Log::shared().setSink(nullptr, LogLevel::error);
+        static_cast<void>(main.save(records, 0, Increment::yes));
+      },
+      "version token of the main cache");
+}
+
+}  // namespace
+}  // namespace mirabel::testing
