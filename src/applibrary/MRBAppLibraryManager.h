@@ -1,0 +1,51 @@
+#pragma once
+
+#include <functional>
+#include <optional>
+
+#include "applibrary/LocalAppLibraryCache.h"
+#include "applibrary/LocalAppLibraryManager.h"
+#include "foundation/SerialQueue.h"
+#include "identity/AppLibraryRoots.h"
+#include "items/AppLibraryOwners.h"
+#include "platform/EnumerationObservers.h"
+#include "platform/Platform.h"
+
+namespace mirabel {
+
+/// The app libraries of the process: both caches, and the shared manager, which starts with what
+/// the working set was last fed from. One for each platform; it outlives whoever asks it for roots
+/// or owners. Any thread may call it.
+class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwners {
+ public:
+  /// What `platform` refers to outlives this.
+  explicit MRBAppLibraryManager(const Platform& platform);
+
+  /// Asks the registry and writes the main cache where the answer is a new one; whether it did.
+  /// This and upgrades run one at a time on the background queue, which the call waits for; from
+  /// that queue, as in a call of the observer, neither may be asked for.
+  bool refreshFromRegistry();
+  /// Has the shared manager follow the main cache; whether it changed.
+  bool upgradeFromMainCache(VesselChangeObserver* observer = nullptr);
+
+  [[nodiscard]] LocalAppLibraryManager& shared() { return shared_; }
+  [[nodiscard]] AppLibraryCaches& caches() { return caches_; }
+  [[nodiscard]] const SerialQueue& backgroundQueue() const { return backgroundQueue_; }
+
+  [[nodiscard]] List rootURLsForAppLibraries() const override {
+    return shared_.rootURLsForAppLibraries();
+  }
+  [[nodiscard]] std::optional<BundleProxy> applicationOwning(const URL& url) const override {
+    return shared_.applicationOwning(url);
+  }
+
+ private:
+  bool inBackground(const std::function<bool()>& work);
+
+  Platform platform_;
+  AppLibraryCaches caches_;
+  LocalAppLibraryManager shared_;
+  SerialQueue backgroundQueue_{"mirabel.app-library.background"};
+};
+
+}  // namespace mirabel
