@@ -42,7 +42,9 @@ class ApplicationRegistry {
 
   /// Reports nothing in place of an entry that is there and can't be read.
   using EnumerationBlock = std::function<void(const std::optional<BundleProxy>&)>;
-  /// Calls `block` for each application of the type, before it returns. POSIX errors: not all of
+  /// Calls `block` for each application of the type, before it returns. Entries may be anybody's,
+  /// so an implementation bounds their number, and the length of what it tells of one: all of it
+  /// together has to fit into a keyed archive, or the list can't be kept. POSIX errors: not all of
   /// them were reported, and nothing can be said of those that were not.
   [[nodiscard]] virtual Result<void> enumerateApplicationsOfType(ApplicationType type,
                                                                  const EnumerationBlock& block) = 0;

@@ -155,6 +155,25 @@ TEST_F(LocalAppLibraryCacheTest, FileCutAtAnyByteIsNothingAndIsWrittenAnew) {
   }
 }
 
+TEST_F(LocalAppLibraryCacheTest, FlippedBitIsNothingOrIsReadAndIsWrittenOver) {
+  ASSERT_TRUE(main.save(records, 0, Increment::yes));
+  const Data whole = fake.caches.files.at(mainCachePath);
+  std::size_t refused = 0;
+  for (std::size_t bit = 0; bit < whole.size() * 8; ++bit) {
+    Data flipped = whole;
+    flipped[bit / 8] ^= static_cast<std::uint8_t>(1U << (bit % 8));
+    fake.caches.files[mainCachePath] = flipped;
+    AppLibraryCaches next(fake.caches);
+    const auto content = next.main.load();
+    refused += content ? 0 : 1;
+    ASSERT_EQ(next.main.versionToken(), content ? content->versionToken : 0U) << bit;
+    const auto written = next.main.save(records, 0, Increment::yes);
+    ASSERT_GT(written.value(), content ? content->versionToken : 1U) << bit;
+    ASSERT_EQ(shown(next.main.load()->records), shown(records)) << bit;
+  }
+  EXPECT_GT(refused, whole.size() * 2);
+}
+
 TEST_F(LocalAppLibraryCacheTest, TwoProcessesNeverGiveOneNumberToTwoContents) {
   AppLibraryCaches other(fake.caches);
   ASSERT_EQ(main.save(records, 0, Increment::yes).value(), 1U);

@@ -92,6 +92,16 @@ TEST_F(OpeningThePlatform, HonoursTheEnvironmentOnlyWithoutAnExplicitHome) {
   EXPECT_EQ(LinuxPlatform::open({.home = home.path()}).value()->stateFolder(), home.stateFolder());
   setEnvironment("XDG_STATE_HOME", "relative");
   EXPECT_EQ(LinuxPlatform::open({}).value()->stateFolder(), home.stateFolder());
+
+  const auto applicationSupport = [](LinuxPlatform::Options options) {
+    const auto opened = LinuxPlatform::open(std::move(options)).value();
+    return opened->platform().caches.applicationSupportURL().path();
+  };
+  setEnvironment("XDG_DATA_HOME", other.path() + "/data");
+  EXPECT_EQ(applicationSupport({}), other.path() + "/data");
+  EXPECT_EQ(applicationSupport({.home = home.path()}), home.path() + "/.local/share");
+  setEnvironment("XDG_DATA_HOME", "relative");
+  EXPECT_EQ(applicationSupport({}), home.path() + "/.local/share");
 }
 
 }  // namespace
