@@ -28,7 +28,7 @@ void Reserve::make() const {
   const int folder = folder_.descriptor();
   if (::fstatat(folder, fileName, &status, AT_SYMLINK_NOFOLLOW) == 0) return;
   // What was given up on a disk that is nearly full stays free for what comes next.
-  struct statvfs disk{};
+  struct statvfs disk {};
   if (::fstatvfs(folder, &disk) != 0 || disk.f_bavail * disk.f_frsize < fewestFree) return;
   const UniqueFd file(::openat(folder, fileName, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
   // Half of it would be there next time, and taken for all of it.
