@@ -15,9 +15,10 @@
 
 namespace mirabel {
 
-/// The system calls that operations are made of: all that change something and all that find the
-/// way go through here, so that a test can have any one of them fail, or do something just before
-/// it. Errors are POSIX errors. Any thread.
+/// The steps that operations are made of, nearly all of them one system call. They go through here,
+/// so that a test can have any one of them fail, or do something just before it. What lies within a
+/// step (copying contents, replacing the record of pending work, making the folders of a path) calls
+/// the system by itself. Errors are POSIX errors. Any thread.
 class FileCalls {
  public:
   /// Asked before each call, with its name; the errno that it has to fail with, 0 to go on.
