@@ -17,8 +17,8 @@ namespace mirabel {
 
 /// The steps that operations are made of, nearly all of them one system call. They go through here,
 /// so that a test can have any one of them fail, or do something just before it. What lies within a
-/// step (copying contents, replacing the record of pending work, making the folders of a path) calls
-/// the system by itself. Errors are POSIX errors. Any thread.
+/// step (copying contents, replacing the record of pending work, making the folders of a path)
+/// calls the system by itself. Errors are POSIX errors. Any thread.
 class FileCalls {
  public:
   /// Asked before each call, with its name; the errno that it has to fail with, 0 to go on.
