@@ -54,7 +54,7 @@ TEST(TrashPlacesTest, ComponentsThatNameNoFileAreRefusedWithTheirList) {
 TEST(TrashPlacesTest, PutBackStringIsThePathBehindTheLibrary) {
   struct Case {
     const char* item;
-    const char* library;
+    const char* root;
     std::optional<std::string> string;
   };
   const Case cases[] = {
@@ -68,7 +68,7 @@ TEST(TrashPlacesTest, PutBackStringIsThePathBehindTheLibrary) {
       {"/home/me/Documents/a", "/apps/draw/Documents", std::nullopt},
   };
   for (const Case& c : cases)
-    EXPECT_EQ(putBackString(URL::fileURL(c.item), URL::fileURL(c.library)), c.string) << c.item;
+    EXPECT_EQ(putBackString(URL::fileURL(c.item), URL::fileURL(c.root)), c.string) << c.item;
 }
 
 }  // namespace
