@@ -131,6 +131,8 @@ TEST_P(HardLinksTest, NamesAreToldThatCameOrWent) {
     std::vector<std::string> told;
   };
   const auto unlink = [this](const char* name) { fs::remove(path(name)); };
+  const std::string outside = base_ + "/outside";
+  const auto moveOut = [&](const char* name) { fs::rename(path(name), outside); };
   const Case cases[] = {
       {"a name more", [&] { link("a/x", "c/z"); }, {"a/x", "b/y", "c/z"}},
       {"a name less", [&] { unlink("b/y"); }, {"b/y"}},
@@ -159,10 +161,20 @@ TEST_P(HardLinksTest, NamesAreToldThatCameOrWent) {
       {"the folder of one name hidden", [&] { fs::rename(path("b"), path(".b")); }, {".b/y"}},
       {"the folder of one name deleted", [&] { fs::remove_all(path("b")); }, {"b/y"}},
       {"the folder of the first name deleted", [&] { fs::remove_all(path("a")); }, {"a/x", "b/y"}},
+      {"written to under a name whose folder then left",
+       [&] { write("b/y", "longer"), moveOut("b"); },
+       {"a/x", "b/y"}},
+      {"written to under the first name, whose folder then left",
+       [&] { write("a/x", "longer"), moveOut("a"); },
+       {"a/x", "b/y"}},
+      {"written to under a name that then left",
+       [&] { write("b/y", "longer"), moveOut("b/y"); },
+       {"a/x", "b/y"}},
   };
   for (const Case& c : cases) {
     close();
     fs::remove_all(documents_);
+    fs::remove_all(outside);
     fs::create_directory(documents_);
     for (const char* folder : {"a", "b", "c"})
       makeFolder(folder);

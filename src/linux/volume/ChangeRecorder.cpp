@@ -125,6 +125,7 @@ Result<void> ChangeRecorder::goneLinks(std::uint64_t folder, const std::string& 
     auto row = store_.objectInSlot(slot);
     if (!row) return fail(row.error());
     if (!*row) continue;
+    if ((*row)->location) noteSurvivor((*row)->fileID);
     std::string place = path;
     place.append("/").append(name);
     if (auto told = append(**row, {folder, name}, std::move(place), false); !told) return told;
@@ -142,6 +143,7 @@ Result<void> ChangeRecorder::goneThing(ObjectRow thing,
     if (folders.contains(link.folder)) continue;
     // It lives on under this name.
     thing.location = std::move(link);
+    noteSurvivor(thing.fileID);
     if (auto kept = store_.put(thing); !kept) return kept;
     return changed(thing, *thing.location);
   }

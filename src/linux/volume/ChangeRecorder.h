@@ -3,8 +3,10 @@
 #include <functional>
 #include <map>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
@@ -36,6 +38,10 @@ class ChangeRecorder {
   /// The object is nowhere: so is its document, if it still has it, and everything in it, which is
   /// detached. The row itself is left to the caller.
   [[nodiscard]] Result<void> gone(const ObjectRow& row, const Location& from);
+  /// Notes that the object lost a name, and goes on under another: what was last done to it may
+  /// have been heard of under the lost name alone, so that it has to be looked at.
+  void noteSurvivor(std::uint64_t fileID) { survivors_.insert(fileID); }
+  [[nodiscard]] std::set<std::uint64_t> takeSurvivors() { return std::exchange(survivors_, {}); }
   enum class Which { everything, hardLinked };
   /// Records for what is in a folder, as it lies now.
   [[nodiscard]] Result<void> contents(std::uint64_t folder, Which which = Which::everything);
@@ -65,6 +71,7 @@ class ChangeRecorder {
   const IndexedPaths& paths_;
   const MonitoredRoots& roots_;
   std::function<bool(std::string_view)> isPackageName_;
+  std::set<std::uint64_t> survivors_;
 };
 
 }  // namespace mirabel

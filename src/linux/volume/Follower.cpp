@@ -66,6 +66,7 @@ Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
       return fail(done.error());
     if (auto settled = settle(transaction); !settled) return fail(settled.error());
   }
+  places_.addOthers(context_.recorder.takeSurvivors());
   if (places_.hasOthers()) {
     auto looked = transaction([&] { return places_.lookAtOthers(); });
     if (!looked) return fail(looked.error());

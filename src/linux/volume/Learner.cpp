@@ -292,6 +292,7 @@ Result<void> Learner::leave(ObjectRow row) {
   const Location from = *row.location;
   auto promoted = placer_.promoteLink(row);
   if (!promoted) return fail(promoted.error());
+  if (*promoted) recorder_.noteSurvivor(row.fileID);
   if (*promoted) return {};
   row.location.reset();
   if (auto told = recorder_.gone(row, from); !told) return told;

@@ -32,6 +32,7 @@ Result<void> MissingNames::settle(const Missing& missing) {
   if (missing.isLink) {
     auto removed = context_.store.removeLink(missing.location.folder, missing.location.name);
     if (!removed || !*row) return removed;
+    context_.recorder.noteSurvivor((*row)->fileID);
     return context_.recorder.changed(**row, missing.location);
   }
   if (!*row || (*row)->location != missing.location) return {};

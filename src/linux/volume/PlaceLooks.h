@@ -28,6 +28,8 @@ class PlaceLooks {
   /// Looks at what was linked or unlinked somewhere under its other names; to be called when the
   /// places were looked at. What does not lie where the index has it is kept for the next time.
   [[nodiscard]] Result<void> lookAtOthers();
+  /// Further objects to be looked at then.
+  void addOthers(std::set<std::uint64_t> fileIDs) { others_.merge(fileIDs); }
   [[nodiscard]] bool hasOthers() const { return !others_.empty(); }
   void clear() { others_.clear(); }
 
