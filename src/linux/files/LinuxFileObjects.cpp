@@ -45,9 +45,8 @@ class OpenObject final : public FileObject {
 };
 
 std::uint64_t deviceOfFirstRoot(const LookContext& context) {
-  const bool isThere = !context.roots.paths().empty() && context.roots.descriptor(0) >= 0;
-  const auto status = isThere ? statusAt(context.roots.descriptor(0), "")
-                              : Result<ObjectStatus>(fail(Error::posix(ENOENT)));
+  const auto root = context.roots.open(context.roots.firstPath(), O_PATH | O_DIRECTORY);
+  const auto status = root ? statusAt(root->get(), "") : fail(root.error());
   return status ? status->device : context.index.device();
 }
 

@@ -62,7 +62,7 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   auto roots = std::make_unique<MonitoredRoots>(std::move(paths));
   VolumeIndex::Options indexOptions;
   // A document storage that is missing belongs where it would be made.
-  indexOptions.volumePath = roots->descriptor(0) >= 0 ? layout->documents : layout->home;
+  indexOptions.volumePath = roots->isThere(layout->documents) ? layout->documents : layout->home;
   indexOptions.stateFolder = layout->stateFolder;
   indexOptions.isPackageName = PackageTypes::isPackageName;
   indexOptions.makeWatcher = std::move(options.makeWatcher);

@@ -1,10 +1,10 @@
 #include "linux/kernel/MonitoredRoots.h"
 
-#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <deque>
 #include <fcntl.h>
+#include <mutex>
 #include <utility>
 
 #include "linux/kernel/ObjectStatus.h"
@@ -12,91 +12,179 @@
 namespace mirabel {
 namespace {
 
-bool holds(const std::string& root, std::string_view path) {
+// How a further root is reached: it may lie on any mount, but behind no symbolic link.
+constexpr unsigned long long withoutLinks = RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS;
+
+bool holds(std::string_view root, std::string_view path) {
   if (!path.starts_with(root)) return false;
   return path.size() == root.size() || root == "/" || path[root.size()] == '/';
 }
 
+std::string_view below(std::string_view root, std::string_view path) {
+  std::string_view relative = path.substr(root.size());
+  if (relative.starts_with('/')) relative.remove_prefix(1);
+  return relative;
+}
+
+bool isAbsence(const Error& error) {
+  return error.isPosix(ENOENT) || error.isPosix(ENOTDIR) || error.isPosix(ELOOP) ||
+         error.isPosix(EACCES);
+}
+
 }  // namespace
 
-/// What is open at a root's path now.
+/// What is at a root's path now.
 struct MonitoredRoots::Root {
+  enum class Kept { open, closed };
+  Root(std::string where, std::uint64_t given, Kept kept)
+      : path(std::move(where)), number(given), isKeptOpen(kept == Kept::open) {}
+
+  const std::string path;
+  const std::uint64_t number;
+  const bool isKeptOpen;
   // Written by `refresh` alone. Whoever reads a descriptor that is replaced at that moment may use
   // it a little longer, so former ones are closed some changes later.
+  std::atomic<bool> isThere = false;
   std::atomic<int> descriptor = -1;
   std::atomic<std::uint64_t> device = 0;
-  std::uint64_t inode = 0;
+  std::atomic<std::uint64_t> inode = 0;
   UniqueFd current{};
   std::deque<UniqueFd> former{};
 
-  void take(UniqueFd opened, const ObjectStatus& status) {
+  void take(UniqueFd opened, const std::optional<ObjectStatus>& status) {
     constexpr std::size_t mostFormer = 8;
-    inode = status.inode;
-    device = status.device;
+    inode = status ? status->inode : 0;
+    device = status ? status->device : 0;
+    isThere = status.has_value();
+    if (!isKeptOpen) return;
     descriptor = opened.get();
     former.push_back(std::exchange(current, std::move(opened)));
     if (former.size() > mostFormer) former.pop_front();
   }
+
+  [[nodiscard]] Result<UniqueFd> open() const {
+    if (!isThere) return fail(Error::posix(ENOENT));
+    auto opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY, withoutLinks);
+    if (!opened) return opened;
+    const auto status = statusAt(opened->get(), "");
+    if (!status) return fail(status.error());
+    if (status->inode != inode || status->device != device) return fail(Error::posix(ENOENT));
+    return opened;
+  }
 };
 
-MonitoredRoots::MonitoredRoots(std::vector<std::string> paths) : paths_(std::move(paths)) {
-  for (std::size_t i = 0; i < paths_.size(); ++i)
-    roots_.push_back(std::make_unique<Root>());
-  static_cast<void>(refresh());
+MonitoredRoots::MonitoredRoots(std::vector<std::string> paths)
+    : firstPath_(paths.empty() ? std::string() : std::move(paths.front())),
+      first_(std::make_shared<Root>(firstPath_, nextNumber_++, Root::Kept::open)) {
+  static_cast<void>(refresh(*first_));
+  if (!paths.empty()) setFurther({paths.begin() + 1, paths.end()});
 }
 
 MonitoredRoots::~MonitoredRoots() = default;
 
-bool MonitoredRoots::refresh() {
-  bool hasChanged = false;
-  for (std::size_t i = 0; i < paths_.size(); ++i) {
-    Root& root = *roots_[i];
-    const auto seen = statusOf(paths_[i]);
-    const bool isThere = seen && seen->kind == FileKind::folder;
-    if (!isThere && root.descriptor < 0) continue;
-    if (isThere && root.descriptor >= 0 && seen->inode == root.inode &&
-        seen->device == root.device) {
-      continue;
-    }
-    auto opened = openLongPath(AT_FDCWD, paths_[i], O_PATH | O_DIRECTORY);
-    const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
-    if (!status && root.descriptor < 0) continue;
-    hasChanged = true;
-    root.take(status ? std::move(*opened) : UniqueFd(), status.value_or(ObjectStatus{}));
+void MonitoredRoots::setFurther(const std::vector<std::string>& paths) {
+  decltype(furtherByPath_) byPath;
+  std::vector<RootPointer> roots;
+  roots.reserve(paths.size());
+  const std::unique_lock lock(mutex_);
+  for (const std::string& path : paths) {
+    if (path == firstPath_ || byPath.contains(path)) continue;
+    const auto known = furtherByPath_.find(path);
+    RootPointer root = known != furtherByPath_.end()
+                           ? known->second
+                           : std::make_shared<Root>(path, nextNumber_++, Root::Kept::closed);
+    if (known == furtherByPath_.end()) static_cast<void>(refresh(*root));
+    byPath.emplace(path, root);
+    roots.push_back(std::move(root));
   }
-  return hasChanged;
+  further_ = std::move(roots);
+  furtherByPath_ = std::move(byPath);
+}
+
+std::vector<MonitoredRoots::RootPointer> MonitoredRoots::all() const {
+  const std::shared_lock lock(mutex_);
+  std::vector<RootPointer> roots{first_};
+  roots.insert(roots.end(), further_.begin(), further_.end());
+  return roots;
+}
+
+MonitoredRoots::Changes MonitoredRoots::refresh() {
+  Changes changes;
+  for (const RootPointer& root : all()) {
+    if (!refresh(*root)) continue;
+    if (root == first_) changes.isFirst = true;
+    if (root != first_) changes.further.push_back(root->path);
+  }
+  return changes;
+}
+
+bool MonitoredRoots::refresh(Root& root) {
+  const auto resolve = root.isKeptOpen ? 0 : withoutLinks;
+  auto opened = openLongPath(AT_FDCWD, root.path, O_PATH | O_DIRECTORY, resolve);
+  if (!opened && !isAbsence(opened.error())) return false;
+  const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
+  if (!status && !root.isThere) return false;
+  if (status && root.isThere && status->inode == root.inode && status->device == root.device) {
+    return false;
+  }
+  root.take(status ? std::move(*opened) : UniqueFd(),
+            status ? std::optional(*status) : std::nullopt);
+  return true;
+}
+
+// Of nested roots the innermost one owns the path.
+MonitoredRoots::RootPointer MonitoredRoots::holderOf(std::string_view path) const {
+  const bool isInFirst = holds(firstPath_, path);
+  const std::shared_lock lock(mutex_);
+  if (furtherByPath_.empty()) return isInFirst ? first_ : nullptr;
+  for (std::string_view above = path; !above.empty();) {
+    if (isInFirst && above.size() == firstPath_.size()) return first_;
+    const auto found = furtherByPath_.find(above);
+    if (found != furtherByPath_.end()) return found->second;
+    const std::size_t slash = above.rfind('/');
+    above = slash == std::string_view::npos ? std::string_view() : above.substr(0, slash);
+  }
+  return isInFirst ? first_ : nullptr;
 }
 
 std::optional<MonitoredRoots::Place> MonitoredRoots::locate(std::string_view path) const {
-  std::optional<Place> best;
-  for (std::size_t i = 0; i < paths_.size(); ++i) {
-    if (!holds(paths_[i], path)) continue;
-    // Of nested roots the innermost one owns the path.
-    if (best && paths_[best->root].size() >= paths_[i].size()) continue;
-    std::string_view relative = path.substr(paths_[i].size());
-    if (relative.starts_with('/')) relative.remove_prefix(1);
-    best = Place{i, relative};
-  }
-  return best;
+  const RootPointer root = holderOf(path);
+  if (!root) return std::nullopt;
+  return Place{root->number, path.substr(0, root->path.size()), below(root->path, path)};
 }
 
-int MonitoredRoots::descriptor(std::size_t root) const {
-  return roots_[root]->descriptor;
+std::vector<std::string> MonitoredRoots::paths() const {
+  std::vector<std::string> paths;
+  for (const RootPointer& root : all())
+    paths.push_back(root->path);
+  return paths;
+}
+
+bool MonitoredRoots::isThere(std::string_view rootPath) const {
+  const RootPointer root = holderOf(rootPath);
+  return root && root->path == rootPath && root->isThere;
 }
 
 Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const {
   if (path.find('\0') != std::string::npos) return fail(Error::posix(EINVAL));
   const int allFlags = flags | ((flags & O_PATH) != 0 ? 0 : O_NONBLOCK | O_NOCTTY);
-  const auto place = locate(path);
-  if (!place) return openLongPath(AT_FDCWD, path, allFlags);
-  const int root = descriptor(place->root);
-  if (root < 0) return fail(Error::posix(ENOENT));
-  auto opened = openLongPath(root, std::string(place->relative), allFlags, resolveBeneath);
-  if (!opened || place->relative.empty()) return opened;
+  const RootPointer root = holderOf(path);
+  if (!root) return openLongPath(AT_FDCWD, path, allFlags);
+  UniqueFd reopened;
+  if (!root->isKeptOpen) {
+    auto folder = root->open();
+    if (!folder) return folder;
+    reopened = std::move(*folder);
+  }
+  const int folder = root->isKeptOpen ? root->descriptor.load() : reopened.get();
+  if (folder < 0) return fail(Error::posix(ENOENT));
+  const std::string relative(below(root->path, path));
+  auto opened = openLongPath(folder, relative, allFlags, resolveBeneath);
+  if (!opened || relative.empty()) return opened;
   // A subvolume is no mount to the kernel, and gives out inode numbers of the root's once more.
   const auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
-  if (status->device != roots_[place->root]->device) return fail(Error::posix(EXDEV));
+  if (status->device != root->device) return fail(Error::posix(EXDEV));
   return opened;
 }
 

@@ -69,7 +69,7 @@ Result<void> createFolder(const MonitoredRoots& roots, const URL& url) {
   const std::string& path = url.path();
   if (path.empty()) return fail(Error::posix(EINVAL));
   const auto place = roots.locate(path);
-  auto start = roots.open(place ? roots.paths()[place->root] : "/", O_PATH | O_DIRECTORY);
+  auto start = roots.open(place ? std::string(place->rootPath) : "/", O_PATH | O_DIRECTORY);
   if (!start) return fail(start.error());
   return place ? createBelow(std::move(*start), place->relative, Links::refused)
                : createBelow(std::move(*start), std::string_view(path).substr(1), Links::followed);

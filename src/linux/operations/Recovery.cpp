@@ -45,7 +45,7 @@ class OperationRecovery {
     if (path) return openFolder(context_, URL::fileURL(*path));
     if (!path.error().isPosix(ENOENT)) return fail(path.error());
     const auto root = context_.roots.locate(folder.path);
-    if (root && context_.roots.descriptor(root->root) < 0) return fail(Error::posix(ENODEV));
+    if (root && !context_.roots.isThere(root->rootPath)) return fail(Error::posix(ENODEV));
     return openFolder(context_, URL::fileURL(folder.path));
   }
 

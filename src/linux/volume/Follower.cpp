@@ -32,12 +32,32 @@ Follower::Follower(IndexContext context, Options options)
       recent_(context_) {}
 
 Result<void> Follower::catchUp(const Transaction& transaction) {
-  if (options_.haveRootsChanged()) isInStep_ = false;
+  auto changed = options_.changedRoots();
+  if (changed.isFirst) isInStep_ = false;
   if (!isInStep_) return compareAll(transaction);
-  auto outcome = follow(transaction);
+  addRoots(changed.further);
+  auto added = addChangedRoots(transaction);
+  auto outcome = added ? follow(transaction) : fail(added.error());
   if (!outcome) isInStep_ = false;
   if (!outcome) return fail(outcome.error());
   return *outcome == Outcome::inStep ? Result<void>() : compareAll(transaction);
+}
+
+void Follower::addRoots(const std::vector<std::string>& paths) {
+  changedRoots_.insert(paths.begin(), paths.end());
+}
+
+Result<void> Follower::addChangedRoots(const Transaction& transaction) {
+  if (changedRoots_.empty()) return {};
+  auto added = transaction([&]() -> Result<void> {
+    for (const std::string& path : changedRoots_) {
+      if (!context_.roots.locate(path)) continue;
+      if (auto done = scan_.addRoot(path); !done) return done;
+    }
+    return {};
+  });
+  if (added) changedRoots_.clear();
+  return added;
 }
 
 // Following records -----------------------------------------------------------------------------
@@ -202,6 +222,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   looks_.clear();
   later_.clear();
   places_.clear();
+  changedRoots_.clear();
   static_cast<void>(scan_.takeDisturbed());
   scan_.setWatcher(watcher_.get());
   if (watcher_) {

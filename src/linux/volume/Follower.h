@@ -6,7 +6,10 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <set>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "linux/volume/FollowStatus.h"
@@ -28,8 +31,8 @@ class Follower final : public RecentPlaces {
   struct Options {
     /// Makes the watcher; nothing: no folder is watched.
     std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher;
-    /// Says whether a root is another folder than it was, which no record tells of.
-    std::function<bool()> haveRootsChanged;
+    /// Says which roots are other folders than they were, which no record tells of.
+    std::function<MonitoredRoots::Changes()> changedRoots;
     /// Called when everything was compared and changes are heard of from now on.
     std::function<void()> hasCompared;
     /// Told, once, when folders can't be watched.
@@ -42,6 +45,9 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] Result<void> catchUp(const Transaction& transaction);
   /// Compares everything, whatever is known.
   [[nodiscard]] Result<void> compareAll(const Transaction& transaction);
+
+  /// These roots were added; what lies in them is taken in by the next `catchUp`.
+  void addRoots(const std::vector<std::string>& paths);
 
   /// Whether changes are heard of, so that the index need not be compared.
   [[nodiscard]] bool isInStep() const override { return isInStep_; }
@@ -65,6 +71,7 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] Result<void> scanArrived(const Transaction& transaction, const Pause& pause);
   [[nodiscard]] Result<void> addArrived();
   [[nodiscard]] Result<void> addDisturbed();
+  [[nodiscard]] Result<void> addChangedRoots(const Transaction& transaction);
   [[nodiscard]] Result<void> addByID(std::uint64_t folder);
   [[nodiscard]] Result<void> scanAll(const Transaction& transaction);
   void prepareWatcher();
@@ -77,6 +84,7 @@ class Follower final : public RecentPlaces {
   PlaceLooks places_;
   RecentNames recent_;
   LookList looks_;
+  std::set<std::string> changedRoots_;
   LookList later_;  // places whose folder was not where the index has it
   std::shared_ptr<FolderWatcher> watcher_;
   bool isInStep_ = false;

@@ -41,6 +41,10 @@ CREATE TABLE IF NOT EXISTS handovers(
   folder INTEGER NOT NULL, name BLOB NOT NULL, document_id INTEGER NOT NULL,
   kind INTEGER NOT NULL, PRIMARY KEY(folder, name)) WITHOUT ROWID;
 CREATE INDEX IF NOT EXISTS handovers_document ON handovers(document_id);
+CREATE TABLE IF NOT EXISTS followed_folders(
+  path BLOB PRIMARY KEY, label BLOB NOT NULL) WITHOUT ROWID;
+CREATE TABLE IF NOT EXISTS followed_versions(
+  version INTEGER PRIMARY KEY, event INTEGER NOT NULL);
 CREATE TABLE IF NOT EXISTS kept_attributes(
   file_id INTEGER NOT NULL, name BLOB NOT NULL, value BLOB,
   PRIMARY KEY(file_id, name)) WITHOUT ROWID;

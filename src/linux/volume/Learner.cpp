@@ -27,13 +27,13 @@ Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRec
 
 // Folders ---------------------------------------------------------------------------------------
 
-Result<std::uint64_t> Learner::rootID(std::size_t root) {
-  const int folder = roots_.descriptor(root);
-  auto status = statusAt(folder, "");
+Result<std::uint64_t> Learner::rootID(const std::string& path) {
+  const auto folder = roots_.open(path, O_PATH | O_DIRECTORY);
+  if (!folder) return fail(folder.error());
+  auto status = statusAt(folder->get(), "");
   if (!status) return fail(status.error());
-  const std::string& path = roots_.paths()[root];
-  auto row =
-      placer_.place({{folder, "", *status}, path, {0, path}, objectKind(status->kind, false)});
+  auto row = placer_.place(
+      {{folder->get(), "", *status}, path, {0, path}, objectKind(status->kind, false)});
   if (!row) return fail(row.error());
   return row->fileID;
 }
@@ -61,8 +61,8 @@ Result<std::uint64_t> Learner::folderID(const std::string& path, int folder,
     return learned->fileID;
   }
   // Not known to lie there: learn the way to it from the top.
-  auto id = rootID(place->root);
-  std::size_t end = roots_.paths()[place->root].size();
+  auto id = rootID(std::string(place->rootPath));
+  std::size_t end = place->rootPath.size();
   while (id && end < path.size()) {
     const std::size_t start = end + 1;
     end = std::min(path.find('/', start), path.size());

@@ -94,6 +94,7 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] Result<std::optional<std::string>> verify(const ObjectRow& row);
   /// Finds the folders above again that have moved.
   [[nodiscard]] Result<void> settleFoldersAbove(const Location& location);
+  [[nodiscard]] Result<void> settleRoot(const std::vector<std::uint64_t>& foldersAbove);
   /// Learns what is at that place now.
   [[nodiscard]] Result<void> learnAt(const Location& location);
   /// Learns a root, or something outside of all: known by its whole path, unless that is another
@@ -102,7 +103,7 @@ class Learner final : private FolderIdentities {
   /// The row of what is seen, if that stands where the index has it.
   [[nodiscard]] Result<std::optional<ObjectRow>> objectInPlace(const SeenObject& seen);
   [[nodiscard]] Result<std::optional<std::string>> search(ObjectRow row);
-  [[nodiscard]] Result<std::uint64_t> rootID(std::size_t root);
+  [[nodiscard]] Result<std::uint64_t> rootID(const std::string& path);
   [[nodiscard]] Result<std::vector<ObjectRow>> occupants(std::uint64_t folder,
                                                          std::span<const Sighting> sightings);
 

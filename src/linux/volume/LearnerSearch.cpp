@@ -12,13 +12,22 @@ Result<std::optional<std::string>> Learner::verify(const ObjectRow& row) {
   return paths_.standingPath(row, *row.location);
 }
 
+// Another folder may have come to the path of the root.
+Result<void> Learner::settleRoot(const std::vector<std::uint64_t>& foldersAbove) {
+  if (foldersAbove.empty()) return {};
+  auto outermost = store_.objectByFileID(foldersAbove.front());
+  if (!outermost) return fail(outermost.error());
+  if (!*outermost || !(*outermost)->location || (*outermost)->location->folder != 0) return {};
+  const std::string path = (*outermost)->location->name;
+  if (!roots_.isThere(path)) return {};
+  auto id = rootID(path);
+  return id ? Result<void>() : fail(id.error());
+}
+
 Result<void> Learner::settleFoldersAbove(const Location& location) {
-  for (std::size_t root = 0; root < roots_.paths().size(); ++root) {
-    if (roots_.descriptor(root) < 0) continue;
-    if (auto id = rootID(root); !id) return fail(id.error());
-  }
   auto folders = paths_.foldersAbove(location);
   if (!folders) return fail(folders.error());
+  if (auto settled = settleRoot(*folders); !settled) return settled;
   for (const std::uint64_t id : *folders) {
     auto folder = store_.objectByFileID(id);
     if (!folder) return fail(folder.error());
@@ -51,8 +60,8 @@ Result<std::optional<std::string>> Learner::search(ObjectRow row) {
     if (!path) return fail(path.error());
     if (*path) hint = splitPath(**path).parent;
   }
-  const auto found = finder_.find(row, hint.value_or(roots_.paths().front()),
-                                  [] { return std::vector<ObjectRow>(); });
+  const auto found =
+      finder_.find(row, hint.value_or(roots_.firstPath()), [] { return std::vector<ObjectRow>(); });
   if (!found) {
     if (!row.location) return std::nullopt;
     if (auto left = leave(std::move(row)); !left) return fail(left.error());

@@ -30,17 +30,22 @@ void TreeScan::add(std::string path, std::uint64_t id, Depth depth) {
 }
 
 Result<void> TreeScan::addRoots() {
-  const MonitoredRoots& roots = context_.roots;
-  for (std::size_t i = 0; i < roots.paths().size(); ++i) {
-    // One that is not there holds nothing.
-    if (roots.descriptor(i) < 0) {
-      if (auto noted = missing_.add(0, roots.paths()[i]); !noted) return noted;
-      continue;
-    }
-    auto id = context_.learner.folderID(roots.paths()[i], roots.descriptor(i));
-    if (!id) return fail(id.error());
-    add(roots.paths()[i], *id, Depth::everything);
+  for (const std::string& path : context_.roots.paths()) {
+    if (auto added = addRoot(path); !added) return added;
   }
+  return {};
+}
+
+Result<void> TreeScan::addRoot(const std::string& path) {
+  auto folder = context_.roots.open(path, O_PATH | O_DIRECTORY);
+  // One that is not there holds nothing.
+  if (!folder && (isDisturbance(folder.error()) || isClosedToUs(folder.error()))) {
+    return missing_.add(0, path);
+  }
+  if (!folder) return fail(folder.error());
+  auto id = context_.learner.folderID(path, folder->get());
+  if (!id) return fail(id.error());
+  add(path, *id, Depth::everything);
   return {};
 }
 

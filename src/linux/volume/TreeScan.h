@@ -34,6 +34,8 @@ class TreeScan {
   };
   void add(std::string path, std::uint64_t id, Depth depth);
   [[nodiscard]] Result<void> addRoots();
+  /// One that is not there is noted as missing, with all that it held.
+  [[nodiscard]] Result<void> addRoot(const std::string& path);
   [[nodiscard]] bool isEmpty() const { return pending_.empty(); }
   void clear();
 

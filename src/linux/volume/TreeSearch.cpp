@@ -1,5 +1,6 @@
 #include "linux/volume/TreeSearch.h"
 
+#include <algorithm>
 #include <dirent.h>
 #include <fcntl.h>
 #include <string_view>
@@ -49,7 +50,8 @@ void searchFolder(const MonitoredRoots& roots, const std::string& folderPath,
 
 void searchRoots(const MonitoredRoots& roots, std::set<std::uint64_t>& wanted,
                  const CandidateVisitor& visitor) {
-  std::vector<std::string> pending(roots.paths().rbegin(), roots.paths().rend());
+  std::vector<std::string> pending = roots.paths();
+  std::ranges::reverse(pending);
   while (!pending.empty() && !wanted.empty()) {
     const std::string path = std::move(pending.back());
     pending.pop_back();

@@ -40,6 +40,12 @@ class StoredVolumeIndex final : public VolumeIndex {
 
   ~StoredVolumeIndex() override { thread_.reset(); }
 
+  Result<void> loadFollowedFolders() {
+    if (auto loaded = followed_.load(); !loaded) return loaded;
+    roots_.setFurther(followed_.paths());
+    return {};
+  }
+
   Result<void> loadKeptAttributes() {
     return keptAttributes_.load([this](std::uint64_t fileID) -> Result<bool> {
       auto row = state_->store().objectByFileID(fileID);
@@ -157,6 +163,35 @@ class StoredVolumeIndex final : public VolumeIndex {
     return state_->journal().replay(since, limit);
   }
 
+  Result<void> follow(const std::vector<FollowedFolder>& folders, std::uint64_t version) override {
+    const Ringing ringing(*this);
+    const std::scoped_lock lock(mutex_);
+    const auto difference = followed_.differenceTo(folders, version);
+    if (difference.isEmpty()) return {};
+    const std::uint64_t lastEvent = state_->journal().lastID();
+    // Those that go are told of in the transaction that forgets them; those that come are scanned
+    // by whoever brings the index in step next, in another process if need be.
+    auto done = inTransaction([&]() -> Result<void> {
+      for (const std::string& path : difference.gone) {
+        if (auto left = leaveRoot(path); !left) return left;
+      }
+      for (const std::string& path : difference.relabelled) {
+        if (auto told = tellOfRoot(path); !told) return told;
+      }
+      return followed_.store(folders, version, lastEvent);
+    });
+    if (!done) return done;
+    followed_.adopt(folders, version, lastEvent);
+    roots_.setFurther(followed_.paths());
+    follower_.addRoots(difference.come);
+    return follower_.isInStep() ? follower_.catchUp(transactions()) : Result<void>();
+  }
+
+  std::uint64_t lastEventUnder(std::uint64_t version) override {
+    const std::scoped_lock lock(mutex_);
+    return followed_.lastEventUnder(version);
+  }
+
   JournalBell& bell() override { return bell_; }
   KeptAttributes& keptAttributes() override { return keptAttributes_; }
 
@@ -237,6 +272,18 @@ class StoredVolumeIndex final : public VolumeIndex {
     return {};
   }
 
+  Result<void> leaveRoot(const std::string& path) {
+    auto row = state_->store().objectAt(0, path);
+    if (!row || !*row) return row ? Result<void>() : fail(row.error());
+    return learner_.leave(std::move(**row));
+  }
+
+  Result<void> tellOfRoot(const std::string& path) {
+    auto row = state_->store().objectAt(0, path);
+    if (!row || !*row) return row ? Result<void>() : fail(row.error());
+    return recorder_.changed(**row, {0, path});
+  }
+
   Result<void> find(std::uint64_t fileID, std::optional<std::string>& path) {
     auto found = learner_.find(fileID);
     if (!found) return fail(found.error());
@@ -253,7 +300,8 @@ class StoredVolumeIndex final : public VolumeIndex {
   std::mutex mutex_;
   std::unique_ptr<VolumeState> state_;
   Reserve reserve_{state_->folder()};
-  const MonitoredRoots& roots_;
+  MonitoredRoots& roots_;
+  FollowedFolders followed_{state_->database()};
   IndexedPaths paths_;
   ChangeRecorder recorder_;
   Learner learner_;
@@ -285,7 +333,9 @@ Result<std::unique_ptr<VolumeIndex>> openOnce(MonitoredRoots& roots,
   if (!state) return fail(state.error());
   auto index =
       std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
-  if (auto loaded = index->loadKeptAttributes(); !loaded) return fail(loaded.error());
+  auto loaded = index->loadKeptAttributes();
+  if (loaded) loaded = index->loadFollowedFolders();
+  if (!loaded) return fail(loaded.error());
   return index;
 }
 

@@ -16,6 +16,7 @@
 #include "linux/kernel/ObjectStatus.h"
 #include "linux/volume/EventJournal.h"
 #include "linux/volume/FollowStatus.h"
+#include "linux/volume/FollowedFolders.h"
 #include "linux/volume/JournalBell.h"
 #include "linux/volume/KeptAttributes.h"
 #include "linux/volume/StateFolder.h"
@@ -95,6 +96,15 @@ class VolumeIndex {
   /// no longer kept, or `since` was never given out.
   [[nodiscard]] virtual Result<std::vector<JournalRecord>> events(std::uint64_t since,
                                                                   std::size_t limit) = 0;
+
+  /// Makes these the roots beside the first, as they belong to that version of their list (0: to
+  /// none). What lies in one that comes is told as it is found, what lay in one that goes as gone,
+  /// and the folder itself where its label is another one. They are remembered: the next process
+  /// begins with them.
+  [[nodiscard]] virtual Result<void> follow(const std::vector<FollowedFolder>& folders,
+                                            std::uint64_t version) = 0;
+  /// See `FollowedFolders`.
+  [[nodiscard]] virtual std::uint64_t lastEventUnder(std::uint64_t version) = 0;
 
   /// Tells whoever is added that there are further events.
   [[nodiscard]] virtual JournalBell& bell() = 0;
