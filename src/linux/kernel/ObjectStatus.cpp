@@ -65,10 +65,10 @@ std::int64_t coarseNow() {
   return now.tv_sec * nanosecondsPerSecond + now.tv_nsec;
 }
 
-Result<ObjectStatus> look(int directory, const char* name) {
+Result<ObjectStatus> look(int directory, const char* name, int links = AT_SYMLINK_NOFOLLOW) {
   const std::int64_t now = coarseNow();
   struct statx buffer;
-  const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | (*name == '\0' ? AT_EMPTY_PATH : 0);
+  const int flags = links | AT_NO_AUTOMOUNT | (*name == '\0' ? AT_EMPTY_PATH : 0);
   if (::statx(directory, name, flags, STATX_BASIC_STATS | STATX_BTIME, &buffer) != 0) {
     return fail(Error::posix(errno));
   }
@@ -101,6 +101,10 @@ Result<ObjectStatus> statusOf(const std::string& path) {
   auto parent = openLongPath(AT_FDCWD, splitPath(path).parent, O_PATH | O_DIRECTORY);
   if (!parent) return fail(parent.error());
   return look(parent->get(), splitPath(path).name.c_str());
+}
+
+Result<ObjectStatus> statusOfTarget(const std::string& path) {
+  return look(AT_FDCWD, path.c_str(), 0);
 }
 
 std::optional<std::string> handleAt(int directory, const std::string& name) {

@@ -36,6 +36,9 @@ struct ObjectStatus {
 [[nodiscard]] Result<ObjectStatus> statusAt(int directory, const std::string& name);
 /// The same for an absolute path of any length, also beyond PATH_MAX.
 [[nodiscard]] Result<ObjectStatus> statusOf(const std::string& path);
+/// What an absolute path shorter than PATH_MAX leads to: symbolic links are followed, the final one
+/// too.
+[[nodiscard]] Result<ObjectStatus> statusOfTarget(const std::string& path);
 
 /// The kernel's handle of an object: bytes that name it among all objects, of now and of before,
 /// on its file system. Starts with the handle's type. Nothing where the file system has none.
