@@ -14,6 +14,10 @@ namespace mirabel {
 /// Whether an operation may choose another name where the wanted one is taken.
 enum class Bouncing { refused, allowed };
 
+/// What operations have not finished with may lie beside its place for a while, under a name that
+/// begins like this. It is nobody's item.
+inline constexpr std::string_view unfinishedNamePrefix = ".mirabel-";
+
 /// Changes to the file system, as the host's operations on a file URL; the `vs_` operations take
 /// the URL that they are asked of first. Any thread may call them.
 ///

@@ -96,6 +96,24 @@ class LocalVessel {
                                  const std::optional<std::string>& toParentItemIdentifier,
                                  ItemHandler completionHandler,
                                  std::optional<std::string> formerName = {});
+  /// Deletes for good what was trashed before the date. What has no date of its own, because
+  /// another program put it there, gets the current one, and so goes one period later. The trash
+  /// is walked before the call returns, on the caller's thread, which waits while many deletions
+  /// are under way: so it must not be made from a completion handler. The handler is called on a
+  /// queue of its own once all deletions have ended, and never with an error: what could not be
+  /// deleted is logged, and qualifies the next time again.
+  void _removeTrashedItemsOlderThanDate(const Date& date, ErrorHandler completionHandler);
+
+  /// What lies directly in a trash folder, hidden names among it.
+  struct TrashedEntry {
+    URL url;
+    /// Nothing where it has none; an error for one that is no date.
+    Result<std::optional<Date>> trashDate;
+  };
+  /// Calls the visitor for everything in the trash folders of the app libraries and, last, of the
+  /// document storage, before it returns. A folder that can't be read is passed over. Memory does
+  /// not grow with the number of entries.
+  void forEachTrashedEntry(const std::function<void(const TrashedEntry&)>& visitor) const;
 
   // The user's metadata, each kept in an attribute of the file; nothing given clears it. A write
   // that fails leaves the attribute as it was, with a POSIX error.
@@ -145,6 +163,14 @@ class LocalVessel {
   [[nodiscard]] std::optional<URL> providedParent(std::string_view identifier) const;
   [[nodiscard]] std::optional<URL> putBackFolder(const LocalItem& item) const;
   [[nodiscard]] std::optional<URL> appLibraryRoot(const LocalItem& item) const;
+
+  struct Removals;
+  [[nodiscard]] Result<std::optional<Date>> trashDateOf(const URL& url) const;
+  void removeIfTrashedBefore(const Date& date, const TrashedEntry& entry,
+                             const std::shared_ptr<Removals>& removals);
+  void deleteTrashedItem(std::string_view identifier, const URL& entry,
+                         ErrorHandler completionHandler);
+  void deleteItem(const URL& item, ErrorHandler completionHandler);
 
   [[nodiscard]] ItemResult storeLastUsedDate(const std::optional<Date>& date,
                                              std::string_view identifier) const;

@@ -70,10 +70,14 @@ void LocalVessel::deleteItemWithIdentifier(std::string_view identifier,
   const LogSection section("delete item " + quoted(identifier));
   const auto item = _urlForItemWithPersistentIdentifier(identifier);
   if (!item) return completionHandler(Error::nonExistentItem(identifier));
+  deleteItem(*item, std::move(completionHandler));
+}
+
+void LocalVessel::deleteItem(const URL& item, ErrorHandler completionHandler) {
   underway_.enter();
   platform_.operations.vs_deleteWithCompletionHandler(
-      *item, [group = underway_, completionHandler = std::move(completionHandler)](
-                 std::optional<Error> error) mutable {
+      item, [group = underway_,
+             completionHandler = std::move(completionHandler)](std::optional<Error> error) mutable {
         completionHandler(std::move(error));
         group.leave();
       });

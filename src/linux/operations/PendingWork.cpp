@@ -8,6 +8,7 @@
 
 #include "foundation/Log.h"
 #include "linux/kernel/LongPath.h"
+#include "platform/FileOperations.h"
 
 namespace mirabel {
 namespace {
@@ -17,12 +18,15 @@ constexpr const char* damagedFileName = "pending.damaged";
 constexpr const char* newFileName = "pending.new";
 // More than that was not written by this program.
 constexpr std::size_t largestFile = 16u << 20;
-constexpr std::string_view keptPrefix = ".mirabel-kept-";
+
+std::string keptPrefix() {
+  return std::string(unfinishedNamePrefix) + "kept-";
+}
 
 std::string removedPrefix() {
   std::string id = UUID::random().description();
   std::erase(id, '-');
-  return ".mirabel-" + id.substr(0, 16) + "-";
+  return std::string(unfinishedNamePrefix) + id.substr(0, 16) + "-";
 }
 
 Result<Data> readFile(int folder) {
@@ -115,7 +119,7 @@ Result<std::string> PendingWork::temporaryName(const std::string& path) {
 
 std::string PendingWork::hiddenName() {
   const std::scoped_lock lock(mutex_);
-  return nextName(std::string(keptPrefix) + prefix_.substr(std::string_view(".mirabel-").size()));
+  return nextName(keptPrefix() + prefix_.substr(unfinishedNamePrefix.size()));
 }
 
 Result<PendingFolder> PendingWork::folderAt(const std::string& path) {

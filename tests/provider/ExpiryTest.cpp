@@ -1,0 +1,272 @@
+#include <algorithm>
+#include <bit>
+#include <cerrno>
+#include <functional>
+#include <future>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <limits>
+#include <string>
+#include <string_view>
+#include <thread>
+#include <vector>
+
+#include "foundation/KeyedArchive.h"
+#include "items/AttributeNames.h"
+#include "provider/ProviderFixture.h"
+
+namespace mirabel::testing {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsSupersetOf;
+
+// Fractions that archives hold as they are.
+constexpr std::uint32_t quarter = 250'000'000;
+constexpr Date reference{1'760'000'000, 2 * quarter};
+constexpr Date longAgo{1'000'000'000, 0};
+
+/// The archive of a date with other eight bytes in place of the date's.
+Data archiveOfSeconds(double secondsSince2001) {
+  constexpr double marker = 123'456'789.0;
+  const auto bytesOf = [](double number) {
+    Data bytes;
+    for (int shift = 56; shift >= 0; shift -= 8)
+      bytes.push_back(static_cast<std::uint8_t>(std::bit_cast<std::uint64_t>(number) >> shift));
+    return bytes;
+  };
+  Data archive = keyedarchive::archiveDate(*Date::fromReferenceSeconds(marker)).value();
+  const auto found = std::ranges::search(archive, bytesOf(marker));
+  EXPECT_FALSE(found.empty()) << "dates are archived in another way";
+  std::ranges::copy(bytesOf(secondsSince2001), found.begin());
+  return archive;
+}
+
+class ExpiryTest : public ProviderFixture {
+ protected:
+  ExpiryTest() {
+    fake.volume.makeFolder(trash);
+    fake.volume.makeFolder(libraryTrash);
+  }
+
+  void setDate(const std::string& path, const Data& payload) {
+    fake.volume.at(path).attributes[std::string(attributename::trashDate)] = payload;
+  }
+  std::string trashed(const std::string& path, const Date& date = longAgo) {
+    fake.volume.writeFile(path, "x");
+    setDate(path, keyedarchive::archiveDate(date).value());
+    return path;
+  }
+  std::optional<Date> dateAt(const std::string& path) {
+    const auto& attributes = fake.volume.at(path).attributes;
+    const auto found = attributes.find(attributename::trashDate);
+    if (found == attributes.end()) return {};
+    const auto date = keyedarchive::unarchiveDate(found->second);
+    return date ? std::optional(*date) : std::nullopt;
+  }
+
+  using Answer = std::future<std::optional<Error>>;
+  Answer begin(const Date& date = reference) {
+    const auto answer = std::make_shared<std::promise<std::optional<Error>>>();
+    // A second call would throw.
+    vessel->_removeTrashedItemsOlderThanDate(
+        date, [answer](std::optional<Error> error) { answer->set_value(std::move(error)); });
+    return answer->get_future();
+  }
+  void expire(const Date& date = reference) { EXPECT_EQ(begin(date).get(), std::nullopt); }
+  static bool isReady(const Answer& answer) {
+    return answer.wait_for(std::chrono::seconds(0)) == std::future_status::ready;
+  }
+
+  std::vector<LogLine> errors() const {
+    auto lines = log.messages();
+    std::erase_if(lines, [](const LogLine& line) { return line.level != LogLevel::error; });
+    return lines;
+  }
+
+  const std::string trash = "/home/me/Documents/.Trash";
+  const std::string libraryTrash = "/apps/draw/Documents/.Trash";
+};
+
+TEST_F(ExpiryTest, OnlyWhatWasTrashedStrictlyBeforeGoes) {
+  const struct {
+    const char* name;
+    Date date;
+    bool goes;
+  } cases[] = {
+      {"just before", {reference.seconds, quarter}, true},
+      {"at it", reference, false},
+      {"just after", {reference.seconds, 3 * quarter}, false},
+      {"in the first year", {Date::earliest.seconds + 1, 0}, true},
+      {"in the last year", {Date::latest.seconds - 1, 0}, false},
+      {".hidden", longAgo, true},
+      {".mirabel-0123456789ABCDEF-1", longAgo, false},  // a removal that is under way
+  };
+  for (const auto& c : cases)
+    trashed(trash + "/" + c.name, c.date);
+  expire();
+  for (const auto& c : cases) {
+    EXPECT_EQ(existsAt(trash + "/" + c.name), !c.goes) << c.name;
+    EXPECT_TRUE(c.goes || dateAt(trash + "/" + c.name) == c.date) << c.name;
+  }
+  EXPECT_THAT(errors(), ElementsAre());
+}
+
+TEST_F(ExpiryTest, WithoutAReadableDateAnEntryIsStampedAndGoesOnePeriodLater) {
+  const std::string missing = "can't find trash date";
+  const std::string unreadable = "can't unarchive xattr data";
+  const struct {
+    std::string name;
+    std::optional<Data> payload;
+    const std::string& why;
+  } cases[] = {
+      {"none", {}, missing},
+      {".hidden", {}, missing},
+      {"empty", Data(), unreadable},
+      {"text", dataFromString("2020-01-01"), unreadable},
+      {"a number", keyedarchive::archiveNumber(Number::of(1.0)).value(), unreadable},
+      {"a string", keyedarchive::archiveString("2020-01-01").value(), unreadable},
+      {"not a number", archiveOfSeconds(std::numeric_limits<double>::quiet_NaN()), unreadable},
+      {"minus infinity", archiveOfSeconds(-std::numeric_limits<double>::infinity()), unreadable},
+      {"before the calendar", archiveOfSeconds(-1e18), unreadable},
+  };
+  for (const auto& c : cases) {
+    fake.volume.writeFile(trash + "/" + c.name);
+    if (c.payload) setDate(trash + "/" + c.name, *c.payload);
+  }
+  expire();
+  const Date now = fake.clock.now();
+  for (const auto& c : cases) {
+    const std::string path = trash + "/" + c.name;
+    EXPECT_EQ(dateAt(path), now) << c.name;
+    EXPECT_THAT(log.messages(),
+                Contains(debug(c.why + " for URL \"" + path + "\"; set current date")));
+  }
+  expire(now);
+  EXPECT_TRUE(existsAt(trash + "/none"));
+  expire({now.seconds + 1, 0});
+  for (const auto& c : cases)
+    EXPECT_FALSE(existsAt(trash + "/" + c.name)) << c.name;
+}
+
+TEST_F(ExpiryTest, WhatATrashedFolderHoldsIsNeitherStampedNorJudged) {
+  fake.volume.makeFolder(trash + "/kept");
+  setDate(trash + "/kept", keyedarchive::archiveDate(reference).value());
+  trashed(trash + "/kept/old");
+  fake.volume.writeFile(trash + "/kept/new");
+  fake.volume.makeFolder(trash + "/gone");
+  setDate(trash + "/gone", keyedarchive::archiveDate(longAgo).value());
+  fake.volume.writeFile(trash + "/gone/inside");
+  trashed(fake.path("a.txt"));  // not in the trash at all
+  expire();
+  EXPECT_TRUE(existsAt(trash + "/kept/old"));
+  EXPECT_EQ(dateAt(trash + "/kept/new"), std::nullopt);
+  EXPECT_FALSE(existsAt(trash + "/gone"));
+  EXPECT_TRUE(exists("a.txt"));
+}
+
+TEST_F(ExpiryTest, TheTrashesOfLibrariesComeFirstAndEachStepSaysWhatItDoes) {
+  const std::string ofLibrary = trashed(libraryTrash + "/a");
+  const std::string ofStorage = trashed(trash + "/b");
+  const std::string first = idAt(ofLibrary);
+  const std::string second = idAt(ofStorage);
+  log.clear();
+  expire();
+  EXPECT_THAT(log.sectionLabels(),
+              ElementsAre("remove trashed items older than 2025-10-09T08:53:20.5Z",
+                          "fetching item identifier for \"" + ofLibrary + "\"",
+                          "delete item \"" + first + "\"", "fetching URL for \"" + first + "\"",
+                          "fetching item identifier for \"" + ofStorage + "\"",
+                          "delete item \"" + second + "\"", "fetching URL for \"" + second + "\""));
+  const std::string remove = " was trashed before reference date, let's remove it";
+  EXPECT_THAT(log.messages(),
+              ElementsAre(debug("found " + first), debug("item " + first + remove),
+                          debug("found file://" + ofLibrary), debug("found " + second),
+                          debug("item " + second + remove), debug("found file://" + ofStorage),
+                          debug("wait until all deletions are complete")));
+}
+
+TEST_F(ExpiryTest, TheHostHearsOnceAllDeletionsHaveReported) {
+  const std::string a = trashed(trash + "/a");
+  const std::string b = trashed(trash + "/b");
+  fake.reports.hold();
+  Answer answer = begin();
+  EXPECT_EQ(fake.reports.held(), 2U);
+  EXPECT_FALSE(isReady(answer));
+  fake.reports.release();
+  EXPECT_EQ(answer.get(), std::nullopt);
+  // Nor does the provider go before.
+  trashed(trash + "/c");
+  fake.reports.hold();
+  answer = begin();
+  std::thread releasing([&] { fake.reports.release(); });
+  vessel.reset();
+  EXPECT_TRUE(isReady(answer));
+  releasing.join();
+}
+
+TEST_F(ExpiryTest, AFullTrashIsRemovedWithAFewDeletionsAtATime) {
+  constexpr int count = 1000;
+  for (int i = 0; i < count; ++i)
+    trashed(trash + "/" + std::to_string(i));
+  fake.reports.hold();
+  auto whole = std::async(std::launch::async, [&] { expire(); });
+  while (fake.faults.calls(Op::deleteItem) < 64)
+    std::this_thread::yield();
+  EXPECT_LE(fake.reports.held(), 64U);
+  fake.reports.release();
+  whole.get();
+  EXPECT_TRUE(fake.volume.at(trash).entries.empty());
+}
+
+TEST_F(ExpiryTest, WhatCannotBeDeletedStaysForTheNextTime) {
+  const std::string kept = trashed(trash + "/a");
+  const std::string identifier = idAt(kept);
+  trashed(trash + "/b");
+  log.clear();
+  fake.faults.fail(Op::deleteItem, Error::posix(EACCES));
+  expire();
+  EXPECT_THAT(errors(), ElementsAre(error("can't remove item " + identifier + "; " +
+                                          Error::posix(EACCES).description())));
+  EXPECT_EQ(dateAt(kept), longAgo);
+  EXPECT_FALSE(existsAt(trash + "/b"));
+  clear();
+  fake.faults.fail(Op::readValues, Error::posix(EIO), 1, 100);
+  fake.faults.fail(Op::openObject, Error::posix(EIO), 1, 100);
+  expire();
+  EXPECT_THAT(errors(), Contains(error("identifier lookup failed for URL \"" + kept + "\"")));
+  clear();
+  expire();
+  EXPECT_FALSE(existsAt(kept));
+}
+
+TEST_F(ExpiryTest, AHardLinkInTheDocumentsOutlivesTheOneInTheTrash) {
+  // The identifier leads to the name that comes first.
+  fake.volume.link(fake.path("a.txt"), trash + "/a.txt");
+  setDate(trash + "/a.txt", keyedarchive::archiveDate(longAgo).value());
+  expire();
+  EXPECT_TRUE(exists("a.txt"));
+  EXPECT_FALSE(existsAt(trash + "/a.txt"));
+}
+
+TEST_F(ExpiryTest, WhicheverCallFailsTheHostIsToldAndNothingYoungGoes) {
+  const std::string library = trashed(libraryTrash + "/old");
+  const std::string young = trashed(trash + "/young", reference);
+  for (std::size_t n = 1, calls = n; calls >= n; ++n) {
+    ASSERT_LT(n, 500U);
+    trashed(library);
+    trashed(trash + "/old");
+    fake.faults.reset();
+    fake.faults.failCall(n, Error::posix(EIO));
+    expire();
+    calls = fake.faults.calls();
+    EXPECT_TRUE(existsAt(young)) << n;
+    EXPECT_TRUE(exists("a.txt")) << n;
+    // What was not recognised for old was stamped at most.
+    EXPECT_TRUE(!existsAt(trash + "/old") || !existsAt(library)) << n;
+  }
+}
+
+}  // namespace
+}  // namespace mirabel::testing
