@@ -59,13 +59,23 @@ void addFileCommands(Adder& add, ItemArguments& arguments) {
   CLI::App& remove = add.command("rm", "Delete items for good, folders with everything in them");
   Adder::items(remove, arguments.remove.items);
   remove.add_flag("--dry-run", arguments.remove.isDryRun, "Say what would be deleted");
+}
 
+void addTrashCommands(Adder& add, ItemArguments& arguments) {
   Adder::items(add.command("trash", "Move items to the trash"), arguments.trash);
 
   CLI::App& restore = add.command("restore", "Put items in the trash back where they came from");
   Adder::items(restore, arguments.restore.items);
   restore.add_option("--to", arguments.restore.parent, "Put them into this folder instead")
       ->type_name("ITEM");
+
+  CLI::App& expire = add.command("expire", "Delete for good what has been in the trash for long");
+  expire
+      .add_option("--older-than", arguments.expire.olderThan,
+                  "A day, a moment in RFC 3339 form, or an age: 30d, 12h, 2w, 45m, 90s")
+      ->required()
+      ->type_name("DATE|AGE");
+  expire.add_flag("--dry-run", arguments.expire.isDryRun, "Say what would be deleted");
 }
 
 void addMetadataCommands(Adder& add, ItemArguments& arguments) {
@@ -94,6 +104,7 @@ void addMetadataCommands(Adder& add, ItemArguments& arguments) {
 void addItemCommands(CLI::App& app, ItemArguments& arguments, const std::string& footer) {
   Adder add(app, footer);
   addFileCommands(add, arguments);
+  addTrashCommands(add, arguments);
   addMetadataCommands(add, arguments);
 }
 
@@ -106,6 +117,7 @@ std::optional<ExitCode> runItemCommand(const CLI::App& app, Program& program,
   if (app.got_subcommand("rm")) return runRemove(program, arguments.remove);
   if (app.got_subcommand("trash")) return runTrash(program, arguments.trash);
   if (app.got_subcommand("restore")) return runRestore(program, arguments.restore);
+  if (app.got_subcommand("expire")) return runExpire(program, arguments.expire);
   if (app.got_subcommand("tag")) return runTag(program, arguments.tag);
   if (app.got_subcommand("favorite")) return runFavorite(program, arguments.favorite);
   if (app.got_subcommand("used")) return runUsed(program, arguments.used);

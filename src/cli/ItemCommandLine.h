@@ -21,6 +21,7 @@ struct ItemArguments {
   RemoveOptions remove;
   std::vector<std::string> trash;
   RestoreOptions restore;
+  ExpireOptions expire;
   TagOptions tag;
   FavoriteOptions favorite;
   UsedOptions used;

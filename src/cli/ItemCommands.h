@@ -50,6 +50,12 @@ struct RestoreOptions {
 };
 ExitCode runRestore(Program& program, const RestoreOptions& options);
 
+struct ExpireOptions {
+  std::string olderThan;  ///< see `referenceDateFrom`
+  bool isDryRun = false;
+};
+ExitCode runExpire(Program& program, const ExpireOptions& options);
+
 struct TagOptions {
   std::string item;
   std::vector<std::string> labels;

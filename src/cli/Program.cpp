@@ -53,6 +53,12 @@ ExitCode Program::reportUsage(std::string_view text) {
   return code;
 }
 
+ExitCode Program::reportFailed(std::string_view text) {
+  constexpr ExitCode code = ExitCode::failed;
+  reportFailure(streams_.err, options_.json, "mirabel", static_cast<int>(code), text);
+  return code;
+}
+
 void reportFailure(std::ostream& err, bool asJSON, std::string_view domain, std::int64_t code,
                    std::string_view message) {
   if (!asJSON) {

@@ -57,6 +57,8 @@ class Program {
   ExitCode report(const Error& error, std::string_view what);
   /// The same for an argument that is not what it should be; answers `ExitCode::usage`.
   ExitCode reportUsage(std::string_view text);
+  /// The same for what no single error tells; answers `ExitCode::failed`.
+  ExitCode reportFailed(std::string_view text);
 
  private:
   GlobalOptions options_;
