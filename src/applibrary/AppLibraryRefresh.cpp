@@ -63,13 +63,15 @@ Result<std::vector<BundleProxy>> retrieveAppLibraries(ApplicationRegistry& regis
   return records;
 }
 
-bool refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache) {
+bool refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache,
+                      std::optional<std::vector<BundleProxy>>* latest) {
   const auto cannotRefresh = [](const Error& error) {
     logError("can't refresh app libraries; " + error.description());
     return false;
   };
   const auto records = retrieveAppLibraries(registry);
   if (!records) return cannotRefresh(records.error());
+  if (latest != nullptr) *latest = *records;
   const auto previous = mainCache.load();
   const bool isUnchanged =
       areIdentical(*records, previous ? previous->records : std::vector<BundleProxy>());

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <vector>
 
 #include "applibrary/LocalAppLibraryCache.h"
@@ -15,7 +16,9 @@ namespace mirabel {
 
 /// Writes what the registry tells into the main cache where that differs from what the cache
 /// holds, and answers whether it did. A failure of either is logged and leaves file and token.
-/// One call at a time in a process; other processes may do the same.
-bool refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache);
+/// One call at a time in a process; other processes may do the same. `latest`, if given, gets what
+/// the registry told, if it told anything: the cache may hold display names of before.
+bool refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache,
+                      std::optional<std::vector<BundleProxy>>* latest = nullptr);
 
 }  // namespace mirabel

@@ -153,6 +153,15 @@ std::shared_ptr<LocalAppLibraryItem> LocalAppLibraryManager::appLibraryWithItemI
   return library == nullptr ? nullptr : itemOfNow(library->record, library->item);
 }
 
+std::vector<std::pair<URL, BundleProxy>> LocalAppLibraryManager::foldersAndRecords() const {
+  const Version version = current();
+  std::vector<std::pair<URL, BundleProxy>> folders;
+  folders.reserve(version->libraries().size());
+  for (const AppLibraryContent::Library& library : version->libraries())
+    folders.emplace_back(URL::fileURL(library.item->fileURL().path()), library.record);
+  return folders;
+}
+
 std::optional<BundleProxy> LocalAppLibraryManager::bundleProxyWithRootURL(const URL& url) const {
   const Version version = current();
   const auto* library = version->atRootURL(url);

@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "applibrary/AppLibraryContent.h"
@@ -49,6 +50,8 @@ class LocalAppLibraryManager final : public AppLibraryRoots, public AppLibraryOw
   /// The same for one; null for an identifier that no app library has, or where it is gone.
   [[nodiscard]] std::shared_ptr<LocalAppLibraryItem> appLibraryWithItemIdentifier(
       std::string_view identifier) const;
+  /// Folders as they can be opened, with the records that they belong to, in their order.
+  [[nodiscard]] std::vector<std::pair<URL, BundleProxy>> foldersAndRecords() const;
   /// The record of the library whose folder this is.
   [[nodiscard]] std::optional<BundleProxy> bundleProxyWithRootURL(const URL& url) const;
 

@@ -1,6 +1,10 @@
 #include "applibrary/MRBAppLibraryManager.h"
 
+#include <utility>
+#include <vector>
+
 #include "applibrary/AppLibraryRefresh.h"
+#include "foundation/Log.h"
 
 namespace mirabel {
 
@@ -10,7 +14,31 @@ MRBAppLibraryManager::MRBAppLibraryManager(const Platform& platform)
       shared_(platform, caches_, LocalAppLibraryCacheSource::workingSet) {}
 
 bool MRBAppLibraryManager::refreshFromRegistry() {
-  return inBackground([&] { return refreshMainCache(platform_.applications, caches_.main); });
+  return inBackground([&] {
+    std::optional<std::vector<BundleProxy>> latest;
+    const bool hasChanged = refreshMainCache(platform_.applications, caches_.main, &latest);
+    if (!latest) return hasChanged;
+    latestNames_.clear();
+    for (BundleProxy& record : *latest) {
+      if (!record.dataContainerURL || !record.localizedName) continue;
+      latestNames_.emplace(record.dataContainerURL->path(), *std::move(record.localizedName));
+    }
+    return hasChanged;
+  });
+}
+
+void MRBAppLibraryManager::followLibraries(EventStreams& events) {
+  backgroundQueue_.sync([&] {
+    std::vector<FollowedLibrary> libraries;
+    for (auto& [folder, record] : shared_.foldersAndRecords()) {
+      const auto latest = latestNames_.find(record.dataContainerURL->path());
+      libraries.push_back({folder, latest != latestNames_.end()
+                                       ? latest->second
+                                       : std::move(record.localizedName).value_or("")});
+    }
+    if (auto done = events.followLibraries(libraries, shared_.versionToken()); !done)
+      logError("can't follow the app libraries; " + done.error().description());
+  });
 }
 
 bool MRBAppLibraryManager::upgradeFromMainCache(VesselChangeObserver* observer) {

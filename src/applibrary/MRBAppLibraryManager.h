@@ -1,7 +1,9 @@
 #pragma once
 
 #include <functional>
+#include <map>
 #include <optional>
+#include <string>
 
 #include "applibrary/LocalAppLibraryCache.h"
 #include "applibrary/LocalAppLibraryManager.h"
@@ -9,6 +11,7 @@
 #include "identity/AppLibraryRoots.h"
 #include "items/AppLibraryOwners.h"
 #include "platform/EnumerationObservers.h"
+#include "platform/EventStreams.h"
 #include "platform/Platform.h"
 
 namespace mirabel {
@@ -28,6 +31,10 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   /// Has the shared manager follow the main cache; whether it changed.
   bool upgradeFromMainCache(VesselChangeObserver* observer = nullptr);
 
+  /// Has the history follow the libraries of the shared manager, under the names that the registry
+  /// had for them at the last refresh. A failure is logged; the next call tries again.
+  void followLibraries(EventStreams& events);
+
   [[nodiscard]] LocalAppLibraryManager& shared() { return shared_; }
   [[nodiscard]] AppLibraryCaches& caches() { return caches_; }
   [[nodiscard]] const SerialQueue& backgroundQueue() const { return backgroundQueue_; }
@@ -45,6 +52,7 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   Platform platform_;
   AppLibraryCaches caches_;
   LocalAppLibraryManager shared_;
+  std::map<std::string, std::string> latestNames_;  // by path of the container; background queue
   SerialQueue backgroundQueue_{"mirabel.app-library.background"};
 };
 

@@ -16,7 +16,9 @@ namespace {
 /// One page, as the enumerator hands it over.
 class Page final : public VesselEnumerationObserver {
  public:
-  void didEnumerateItems(const VesselItems& enumerated) override { items = enumerated; }
+  void didEnumerateItems(const VesselItems& enumerated) override {
+    items.insert(items.end(), enumerated.begin(), enumerated.end());
+  }
   void finishEnumeratingUpToPage(const std::optional<Data>& nextPage) override { next = nextPage; }
   void finishEnumeratingWithError(const Error& failure) override { error = failure; }
 

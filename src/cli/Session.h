@@ -7,6 +7,7 @@
 #include <string>
 #include <string_view>
 
+#include "applibrary/MRBAppLibraryManager.h"
 #include "foundation/Error.h"
 #include "fs/FSChangesEnumerator.h"
 #include "host/HostTrash.h"
@@ -31,6 +32,7 @@ class Session {
   [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
   [[nodiscard]] LocalVessel& provider() { return *provider_; }
   [[nodiscard]] HostTrash& trash() { return *trash_; }
+  [[nodiscard]] MRBAppLibraryManager& libraries() { return *libraries_; }
   /// Lists the container and tells its changes, when it is asked. Errors: see `LocalVessel`.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(
       std::string_view container, LiveUpdates liveUpdates = LiveUpdates::unwanted) {
@@ -42,8 +44,7 @@ class Session {
  private:
   Session() = default;
   std::unique_ptr<LinuxPlatform> platform_;
-  NoAppLibraryRoots roots_;
-  NoAppLibraryOwners owners_;
+  std::unique_ptr<MRBAppLibraryManager> libraries_;
   LoggingDiagnosticReporter diagnostics_;
   std::unique_ptr<FileObjectURLs> identity_;
   std::unique_ptr<FSChangesEnumerations> enumerations_;

@@ -49,7 +49,7 @@ GatherPage::GatherPage(const ItemContext& context, const GatherScope& scope)
       scope_(scope),
       hiddenTest_(scope.urls, context.platform.resources),
       look_(context, hiddenTest_),
-      names_(context, scope.urls,
+      names_(context, scope.isRecursive() ? scope.urls : std::vector{scope.urls.front()},
              scope.isRecursive() ? LinkNames::Depth::everything : LinkNames::Depth::children,
              hiddenTest_) {}
 

@@ -19,7 +19,7 @@ namespace mirabel {
 /// What a listing walks for a container.
 struct GatherScope {
   std::string container;
-  std::vector<URL> urls;  ///< the monitored folders, not empty
+  std::vector<URL> urls;  ///< the monitored folders, not empty; of the root, the first is listed
 
   [[nodiscard]] bool isWorkingSet() const;
   [[nodiscard]] bool isAllDirectories() const;

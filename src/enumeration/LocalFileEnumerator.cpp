@@ -69,13 +69,16 @@ void LocalFileEnumerator::startNotifier() {
   });
 }
 
+void LocalFileEnumerator::stopNotifier() {
+  if (!notifier_) return;
+  SerialQueue queue = notifier_->reader()->streamQueue();
+  queue.async([reader = notifier_->reader()] {
+    if (reader->isRunning()) reader->stop();
+  });
+}
+
 void LocalFileEnumerator::invalidate() {
-  if (notifier_) {
-    SerialQueue queue = notifier_->reader()->streamQueue();
-    queue.async([reader = notifier_->reader()] {
-      if (reader->isRunning()) reader->stop();
-    });
-  }
+  stopNotifier();
   std::set<std::shared_ptr<ChangesEnumeration>> running;
   {
     const std::lock_guard lock(mutex_);

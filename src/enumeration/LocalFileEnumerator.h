@@ -43,6 +43,8 @@ class LocalFileEnumerator final : public VesselEnumerator,
 
   /// Makes the notifier the delegate of its reader, and submits the start of that.
   void startNotifier();
+  /// Submits the end of that. Enumerations of changes go on.
+  void stopNotifier();
 
   [[nodiscard]] const std::string& container() const { return scope_.container; }
   [[nodiscard]] const URL& enumeratedItemURL() const { return scope_.urls.front(); }

@@ -82,7 +82,7 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
       everywhereSight_(rootsOf(context, roots), context.platform.resources),
       look_(context_, everywhereSight_),
       containerNames_(
-          context_, urls_,
+          context_, isFolderContainer() ? std::vector{urls_.front()} : urls_,
           isFolderContainer() ? LinkNames::Depth::children : LinkNames::Depth::everything,
           containerSight_),
       everywhereNames_(context_, rootsOf(context, roots), LinkNames::Depth::everything,
@@ -110,7 +110,8 @@ void FSChangesEnumerator::stop() {
 void FSChangesEnumerator::startReader(FSEventReaderMode mode, std::uint64_t since) {
   passedEventID_ = since;
   const auto reader =
-      FSEventReader::create(context_, events_, urls_, since, mode, Verbosity::quiet);
+      FSEventReader::create(context_, events_, urls_, since, mode, Verbosity::quiet,
+                            eventScopeOf(container_));
   SerialQueue readerQueue = reader->streamQueue();
   {
     const std::lock_guard lock(mutex_);
@@ -354,7 +355,7 @@ std::optional<std::string> FSChangesEnumerator::reasonToIgnore(const LocalItem& 
   if (identifier == VesselRootContainerItemIdentifier || identifier == container_) {
     return "; item is the container";
   }
-  if (container_ == VesselWorkingSetContainerItemIdentifier && identifier.starts_with('#')) {
+  if (!isFolderContainer() && identifier.starts_with('#')) {
     return "; app library are not indexed";
   }
   if (container_ == VesselAllDirectoriesContainerItemIdentifier &&

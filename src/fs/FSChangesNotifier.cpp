@@ -18,7 +18,8 @@ std::shared_ptr<FSChangesNotifier> FSChangesNotifier::create(
     return nullptr;
   }
   auto reader = FSEventReader::create(context, events, std::move(urls), events.currentEventID(),
-                                      FSEventReaderMode::pathBased, Verbosity::verbose);
+                                      FSEventReaderMode::pathBased, Verbosity::verbose,
+                                      eventScopeOf(container));
   return std::shared_ptr<FSChangesNotifier>(
       new FSChangesNotifier(context.platform, diagnostics, std::move(container), std::move(reader),
                             *deviceUUID, options));

@@ -29,14 +29,22 @@ void FSEventReaderDelegate::didDropEvent(FSEventReader&, const FileSystemEvent&,
 std::shared_ptr<FSEventReader> FSEventReader::create(const ItemContext& context,
                                                      EventStreams& events, std::vector<URL> urls,
                                                      std::uint64_t sinceFSEventID,
-                                                     FSEventReaderMode mode, Verbosity verbosity) {
+                                                     FSEventReaderMode mode, Verbosity verbosity,
+                                                     FSEventScope scope) {
   return std::shared_ptr<FSEventReader>(
-      new FSEventReader(context, events, std::move(urls), sinceFSEventID, mode, verbosity));
+      new FSEventReader(context, events, std::move(urls), sinceFSEventID, mode, verbosity, scope));
+}
+
+FSEventScope eventScopeOf(std::string_view container) {
+  const bool isOfSeveral = container == VesselRootContainerItemIdentifier ||
+                           container == VesselWorkingSetContainerItemIdentifier ||
+                           container == VesselAllDirectoriesContainerItemIdentifier;
+  return isOfSeveral ? FSEventScope::everything : FSEventScope::folders;
 }
 
 FSEventReader::FSEventReader(const ItemContext& context, EventStreams& events,
                              std::vector<URL> urls, std::uint64_t sinceFSEventID,
-                             FSEventReaderMode mode, Verbosity verbosity)
+                             FSEventReaderMode mode, Verbosity verbosity, FSEventScope scope)
     : context_(context),
       events_(events),
       streamQueue_("mirabel.fsevents-stream"),
@@ -44,6 +52,7 @@ FSEventReader::FSEventReader(const ItemContext& context, EventStreams& events,
       urls_(std::move(urls)),
       mode_(mode),
       verbosity_(verbosity),
+      scope_(scope),
       hiddenTest_(urls_, context.platform.resources),
       look_(context_, hiddenTest_) {}
 
@@ -102,12 +111,17 @@ Result<std::unique_ptr<EventStream>> FSEventReader::createStream() {
     return events_.createRelativeToDevice(device, {"/.docid"}, lastProcessedFSEventID_, latency,
                                           creationFlags, std::move(callback));
   }
+  return events_.createForPaths(streamPaths(), lastProcessedFSEventID_, latency, creationFlags,
+                                std::move(callback));
+}
+
+std::vector<std::string> FSEventReader::streamPaths() const {
+  if (scope_ == FSEventScope::everything) return {"/"};
   std::vector<std::string> paths;
   paths.reserve(urls_.size());
   for (const URL& url : urls_)
     paths.push_back(url.path());
-  return events_.createForPaths(std::move(paths), lastProcessedFSEventID_, latency, creationFlags,
-                                std::move(callback));
+  return paths;
 }
 
 void FSEventReader::processBatch(std::span<const FileSystemEvent> events) {

@@ -6,6 +6,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "foundation/SerialQueue.h"
@@ -20,6 +21,11 @@ struct EventPlace;
 enum class FSEventReaderMode { pathBased = 0, docIDBased = 1 };
 
 enum class Verbosity { quiet, verbose };
+/// Which events a reader hears of: those at and below its folders, or all there are, so that it is
+/// told as well of what lay in folders that are its own no more.
+enum class FSEventScope { folders, everything };
+/// The containers that hold app libraries, which come and go, hear of everything.
+[[nodiscard]] FSEventScope eventScopeOf(std::string_view container);
 
 /// Replays the event history of monitored folders from an event ID and goes on with what happens,
 /// turning each event into one call on its delegate. What happened to a thing is decided by
@@ -31,7 +37,8 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
   /// What `context` refers to and `events` outlive the reader. Any thread.
   [[nodiscard]] static std::shared_ptr<FSEventReader> create(
       const ItemContext& context, EventStreams& events, std::vector<URL> urls,
-      std::uint64_t sinceFSEventID, FSEventReaderMode mode, Verbosity verbosity);
+      std::uint64_t sinceFSEventID, FSEventReaderMode mode, Verbosity verbosity,
+      FSEventScope scope = FSEventScope::folders);
   ~FSEventReader();
   FSEventReader(const FSEventReader&) = delete;
   FSEventReader& operator=(const FSEventReader&) = delete;
@@ -71,9 +78,11 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
   using ItemResult = Result<std::shared_ptr<LocalItem>>;
 
   FSEventReader(const ItemContext& context, EventStreams& events, std::vector<URL> urls,
-                std::uint64_t sinceFSEventID, FSEventReaderMode mode, Verbosity verbosity);
+                std::uint64_t sinceFSEventID, FSEventReaderMode mode, Verbosity verbosity,
+                FSEventScope scope);
 
   [[nodiscard]] Result<std::unique_ptr<EventStream>> createStream();
+  [[nodiscard]] std::vector<std::string> streamPaths() const;
   void processBatch(std::span<const FileSystemEvent> events);
   void process(std::size_t index, const FileSystemEvent& event, const EventPlace& place);
   [[nodiscard]] bool processStreamFlags(const FileSystemEvent& event);
@@ -97,6 +106,7 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
   std::vector<URL> urls_;
   FSEventReaderMode mode_;
   Verbosity verbosity_;
+  FSEventScope scope_;
   std::weak_ptr<FSEventReaderDelegate> delegate_;
   bool hasToldEnough_ = false;
   HiddenTest hiddenTest_;

@@ -20,8 +20,8 @@ using VesselItems = std::vector<std::shared_ptr<LocalItem>>;
 inline constexpr std::string_view VesselInitialPageSortedByName = "VesselInitialPageSortedByName";
 inline constexpr std::string_view VesselInitialPageSortedByDate = "VesselInitialPageSortedByDate";
 
-/// What the host hands over to be told one page of a listing: `didEnumerateItems` at most once,
-/// then exactly one of the two finishing calls. Called on the thread that asked.
+/// What the host hands over to be told one page of a listing: `didEnumerateItems` once or twice,
+/// or not at all, then exactly one of the two finishing calls. Called on the thread that asked.
 class VesselEnumerationObserver {
  public:
   virtual ~VesselEnumerationObserver() = default;

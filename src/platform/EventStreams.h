@@ -11,6 +11,7 @@
 
 #include "foundation/Error.h"
 #include "foundation/SerialQueue.h"
+#include "foundation/URL.h"
 #include "foundation/Values.h"
 #include "platform/FileObjects.h"
 
@@ -60,13 +61,23 @@ class EventStream {
   virtual void invalidate() = 0;
 };
 
-/// The persistent event history of the volume of the documents. Any thread may call it.
+/// The document folder of an application.
+struct FollowedLibrary {
+  URL folder;
+  /// What else is shown of it, such as its display name: another one is told as a change of the
+  /// folder.
+  std::string label;
+};
+
+/// The persistent event history of the volume of the documents: of the document storage, and of
+/// the libraries that are followed. Any thread may call it.
 class EventStreams {
  public:
   virtual ~EventStreams() = default;
   using Callback = std::function<void(std::span<const FileSystemEvent>)>;
 
-  /// Events at and below `paths`. A `since` that is no longer kept, or that this history never
+  /// Events at and below `paths`; "/" stands for all there are, also of libraries that are followed
+  /// no more. A `since` that is no longer kept, or that this history never
   /// gave out, makes a first event with the flag `kernelDropped`. POSIX errors.
   [[nodiscard]] virtual Result<std::unique_ptr<EventStream>> createForPaths(
       std::vector<std::string> paths, std::uint64_t since, std::chrono::milliseconds latency,
@@ -75,6 +86,16 @@ class EventStreams {
   [[nodiscard]] virtual Result<std::unique_ptr<EventStream>> createRelativeToDevice(
       DeviceID device, std::vector<std::string> paths, std::uint64_t since,
       std::chrono::milliseconds latency, std::uint32_t flags, Callback callback) = 0;
+
+  /// Follows these libraries, and no others, as they belong to that version of their list. What
+  /// lies in one that comes is told as something that happened there, and so is what lay in one
+  /// that goes, as gone. It stays like this in the next process. Saying the same again is cheap.
+  [[nodiscard]] virtual Result<void> followLibraries(const std::vector<FollowedLibrary>& libraries,
+                                                     std::uint64_t version) = 0;
+  /// The event up to which the history told of the libraries of that version: whoever holds what
+  /// they showed has to hear of everything after it. The largest number while there is no later
+  /// version; 0 when it is not known any more.
+  [[nodiscard]] virtual std::uint64_t lastEventIDUnder(std::uint64_t version) = 0;
 
   /// The latest event ID. Whatever a finished system call changed has an ID at or below it.
   [[nodiscard]] virtual std::uint64_t currentEventID() = 0;

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "enumeration/LocalFileEnumerator.h"
+#include "enumeration/LocalRootEnumerator.h"
 #include "foundation/Log.h"
 #include "identity/MRBFileObjectIdentifier.h"
 #include "items/LocalAppLibraryItem.h"
@@ -22,14 +23,19 @@ URL uncached(const URL& url) {
 }  // namespace
 
 LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
-                         const AppLibraryOwners& owners, std::optional<ChangeServices> changes)
+                         const AppLibraryOwners& owners, std::optional<ChangeServices> changes,
+                         std::optional<ApplicationServices> applications)
     : platform_(platform),
       roots_(roots),
       identity_(platform_, roots),
       context_{platform_, identity_, owners},
-      changes_(std::move(changes)) {}
+      changes_(std::move(changes)),
+      applications_(std::move(applications)) {
+  if (applications_) startUp();
+}
 
 LocalVessel::~LocalVessel() {
+  shutDown();
   liveUpdates_.stop();
   underway_.wait();
 }
@@ -112,28 +118,19 @@ Result<std::shared_ptr<VesselEnumerator>> LocalVessel::enumeratorForContainerIte
     std::string_view identifier, LiveUpdates liveUpdates) {
   const LogSection section("enumerator for " + std::string(identifier));
   if (!changes_) return fail(Error::posix(ENOTSUP, "this provider follows no changes"));
-  auto folders = foldersOf(identifier);
-  if (!folders) return fail(folders.error());
-  auto enumerator = LocalFileEnumerator::create(
-      {context_, *changes_, walks_}, std::string(identifier), *std::move(folders), liveUpdates);
+  const EnumerationServices services{context_, *changes_, walks_};
+  if (eventScopeOf(identifier) == FSEventScope::everything) {
+    if (!applications_) return fail(Error::posix(ENOTSUP, "this provider follows no applications"));
+    return LocalRootEnumerator::create(services, applications_->libraries, std::string(identifier),
+                                       liveUpdates, liveUpdates_);
+  }
+  auto url = urlForIdentifier(identifier);
+  if (!url) return fail(url.error());
+  auto enumerator = LocalFileEnumerator::create(services, std::string(identifier),
+                                                {*std::move(url)}, liveUpdates);
   if (const auto& notifier = enumerator->notifier()) liveUpdates_.add(notifier->reader());
   enumerator->startNotifier();
   return enumerator;
-}
-
-/// What an enumerator of the container walks.
-Result<std::vector<URL>> LocalVessel::foldersOf(std::string_view container) const {
-  const bool isEverything = container == VesselWorkingSetContainerItemIdentifier ||
-                            container == VesselAllDirectoriesContainerItemIdentifier;
-  if (!isEverything) {
-    auto url = urlForIdentifier(container);
-    if (!url) return fail(url.error());
-    return std::vector{*std::move(url)};
-  }
-  std::vector<URL> folders{platform_.manager.documentStorageURL()};
-  const auto libraries = roots_.rootURLsForAppLibraries();
-  folders.insert(folders.end(), libraries->begin(), libraries->end());
-  return folders;
 }
 
 void LocalVessel::providePlaceholderAtURL(const URL& url,

@@ -7,25 +7,40 @@
 #include <string_view>
 #include <vector>
 
+#include "applibrary/MRBAppLibraryManager.h"
 #include "enumeration/EnumerationServices.h"
 #include "foundation/DispatchGroup.h"
+#include "foundation/SerialQueue.h"
+#include "foundation/VSPacer.h"
 #include "fs/FSChangesEnumerator.h"
 #include "identity/FileObjectURLs.h"
 #include "items/LocalItem.h"
 #include "platform/EnumerationObservers.h"
+#include "platform/NotificationCenter.h"
 #include "platform/Platform.h"
 
 namespace mirabel {
+
+/// What following the installed applications needs: references that outlive who gets it.
+struct ApplicationServices {
+  MRBAppLibraryManager& libraries;
+  NotificationCenter& notifications;
+};
 
 /// The principal object that the host calls. Entry points may be called from any thread; lookups
 /// and operations hold no lock and keep no cache.
 class LocalVessel {
  public:
-  /// Everything passed in outlives the provider. Without `changes` it has no enumerators.
+  /// Everything passed in outlives the provider. Without `changes` it has no enumerators, and
+  /// without `applications` none of the root, and the app libraries are what they are. With them
+  /// it has the app libraries refreshed at once, and whenever an application is installed or
+  /// removed.
   LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
-              const AppLibraryOwners& owners, std::optional<ChangeServices> changes = {});
+              const AppLibraryOwners& owners, std::optional<ChangeServices> changes = {},
+              std::optional<ApplicationServices> applications = {});
   /// Ends the live updates of its enumerators, and waits until the operations that were started
-  /// have reported: so it must not be called from a completion handler.
+  /// have reported, and for a refresh of the app libraries: so it must not be called from a
+  /// completion handler.
   ~LocalVessel();
   LocalVessel(const LocalVessel&) = delete;
   LocalVessel& operator=(const LocalVessel&) = delete;
@@ -35,6 +50,10 @@ class LocalVessel {
   /// on the caller's before the call returns.
   using ItemHandler = std::function<void(ItemResult)>;
   using ErrorHandler = std::function<void(std::optional<Error>)>;
+
+  /// Returns when the app libraries are those that the registry told of at or after this call
+  /// began, if a refresh was due: for who must not answer before the first one.
+  void waitForAppLibraries();
 
   // Lookups.
 
@@ -51,7 +70,8 @@ class LocalVessel {
 
   /// The enumerator of a container, with its live updates started where they are wanted. It must
   /// not outlive the provider. Errors: those of `urlForIdentifier`; POSIX ENOTSUP for a provider
-  /// without changes.
+  /// without changes, and for the root, the working set and all directories for one without
+  /// applications.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumeratorForContainerItemIdentifier(
       std::string_view identifier, LiveUpdates liveUpdates = LiveUpdates::wanted);
 
@@ -144,7 +164,9 @@ class LocalVessel {
  private:
   [[nodiscard]] std::shared_ptr<LocalItem> temporaryLocalFolder() const;
   [[nodiscard]] std::optional<std::string> identifierForURL(const URL& url) const;
-  [[nodiscard]] Result<std::vector<URL>> foldersOf(std::string_view container) const;
+  void startUp();
+  void shutDown();
+  void refreshAppLibraries();
 
   using AfterSuccess = std::function<void(const URL&)>;
   [[nodiscard]] FileOperations::URLHandler completion(ItemHandler completionHandler,
@@ -187,6 +209,14 @@ class LocalVessel {
   OpenWalks walks_;
   RunningReaders liveUpdates_;
   DispatchGroup underway_;  ///< operations that have not reported yet
+
+  /// The observer of the registry's notifications, so that those who post them never hold the
+  /// provider itself.
+  struct InstalledAppsProxy;
+  std::optional<ApplicationServices> applications_;
+  SerialQueue appRefreshQueue_{"mirabel.app-refresh.queue"};
+  std::shared_ptr<InstalledAppsProxy> installedAppsProxy_;
+  std::unique_ptr<VSPacer> appRefreshPacer_;
 };
 
 }  // namespace mirabel

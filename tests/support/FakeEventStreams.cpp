@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <limits>
+#include <map>
 #include <utility>
 
 namespace mirabel::testing {
@@ -28,6 +29,9 @@ struct FakeEventStreams::State {
   std::uint64_t lastForgotten = 0;
   std::size_t batchSize = std::numeric_limits<std::size_t>::max();
   std::optional<Error> creationFailure;
+  std::optional<Error> followingFailure;
+  std::vector<FollowedLibrary> libraries;
+  std::map<std::uint64_t, std::uint64_t> versions;  // last events before them
   std::vector<Request> requests;
   std::vector<Stream*> running;
 };
@@ -111,6 +115,32 @@ Result<std::unique_ptr<EventStream>> FakeEventStreams::create(Request request, C
   state_->requests.push_back(request);
   if (state_->creationFailure) return fail(*state_->creationFailure);
   return std::make_unique<Stream>(state_, std::move(request), std::move(callback));
+}
+
+Result<void> FakeEventStreams::followLibraries(const std::vector<FollowedLibrary>& libraries,
+                                               std::uint64_t version) {
+  const std::lock_guard lock(state_->mutex);
+  if (state_->followingFailure) return fail(*state_->followingFailure);
+  state_->libraries = libraries;
+  state_->versions.emplace(version, state_->history.size());
+  return {};
+}
+
+std::uint64_t FakeEventStreams::lastEventIDUnder(std::uint64_t version) {
+  const std::lock_guard lock(state_->mutex);
+  const auto later = state_->versions.upper_bound(version);
+  return later == state_->versions.end() ? std::numeric_limits<std::uint64_t>::max()
+                                         : later->second;
+}
+
+std::vector<FollowedLibrary> FakeEventStreams::libraries() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->libraries;
+}
+
+void FakeEventStreams::failFollowing(std::optional<Error> error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->followingFailure = std::move(error);
 }
 
 std::uint64_t FakeEventStreams::currentEventID() {

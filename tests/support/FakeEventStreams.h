@@ -37,7 +37,15 @@ class FakeEventStreams final : public EventStreams {
   Result<std::unique_ptr<EventStream>> createRelativeToDevice(
       DeviceID device, std::vector<std::string> paths, std::uint64_t since,
       std::chrono::milliseconds latency, std::uint32_t flags, Callback callback) override;
+  Result<void> followLibraries(const std::vector<FollowedLibrary>& libraries,
+                               std::uint64_t version) override;
+  std::uint64_t lastEventIDUnder(std::uint64_t version) override;
   std::uint64_t currentEventID() override;
+
+  /// The libraries that were last said to be followed.
+  [[nodiscard]] std::vector<FollowedLibrary> libraries() const;
+  /// `followLibraries` fails from now on, until `nullopt`.
+  void failFollowing(std::optional<Error> error);
 
   /// Appends to the history, under the next ID, which it answers.
   std::uint64_t append(std::string_view path, std::optional<std::uint64_t> fileID = {},

@@ -16,9 +16,12 @@ namespace {
 constexpr std::size_t firstBatch = 100;
 constexpr std::size_t largestBatch = 1024;
 
+// The path that everything lies below.
+constexpr std::string_view everything = "/";
+
 bool isAtOrBelow(std::string_view path, std::string_view folder) {
   return path.starts_with(folder) &&
-         (path.size() == folder.size() || folder == "/" || path[folder.size()] == '/');
+         (path.size() == folder.size() || folder == everything || path[folder.size()] == '/');
 }
 
 FileSystemEvent eventOf(JournalRecord record) {
@@ -74,7 +77,7 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
     if (!last) lose(last.error());
     for (const std::string& path : selection.paths) {
       const auto status = statusOf(path);
-      if (!status) continue;
+      if (!status || path == everything) continue;
       auto seen = services.index.learnPath(path, *status, false);
       if (seen) folders.push_back(seen->fileID);
     }

@@ -39,6 +39,19 @@ Result<std::unique_ptr<EventStream>> LinuxEventStreams::createRelativeToDevice(
                                          std::move(callback));
 }
 
+Result<void> LinuxEventStreams::followLibraries(const std::vector<FollowedLibrary>& libraries,
+                                                std::uint64_t version) {
+  std::vector<FollowedFolder> folders;
+  folders.reserve(libraries.size());
+  for (const FollowedLibrary& library : libraries)
+    folders.push_back({library.folder.path(), library.label});
+  return index_.follow(folders, version);
+}
+
+std::uint64_t LinuxEventStreams::lastEventIDUnder(std::uint64_t version) {
+  return index_.lastEventUnder(version);
+}
+
 std::uint64_t LinuxEventStreams::currentEventID() {
   auto id = index_.currentEventID();
   if (id) return *id;

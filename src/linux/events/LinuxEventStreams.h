@@ -26,6 +26,9 @@ class LinuxEventStreams final : public EventStreams {
   [[nodiscard]] Result<std::unique_ptr<EventStream>> createRelativeToDevice(
       DeviceID device, std::vector<std::string> paths, std::uint64_t since,
       std::chrono::milliseconds latency, std::uint32_t flags, Callback callback) override;
+  [[nodiscard]] Result<void> followLibraries(const std::vector<FollowedLibrary>& libraries,
+                                             std::uint64_t version) override;
+  [[nodiscard]] std::uint64_t lastEventIDUnder(std::uint64_t version) override;
   [[nodiscard]] std::uint64_t currentEventID() override;
 
  private:

@@ -1,5 +1,7 @@
 #include "linux/files/LinuxPlatform.h"
 
+#include "linux/apps/LinuxApplicationRegistry.h"
+#include "linux/apps/LocalNotificationCenter.h"
 #include "linux/events/LinuxEventStreams.h"
 #include "linux/files/HomeLayout.h"
 #include "linux/files/LinuxCacheFiles.h"
@@ -21,11 +23,13 @@ namespace mirabel {
 // In the order in which they need each other.
 struct LinuxPlatform::Parts {
   Parts(HomeLayout where, std::unique_ptr<MonitoredRoots> folders,
-        std::unique_ptr<VolumeIndex> volumeIndex, FileCalls::Check check)
+        std::unique_ptr<VolumeIndex> volumeIndex, LinuxApplicationRegistry::Options registry,
+        FileCalls::Check check)
       : layout(std::move(where)),
         roots(std::move(folders)),
         index(std::move(volumeIndex)),
-        operations(*roots, *index, attributes, {PackageTypes::isPackageName, std::move(check)}) {}
+        operations(*roots, *index, attributes, {PackageTypes::isPackageName, std::move(check)}),
+        applications(std::move(registry)) {}
 
   HomeLayout layout;
   std::unique_ptr<MonitoredRoots> roots;
@@ -39,7 +43,8 @@ struct LinuxPlatform::Parts {
   LinuxDirectoryStreams directories{*roots};
   LinuxDirectorySizer sizes{*roots};
   LinuxFileOperations operations;
-  NoApplications applications;
+  LocalNotificationCenter notifications;
+  LinuxApplicationRegistry applications;
   LinuxVesselManager manager{URL::fileURL(layout.documents)};
   LinuxVolumeHistory history{*index};
   LinuxEventStreams events{*index};
@@ -68,10 +73,19 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   indexOptions.makeWatcher = std::move(options.makeWatcher);
   indexOptions.timeout = options.timeout;
   indexOptions.notice = std::move(options.notice);
+  LinuxApplicationRegistry::Options registry;
+  registry.home = layout->home;
+  registry.directories = ApplicationDirectories::of(
+      layout->home, options.home ? ApplicationDirectories::Reach::homeAlone
+                                 : ApplicationDirectories::Reach::wholeMachine);
+  const auto volume = statusOf(indexOptions.volumePath);
+  if (!volume) return fail(volume.error());
+  registry.device = volume->device;
   auto index = VolumeIndex::open(*roots, std::move(indexOptions));
   if (!index) return fail(index.error());
   return std::unique_ptr<LinuxPlatform>(new LinuxPlatform(std::make_unique<Parts>(
-      std::move(*layout), std::move(roots), std::move(*index), std::move(options.checkFileCall))));
+      std::move(*layout), std::move(roots), std::move(*index), std::move(registry),
+      std::move(options.checkFileCall))));
 }
 
 LinuxPlatform::LinuxPlatform(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
@@ -80,6 +94,14 @@ LinuxPlatform::~LinuxPlatform() = default;
 
 EventStreams& LinuxPlatform::events() const {
   return parts_->events;
+}
+
+LinuxApplicationRegistry& LinuxPlatform::applications() const {
+  return parts_->applications;
+}
+
+NotificationCenter& LinuxPlatform::notifications() const {
+  return parts_->notifications;
 }
 
 const OperationProgress& LinuxPlatform::progress() const {

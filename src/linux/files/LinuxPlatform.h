@@ -14,9 +14,12 @@
 #include "linux/volume/VolumeIndex.h"
 #include "linux/watch/FolderWatcher.h"
 #include "platform/EventStreams.h"
+#include "platform/NotificationCenter.h"
 #include "platform/Platform.h"
 
 namespace mirabel {
+
+class LinuxApplicationRegistry;
 
 /// The platform on Linux for one home folder: resolves what it works on once, opens the volume's
 /// index, and owns every interface of `Platform`. Owned by the program; `platform()` may be used
@@ -58,6 +61,9 @@ class LinuxPlatform {
   [[nodiscard]] const Platform& platform() const;
   /// The event history of the documents' volume.
   [[nodiscard]] EventStreams& events() const;
+  [[nodiscard]] LinuxApplicationRegistry& applications() const;
+  /// Where it is told that applications were installed or removed.
+  [[nodiscard]] NotificationCenter& notifications() const;
   /// Gives the signals to whoever listens.
   [[nodiscard]] LinuxVesselManager& manager() const;
   /// How far the operations on files have come.
