@@ -81,15 +81,9 @@ bool OpenIndex::isFollowing() const {
 OpenProvider::OpenProvider(const std::string& home) {
   LinuxPlatform::Options options;
   options.home = home;
-  platform_ = std::move(LinuxPlatform::open(std::move(options)).value());
-  const Platform& platform = platform_->platform();
-  identity_ = std::make_unique<FileObjectURLs>(platform, roots_);
-  const ItemContext context{platform, *identity_, owners_};
-  enumerations_ = std::make_unique<FSChangesEnumerations>(context, platform_->events(), roots_);
-  vessel_ = std::make_unique<LocalVessel>(
-      platform, roots_, owners_, ChangeServices{platform_->events(), diagnostics_, *enumerations_});
-  enumerator_ = vessel_
-                    ->enumeratorForContainerItemIdentifier(VesselWorkingSetContainerItemIdentifier,
+  provider_ = std::move(HostedProvider::open(std::move(options)).value());
+  enumerator_ = provider_->vessel().
+                    enumeratorForContainerItemIdentifier(VesselWorkingSetContainerItemIdentifier,
                                                            LiveUpdates::unwanted)
                     .value();
 }

@@ -45,13 +45,7 @@ class OpenProvider {
   void list(const std::function<void(std::size_t)>& visit) const;
 
  private:
-  std::unique_ptr<LinuxPlatform> platform_;
-  NoAppLibraryRoots roots_;
-  NoAppLibraryOwners owners_;
-  LoggingDiagnosticReporter diagnostics_;
-  std::unique_ptr<FileObjectURLs> identity_;
-  std::unique_ptr<FSChangesEnumerations> enumerations_;
-  std::unique_ptr<LocalVessel> vessel_;
+  std::unique_ptr<HostedProvider> provider_;
   std::shared_ptr<VesselEnumerator> enumerator_;
 };
 

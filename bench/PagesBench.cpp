@@ -26,7 +26,7 @@ constexpr std::uint64_t pageSize = 200;
 
 class Page final : public VesselEnumerationObserver {
  public:
-  void didEnumerateItems(const VesselItems& items) override { count = items.size(); }
+  void didEnumerateItems(const VesselItems& items) override { count += items.size(); }
   void finishEnumeratingUpToPage(const std::optional<Data>& page) override { next = page; }
   void finishEnumeratingWithError(const Error&) override {
     require(false, "a page is handed over");
@@ -42,24 +42,18 @@ class Provider {
   explicit Provider(const BenchHome& home) {
     LinuxPlatform::Options options;
     options.home = home.path();
-    platform_ = std::move(LinuxPlatform::open(std::move(options)).value());
-    identity_ = std::make_unique<FileObjectURLs>(platform_->platform(), roots_);
-    enumerations_ = std::make_unique<FSChangesEnumerations>(
-        ItemContext{platform_->platform(), *identity_, owners_}, platform_->events(), roots_);
-    vessel_ = std::make_unique<LocalVessel>(
-        platform_->platform(), roots_, owners_,
-        ChangeServices{platform_->events(), diagnostics_, *enumerations_});
+    provider_ = std::move(HostedProvider::open(std::move(options)).value());
   }
 
   std::shared_ptr<VesselEnumerator> enumerator(const std::string& container) {
-    return vessel_->enumeratorForContainerItemIdentifier(container, LiveUpdates::unwanted).value();
+    return provider_->vessel().enumeratorForContainerItemIdentifier(container, LiveUpdates::unwanted).value();
   }
   std::string containerOf(const std::string& folder) const {
-    return vessel_->persistentIdentifierForItemAtURL(URL::fileURL(folder)).value();
+    return provider_->vessel().persistentIdentifierForItemAtURL(URL::fileURL(folder)).value();
   }
   /// The pass over the open folder.
   std::size_t pass(const std::string& folder) {
-    const Platform& platform = platform_->platform();
+    const Platform& platform = provider_->platform();
     FSDirectoryWalk walk({{URL::fileURL(folder)}}, platform.directories, platform.resources);
     std::size_t count = 0;
     std::vector<URL> entries;
@@ -70,19 +64,13 @@ class Provider {
         return {};
       };
       require(walk.next(pageSize, visit).has_value(), "the folder is read");
-      count += makeItems(vessel_->itemContext(), entries).value().size();
+      count += makeItems(provider_->vessel().itemContext(), entries).value().size();
     } while (entries.size() == pageSize);
     return count;
   }
 
  private:
-  std::unique_ptr<LinuxPlatform> platform_;
-  NoAppLibraryRoots roots_;
-  NoAppLibraryOwners owners_;
-  LoggingDiagnosticReporter diagnostics_;
-  std::unique_ptr<FileObjectURLs> identity_;
-  std::unique_ptr<FSChangesEnumerations> enumerations_;
-  std::unique_ptr<LocalVessel> vessel_;
+  std::unique_ptr<HostedProvider> provider_;
 };
 
 struct Listing {

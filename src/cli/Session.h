@@ -6,14 +6,10 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 
-#include "applibrary/MRBAppLibraryManager.h"
 #include "foundation/Error.h"
-#include "fs/FSChangesEnumerator.h"
-#include "host/HostTrash.h"
-#include "linux/files/LinuxPlatform.h"
-#include "linux/log/LoggingDiagnosticReporter.h"
-#include "provider/LocalVessel.h"
+#include "host/HostedProvider.h"
 
 namespace mirabel {
 
@@ -29,27 +25,21 @@ class Session {
   /// Errors: those of `LinuxPlatform::open`.
   [[nodiscard]] static Result<std::unique_ptr<Session>> open(Options options);
 
-  [[nodiscard]] const LocalVessel& provider() const { return *provider_; }
-  [[nodiscard]] LocalVessel& provider() { return *provider_; }
-  [[nodiscard]] HostTrash& trash() { return *trash_; }
-  [[nodiscard]] MRBAppLibraryManager& libraries() { return *libraries_; }
+  [[nodiscard]] const LocalVessel& provider() const { return hosted_->vessel(); }
+  [[nodiscard]] LocalVessel& provider() { return hosted_->vessel(); }
+  [[nodiscard]] HostTrash& trash() { return hosted_->trash(); }
+  [[nodiscard]] MRBAppLibraryManager& libraries() const { return hosted_->libraries(); }
   /// Lists the container and tells its changes, when it is asked. Errors: see `LocalVessel`.
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumerator(
       std::string_view container, LiveUpdates liveUpdates = LiveUpdates::unwanted) {
-    return provider_->enumeratorForContainerItemIdentifier(container, liveUpdates);
+    return provider().enumeratorForContainerItemIdentifier(container, liveUpdates);
   }
-  [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
-  [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
+  [[nodiscard]] const Platform& platform() const { return hosted_->platform(); }
+  [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return hosted_->linuxPlatform(); }
 
  private:
-  Session() = default;
-  std::unique_ptr<LinuxPlatform> platform_;
-  std::unique_ptr<MRBAppLibraryManager> libraries_;
-  LoggingDiagnosticReporter diagnostics_;
-  std::unique_ptr<FileObjectURLs> identity_;
-  std::unique_ptr<FSChangesEnumerations> enumerations_;
-  std::unique_ptr<HostTrash> trash_;  // what the provider has begun may still report to it
-  std::unique_ptr<LocalVessel> provider_;
+  explicit Session(std::unique_ptr<HostedProvider> hosted) : hosted_(std::move(hosted)) {}
+  std::unique_ptr<HostedProvider> hosted_;
 };
 
 }  // namespace mirabel

@@ -32,7 +32,9 @@ HeldItem heldItem(const LocalItem& item) {
 
 class PageCollector final : public VesselEnumerationObserver {
  public:
-  void didEnumerateItems(const VesselItems& items) override { collected = items; }
+  void didEnumerateItems(const VesselItems& items) override {
+    collected.insert(collected.end(), items.begin(), items.end());
+  }
   void finishEnumeratingUpToPage(const std::optional<Data>& page) override { next = page; }
   void finishEnumeratingWithError(const Error& failure) override { error = failure; }
 
@@ -73,23 +75,17 @@ Host::Host(const std::string& home) {
   LinuxPlatform::Options options;
   options.home = home;
   options.makeWatcher = [faults = faults_] { return makeFaultyWatcher(makeWatcher(), faults); };
-  auto opened = LinuxPlatform::open(std::move(options));
+  auto opened = HostedProvider::open(std::move(options));
   if (!opened) throw std::runtime_error(opened.error().description());
-  platform_ = std::move(*opened);
-  const Platform& platform = platform_->platform();
-  identity_ = std::make_unique<FileObjectURLs>(platform, roots_);
-  const ItemContext context{platform, *identity_, owners_};
-  enumerations_ = std::make_unique<FSChangesEnumerations>(context, platform_->events(), roots_);
-  vessel_ = std::make_unique<LocalVessel>(
-      platform, roots_, owners_, ChangeServices{platform_->events(), diagnostics_, *enumerations_});
+  provider_ = std::move(*opened);
 }
 
 std::string Host::identifierOf(const std::string& path) const {
-  return vessel_->persistentIdentifierForItemAtURL(URL::fileURL(path)).value_or("");
+  return provider_->vessel().persistentIdentifierForItemAtURL(URL::fileURL(path)).value_or("");
 }
 
 std::shared_ptr<VesselEnumerator> Host::enumerator(const std::string& container) {
-  auto made = vessel_->enumeratorForContainerItemIdentifier(container);
+  auto made = provider_->vessel().enumeratorForContainerItemIdentifier(container);
   EXPECT_TRUE(made) << container << ": " << (made ? "" : made.error().description());
   return made.value_or(nullptr);
 }

@@ -5,11 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "fs/FSChangesEnumerator.h"
+#include "host/HostedProvider.h"
 #include "linux/FaultyWatcher.h"
-#include "linux/files/LinuxPlatform.h"
-#include "linux/log/LoggingDiagnosticReporter.h"
-#include "provider/LocalVessel.h"
 
 namespace mirabel::testing {
 
@@ -50,13 +47,7 @@ class Host {
   std::shared_ptr<VesselEnumerator> enumerator(const std::string& container);
   void apply(Replica& replica, const LocalItem& item) const;
 
-  std::unique_ptr<LinuxPlatform> platform_;
-  NoAppLibraryRoots roots_;
-  NoAppLibraryOwners owners_;
-  LoggingDiagnosticReporter diagnostics_;
-  std::unique_ptr<FileObjectURLs> identity_;
-  std::unique_ptr<FSChangesEnumerations> enumerations_;
-  std::unique_ptr<LocalVessel> vessel_;
+  std::unique_ptr<HostedProvider> provider_;
 };
 
 }  // namespace mirabel::testing

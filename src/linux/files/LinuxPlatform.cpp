@@ -58,13 +58,7 @@ struct LinuxPlatform::Parts {
 Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   auto layout = HomeLayout::resolve({options.home, options.documents, options.stateFolder});
   if (!layout) return fail(layout.error());
-  std::vector<std::string> paths{layout->documents};
-  for (const std::string& path : options.furtherRoots) {
-    auto resolved = resolvedPath(path);
-    if (!resolved) return fail(resolved.error());
-    paths.push_back(std::move(*resolved));
-  }
-  auto roots = std::make_unique<MonitoredRoots>(std::move(paths));
+  auto roots = std::make_unique<MonitoredRoots>(std::vector{layout->documents});
   VolumeIndex::Options indexOptions;
   // A document storage that is missing belongs where it would be made.
   indexOptions.volumePath = roots->isThere(layout->documents) ? layout->documents : layout->home;

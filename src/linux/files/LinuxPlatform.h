@@ -32,8 +32,6 @@ class LinuxPlatform {
     std::optional<std::string> home{};
     /// The document storage; absent: "Documents" in the home folder. It may be a symbolic link.
     std::optional<std::string> documents{};
-    /// Further folders to present, such as the document folders of applications.
-    std::vector<std::string> furtherRoots{};
     /// Where state is kept; absent: "mirabel" in the XDG state folder.
     std::optional<std::string> stateFolder{};
     /// Hears of changes from the kernel; empty: every question about them is answered by a look at

@@ -28,9 +28,12 @@ LinuxPlatform& OperationsTest::opened() {
   if (!platform_) {
     LinuxPlatform::Options options;
     options.home = home.path();
-    options.furtherRoots = furtherRoots_;
     options.checkFileCall = [this](std::string_view call) { return check_ ? check_(call) : 0; };
     platform_ = LinuxPlatform::open(std::move(options)).value();
+    std::vector<FollowedLibrary> libraries;
+    for (const std::string& root : furtherRoots_)
+      libraries.push_back({URL::fileURL(root), ""});
+    EXPECT_TRUE(platform_->events().followLibraries(libraries, 1));
   }
   return *platform_;
 }

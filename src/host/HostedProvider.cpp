@@ -1,0 +1,30 @@
+#include "host/HostedProvider.h"
+
+#include <utility>
+
+namespace mirabel {
+
+Result<std::unique_ptr<HostedProvider>> HostedProvider::open(LinuxPlatform::Options options) {
+  auto platform = LinuxPlatform::open(std::move(options));
+  if (!platform) return fail(platform.error());
+  std::unique_ptr<HostedProvider> provider(new HostedProvider(std::move(*platform)));
+  // What is answered must not depend on how far the first refresh has come.
+  provider->vessel_->waitForAppLibraries();
+  return provider;
+}
+
+HostedProvider::HostedProvider(std::unique_ptr<LinuxPlatform> platform)
+    : platform_(std::move(platform)),
+      libraries_(std::make_unique<MRBAppLibraryManager>(platform_->platform())),
+      identity_(std::make_unique<FileObjectURLs>(platform_->platform(), *libraries_)) {
+  EventStreams& events = platform_->events();
+  enumerations_ = std::make_unique<FSChangesEnumerations>(
+      ItemContext{platform_->platform(), *identity_, *libraries_}, events, *libraries_);
+  vessel_ = std::make_unique<LocalVessel>(
+      platform_->platform(), *libraries_, *libraries_,
+      ChangeServices{events, diagnostics_, *enumerations_},
+      ApplicationServices{*libraries_, platform_->notifications()});
+  trash_ = std::make_unique<HostTrash>(*vessel_, platform_->index().keptAttributes());
+}
+
+}  // namespace mirabel

@@ -1,0 +1,45 @@
+#pragma once
+
+#include <memory>
+
+#include "applibrary/MRBAppLibraryManager.h"
+#include "foundation/Error.h"
+#include "fs/FSChangesEnumerator.h"
+#include "host/HostTrash.h"
+#include "linux/files/LinuxPlatform.h"
+#include "linux/log/LoggingDiagnosticReporter.h"
+#include "provider/LocalVessel.h"
+
+namespace mirabel {
+
+/// The provider of one home with all that it stands on, running in this process. It holds the
+/// volume's state for as long as it lives. What its enumerators have under way must have ended
+/// when it goes.
+class HostedProvider {
+ public:
+  /// Returns when the app libraries are those that are installed now. Errors: those of
+  /// `LinuxPlatform::open`.
+  [[nodiscard]] static Result<std::unique_ptr<HostedProvider>> open(LinuxPlatform::Options options);
+  HostedProvider(const HostedProvider&) = delete;
+  HostedProvider& operator=(const HostedProvider&) = delete;
+
+  [[nodiscard]] LocalVessel& vessel() { return *vessel_; }
+  [[nodiscard]] const LocalVessel& vessel() const { return *vessel_; }
+  [[nodiscard]] HostTrash& trash() { return *trash_; }
+  [[nodiscard]] MRBAppLibraryManager& libraries() { return *libraries_; }
+  [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
+  [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
+
+ private:
+  explicit HostedProvider(std::unique_ptr<LinuxPlatform> platform);
+
+  std::unique_ptr<LinuxPlatform> platform_;
+  std::unique_ptr<MRBAppLibraryManager> libraries_;
+  LoggingDiagnosticReporter diagnostics_;
+  std::unique_ptr<FileObjectURLs> identity_;
+  std::unique_ptr<FSChangesEnumerations> enumerations_;
+  std::unique_ptr<HostTrash> trash_;  // what the provider has begun may still report to it
+  std::unique_ptr<LocalVessel> vessel_;
+};
+
+}  // namespace mirabel
