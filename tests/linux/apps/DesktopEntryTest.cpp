@@ -1,0 +1,157 @@
+#include <gtest/gtest.h>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "foundation/Unicode.h"
+#include "linux/apps/ApplicationIdentifier.h"
+#include "linux/apps/DesktopEntry.h"
+
+namespace mirabel::testing {
+namespace {
+
+std::optional<DesktopEntry> parse(const std::string& text,
+                                  const std::vector<std::string>& locales = {"C"}) {
+  return DesktopEntry::parse(text, languagesOf(locales));
+}
+
+DesktopEntry ofLines(const std::string& lines, const std::vector<std::string>& locales = {"C"}) {
+  return parse("[Desktop Entry]\nType=Application\n" + lines + "\n", locales).value();
+}
+
+TEST(DesktopEntryTest, OnlyApplicationsThatAreNotDeletedCount) {
+  const std::pair<const char*, bool> cases[] = {
+      {"Type=Application\n", true},
+      {"Type=Application\nNoDisplay=true\n", true},
+      {"Type=Application\nHidden=false\n", true},
+      {"Type=Application\nHidden=true\n", false},
+      {"Type=Link\nURL=https://localhost\n", false},
+      {"Name=A\n", false},
+      {"", false},
+  };
+  for (const auto& [lines, isApplication] : cases)
+    EXPECT_EQ(parse("[Desktop Entry]\n" + std::string(lines)).value().isApplication, isApplication)
+        << lines;
+}
+
+TEST(DesktopEntryTest, OtherBytesAreNoEntry) {
+  const std::string cases[] = {"",
+                               "{}",
+                               "[Other]\nType=Application\n",
+                               "Type=Application\n[Desktop Entry]\n",
+                               "\x7f"
+                               "ELF\x02\x01\x01",
+                               std::string("[Desktop Entry]\nType=Application\nName=a\0b\n", 43)};
+  for (const std::string& text : cases)
+    EXPECT_FALSE(parse(text)) << text;
+}
+
+TEST(DesktopEntryTest, NameIsInTheFirstLanguageThatHasOne) {
+  const std::string lines =
+      "Name=Notes\nName[de]=Notizen\nName[de_AT]=Merkzettel\nName[sr@latin]="
+      "Beleske\nName[fr]=\n";
+  const std::pair<std::vector<std::string>, const char*> cases[] = {
+      {{"C"}, "Notes"},
+      {{"de_DE.UTF-8"}, "Notizen"},
+      {{"de_AT"}, "Merkzettel"},
+      {{"sr_RS@latin"}, "Beleske"},
+      {{"es_ES", "de"}, "Notizen"},
+      {{"es_ES", "C", "de"}, "Notes"},
+      {{"fr"}, "Notes"},
+      {{"../x"}, "Notes"},
+  };
+  for (const auto& [locales, name] : cases)
+    EXPECT_EQ(ofLines(lines, locales).localizedName, name) << locales.front();
+  EXPECT_EQ(ofLines("Name[de]=Notizen").localizedName, std::nullopt);
+  EXPECT_EQ(ofLines("Name=").localizedName, std::nullopt);
+}
+
+TEST(DesktopEntryTest, NameIsBoundedText) {
+  EXPECT_EQ(ofLines("Name=a\xff"
+                    "b")
+                .localizedName,
+            "a\xEF\xBF\xBD"
+            "b");
+  const std::string umlauts = "a" + [] {
+    std::string text;
+    for (int i = 0; i < 50'000; ++i)
+      text += "\xC3\xBC";
+    return text;
+  }();
+  const std::string name = ofLines("Name=" + umlauts).localizedName.value();
+  EXPECT_EQ(name, umlauts.substr(0, 1023));
+  EXPECT_TRUE(isUTF8(name));
+  EXPECT_EQ(ofLines("Name=" + std::string(1024, 'n')).localizedName, std::string(1024, 'n'));
+}
+
+TEST(DesktopEntryTest, FilesAreOpenedByCommandsThatTakeThem) {
+  const std::pair<const char*, bool> cases[] = {
+      {"Exec=a %f\nMimeType=text/plain;", true},
+      {"Exec=a %F\nMimeType=text/plain", true},
+      {"Exec=a --x=%u -\nMimeType=text/a;", true},
+      {"Exec=a %U\nMimeType=text/plain;", true},
+      {"Exec=a %%f\nMimeType=text/plain;", false},
+      {"Exec=a %%%f\nMimeType=text/plain;", true},
+      {"Exec=a %i %c\nMimeType=text/a;", false},
+      {"Exec=a %\nMimeType=text/plain;", false},
+      {"Exec=a %f", false},
+      {"Exec=a %f\nMimeType= ;", false},
+      {"MimeType=text/plain;", false},
+  };
+  for (const auto& [lines, opens] : cases)
+    EXPECT_EQ(ofLines(lines).opensFiles, opens) << lines;
+}
+
+TEST(DesktopEntryTest, KeysAreBooleansOrFalse) {
+  const std::pair<const char*, std::optional<bool>> cases[] = {
+      {"", std::nullopt},
+      {"X-Vessel-FileSharingEnabled=true", true},
+      {"X-Vessel-FileSharingEnabled=false", false},
+      {"X-Vessel-FileSharingEnabled=perhaps", false},
+      {"X-Vessel-FileSharingEnabled=", false},
+      {"X-Vessel-FileSharingEnabled[de]=true", std::nullopt},
+      {"[Desktop Action a]\nX-Vessel-FileSharingEnabled=true", std::nullopt},
+  };
+  for (const auto& [lines, expected] : cases) {
+    const DesktopEntry entry = ofLines(lines);
+    EXPECT_EQ(entry.fileSharingEnabled, expected) << lines;
+    EXPECT_EQ(entry.hasKeys(), expected.has_value()) << lines;
+    EXPECT_EQ(entry.supportsOpenInPlace, std::nullopt) << lines;
+  }
+}
+
+TEST(ApplicationIdentifierTest, OnlyPlainNamesAreIdentifiers) {
+  const std::string_view good[] = {"org.gnome.Notes", "firefox", "a-b_c+d@e.f", "0"};
+  for (const std::string_view text : good)
+    EXPECT_TRUE(isApplicationIdentifier(text)) << text;
+  EXPECT_TRUE(isApplicationIdentifier(std::string(255, 'a')));
+  const std::string bad[] = {"",
+                             ".",
+                             "..",
+                             ".a",
+                             "a/b",
+                             "a b",
+                             "a\nb",
+                             "\x1b[31m",
+                             "\xC3\xBC",
+                             std::string(256, 'a'),
+                             "a\\b",
+                             "a\xff",
+                             std::string("a\0b", 3),
+                             "#a",
+                             "a%2Fb"};
+  for (const std::string& text : bad)
+    EXPECT_FALSE(isApplicationIdentifier(text)) << text;
+}
+
+TEST(ApplicationIdentifierTest, FolderOfAnEntryIsPartOfItsIdentifier) {
+  EXPECT_EQ(identifierOfEntry("a.b.desktop"), "a.b");
+  EXPECT_EQ(identifierOfEntry("kde/sub/a.desktop"), "kde-sub-a");
+  EXPECT_EQ(identifierOfEntry(".desktop"), "");
+  EXPECT_EQ(identifierOfEntry("../a.desktop"), "..-a");
+  for (const char* path : {"a", "a.desktop~", "a.DESKTOP", "desktop", "a.desktop.bak"})
+    EXPECT_FALSE(identifierOfEntry(path)) << path;
+}
+
+}  // namespace
+}  // namespace mirabel::testing
