@@ -81,5 +81,6 @@ void runListingBenchmarks(const Scale& scale);
 void runPagesBenchmarks(const Scale& scale);
 void runFollowingBenchmarks(const Scale& scale);
 void runOperationBenchmarks(const Scale& scale);
+void runApplicationsBenchmarks(const Scale& scale);
 
 }  // namespace mirabel::bench

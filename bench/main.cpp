@@ -28,6 +28,7 @@ int run(int count, char** arguments) {
   mirabel::bench::runPagesBenchmarks(scale);
   mirabel::bench::runFollowingBenchmarks(scale);
   mirabel::bench::runOperationBenchmarks(scale);
+  mirabel::bench::runApplicationsBenchmarks(scale);
   return 0;
 }
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstddef>
 #include <glib.h>
+#include <iterator>
 #include <memory>
 
 #include "foundation/Unicode.h"
@@ -20,6 +21,40 @@ struct FreeMemory {
   void operator()(char* text) const { g_free(text); }
 };
 using OwnedString = std::unique_ptr<char, FreeMemory>;
+
+std::string_view trimmed(std::string_view text) {
+  constexpr std::string_view spaces = " \t\r";
+  const std::size_t start = text.find_first_not_of(spaces);
+  if (start == std::string_view::npos) return {};
+  return text.substr(start, text.find_last_not_of(spaces) + 1 - start);
+}
+
+bool isKeyThatCounts(std::string_view key) {
+  constexpr std::string_view keys[] = {"Type", "Hidden", "Name", "Exec", "MimeType"};
+  const std::string_view plain = trimmed(key.substr(0, key.find('[')));
+  return plain.starts_with("X-Vessel-") || std::ranges::find(keys, plain) != std::end(keys);
+}
+
+// Most of an entry is translations and actions that nobody asks for here, and taking them in would
+// cost more than all the rest. What is malformed stays, for the parser to refuse.
+std::string linesThatCount(std::string_view bytes) {
+  std::string lines;
+  bool isInGroup = false;
+  while (!bytes.empty()) {
+    const std::string_view line = bytes.substr(0, bytes.find('\n'));
+    bytes.remove_prefix(std::min(bytes.size(), line.size() + 1));
+    const std::string_view content = trimmed(line);
+    if (content.empty() || content.starts_with('#')) continue;
+    if (content.starts_with('[')) {
+      if (isInGroup) break;
+      isInGroup = content.substr(1, content.size() - 2) == group;
+    } else if (const auto end = content.find('='); isInGroup && end != std::string_view::npos) {
+      if (!isKeyThatCounts(content.substr(0, end))) continue;
+    }
+    lines.append(line).append(1, '\n');
+  }
+  return lines;
+}
 
 class KeyFile {
  public:
@@ -90,7 +125,8 @@ bool namesTypes(std::string_view types) {
 std::optional<DesktopEntry> DesktopEntry::parse(std::string_view bytes,
                                                 std::span<const std::string> languages) {
   KeyFile file;
-  if (bytes.find('\0') != std::string_view::npos || !file.load(bytes)) return std::nullopt;
+  if (bytes.find('\0') != std::string_view::npos || !file.load(linesThatCount(bytes)))
+    return std::nullopt;
   DesktopEntry entry;
   entry.isApplication =
       file.text(G_KEY_FILE_DESKTOP_KEY_TYPE) == G_KEY_FILE_DESKTOP_TYPE_APPLICATION &&

@@ -45,7 +45,7 @@ bool isFolder(int directory, const RawDirectory::Entry& entry) {
 class Walk {
  public:
   enum class Visit { goOn, stop };
-  using EntryVisitor = std::function<Visit(const std::string& relativePath)>;
+  using EntryVisitor = std::function<Visit(const std::string& relativePath, bool isThere)>;
   using FolderVisitor = std::function<Visit(const Folder& folder)>;
 
   Walk(const std::string& directory, EntryVisitor onEntry, FolderVisitor onFolder)
@@ -76,7 +76,8 @@ class Walk {
       const auto& name = (*entry)->name;
       if (name == "." || name == "..") continue;
       const std::string path = where.relativePath + std::string(name);
-      isStopped_ = onEntry_(path) == Visit::stop;
+      const auto type = (*entry)->type;
+      isStopped_ = onEntry_(path, type != DT_LNK && type != DT_UNKNOWN) == Visit::stop;
       if (where.depth == deepestEntryFolder || name.starts_with('.')) continue;
       if (isFolder(folder.descriptor(), **entry)) waiting_.push_back({path + "/", where.depth + 1});
     }
@@ -114,7 +115,7 @@ Result<std::vector<ListedEntry>> listEntries(const std::string& directory, std::
   std::vector<ListedEntry> entries;
   std::vector<std::string> refused;
   std::size_t count = 0;
-  const auto onEntry = [&](const std::string& path) {
+  const auto onEntry = [&](const std::string& path, bool isThere) {
     if (count++ == mostEntries) {
       leftOut.add(directory, "it has more entries than are read");
       return Walk::Visit::stop;
@@ -122,7 +123,7 @@ Result<std::vector<ListedEntry>> listEntries(const std::string& directory, std::
     auto identifier = identifierOfEntry(path);
     if (!identifier) return Walk::Visit::goOn;
     if (isApplicationIdentifier(*identifier)) {
-      entries.push_back({std::move(*identifier), path});
+      entries.push_back({std::move(*identifier), path, isThere});
     } else {
       refused.push_back(std::move(*identifier));
     }
@@ -138,7 +139,7 @@ Result<std::vector<ListedEntry>> listEntries(const std::string& directory, std::
 
 std::vector<std::string> foldersOfEntries(const std::string& directory, std::size_t most) {
   std::vector<std::string> folders;
-  const auto onEntry = [](const std::string&) { return Walk::Visit::goOn; };
+  const auto onEntry = [](const std::string&, bool) { return Walk::Visit::goOn; };
   const auto onFolder = [&](const Folder& folder) {
     if (folders.size() == most) return Walk::Visit::stop;
     std::string path = directory + "/" + folder.relativePath;

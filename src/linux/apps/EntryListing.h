@@ -15,6 +15,8 @@ inline constexpr unsigned deepestEntryFolder = 4;
 struct ListedEntry {
   std::string identifier;    ///< plausible, see `isApplicationIdentifier`
   std::string relativePath;  ///< below the directory
+  /// Something is there for sure: it is no link, which may lead to nothing.
+  bool isThere = false;
 };
 
 /// The desktop entries of one directory by their names, in the order of their identifiers, each

@@ -21,6 +21,9 @@ constexpr std::string_view noEntry = "its entry is no desktop entry";
 // again and keep them.
 constexpr std::int64_t longestTick = 20'000'000;
 
+// The entries of both types are looked at in turn, and by more than one thread.
+constexpr std::uint64_t passesKept = 4;
+
 bool isSettled(const ObjectStatus& status) {
   return status.changeTime < status.seenAt - longestTick;
 }
@@ -108,14 +111,10 @@ void EntryReader::keep(const std::string& path, const ObjectStatus& status,
   }
 }
 
-std::uint64_t EntryReader::beginPass() {
+void EntryReader::endPass() {
   const std::lock_guard lock(mutex_);
-  return ++pass_;
-}
-
-void EntryReader::forgetUnread(std::uint64_t pass) {
-  const std::lock_guard lock(mutex_);
-  std::erase_if(kept_, [pass](const auto& item) { return item.second.pass < pass; });
+  ++pass_;
+  std::erase_if(kept_, [this](const auto& item) { return item.second.pass + passesKept < pass_; });
 }
 
 }  // namespace mirabel

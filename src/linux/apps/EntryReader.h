@@ -33,10 +33,8 @@ class EntryReader {
   /// see `isPassing`.
   [[nodiscard]] Result<EntryReading> read(const std::string& path);
 
-  /// Begins a pass over all entries; answers its number, for `forgetUnread`.
-  [[nodiscard]] std::uint64_t beginPass();
-  /// Drops what was last read before that pass began.
-  void forgetUnread(std::uint64_t pass);
+  /// To be called after each look at many entries: drops what none of the last such looks read.
+  void endPass();
 
  private:
   struct Kept {

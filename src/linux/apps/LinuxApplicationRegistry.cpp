@@ -41,23 +41,19 @@ PropertyList infoDictionary(const DesktopEntry& entry, std::span<const std::stri
 
 }  // namespace
 
-/// One look at all entries, those of the user first.
+/// One look at the entries of a type.
 struct LinuxApplicationRegistry::Scan {
-  Scan(ApplicationType last, ContainerFolders::Opened opened)
-      : isWhole(last == ApplicationType::system), containers(std::move(opened)) {}
+  Scan(ApplicationType which, ContainerFolders::Opened opened)
+      : type(which), containers(std::move(opened)) {}
 
-  struct Application {
-    ApplicationType type;
-    std::optional<BundleProxy> proxy;  // nothing for an entry that can't be read
-  };
-
-  bool isWhole;
+  ApplicationType type;
   ContainerFolders::Opened containers;
-  std::vector<Application> applications{};
-  Entries entries{};
-  std::unordered_set<std::string> taken{};           // identifiers
-  std::unordered_set<std::uint64_t> takenFolders{};  // inodes of document folders
+  std::vector<std::optional<BundleProxy>> applications{};  // nothing for what can't be read
+  std::unordered_set<std::string> taken{};                 // identifiers
   std::size_t looks = 0;
+  Inodes documentsBefore{};  // of applications that come before
+  Inodes documents{};
+  Entries entries{};
   LeftOutList leftOut{};
 };
 
@@ -71,34 +67,58 @@ LinuxApplicationRegistry::LinuxApplicationRegistry(Options options)
 
 Result<void> LinuxApplicationRegistry::enumerateApplicationsOfType(ApplicationType type,
                                                                    const EnumerationBlock& block) {
-  const auto done = scan(type);
+  auto done = scan(type);
   if (!done) return fail(done.error());
+  const auto applications = std::move(done->applications);
   remember(*done);
-  for (const Scan::Application& application : done->applications)
-    if (application.type == type) block(application.proxy);
+  for (const std::optional<BundleProxy>& application : applications)
+    block(application);
   return {};
 }
 
-Result<LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::scan(ApplicationType last) {
+Result<LinuxApplicationRegistry::Scan> LinuxApplicationRegistry::scan(ApplicationType type) {
   auto containers = containers_.open();
   if (!containers) return fail(containers.error());
-  Scan result(last, std::move(*containers));
+  Scan result(type, std::move(*containers));
+  const std::size_t users = options_.directories.user.size();
+  const bool isSystem = type == ApplicationType::system;
   const std::string_view reason = result.containers.reason();
-  if (!reason.empty()) result.leftOut.add(ContainerFolders::pathInHome, reason);
-  const std::uint64_t pass = result.isWhole ? reader_.beginPass() : 0;
-  // Those of the user hide those of the system, so they are looked at in any case.
-  const std::size_t end =
-      result.isWhole ? finder_.directories().size() : options_.directories.user.size();
-  for (std::size_t i = 0; i < end; ++i)
+  if (!isSystem && !reason.empty()) result.leftOut.add(ContainerFolders::pathInHome, reason);
+  if (isSystem) {
+    const std::lock_guard lock(mutex_);
+    result.documentsBefore = users_.documents;
+  }
+  // Those of the user hide those of the system.
+  for (std::size_t i = 0; isSystem && i < users; ++i)
+    if (auto done = skipDirectory(i, result); !done) return fail(done.error());
+  const std::size_t end = isSystem ? finder_.directories().size() : users;
+  for (std::size_t i = isSystem ? users : 0; i < end; ++i)
     if (auto done = scanDirectory(i, result); !done) return fail(done.error());
-  if (result.isWhole) reader_.forgetUnread(pass);
+  reader_.endPass();
   return result;
+}
+
+// Takes the identifiers of the directory, and as many of the looks as its own enumeration would.
+Result<void> LinuxApplicationRegistry::skipDirectory(std::size_t number, Scan& scan) {
+  LeftOutList ignored;
+  const auto entries = finder_.list(number, ignored);
+  if (!entries) return fail(entries.error());
+  for (const ListedEntry& entry : *entries) {
+    if (scan.taken.contains(entry.identifier)) continue;
+    if (scan.looks == options_.mostApplications) break;
+    ++scan.looks;
+    if (!entry.isThere) {
+      const auto reading = reader_.read(finder_.directories()[number] + "/" + entry.relativePath);
+      if (!reading) return fail(reading.error());
+      if (reading->isAbsent()) continue;
+    }
+    scan.taken.insert(entry.identifier);
+  }
+  return {};
 }
 
 Result<void> LinuxApplicationRegistry::scanDirectory(std::size_t number, Scan& scan) {
   const auto entries = finder_.list(number, scan.leftOut);
-  const bool isUsers = number < options_.directories.user.size();
-  const ApplicationType type = isUsers ? ApplicationType::user : ApplicationType::system;
   if (!entries) return fail(entries.error());
   for (const ListedEntry& entry : *entries) {
     if (scan.taken.contains(entry.identifier)) continue;
@@ -108,28 +128,27 @@ Result<void> LinuxApplicationRegistry::scanDirectory(std::size_t number, Scan& s
     }
     ++scan.looks;
     const std::string path = finder_.directories()[number] + "/" + entry.relativePath;
-    if (auto done = scanEntry(entry.identifier, path, type, scan); !done) return done;
+    if (auto done = scanEntry(entry.identifier, path, scan); !done) return done;
   }
   return {};
 }
 
 Result<void> LinuxApplicationRegistry::scanEntry(const std::string& identifier,
-                                                 const std::string& path, ApplicationType type,
-                                                 Scan& scan) {
+                                                 const std::string& path, Scan& scan) {
   const auto reading = reader_.read(path);
   if (!reading) return fail(reading.error());
   if (reading->isAbsent()) return {};
   scan.taken.insert(identifier);
   if (!reading->entry) {
     scan.leftOut.add(identifier, reading->reason);
-    scan.applications.push_back({type, std::nullopt});
+    scan.applications.emplace_back(std::nullopt);
     return {};
   }
   if (!reading->entry->isApplication) return {};
   const auto look = scan.containers.look(identifier);
   if (!look) return fail(look.error());
   auto container = documentsOf(identifier, *look, scan);
-  scan.applications.push_back({type, makeProxy(identifier, *reading->entry, std::move(container))});
+  scan.applications.emplace_back(makeProxy(identifier, *reading->entry, std::move(container)));
   scan.entries.emplace(identifier, reading->entry);
   return {};
 }
@@ -139,27 +158,26 @@ std::optional<URL> LinuxApplicationRegistry::documentsOf(const std::string& iden
                                                          Scan& scan) {
   std::string_view reason = look.reason;
   // Two names may lead to one folder, where case does not count or something is mounted twice.
-  const bool isTaken = look.hasDocuments && !scan.takenFolders.insert(look.inode).second;
+  const bool isTaken = look.hasDocuments && (scan.documentsBefore.contains(look.inode) ||
+                                             !scan.documents.insert(look.inode).second);
   if (isTaken) reason = "its documents are those of another application";
   if (!reason.empty()) scan.leftOut.add(identifier, reason);
   if (!look.hasDocuments || isTaken) return {};
   return containers_.containerOf(identifier);
 }
 
-void LinuxApplicationRegistry::remember(const Scan& scan) {
+void LinuxApplicationRegistry::remember(Scan& scan) {
+  Seen seen{std::move(scan.entries), std::move(scan.documents), scan.leftOut.items()};
   const std::lock_guard lock(mutex_);
-  if (scan.isWhole) {
-    known_ = scan.entries;
-    leftOut_ = scan.leftOut.items();
-    return;
-  }
-  for (const auto& [identifier, entry] : scan.entries)
-    known_.insert_or_assign(identifier, entry);
+  (scan.type == ApplicationType::system ? systems_ : users_) = std::move(seen);
+  looked_.clear();
 }
 
 std::vector<LeftOut> LinuxApplicationRegistry::leftOut() const {
   const std::lock_guard lock(mutex_);
-  return leftOut_;
+  std::vector<LeftOut> all = users_.leftOut;
+  all.insert(all.end(), systems_.leftOut.begin(), systems_.leftOut.end());
+  return all;
 }
 
 // --- looking up one ------------------------------------------------------------------------------
@@ -199,17 +217,18 @@ void LinuxApplicationRegistry::learn(const std::string& identifier,
                                      std::shared_ptr<const DesktopEntry> entry) {
   const std::lock_guard lock(mutex_);
   if (entry == nullptr) {
-    known_.erase(identifier);
+    looked_.erase(identifier);
   } else {
-    known_.insert_or_assign(identifier, std::move(entry));
+    looked_.insert_or_assign(identifier, std::move(entry));
   }
 }
 
 std::shared_ptr<const DesktopEntry> LinuxApplicationRegistry::known(
     const std::string& identifier) const {
   const std::lock_guard lock(mutex_);
-  const auto found = known_.find(identifier);
-  return found == known_.end() ? nullptr : found->second;
+  for (const Entries* entries : {&looked_, &users_.entries, &systems_.entries})
+    if (const auto found = entries->find(identifier); found != entries->end()) return found->second;
+  return nullptr;
 }
 
 std::optional<PropertyList> LinuxApplicationRegistry::infoDictionaryValues(

@@ -8,6 +8,7 @@
 #include <string>
 #include <string_view>
 #include <unordered_map>
+#include <unordered_set>
 #include <vector>
 
 #include "linux/apps/ApplicationDirectories.h"
@@ -46,33 +47,43 @@ class LinuxApplicationRegistry final : public ApplicationRegistry {
   std::optional<PropertyList> infoDictionaryValues(const BundleProxy& application,
                                                    std::span<const std::string_view> keys) override;
 
-  /// What the last enumeration of the system's applications, which looks at those of the user as
-  /// well, did not tell of. In an order that depends on nothing but what is on the disk.
+  /// What the last enumerations, one of each type, did not tell of. In an order that depends on
+  /// nothing but what is on the disk.
   [[nodiscard]] std::vector<LeftOut> leftOut() const;
 
  private:
   using Entries = std::unordered_map<std::string, std::shared_ptr<const DesktopEntry>>;
+  using Inodes = std::unordered_set<std::uint64_t>;
   struct Scan;
 
-  [[nodiscard]] Result<Scan> scan(ApplicationType last);
+  [[nodiscard]] Result<Scan> scan(ApplicationType type);
+  [[nodiscard]] Result<void> skipDirectory(std::size_t number, Scan& scan);
   [[nodiscard]] Result<void> scanDirectory(std::size_t number, Scan& scan);
   [[nodiscard]] Result<void> scanEntry(const std::string& identifier, const std::string& path,
-                                       ApplicationType type, Scan& scan);
+                                       Scan& scan);
   [[nodiscard]] std::optional<URL> documentsOf(const std::string& identifier,
                                                const ContainerFolders::Look& look, Scan& scan);
-  void remember(const Scan& scan);
+  void remember(Scan& scan);
 
   [[nodiscard]] Result<std::optional<BundleProxy>> proxyOf(const std::string& identifier);
   [[nodiscard]] std::shared_ptr<const DesktopEntry> known(const std::string& identifier) const;
   void learn(const std::string& identifier, std::shared_ptr<const DesktopEntry> entry);
+
+  /// What was seen when the applications of one type were enumerated last.
+  struct Seen {
+    Entries entries;
+    Inodes documents;
+    std::vector<LeftOut> leftOut;
+  };
 
   const Options options_;
   const ContainerFolders containers_;
   EntryReader reader_;
   EntryFinder finder_;
   mutable std::mutex mutex_;
-  Entries known_;  // by identifier, as they were read last
-  std::vector<LeftOut> leftOut_;
+  Seen users_;
+  Seen systems_;
+  Entries looked_;  // those that were looked up since
 };
 
 }  // namespace mirabel

@@ -70,7 +70,8 @@ std::vector<std::string> identifiersOf(ApplicationRegistry& registry, Applicatio
 }
 
 std::string reasonFor(LinuxApplicationRegistry& registry, std::string_view identifier) {
-  static_cast<void>(identifiersOf(registry, ApplicationType::system));
+  for (const auto type : {ApplicationType::user, ApplicationType::system})
+    static_cast<void>(identifiersOf(registry, type));
   for (const LeftOut& item : registry.leftOut())
     if (item.identifier == identifier) return item.reason;
   return "";

@@ -141,10 +141,12 @@ TEST_F(HostileEntriesTest, NumbersAreBoundedTheSameWayEachTime) {
     EXPECT_EQ(reported.back(), "app11000");
     EXPECT_THAT(identifiersOf(bounded, ApplicationType::system), IsEmpty());
   }
-  EXPECT_THAT(bounded.leftOut(), SizeIs(1'001));
-  EXPECT_EQ(bounded.leftOut().front(),
-            (LeftOut{"app11001", "there are more applications than are looked at"}));
-  EXPECT_EQ(bounded.leftOut().back(), (LeftOut{"", "and 1001 more"}));
+  constexpr const char* reason = "there are more applications than are looked at";
+  const auto leftOut = bounded.leftOut();
+  ASSERT_THAT(leftOut, SizeIs(1'002));
+  EXPECT_EQ(leftOut.front(), (LeftOut{"app11001", reason}));
+  EXPECT_EQ(leftOut[1'000], (LeftOut{"", "and 1000 more"}));
+  EXPECT_EQ(leftOut.back(), (LeftOut{"system", reason}));
 
   options = home.options();
   options.mostDirectoryEntries = 100;
