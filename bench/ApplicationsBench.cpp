@@ -110,9 +110,9 @@ void runApplicationsBenchmarks(const Scale& scale) {
   const Applications applications = install(home, count);
   printHeading(std::to_string(count) + " applications, median of " + std::to_string(scale.rounds) +
                " rounds");
-  Comparison first{firstRow, {}, {}, 6.0};
-  Comparison again{againRow, {}, {}, 6.0};
-  Comparison lookup{lookupRow, {}, {}, 6.0};
+  Comparison first{firstRow, {}, {}, 7.0};
+  Comparison again{againRow, {}, {}, 5.0};
+  Comparison lookup{lookupRow, {}, {}, 5.0};
   for (int round = 0; round < scale.rounds; ++round) {
     LinuxApplicationRegistry registry(applications.options);
     const auto all = [&] { require(enumerate(registry) == count, "all of them are reported"); };

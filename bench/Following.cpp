@@ -12,7 +12,7 @@ constexpr std::size_t eventsPerRead = 1000;
 
 class Page final : public VesselEnumerationObserver {
  public:
-  void didEnumerateItems(const VesselItems& items) override { count = items.size(); }
+  void didEnumerateItems(const VesselItems& items) override { count += items.size(); }
   void finishEnumeratingUpToPage(const std::optional<Data>& page) override { next = page; }
   void finishEnumeratingWithError(const Error&) override { require(false, "a page is listed"); }
 

@@ -7,11 +7,8 @@
 
 #include "BenchHome.h"
 #include "foundation/Values.h"
-#include "fs/FSChangesEnumerator.h"
-#include "linux/files/LinuxPlatform.h"
-#include "linux/log/LoggingDiagnosticReporter.h"
+#include "host/HostedProvider.h"
 #include "linux/volume/VolumeIndex.h"
-#include "provider/LocalVessel.h"
 
 namespace mirabel::bench {
 

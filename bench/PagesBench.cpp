@@ -9,12 +9,9 @@
 #include <optional>
 
 #include "BenchHome.h"
-#include "fs/FSChangesEnumerator.h"
 #include "fs/FSDirectoryWalk.h"
+#include "host/HostedProvider.h"
 #include "items/ItemBatch.h"
-#include "linux/files/LinuxPlatform.h"
-#include "linux/log/LoggingDiagnosticReporter.h"
-#include "provider/LocalVessel.h"
 
 namespace mirabel::bench {
 namespace {
