@@ -32,6 +32,8 @@ enum class IconStep { primaryIconData, cachedBitmap, newData, newImage, finaliza
 struct IconFailure {
   IconStep step;
   Error error;
+
+  friend bool operator==(const IconFailure&, const IconFailure&) = default;
 };
 
 /// The icons of applications. Any thread may call it.
