@@ -1,0 +1,20 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "cli/Program.h"
+#include "provider/AppThumbnails.h"
+
+namespace mirabel {
+
+struct IconOptions {
+  std::string item;
+  std::string file;  ///< where the picture goes
+  std::int64_t size = 256;
+};
+/// Writes the icon of an app library's application as a PNG file, in place of what the file held.
+/// `thumbnails` are those of the program's session.
+ExitCode runIcon(Program& program, const AppThumbnails& thumbnails, const IconOptions& options);
+
+}  // namespace mirabel
