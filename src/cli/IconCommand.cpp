@@ -16,19 +16,20 @@ namespace {
 
 constexpr std::int64_t largestSize = 4096;
 
-Result<std::optional<Data>> pictureOf(const AppThumbnails& thumbnails,
-                                      const std::string& identifier, std::int64_t size) {
+Result<std::optional<Data>> pictureOf(const LocalVessel& provider, const std::string& identifier,
+                                      std::int64_t size) {
   Result<std::optional<Data>> picture;
   const auto side = static_cast<double>(size);
-  thumbnails.fetchThumbnailsForItemIdentifiers(
+  provider.fetchThumbnailsForItemIdentifiers(
       {identifier}, {side, side},
-      [&](std::string_view, std::optional<Data> image, std::optional<Error> error) {
-        if (error) {
-          picture = fail(*std::move(error));
-        } else {
-          picture = std::move(image);
-        }
-      },
+      AppThumbnails::PerThumbnailHandler(
+          [&](std::string_view, std::optional<Data> image, std::optional<Error> error) {
+            if (error) {
+              picture = fail(*std::move(error));
+            } else {
+              picture = std::move(image);
+            }
+          }),
       [](const auto&) {});
   return picture;
 }
@@ -45,7 +46,7 @@ Result<void> write(const std::string& file, const Data& bytes) {
 
 }  // namespace
 
-ExitCode runIcon(Program& program, const AppThumbnails& thumbnails, const IconOptions& options) {
+ExitCode runIcon(Program& program, const IconOptions& options) {
   if (options.size < 1 || options.size > largestSize) {
     return program.reportUsage("--size takes 1 to " + std::to_string(largestSize) + " pixels");
   }
@@ -53,7 +54,7 @@ ExitCode runIcon(Program& program, const AppThumbnails& thumbnails, const IconOp
   if (session == nullptr) return program.exitCode();
   const auto found = ItemArgument(options.item).item(*session);
   if (!found) return program.report(found.error(), "can't find " + options.item);
-  const auto picture = pictureOf(thumbnails, (*found)->itemIdentifier(), options.size);
+  const auto picture = pictureOf(session->provider(), (*found)->itemIdentifier(), options.size);
   if (!picture) return program.report(picture.error(), "can't get the icon of " + options.item);
   if (!*picture) {
     return program.reportFailed(options.item +

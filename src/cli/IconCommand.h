@@ -4,7 +4,6 @@
 #include <string>
 
 #include "cli/Program.h"
-#include "provider/AppThumbnails.h"
 
 namespace mirabel {
 
@@ -14,7 +13,6 @@ struct IconOptions {
   std::int64_t size = 256;
 };
 /// Writes the icon of an app library's application as a PNG file, in place of what the file held.
-/// `thumbnails` are those of the program's session.
-ExitCode runIcon(Program& program, const AppThumbnails& thumbnails, const IconOptions& options);
+ExitCode runIcon(Program& program, const IconOptions& options);
 
 }  // namespace mirabel

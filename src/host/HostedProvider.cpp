@@ -23,7 +23,7 @@ HostedProvider::HostedProvider(std::unique_ptr<LinuxPlatform> platform)
   vessel_ = std::make_unique<LocalVessel>(
       platform_->platform(), *libraries_, *libraries_,
       ChangeServices{events, diagnostics_, *enumerations_},
-      ApplicationServices{*libraries_, platform_->notifications()});
+      ApplicationServices{*libraries_, platform_->notifications(), platform_->icons()});
   trash_ = std::make_unique<HostTrash>(*vessel_, platform_->index().keptAttributes());
 }
 

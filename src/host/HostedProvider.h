@@ -29,6 +29,8 @@ class HostedProvider {
   [[nodiscard]] MRBAppLibraryManager& libraries() { return *libraries_; }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
+  /// Keeps up with applications that are installed and removed from now on.
+  void watchApplications() { platform_->watchApplications(); }
 
  private:
   explicit HostedProvider(std::unique_ptr<LinuxPlatform> platform);

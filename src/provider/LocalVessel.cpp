@@ -31,7 +31,9 @@ LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
       context_{platform_, identity_, owners},
       changes_(std::move(changes)),
       applications_(std::move(applications)) {
-  if (applications_) startUp();
+  if (!applications_) return;
+  thumbnails_.emplace(platform_.applications, applications_->icons);
+  startUp();
 }
 
 LocalVessel::~LocalVessel() {

@@ -18,6 +18,7 @@
 #include "platform/EnumerationObservers.h"
 #include "platform/NotificationCenter.h"
 #include "platform/Platform.h"
+#include "provider/AppThumbnails.h"
 
 namespace mirabel {
 
@@ -25,6 +26,7 @@ namespace mirabel {
 struct ApplicationServices {
   MRBAppLibraryManager& libraries;
   NotificationCenter& notifications;
+  IconService& icons;
 };
 
 /// The principal object that the host calls. Entry points may be called from any thread; lookups
@@ -146,6 +148,17 @@ class LocalVessel {
   void setFavoriteRank(const std::optional<Number>& rank, std::string_view forItemIdentifier,
                        const ItemHandler& completionHandler);
 
+  // Pictures of the app libraries, see `AppThumbnails`. Without applications nothing has one.
+
+  void fetchThumbnailsForItemIdentifiers(
+      const std::vector<std::string>& identifiers, const ThumbnailSize& requestedSize,
+      const AppThumbnails::PerThumbnailHandler& perThumbnailCompletionHandler,
+      const AppThumbnails::CompletionHandler& completionHandler) const;
+  void fetchThumbnailsForItemIdentifiers(
+      const std::vector<std::string>& identifiers, const ThumbnailSize& requestedSize,
+      const AppThumbnails::PerTypedThumbnailHandler& perThumbnailCompletionHandlerWithType,
+      const AppThumbnails::CompletionHandler& completionHandler) const;
+
   /// All content is local: these complete at once, without an error.
   void providePlaceholderAtURL(const URL& url, const ErrorHandler& completionHandler) const;
   void startProvidingItemAtURL(const URL& url, const ErrorHandler& completionHandler) const;
@@ -214,6 +227,7 @@ class LocalVessel {
   /// provider itself.
   struct InstalledAppsProxy;
   std::optional<ApplicationServices> applications_;
+  std::optional<AppThumbnails> thumbnails_;
   SerialQueue appRefreshQueue_{"mirabel.app-refresh.queue"};
   std::shared_ptr<InstalledAppsProxy> installedAppsProxy_;
   std::unique_ptr<VSPacer> appRefreshPacer_;

@@ -2,6 +2,7 @@
 #include <chrono>
 #include <mutex>
 #include <string>
+#include <utility>
 
 #include "foundation/Log.h"
 #include "provider/LocalVessel.h"
@@ -29,14 +30,14 @@ struct LocalVessel::InstalledAppsProxy {
 
 void LocalVessel::startUp() {
   installedAppsProxy_ = std::make_shared<InstalledAppsProxy>();
-  appRefreshPacer_ = std::make_unique<VSPacer>("mirabel.app-refresh.pacer", appRefreshQueue_,
-                                               minimumFireInterval);
+  appRefreshPacer_ =
+      std::make_unique<VSPacer>("mirabel.app-refresh.pacer", appRefreshQueue_, minimumFireInterval);
   appRefreshPacer_->setEventBlock([this] { refreshAppLibraries(); });
   appRefreshPacer_->resume();
   appRefreshPacer_->signal();
   installedAppsProxy_->provider = this;
-  for (const std::string_view name : {notification::applicationRegistered,
-                                        notification::applicationUnregistered}) {
+  for (const std::string_view name :
+       {notification::applicationRegistered, notification::applicationUnregistered}) {
     applications_->notifications.addObserver(
         installedAppsProxy_.get(), name,
         [proxy = std::weak_ptr(installedAppsProxy_)](std::string_view) {
@@ -73,6 +74,32 @@ void LocalVessel::refreshAppLibraries() {
     logInfo("notify changes on VesselWorkingSetContainerItemIdentifier");
     signal(platform_.manager, VesselWorkingSetContainerItemIdentifier);
   }
+}
+
+void LocalVessel::fetchThumbnailsForItemIdentifiers(
+    const std::vector<std::string>& identifiers, const ThumbnailSize& requestedSize,
+    const AppThumbnails::PerThumbnailHandler& perThumbnailCompletionHandler,
+    const AppThumbnails::CompletionHandler& completionHandler) const {
+  const auto forward = [&](std::string_view identifier, std::optional<Data> image,
+                           const std::optional<std::string>&, std::optional<Error> error) {
+    perThumbnailCompletionHandler(identifier, std::move(image), std::move(error));
+  };
+  fetchThumbnailsForItemIdentifiers(identifiers, requestedSize,
+                                    AppThumbnails::PerTypedThumbnailHandler(forward),
+                                    completionHandler);
+}
+
+void LocalVessel::fetchThumbnailsForItemIdentifiers(
+    const std::vector<std::string>& identifiers, const ThumbnailSize& requestedSize,
+    const AppThumbnails::PerTypedThumbnailHandler& perThumbnailCompletionHandlerWithType,
+    const AppThumbnails::CompletionHandler& completionHandler) const {
+  if (thumbnails_) {
+    return thumbnails_->fetchThumbnailsForItemIdentifiers(
+        identifiers, requestedSize, perThumbnailCompletionHandlerWithType, completionHandler);
+  }
+  for (const std::string& identifier : identifiers)
+    perThumbnailCompletionHandlerWithType(identifier, {}, {}, {});
+  completionHandler({});
 }
 
 void LocalVessel::waitForAppLibraries() {

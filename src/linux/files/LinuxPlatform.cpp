@@ -1,5 +1,6 @@
 #include "linux/files/LinuxPlatform.h"
 
+#include "linux/apps/ApplicationMonitor.h"
 #include "linux/apps/LinuxApplicationRegistry.h"
 #include "linux/apps/LocalNotificationCenter.h"
 #include "linux/events/LinuxEventStreams.h"
@@ -15,21 +16,35 @@
 #include "linux/files/LinuxVolumeHistory.h"
 #include "linux/files/PackageTypes.h"
 #include "linux/files/SystemClock.h"
+#include "linux/icons/LinuxIconService.h"
 #include "linux/operations/LinuxFileOperations.h"
 #include "linux/volume/StoredListingPositions.h"
 
 namespace mirabel {
 
+namespace {
+
+ApplicationPlaces placesOf(const LinuxApplicationRegistry::Options& registry) {
+  ApplicationPlaces places{registry.directories.user, registry.home + "/.var/app"};
+  const auto& ofSystem = registry.directories.system;
+  places.directories.insert(places.directories.end(), ofSystem.begin(), ofSystem.end());
+  return places;
+}
+
+}  // namespace
+
 // In the order in which they need each other.
 struct LinuxPlatform::Parts {
   Parts(HomeLayout where, std::unique_ptr<MonitoredRoots> folders,
         std::unique_ptr<VolumeIndex> volumeIndex, LinuxApplicationRegistry::Options registry,
-        FileCalls::Check check)
+        LinuxIconService::Options iconOptions, FileCalls::Check check)
       : layout(std::move(where)),
         roots(std::move(folders)),
         index(std::move(volumeIndex)),
         operations(*roots, *index, attributes, {PackageTypes::isPackageName, std::move(check)}),
-        applications(std::move(registry)) {}
+        places(placesOf(registry)),
+        applications(std::move(registry)),
+        icons(std::move(iconOptions)) {}
 
   HomeLayout layout;
   std::unique_ptr<MonitoredRoots> roots;
@@ -44,7 +59,9 @@ struct LinuxPlatform::Parts {
   LinuxDirectorySizer sizes{*roots};
   LinuxFileOperations operations;
   LocalNotificationCenter notifications;
+  ApplicationPlaces places;
   LinuxApplicationRegistry applications;
+  LinuxIconService icons;
   LinuxVesselManager manager{URL::fileURL(layout.documents)};
   LinuxVolumeHistory history{*index};
   LinuxEventStreams events{*index};
@@ -53,6 +70,7 @@ struct LinuxPlatform::Parts {
   LinuxCacheFiles caches{URL::fileURL(layout.applicationSupport), layout.stateFolder};
   Platform platform{resources,    attributes, objects, documents, directories, sizes, operations,
                     applications, manager,    history, clock,     positions,   caches};
+  std::unique_ptr<ApplicationMonitor> applicationMonitor;  // where it is wanted
 };
 
 Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
@@ -72,6 +90,10 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   registry.directories = ApplicationDirectories::of(
       layout->home, options.home ? ApplicationDirectories::Reach::homeAlone
                                  : ApplicationDirectories::Reach::wholeMachine);
+  const auto reach =
+      options.home ? IconFolders::Reach::homeAlone : IconFolders::Reach::wholeMachine;
+  LinuxIconService::Options icons{IconFolders::of(layout->home, reach),
+                                  chosenIconTheme(layout->home, reach)};
   const auto volume = statusOf(indexOptions.volumePath);
   if (!volume) return fail(volume.error());
   registry.device = volume->device;
@@ -79,7 +101,7 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   if (!index) return fail(index.error());
   return std::unique_ptr<LinuxPlatform>(new LinuxPlatform(std::make_unique<Parts>(
       std::move(*layout), std::move(roots), std::move(*index), std::move(registry),
-      std::move(options.checkFileCall))));
+      std::move(icons), std::move(options.checkFileCall))));
 }
 
 LinuxPlatform::LinuxPlatform(std::unique_ptr<Parts> parts) : parts_(std::move(parts)) {}
@@ -92,6 +114,16 @@ EventStreams& LinuxPlatform::events() const {
 
 LinuxApplicationRegistry& LinuxPlatform::applications() const {
   return parts_->applications;
+}
+
+IconService& LinuxPlatform::icons() const {
+  return parts_->icons;
+}
+
+void LinuxPlatform::watchApplications() {
+  if (parts_->applicationMonitor) return;
+  parts_->applicationMonitor = std::make_unique<ApplicationMonitor>(
+      ApplicationMonitor::Options{parts_->places}, parts_->notifications);
 }
 
 NotificationCenter& LinuxPlatform::notifications() const {

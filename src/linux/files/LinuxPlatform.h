@@ -14,6 +14,7 @@
 #include "linux/volume/VolumeIndex.h"
 #include "linux/watch/FolderWatcher.h"
 #include "platform/EventStreams.h"
+#include "platform/IconService.h"
 #include "platform/NotificationCenter.h"
 #include "platform/Platform.h"
 
@@ -60,7 +61,11 @@ class LinuxPlatform {
   /// The event history of the documents' volume.
   [[nodiscard]] EventStreams& events() const;
   [[nodiscard]] LinuxApplicationRegistry& applications() const;
-  /// Where it is told that applications were installed or removed.
+  [[nodiscard]] IconService& icons() const;
+  /// From now on it is told when applications are installed or removed; a command that ends soon
+  /// need not hear of it. Not thread-safe.
+  void watchApplications();
+  /// Where that is told.
   [[nodiscard]] NotificationCenter& notifications() const;
   /// Gives the signals to whoever listens.
   [[nodiscard]] LinuxVesselManager& manager() const;
