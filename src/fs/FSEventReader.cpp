@@ -8,7 +8,6 @@
 #include "fs/EventPlaces.h"
 #include "fs/LogText.h"
 #include "identity/MRBFileObjectIdentifier.h"
-#include "items/LocalAppLibraryItem.h"
 
 namespace mirabel {
 namespace {
@@ -171,19 +170,13 @@ void FSEventReader::processPath(const FileSystemEvent& event, const EventPlace& 
     logWhenVerbose([&] { return dropping(url) + "; URL is hidden"; });
     return tellDrop(event, url, DropReason::hidden);
   }
-  if (const auto library = appLibraryAt(url)) return tellUpdate(library, url);
+  if (const auto library = look_.appLibraryAt(url)) return tellUpdate(library, url);
   const ItemResult item = itemOf(event, url);
   if (!item) return tellFailure(event, url, item.error());
   if (*item) return tellUpdate(*item, url);
   if (event.fileID) return tellDeletion(MRBFileObjectIdentifier::fromFileID(*event.fileID), url);
   logWhenVerbose([&] { return "dropping fsevent at \"" + *event.path + "\"; No object at path"; });
   tellDrop(event, url, DropReason::noObject);
-}
-
-std::shared_ptr<LocalItem> FSEventReader::appLibraryAt(const URL& url) const {
-  if (url.lastPathComponent() != "Documents") return nullptr;
-  const auto proxy = context_.platform.applications.proxyAt(url);
-  return proxy ? LocalAppLibraryItem::create(context_, *proxy) : nullptr;
 }
 
 FSEventReader::ItemResult FSEventReader::itemOf(const FileSystemEvent& event,

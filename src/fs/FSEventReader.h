@@ -89,7 +89,6 @@ class FSEventReader : public std::enable_shared_from_this<FSEventReader> {
   void processPath(const FileSystemEvent& event, const EventPlace& place);
   void processDocument(const FileSystemEvent& event, const EventPlace& place);
   [[nodiscard]] ItemResult itemOf(const FileSystemEvent& event, const URL& url) const;
-  [[nodiscard]] std::shared_ptr<LocalItem> appLibraryAt(const URL& url) const;
 
   void tellUpdate(const std::shared_ptr<LocalItem>& item, const URL& url);
   void tellDeletion(const std::string& identifier, const std::optional<URL>& url);

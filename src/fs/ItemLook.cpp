@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "items/LocalAppLibraryItem.h"
+
 namespace mirabel {
 
 bool meansOutOfReach(const Error& error) {
@@ -15,8 +17,15 @@ ItemLook::ItemLook(const ItemContext& context, const HiddenTest& hiddenTest)
     : context_(context), hiddenTest_(hiddenTest) {}
 
 Result<std::shared_ptr<LocalItem>> ItemLook::at(const URL& url) const {
+  if (auto library = appLibraryAt(url)) return library;
   if (auto item = LocalItem::create(context_, url)) return item;
   return again(url);
+}
+
+std::shared_ptr<LocalItem> ItemLook::appLibraryAt(const URL& url) const {
+  if (url.lastPathComponent() != "Documents") return nullptr;
+  const auto proxy = context_.platform.applications.proxyAt(url);
+  return proxy ? LocalAppLibraryItem::create(context_, *proxy) : nullptr;
 }
 
 /// A second look with an empty cache: it tells what is wrong, or finds that nothing is any more.
@@ -28,6 +37,8 @@ Result<std::shared_ptr<LocalItem>> ItemLook::again(const URL& url) const {
   if (auto item = LocalItem::create(context_, fresh)) return item;
   // What is hidden may be no item for good reason; what left the monitored folders is not ours.
   if (hiddenTest_.isHidden(fresh)) return nullptr;
+  // The application has gone, and its library is about to.
+  if (context_.identity.isAppLibraryRoot(fresh)) return nullptr;
   return fail(Error::posix(EIO, "can't make an item of \"" + fresh.path() + "\""));
 }
 

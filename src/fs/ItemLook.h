@@ -20,7 +20,9 @@ class ItemLook {
   /// The item at `url`; null when nothing is there any more, or nothing of the monitored folders.
   /// An error says that something is there and why it cannot be told: POSIX.
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> at(const URL& url) const;
-  /// The same for the object of that file ID, wherever it lies now.
+  /// The app library whose folder this is; null when it is none's.
+  [[nodiscard]] std::shared_ptr<LocalItem> appLibraryAt(const URL& url) const;
+  /// What `at` answers for the object of that file ID, wherever it lies now.
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> ofFileID(std::uint64_t fileID) const;
   /// Where the object lies; nothing when there is none.
   [[nodiscard]] Result<std::optional<URL>> placeOf(std::uint64_t fileID) const;

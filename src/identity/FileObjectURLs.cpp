@@ -1,5 +1,6 @@
 #include "identity/FileObjectURLs.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <limits>
@@ -132,6 +133,13 @@ const URL* FileObjectURLs::rootHolding(const URL& canonical,
     if (canonical.path().starts_with(library.path())) return &library;
   }
   return canonical.path().starts_with(canonicalStorage_.path()) ? &canonicalStorage_ : nullptr;
+}
+
+bool FileObjectURLs::isAppLibraryRoot(const URL& url) const {
+  const URL canonical = url.properURL();
+  return std::ranges::any_of(*roots_.rootURLsForAppLibraries(), [&](const URL& library) {
+    return library.path() == canonical.path();
+  });
 }
 
 /// Whether it is shown as a folder: a package is a document.

@@ -30,6 +30,9 @@ class FileObjectURLs {
   /// for one that was prefetched, does not touch the disk.
   [[nodiscard]] std::optional<std::string> itemIdentifier(const URL& url) const;
 
+  /// Whether it is the document folder of an app library.
+  [[nodiscard]] bool isAppLibraryRoot(const URL& url) const;
+
   /// The URL of the root container, of "fid=N" and of "did=N"; the path as the volume returns it.
   /// The URL is made anew, with an empty resource cache. Blocks for up to 5 ms while the volume
   /// asks for patience.

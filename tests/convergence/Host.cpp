@@ -84,9 +84,20 @@ std::string Host::identifierOf(const std::string& path) const {
   return provider_->vessel().persistentIdentifierForItemAtURL(URL::fileURL(path)).value_or("");
 }
 
+void Host::refreshAppLibraries() {
+  MRBAppLibraryManager& libraries = provider_->libraries();
+  libraries.refreshFromRegistry();
+  libraries.upgradeFromMainCache();
+  libraries.followLibraries(provider_->linuxPlatform().events());
+}
+
 std::shared_ptr<VesselEnumerator> Host::enumerator(const std::string& container) {
+  if (const auto known = enumerators_.find(container); known != enumerators_.end()) {
+    return known->second;
+  }
   auto made = provider_->vessel().enumeratorForContainerItemIdentifier(container);
   EXPECT_TRUE(made) << container << ": " << (made ? "" : made.error().description());
+  if (made && container.starts_with("Vessel")) enumerators_[container] = *made;
   return made.value_or(nullptr);
 }
 
@@ -98,7 +109,15 @@ void Host::apply(Replica& replica, const LocalItem& item) const {
     replica.items.erase(item.itemIdentifier());
     return;
   }
-  replica.items.insert_or_assign(item.itemIdentifier(), heldItem(item));
+  HeldItem held = heldItem(item);
+  // The working set is told of app libraries when they come or go, not of what they are called or
+  // of their dates and counts.
+  const bool isLibrary = item.itemIdentifier().starts_with('#');
+  if (isLibrary && replica.container == VesselWorkingSetContainerItemIdentifier) {
+    held.filename = "library";
+    held.text.clear();
+  }
+  replica.items.insert_or_assign(item.itemIdentifier(), std::move(held));
 }
 
 Replica Host::list(const std::string& container) {

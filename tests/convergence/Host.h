@@ -35,6 +35,9 @@ class Host {
   /// The kernel's queue loses what it holds and what comes before it is read next.
   void dropRecords() { faults_->loses = true; }
 
+  /// Looks which applications are installed, as it does when it starts.
+  void refreshAppLibraries();
+
   /// Takes an anchor, then lists.
   [[nodiscard]] Replica list(const std::string& container);
   /// Asks for changes until there are no more, and applies them; lists again when told to start
@@ -48,6 +51,8 @@ class Host {
   void apply(Replica& replica, const LocalItem& item) const;
 
   std::unique_ptr<HostedProvider> provider_;
+  /// Those of the root, the working set and all directories, which know what was told last.
+  std::map<std::string, std::shared_ptr<VesselEnumerator>> enumerators_;
 };
 
 }  // namespace mirabel::testing

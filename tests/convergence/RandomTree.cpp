@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <stdio.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
@@ -24,13 +25,22 @@ void writeFile(const std::string& path, std::size_t size, std::ios::openmode mod
 }  // namespace
 
 std::vector<std::string> RandomTree::all(bool folders) const {
-  std::vector<std::string> result;
-  if (folders) result.push_back(root_);
-  for (const auto& entry : fs::recursive_directory_iterator(root_)) {
-    if (fs::is_directory(entry.symlink_status()) == folders) result.push_back(entry.path());
+  std::vector<std::string> roots{root_}, result;
+  std::ranges::copy_if(others_, std::back_inserter(roots), [](const std::string& other) {
+    return fs::is_directory(fs::symlink_status(other));
+  });
+  for (const std::string& root : roots) {
+    if (folders) result.push_back(root);
+    for (const auto& entry : fs::recursive_directory_iterator(root)) {
+      if (fs::is_directory(entry.symlink_status()) == folders) result.push_back(entry.path());
+    }
   }
   std::ranges::sort(result);
   return result;
+}
+
+bool RandomTree::isRoot(const std::string& folder) const {
+  return folder == root_ || std::ranges::find(others_, folder) != others_.end();
 }
 
 std::string RandomTree::any(bool folders) {
@@ -139,7 +149,7 @@ std::string RandomTree::changeLinked(const std::string& to) {
 std::string RandomTree::change() {
   const std::size_t kind = pick(22);
   const std::string file = any(false), folder = any(true), to = anyName();
-  const bool isRoot = folder == root_;
+  const bool isFixed = isRoot(folder);
   switch (kind) {
     case 0:
     case 1:
@@ -156,13 +166,13 @@ std::string RandomTree::change() {
       ::rename(file.c_str(), to.c_str());
       return "rename " + file + " to " + to;
     case 6:
-      if (!isRoot) ::rename(folder.c_str(), to.c_str());
+      if (!isFixed) ::rename(folder.c_str(), to.c_str());
       return "rename folder " + folder + " to " + to;
     case 7:
       ::unlink(file.c_str());
       return "unlink " + file;
     case 8:
-      if (!isRoot && pick(3) == 0) fs::remove_all(folder);
+      if (!isFixed && pick(3) == 0) fs::remove_all(folder);
       return "maybe remove tree " + folder;
     case 9:
       static_cast<void>(::symlink("nowhere", to.c_str()));
@@ -183,7 +193,7 @@ std::string RandomTree::change() {
     }
     case 14: {
       const std::string out = outside_ + "/" + std::to_string(pick(3));
-      ::rename((pick(2) == 0 && !isRoot ? folder : file).c_str(), out.c_str());
+      ::rename((pick(2) == 0 && !isFixed ? folder : file).c_str(), out.c_str());
       return "move out " + folder + " or " + file;
     }
     case 15:
@@ -199,7 +209,7 @@ std::string RandomTree::change() {
     default: {
       const std::string folderTo =
           fs::path(folder).parent_path() / (pick(2) == 0 ? "kind.quill" : "kind");
-      if (!isRoot) ::rename(folder.c_str(), folderTo.c_str());
+      if (!isFixed) ::rename(folder.c_str(), folderTo.c_str());
       return "rename folder " + folder + " to " + folderTo;
     }
   }

@@ -10,8 +10,12 @@ namespace mirabel::testing {
 /// file system refuses is no change.
 class RandomTree {
  public:
-  RandomTree(std::string root, std::string outside, unsigned seed)
-      : root_(std::move(root)), outside_(std::move(outside)), random_(seed) {}
+  /// `others` are further folders in which things happen, whenever they are there.
+  RandomTree(std::string root, std::vector<std::string> others, std::string outside, unsigned seed)
+      : root_(std::move(root)),
+        others_(std::move(others)),
+        outside_(std::move(outside)),
+        random_(seed) {}
 
   /// Makes one, and answers what it was, for people.
   std::string change();
@@ -29,7 +33,10 @@ class RandomTree {
   void linkNameless(const std::string& to);
   std::string changeLinked(const std::string& to);
 
+  [[nodiscard]] bool isRoot(const std::string& folder) const;
+
   std::string root_;
+  std::vector<std::string> others_;
   std::string outside_;  ///< a folder on the same file system that is not presented
   std::mt19937 random_;
 };

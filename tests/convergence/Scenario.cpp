@@ -11,6 +11,7 @@
 
 #include "cli/Printing.h"
 #include "convergence/Host.h"
+#include "convergence/RandomApplications.h"
 #include "convergence/RandomTree.h"
 #include "support/TempHome.h"
 
@@ -73,7 +74,10 @@ std::string difference(const Replica& replica, const Replica& fresh) {
 
 class Run {
  public:
-  Run() : outside_(home_.path() + "/outside"), tree_(home_.documents(), outside_, 0) {
+  Run()
+      : outside_(home_.path() + "/outside"),
+        applications_(home_.path()),
+        tree_(home_.documents(), applications_.libraries(), outside_, 0) {
     std::filesystem::create_directory(outside_);
     home_.makeFolder("watched");
     open();
@@ -93,9 +97,14 @@ class Run {
       case Step::Kind::change:
         tell(tree_.change());
         return true;
+      case Step::Kind::install:
+        tell(applications_.change(tree_));
+        return true;
       case Step::Kind::restart:
         tell("restart");
         host_.reset();
+        for (std::size_t damages = tree_.pick(3); damages > 0; --damages)
+          tell("  " + applications_.damage(tree_));
         open();
         return true;
       case Step::Kind::kill:
@@ -129,6 +138,9 @@ class Run {
   }
 
   bool catchUp() {
+    // As whoever hears of applications does. Until then an app library whose folder is gone is
+    // left out of listings, and its going is not told yet.
+    host_->refreshAppLibraries();
     for (Replica& replica : replicas_) {
       // A folder that is gone or out of sight is nobody's container any more.
       if (replica.container == watched_ && host_->identifierOf(home_.at("watched")) != watched_) {
@@ -147,6 +159,7 @@ class Run {
 
   TempHome home_;
   std::string outside_;
+  RandomApplications applications_;
   RandomTree tree_;
   std::unique_ptr<Host> host_;
   std::string watched_;
@@ -164,7 +177,7 @@ std::vector<Step> stepsOf(unsigned seed) {
     add(Step::Kind::change);
   for (int round = 0; round < 8; ++round) {
     for (unsigned changes = 1 + pick(12); changes > 0; --changes)
-      add(Step::Kind::change);
+      add(pick(10) == 0 ? Step::Kind::install : Step::Kind::change);
     const unsigned interruption = pick(12);
     if (interruption < 3) add(Step::Kind::restart);
     if (interruption == 3) add(Step::Kind::kill);

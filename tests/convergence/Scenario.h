@@ -11,6 +11,7 @@ namespace mirabel::testing {
 struct Step {
   enum class Kind {
     change,   ///< to the tree, while the host runs
+    install,  ///< applications come, go or change
     restart,  ///< the host ends in order and starts again
     kill,     ///< a process that catches up is killed while the tree is changed
     drop,     ///< the kernel's queue loses what it holds

@@ -34,6 +34,9 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] Result<std::uint64_t> folderID(const std::string& path, int folder,
                                                const ObjectStatus& status);
 
+  /// File ID of the root at `path`; takes in what has become of its own dates and count.
+  [[nodiscard]] Result<std::uint64_t> rootID(const std::string& path);
+
   /// Fills in the identities of names seen in that folder. A name that went away meanwhile is
   /// left with the file ID 0; of one that another object has taken, status and kind are renewed.
   /// Answers the file ID of the folder.
@@ -103,7 +106,6 @@ class Learner final : private FolderIdentities {
   /// The row of what is seen, if that stands where the index has it.
   [[nodiscard]] Result<std::optional<ObjectRow>> objectInPlace(const SeenObject& seen);
   [[nodiscard]] Result<std::optional<std::string>> search(ObjectRow row);
-  [[nodiscard]] Result<std::uint64_t> rootID(const std::string& path);
   [[nodiscard]] Result<std::vector<ObjectRow>> occupants(std::uint64_t folder,
                                                          std::span<const Sighting> sightings);
 

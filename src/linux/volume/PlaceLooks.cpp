@@ -175,13 +175,23 @@ Result<void> PlaceLooks::lookAtOthers() {
 Result<bool> PlaceLooks::lookAtObject(const ObjectRow& row) {
   auto path = context_.paths.pathOf(*row.location);
   if (!path) return fail(path.error());
-  if (!*path || row.location->folder == 0) return true;
+  if (!*path) return true;
+  if (row.location->folder == 0) return lookAtRoot(**path);
   const auto look = lookAt(context_.roots, **path);
   if (!look || look->seen.status.inode != row.inode) return false;
   const bool isPackage = context_.isPackageName(row.location->name);
   auto learned = context_.learner.learnPath(**path, look->seen.status, isPackage);
   if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
   return learned.has_value();
+}
+
+/// The document storage is no item; the other roots are.
+Result<bool> PlaceLooks::lookAtRoot(const std::string& path) {
+  if (path == context_.roots.firstPath()) return true;
+  auto id = context_.learner.rootID(path);
+  // What has become of a root that is not there is found when roots are looked at.
+  if (!id && !isOutOfReach(id.error())) return fail(id.error());
+  return true;
 }
 
 // Its count and its dates are those of a new state as well. A change of its mode may have made it

@@ -51,6 +51,7 @@ class PlaceLooks {
   [[nodiscard]] Result<void> noteOthers(const Look& look, const ObjectStatus* status);
   /// False when it does not lie where the index has it.
   [[nodiscard]] Result<bool> lookAtObject(const ObjectRow& row);
+  [[nodiscard]] Result<bool> lookAtRoot(const std::string& path);
   [[nodiscard]] Result<void> lookAtItself(const Folder& folder, bool attributesChanged);
   void followFolder(const FolderWatcher& watcher, const Folder& folder, const Sighting& sighting);
 

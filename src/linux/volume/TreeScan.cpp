@@ -43,7 +43,10 @@ Result<void> TreeScan::addRoot(const std::string& path) {
     return missing_.add(0, path);
   }
   if (!folder) return fail(folder.error());
-  auto id = context_.learner.folderID(path, folder->get());
+  // Nobody above it is read who would see what has become of itself.
+  const bool isItem = path != context_.roots.firstPath();
+  auto id = isItem ? context_.learner.rootID(path) : context_.learner.folderID(path, folder->get());
+  if (!id && isDisturbance(id.error())) return missing_.add(0, path);
   if (!id) return fail(id.error());
   add(path, *id, Depth::everything);
   return {};
