@@ -24,10 +24,10 @@ std::optional<std::int64_t> secondsIn(char unit) {
 std::optional<Date> ago(std::string_view text, const Date& now) {
   if (text.empty() || text.front() == '-') return {};
   const auto unit = secondsIn(text.back());
-  const char* end = text.data() + text.size() - 1;
+  const std::string_view digits = text.substr(0, text.size() - 1);
   std::int64_t count = 0;
-  const auto [stopped, failure] = std::from_chars(text.data(), end, count);
-  if (!unit || failure != std::errc() || stopped != end) return {};
+  const auto [stopped, failure] = std::from_chars(digits.begin(), digits.end(), count);
+  if (!unit || failure != std::errc() || stopped != digits.end()) return {};
   if (count > std::numeric_limits<std::int64_t>::max() / *unit) return {};
   const std::int64_t age = count * *unit;
   if (age > now.seconds - Date::earliest.seconds) return {};

@@ -1,3 +1,5 @@
+#include <cstddef>
+#include <cstdint>
 #include <limits>
 #include <memory>
 #include <semaphore>
@@ -21,10 +23,10 @@ constexpr std::ptrdiff_t mostDeletionsUnderway = 64;
 
 /// One level: what lies in a trashed folder was not trashed by itself, carries no date and is to
 /// get none. Hidden names as well, for people trash these too; they would be kept for ever.
+constexpr EnumeratorOptions oneLevel{EnumeratorOptions::skipsPackageDescendants,
+                                     EnumeratorOptions::skipsSubdirectoryDescendants};
+
 FSDirectoryEnumerator entriesOf(URL folder) {
-  using Options = EnumeratorOptions;
-  constexpr Options oneLevel{Options::skipsPackageDescendants,
-                             Options::skipsSubdirectoryDescendants};
   return {.urls = {std::move(folder)},
           .limit = std::numeric_limits<std::uint64_t>::max(),
           .directoryEnumerationOptionsFor = [](const URL&) { return oneLevel; }};

@@ -33,6 +33,15 @@ Result<Data> readAll(int descriptor, std::size_t limit) {
 
 }  // namespace
 
+std::string joinedPath(std::initializer_list<std::string_view> parts) {
+  std::string path;
+  for (const std::string_view part : parts) {
+    if (!path.empty()) path += '/';
+    path += part;
+  }
+  return path;
+}
+
 bool isRegularFile(const std::string& path) {
   struct stat status {};
   return ::stat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode);

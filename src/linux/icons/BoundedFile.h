@@ -1,12 +1,17 @@
 #pragma once
 
 #include <cstddef>
+#include <initializer_list>
 #include <string>
+#include <string_view>
 
 #include "foundation/Error.h"
 #include "foundation/Values.h"
 
 namespace mirabel {
+
+/// The parts with a slash between each two.
+[[nodiscard]] std::string joinedPath(std::initializer_list<std::string_view> parts);
 
 /// Whether a regular file lies there, or a link to one.
 [[nodiscard]] bool isRegularFile(const std::string& path);

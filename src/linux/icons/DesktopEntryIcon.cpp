@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <string_view>
 
+#include "linux/icons/BoundedFile.h"
 #include "linux/icons/KeyFile.h"
 
 namespace mirabel {
@@ -21,8 +22,9 @@ bool isFileName(std::string_view text) {
 Result<std::string> iconOfDesktopEntry(const std::vector<std::string>& folders,
                                        const std::string& identifier) {
   if (!isFileName(identifier)) return fail(Error::posix(EINVAL, "no name of a desktop entry"));
+  const std::string name = identifier + ".desktop";
   for (const std::string& folder : folders) {
-    const auto entry = KeyFile::read(folder + "/" + identifier + ".desktop", largestEntry);
+    const auto entry = KeyFile::read(joinedPath({folder, name}), largestEntry);
     if (!entry && entry.error().isPosix(ENOENT)) continue;
     if (!entry) return fail(entry.error());
     auto icon = entry->text(entryGroup, "Icon");

@@ -84,7 +84,7 @@ std::optional<std::string> IconLookup::findIn(const IconTheme& index, const std:
 /// By the first index of that theme; its pictures lie in all of the folders.
 std::optional<IconTheme> IconLookup::read(const std::string& theme) const {
   for (const std::string& folder : folders_.themes) {
-    auto index = IconTheme::read(folder + "/" + theme + "/index.theme");
+    auto index = IconTheme::read(joinedPath({folder, theme, "index.theme"}));
     if (index) return *std::move(index);
   }
   if (theme == commonTheme) return IconTheme::hicolor();
@@ -94,14 +94,15 @@ std::optional<IconTheme> IconLookup::read(const std::string& theme) const {
 std::optional<std::string> IconLookup::fileIn(const std::string& theme,
                                               const IconThemeDirectory& directory) const {
   for (const std::string& folder : folders_.themes) {
-    if (auto found = fileBelow(folder + "/" + theme + "/" + directory.path)) return found;
+    if (auto found = fileBelow(joinedPath({folder, theme, directory.path}))) return found;
   }
   return {};
 }
 
 std::optional<std::string> IconLookup::fileBelow(const std::string& folder) const {
   for (const std::string& ending : endings_) {
-    std::string path = folder + "/" + name_ + ending;
+    std::string path = joinedPath({folder, name_});
+    path += ending;
     if (isRegularFile(path)) return path;
   }
   return {};

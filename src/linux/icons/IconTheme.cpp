@@ -108,8 +108,9 @@ IconTheme IconTheme::hicolor() {
   for (const int size : {16, 22, 24, 32, 36, 48, 64, 72, 96, 128, 192, 256, 512}) {
     for (const int scale : {1, 2}) {
       const std::string side = std::to_string(size);
+      const std::string_view suffix = scale == 1 ? "/apps" : "@2/apps";
       IconThemeDirectory directory;
-      directory.path = side + "x" + side + (scale == 1 ? "" : "@2") + "/apps";
+      directory.path.append(side).append("x").append(side).append(suffix);
       directory.size = directory.minSize = directory.maxSize = size;
       directory.scale = scale;
       theme.directories.push_back(std::move(directory));
