@@ -1,10 +1,12 @@
 #include "applibrary/LocalAppLibraryManager.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <utility>
 
 #include "applibrary/SearchIndexCleanup.h"
 #include "foundation/Log.h"
+#include "identity/MRBFileObjectIdentifier.h"
 
 namespace mirabel {
 
@@ -106,11 +108,16 @@ void LocalAppLibraryManager::report(const AppLibraryContent& former, const AppLi
       items.push_back(library.item);
     observer->didUpdateItems(items);
   }
+  // By the records: a library whose folder had gone when this began was never made an item here,
+  // and is held all the same by whoever was told of it before.
   std::vector<std::string> deleted;
-  for (const AppLibraryContent::Library& library : former.libraries()) {
-    const std::string& identifier = library.item->itemIdentifier();
-    if (next.withItemIdentifier(identifier) == nullptr) deleted.push_back(identifier);
+  for (const BundleProxy& record : former.records()) {
+    std::string identifier = MRBFileObjectIdentifier::fromBundleProxy(record);
+    if (next.withItemIdentifier(identifier) == nullptr) deleted.push_back(std::move(identifier));
   }
+  std::ranges::sort(deleted);
+  const auto repeated = std::ranges::unique(deleted);
+  deleted.erase(repeated.begin(), repeated.end());
   if (deleted.empty()) return;
   if (observer != nullptr) observer->didDeleteItemsWithIdentifiers(deleted);
   deleteIndexOfDeletedAppLibraries(platform_.manager, deleted);

@@ -45,6 +45,10 @@ std::vector<std::string> RandomApplications::libraries() const {
   return folders;
 }
 
+bool RandomApplications::isInstalled(const std::string& library) const {
+  return fs::exists(entryOf(fs::path(library).parent_path().filename()));
+}
+
 // As whoever installs it does: in one go.
 void RandomApplications::install(const std::string& application, const std::string& name) const {
   const std::string entry = entryOf(application), temporary = entry + ".new";

@@ -15,6 +15,8 @@ class RandomApplications {
 
   /// The document folders that the applications have or could have.
   [[nodiscard]] std::vector<std::string> libraries() const;
+  /// Whether the application whose folder that is is installed.
+  [[nodiscard]] bool isInstalled(const std::string& library) const;
   /// Makes one, and answers what it was, for people.
   std::string change(RandomTree& random);
   /// What may become of the files of the list while nobody has them in use.

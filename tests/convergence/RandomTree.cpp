@@ -39,6 +39,14 @@ std::vector<std::string> RandomTree::all(bool folders) const {
   return result;
 }
 
+bool RandomTree::mayBeWritten(const std::string& file) const {
+  struct stat status {};
+  if (::stat(file.c_str(), &status) != 0 || status.st_nlink < 2) return true;
+  return std::ranges::none_of(others_, [&](const std::string& other) {
+    return file.starts_with(other + "/") && !isPresented_(other);
+  });
+}
+
 bool RandomTree::isRoot(const std::string& folder) const {
   return folder == root_ || std::ranges::find(others_, folder) != others_.end();
 }
@@ -130,6 +138,7 @@ std::string RandomTree::changeLinked(const std::string& to) {
   const std::string file = anyLinked();
   switch (pick(5)) {
     case 0:
+      if (!mayBeWritten(file)) return "nothing";
       writeFile(file, pick(9) + 1, std::ios::app);
       return "append linked " + file;
     case 1:
@@ -153,9 +162,11 @@ std::string RandomTree::change() {
   switch (kind) {
     case 0:
     case 1:
+      if (!mayBeWritten(to)) return "nothing";
       writeFile(to, pick(60), std::ios::trunc);
       return "write " + to;
     case 2:
+      if (!mayBeWritten(file)) return "nothing";
       if (file != root_ + "/none") writeFile(file, pick(9) + 1, std::ios::app);
       return "append " + file;
     case 3:
@@ -181,9 +192,11 @@ std::string RandomTree::change() {
       ::renameat2(AT_FDCWD, file.c_str(), AT_FDCWD, to.c_str(), RENAME_EXCHANGE);
       return "exchange " + file + " and " + to;
     case 11:
+      if (!mayBeWritten(file)) return "nothing";
       ::chmod(file.c_str(), pick(2) == 0 ? 0400 : 0644);
       return "chmod " + file;
     case 12:
+      if (!mayBeWritten(file)) return "nothing";
       ::lsetxattr(file.c_str(), "user.com.norvane.favorite-rank.number#PS", "x", pick(2), 0);
       return "setxattr " + file;
     case 13: {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <random>
 #include <string>
 #include <vector>
@@ -10,10 +11,15 @@ namespace mirabel::testing {
 /// file system refuses is no change.
 class RandomTree {
  public:
-  /// `others` are further folders in which things happen, whenever they are there.
-  RandomTree(std::string root, std::vector<std::string> others, std::string outside, unsigned seed)
+  /// `others` are further folders in which things happen, whenever they are there. What is written
+  /// to a file through a name in one of them that is not presented at the time is no change that
+  /// its other names must tell.
+  RandomTree(std::string root, std::vector<std::string> others,
+             std::function<bool(const std::string&)> isPresented, std::string outside,
+             unsigned seed)
       : root_(std::move(root)),
         others_(std::move(others)),
+        isPresented_(std::move(isPresented)),
         outside_(std::move(outside)),
         random_(seed) {}
 
@@ -33,10 +39,12 @@ class RandomTree {
   void linkNameless(const std::string& to);
   std::string changeLinked(const std::string& to);
 
+  [[nodiscard]] bool mayBeWritten(const std::string& file) const;
   [[nodiscard]] bool isRoot(const std::string& folder) const;
 
   std::string root_;
   std::vector<std::string> others_;
+  std::function<bool(const std::string&)> isPresented_;
   std::string outside_;  ///< a folder on the same file system that is not presented
   std::mt19937 random_;
 };

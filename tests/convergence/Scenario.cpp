@@ -77,7 +77,9 @@ class Run {
   Run()
       : outside_(home_.path() + "/outside"),
         applications_(home_.path()),
-        tree_(home_.documents(), applications_.libraries(), outside_, 0) {
+        tree_(home_.documents(), applications_.libraries(),
+              [this](const std::string& library) { return applications_.isInstalled(library); },
+              outside_, 0) {
     std::filesystem::create_directory(outside_);
     home_.makeFolder("watched");
     open();

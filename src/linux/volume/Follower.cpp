@@ -137,6 +137,8 @@ std::optional<std::vector<RecentPlace>> Follower::placesOf(std::uint64_t inode) 
   if (!isInStep_) return std::nullopt;
   auto isSound = drain();
   if (!isSound || !*isSound) {
+    // Whoever is following records at this moment has lost some.
+    hasLost_ = true;
     isInStep_ = false;
     return std::nullopt;
   }
