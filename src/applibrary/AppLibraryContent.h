@@ -36,10 +36,14 @@ class AppLibraryContent {
   [[nodiscard]] bool hasRoomFor(const BundleProxy& record) const;
   /// There must be room for it.
   void add(Library library);
-  /// To be called after the last `add`.
+  /// A library there is room for could not be made an item: its folder may be about to come or go.
+  void addUnmade() { isComplete_ = false; }
+  /// To be called after the last of these.
   void finish(std::vector<BundleProxy> allRecords);
 
   [[nodiscard]] std::uint64_t versionToken() const { return versionToken_; }
+  /// Whether another try with the same records would come to the same.
+  [[nodiscard]] bool isComplete() const { return isComplete_; }
   /// As the cache held them, those that were left out among them.
   [[nodiscard]] const std::vector<BundleProxy>& records() const { return records_; }
   /// In the order of the records.
@@ -59,6 +63,7 @@ class AppLibraryContent {
   [[nodiscard]] bool isClaimed(const std::string& path) const;
 
   std::uint64_t versionToken_;
+  bool isComplete_ = true;
   std::string documentStorage_;  ///< canonical path
   std::vector<BundleProxy> records_;
   std::vector<Library> libraries_;

@@ -22,7 +22,7 @@ bool LocalAppLibraryManager::upgradeFromMainCache(VesselChangeObserver* observer
   const LogSection section("upgrading content from main cache");
   const Version former = current();
   const std::uint64_t mainToken = caches_.main.versionToken();
-  if (mainToken == former->versionToken()) return false;
+  if (mainToken == former->versionToken() && former->isComplete()) return false;
   if (former->versionToken() > mainToken) {
     logError("version token shouldn't be greater than the main's cache version (" +
              std::to_string(former->versionToken()) + " vs " + std::to_string(mainToken) + "); " +
@@ -51,6 +51,7 @@ LocalAppLibraryManager::Version LocalAppLibraryManager::built(LocalAppLibraryCac
     auto item = mayTry ? itemOf(record, former, reuse) : nullptr;
     if (!item) {
       logDebug([&] { return "can't create app library for " + record.description(); });
+      if (mayTry && record.dataContainerURL) next->addUnmade();
       continue;
     }
     next->add({record, std::move(item)});

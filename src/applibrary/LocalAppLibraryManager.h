@@ -30,11 +30,12 @@ class LocalAppLibraryManager final : public AppLibraryRoots, public AppLibraryOw
   LocalAppLibraryManager(const Platform& platform, AppLibraryCaches& caches,
                          LocalAppLibraryCacheSource source);
 
-  /// Takes over what the main cache holds, if that has another version than this, and answers
-  /// whether this changed. With an observer all app libraries are built anew and reported to it,
-  /// and what is gone as deleted; without one, those whose record is the same stay as they are.
-  /// What was indexed of those that are gone is deleted, for which the host is waited for without a
-  /// limit. The questions below get the new answers once all that is done.
+  /// Takes over what the main cache holds, if that has another version than this or a library could
+  /// not be made the last time, and answers whether this changed. With an observer all app
+  /// libraries are built anew and reported to it, and what is gone as deleted; without one, those
+  /// whose record is the same stay as they are. What was indexed of those that are gone is deleted,
+  /// for which the host is waited for without a limit. The questions below get the new answers once
+  /// all that is done.
   bool upgradeFromMainCache(VesselChangeObserver* observer = nullptr);
 
   /// Where it started from.

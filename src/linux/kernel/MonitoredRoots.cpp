@@ -26,6 +26,16 @@ std::string_view below(std::string_view root, std::string_view path) {
   return relative;
 }
 
+Result<UniqueFd> openBelow(int root, std::uint64_t device, const std::string& relative, int flags) {
+  auto opened = openLongPath(root, relative, flags, resolveBeneath);
+  if (!opened || relative.empty()) return opened;
+  // A subvolume is no mount to the kernel, and gives out inode numbers of the root's once more.
+  const auto status = statusAt(opened->get(), "");
+  if (!status) return fail(status.error());
+  if (status->device != device) return fail(Error::posix(EXDEV));
+  return opened;
+}
+
 bool isAbsence(const Error& error) {
   return error.isPosix(ENOENT) || error.isPosix(ENOTDIR) || error.isPosix(ELOOP) ||
          error.isPosix(EACCES);
@@ -60,16 +70,6 @@ struct MonitoredRoots::Root {
     descriptor = opened.get();
     former.push_back(std::exchange(current, std::move(opened)));
     if (former.size() > mostFormer) former.pop_front();
-  }
-
-  [[nodiscard]] Result<UniqueFd> open() const {
-    if (!isThere) return fail(Error::posix(ENOENT));
-    auto opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY, withoutLinks);
-    if (!opened) return opened;
-    const auto status = statusAt(opened->get(), "");
-    if (!status) return fail(status.error());
-    if (status->inode != inode || status->device != device) return fail(Error::posix(ENOENT));
-    return opened;
   }
 };
 
@@ -170,22 +170,17 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
   const int allFlags = flags | ((flags & O_PATH) != 0 ? 0 : O_NONBLOCK | O_NOCTTY);
   const RootPointer root = holderOf(path);
   if (!root) return openLongPath(AT_FDCWD, path, allFlags);
-  UniqueFd reopened;
-  if (!root->isKeptOpen) {
-    auto folder = root->open();
-    if (!folder) return folder;
-    reopened = std::move(*folder);
-  }
-  const int folder = root->isKeptOpen ? root->descriptor.load() : reopened.get();
-  if (folder < 0) return fail(Error::posix(ENOENT));
   const std::string relative(below(root->path, path));
-  auto opened = openLongPath(folder, relative, allFlags, resolveBeneath);
-  if (!opened || relative.empty()) return opened;
-  // A subvolume is no mount to the kernel, and gives out inode numbers of the root's once more.
-  const auto status = statusAt(opened->get(), "");
+  if (root->isKeptOpen) {
+    if (root->descriptor < 0) return fail(Error::posix(ENOENT));
+    return openBelow(root->descriptor, root->device, relative, allFlags);
+  }
+  // Whatever folder is there by now: whose it is, is for those to say who look into it.
+  const auto folder = openLongPath(AT_FDCWD, root->path, O_PATH | O_DIRECTORY, withoutLinks);
+  if (!folder) return fail(folder.error());
+  const auto status = statusAt(folder->get(), "");
   if (!status) return fail(status.error());
-  if (status->device != root->device) return fail(Error::posix(EXDEV));
-  return opened;
+  return openBelow(folder->get(), status->device, relative, allFlags);
 }
 
 }  // namespace mirabel

@@ -21,8 +21,9 @@ namespace mirabel {
 /// lead out of the tree. Paths may be of any length. Any thread may call it.
 class MonitoredRoots {
  public:
-  /// Paths are absolute and resolved; the first is the document storage, which is kept open. One
-  /// that does not exist is kept and is simply empty.
+  /// Paths are absolute and resolved; the first is the document storage, which is kept open, and
+  /// stands for the same folder between two calls of `refresh`. One that does not exist is kept and
+  /// is simply empty.
   explicit MonitoredRoots(std::vector<std::string> paths);
   ~MonitoredRoots();
 
@@ -56,7 +57,7 @@ class MonitoredRoots {
   /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
   /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its
   /// final link not followed. POSIX errors: ELOOP for a symbolic link on the way, EXDEV for
-  /// another mount and for a subvolume, ENOENT, also for a root that is another folder by now.
+  /// another mount and for a subvolume, ENOENT.
   [[nodiscard]] Result<UniqueFd> open(const std::string& path, int flags) const;
 
  private:

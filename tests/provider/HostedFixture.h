@@ -1,0 +1,48 @@
+#pragma once
+
+#include <gtest/gtest.h>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "applibrary/MRBAppLibraryManager.h"
+#include "fs/FSChangesEnumerator.h"
+#include "provider/LocalVessel.h"
+#include "support/FakeEventStreams.h"
+#include "support/FakeIconService.h"
+#include "support/FakeNotificationCenter.h"
+#include "support/FakePlatform.h"
+#include "support/LogCapture.h"
+
+namespace mirabel::testing {
+
+/// A provider with everything that a host gives it, on a platform in memory.
+class HostedFixture : public ::testing::Test {
+ protected:
+  /// An application that shows its documents.
+  void install(const std::string& identifier, std::optional<std::string> name = {}) {
+    fake.install(identifier, "/apps/" + identifier, std::move(name));
+    fake.applications.installed.back().supportsOpenInPlace = true;
+    fake.applications.installed.back().fileSharingEnabled = true;
+  }
+  /// Makes the provider, and returns when it has seen what is installed.
+  void start() {
+    vessel = std::make_unique<LocalVessel>(fake.platform(), libraries, libraries,
+                                           ChangeServices{events, fake.diagnostics, changes},
+                                           ApplicationServices{libraries, notifications, icons});
+    vessel->waitForAppLibraries();
+  }
+
+  FakePlatform fake;
+  FakeEventStreams events;
+  FakeNotificationCenter notifications;
+  FakeIconService icons;
+  LogCapture log;
+  MRBAppLibraryManager libraries{fake.platform()};
+  FileObjectURLs identity{fake.platform(), libraries};
+  FSChangesEnumerations changes{{fake.platform(), identity, libraries}, events, libraries};
+  std::unique_ptr<LocalVessel> vessel;
+};
+
+}  // namespace mirabel::testing
