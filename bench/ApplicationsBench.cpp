@@ -6,12 +6,14 @@
 #include <array>
 #include <cstdio>
 #include <fcntl.h>
+#include <filesystem>
 #include <fstream>
 #include <string_view>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include "BenchHome.h"
+#include "host/HostedProvider.h"
 #include "linux/apps/LinuxApplicationRegistry.h"
 
 namespace mirabel::bench {
@@ -20,6 +22,8 @@ namespace {
 constexpr const char* firstRow = "all applications on first sight / open, read, statx";
 constexpr const char* againRow = "all applications again / statx";
 constexpr const char* lookupRow = "each application by its document folder / statx";
+constexpr const char* refreshRow = "app libraries: a refresh, nothing new / one second";
+constexpr const char* changeRow = "app libraries: one comes and goes / a refresh, nothing new";
 constexpr std::array keys = {std::string_view("UISupportsDocumentBrowser")};
 
 // As long as an entry with some translations and an action is.
@@ -101,10 +105,58 @@ std::size_t enumerate(LinuxApplicationRegistry& registry) {
   return count;
 }
 
+void refresh(HostedProvider& provider) {
+  MRBAppLibraryManager& libraries = provider.libraries();
+  libraries.refreshFromRegistry();
+  libraries.upgradeFromMainCache();
+  libraries.followLibraries(provider.linuxPlatform().events());
+}
+
+/// What the provider does after a notification, with a history that is followed: once with nothing
+/// new, and once for an application that comes and once for it when it goes.
+void benchRefresh(const Scale& scale) {
+  if (!scale.includesAny({refreshRow, changeRow})) return;
+  const BenchHome home(BenchHome::Where::memory);
+  const std::string entries = home.path() + "/.local/share/applications";
+  std::filesystem::create_directories(entries);
+  const auto entryOf = [&](std::size_t i) {
+    return entries + "/org.example.App" + std::to_string(i) + ".desktop";
+  };
+  const std::size_t count = scale.files / 10;
+  for (std::size_t i = 0; i <= count; ++i) {
+    std::filesystem::create_directories(home.path() + "/.var/app/org.example.App" +
+                                        std::to_string(i) + "/Documents");
+    if (i < count) std::ofstream(entryOf(i)) << entryText(i);
+  }
+  LinuxPlatform::Options options;
+  options.home = home.path();
+  const auto provider = HostedProvider::open(std::move(options)).value();
+  static_cast<void>(provider->linuxPlatform().events().currentEventID());
+  const auto all = [&] { return provider->libraries().rootURLsForAppLibraries()->size(); };
+  require(all() == count, "all app libraries are known");
+  Comparison same{refreshRow, {}, {}, 1.0};
+  Comparison change{changeRow, {}, {}, 3.0};
+  for (int round = 0; round < scale.rounds; ++round) {
+    const double unchanged = secondsOf([&] { refresh(*provider); });
+    same.ours.push_back(unchanged);
+    same.reference.push_back(1.0);
+    std::ofstream(entryOf(count)) << entryText(count);
+    const double comes = secondsOf([&] { refresh(*provider); });
+    require(all() == count + 1, "one has come");
+    std::filesystem::remove(entryOf(count));
+    const double goes = secondsOf([&] { refresh(*provider); });
+    require(all() == count, "it is gone");
+    change.ours.push_back((comes + goes) / 2);
+    change.reference.push_back(unchanged);
+  }
+  for (const Comparison* comparison : {&same, &change})
+    if (scale.includes(comparison->name)) print(*comparison);
+}
+
 }  // namespace
 
 void runApplicationsBenchmarks(const Scale& scale) {
-  if (!scale.includesAny({firstRow, againRow, lookupRow})) return;
+  if (!scale.includesAny({firstRow, againRow, lookupRow, refreshRow, changeRow})) return;
   const BenchHome home(BenchHome::Where::memory);
   const std::size_t count = scale.files / 10;
   const Applications applications = install(home, count);
@@ -135,6 +187,7 @@ void runApplicationsBenchmarks(const Scale& scale) {
   }
   for (const Comparison* comparison : {&first, &again, &lookup})
     if (scale.includes(comparison->name)) print(*comparison);
+  benchRefresh(scale);
 }
 
 }  // namespace mirabel::bench
