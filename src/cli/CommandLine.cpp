@@ -5,6 +5,7 @@
 #include <memory>
 
 #include "cli/Commands.h"
+#include "cli/IconCommand.h"
 #include "cli/ItemCommandLine.h"
 #include "foundation/Log.h"
 #include "foundation/StandardErrorSink.h"
@@ -26,6 +27,8 @@ const std::string containerHelp =
 constexpr const char* watchHelp =
     "It goes on until it is interrupted, and then tells the anchor to go on from. It holds the\n"
     "volume as long as it runs: other commands wait for that, and then say that it is busy.\n\n";
+constexpr const char* bundleHelp =
+    "BUNDLE is the name of the application's desktop entry without .desktop, org.example.Draw.\n\n";
 constexpr const char* pathHelp =
     "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
 constexpr const char* exitCodeHelp =
@@ -44,6 +47,8 @@ struct Arguments {
   ChangesOptions changes;
   WatchOptions watch;
   std::string container = "root";
+  std::string bundle;
+  IconOptions icon;
   ItemArguments items;
   bool showVersion = false;
 };
@@ -80,6 +85,22 @@ std::string isPageCount(const std::string& text) {
   return isCount ? "" : "takes a number from 1";
 }
 
+void addAppCommands(CLI::App& app, Arguments& arguments) {
+  addCommand(app, "apps", "List the app libraries: the applications that show their documents", "");
+  auto* container =
+      addCommand(app, "container", "Print where the documents of an application lie", bundleHelp);
+  container->add_option("BUNDLE", arguments.bundle, "The identifier of the application")
+      ->required()
+      ->type_name("");
+  auto* icon = addCommand(app, "icon", "Write the icon of an app library to a PNG file", itemHelp);
+  addItem(*icon, arguments.icon.item);
+  icon->add_option("-o,--output", arguments.icon.file, "The file that it goes to; it is replaced")
+      ->required()
+      ->type_name("FILE");
+  icon->add_option("--size", arguments.icon.size, "Its width and height in pixels (256)")
+      ->type_name("N");
+}
+
 void addCommands(CLI::App& app, Arguments& arguments) {
   auto* id = addCommand(app, "id", "Print the identifier of what lies at a path", pathHelp);
   id->add_option("PATH", arguments.path, "What to identify")->required()->type_name("");
@@ -112,6 +133,7 @@ void addCommands(CLI::App& app, Arguments& arguments) {
                    "First print what changed since an anchor that was printed before")
       ->type_name("ANCHOR");
   addItemCommands(app, arguments.items, itemHelp + globalHelp);
+  addAppCommands(app, arguments);
   addCommand(app, "status", "Say how changes are followed, and what the history holds", "");
   addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
   addCommand(app, "demo", "A guided tour in a temporary home", "");
@@ -126,6 +148,9 @@ ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& argume
   if (app.got_subcommand("changes")) return runChanges(program, arguments.changes);
   if (app.got_subcommand("watch")) return runWatch(program, arguments.watch);
   if (const auto code = runItemCommand(app, program, arguments.items)) return *code;
+  if (app.got_subcommand("apps")) return runApps(program);
+  if (app.got_subcommand("container")) return runContainer(program, arguments.bundle);
+  if (app.got_subcommand("icon")) return runIcon(program, arguments.icon);
   if (app.got_subcommand("status")) return runStatus(program);
   if (app.got_subcommand("doctor")) return runDoctor(program);
   return runDemo(program);

@@ -35,6 +35,10 @@ struct WatchOptions {
 };
 ExitCode runWatch(Program& program, const WatchOptions& options);
 
+ExitCode runApps(Program& program);
+/// Prints the document folder of an application, whether or not it is an app library.
+ExitCode runContainer(Program& program, const std::string& bundle);
+
 ExitCode runStatus(Program& program);
 ExitCode runDoctor(Program& program);
 ExitCode runDemo(Program& program);

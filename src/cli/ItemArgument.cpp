@@ -69,11 +69,30 @@ bool isWithin(const std::string& path, const std::string& folder) {
   return path == folder || (path.starts_with(folder) && path[folder.size()] == '/');
 }
 
-// The document storage may be named by a link to it, "~/Documents" for one.
-bool leadsTo(const std::string& path, const std::string& folder) {
+// The document folder of an application that is listed.
+bool isLibrary(const Session& session, const URL& url) {
+  return session.libraries().shared().bundleProxyWithRootURL(url).has_value();
+}
+
+bool isWithinLibrary(const Session& session, const URL& url) {
+  return isLibrary(session, url) || session.libraries().applicationOwning(url).has_value();
+}
+
+// The provider answers for every application that has a folder for documents, but nothing follows
+// what lies in one that is not listed.
+bool isShown(const Session& session, const LocalItem& item) {
+  return !item.itemIdentifier().starts_with('#') || isLibrary(session, item.fileURL());
+}
+
+// The document storage may be named by a link to it, "~/Documents" for one, and so may the folder
+// of an app library.
+std::string withoutLinkToRoot(const Session& session, const std::string& path,
+                              const std::string& storage) {
   std::error_code failure;
   const fs::path target = fs::canonical(path, failure);
-  return !failure && target.native() == folder;
+  if (failure || target == path) return path;
+  const bool isRoot = target == storage || isLibrary(session, URL::fileURL(target.native()));
+  return isRoot ? target.native() : path;
 }
 
 }  // namespace
@@ -103,7 +122,11 @@ Result<std::shared_ptr<LocalItem>> ItemArgument::itemByIdentifier(const Session&
                                text_));
   }
   const std::string_view identifier = text_ == rootWord ? VesselRootContainerItemIdentifier : text_;
-  if (auto item = session.provider().itemForIdentifier(identifier)) return item;
+  if (auto item = session.provider().itemForIdentifier(identifier)) {
+    if (isShown(session, **item)) return item;
+    return fail(withDetail(Error::local(LocalVesselError::itemNotFound),
+                           "the application is there, but its documents are not shown"));
+  }
   const URL& storage = session.platform().manager.documentStorageURL();
   const bool isRoot = identifier == VesselRootContainerItemIdentifier;
   if (isRoot && !session.platform().resources.readValues(storage)) {
@@ -117,14 +140,15 @@ Result<std::shared_ptr<LocalItem>> ItemArgument::itemAtPath(const Session& sessi
   auto place = resolved(path);
   if (!place) return fail(place.error());
   const std::string& storage = session.platform().manager.documentStorageURL().path();
-  if (leadsTo(*place, storage)) place = storage;
+  place = withoutLinkToRoot(session, *place, storage);
   const URL url = URL::fileURL(*place);
   if (auto values = session.platform().resources.readValues(url); !values) {
     return fail(values.error());
   }
   const Error unknown = Error::local(LocalVesselError::itemNotFound);
-  if (!isWithin(*place, storage)) {
-    return fail(withDetail(unknown, "it is not below the document storage \"" + storage + "\""));
+  if (!isWithin(*place, storage) && !isWithinLibrary(session, url)) {
+    return fail(withDetail(unknown, "it is not below the document storage \"" + storage +
+                                        "\", nor in the folder of an app library"));
   }
   if (auto item = session.provider()._propertiesForItemAtURL(url)) return item;
   return fail(withDetail(unknown, "it is not shown as an item"));

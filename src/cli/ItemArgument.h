@@ -11,8 +11,9 @@ namespace mirabel {
 /// How a person names an item: the word "root", an identifier, or else a path. What begins with
 /// "fid=", "did=" or "#" and has no "/" in it is an identifier, so that "./fid=3" is a path. Errors
 /// of the lookups: `LocalVesselError::invalidItemIdentifier` for an identifier that no form fits,
-/// `itemNotFound` for a path outside the documents, the host's no-such-item error, POSIX and file
-/// errors for a path that leads nowhere.
+/// `itemNotFound` for a path outside the documents and the app libraries, and for an application
+/// whose documents are no app library, the host's no-such-item error, POSIX and file errors for a
+/// path that leads nowhere.
 class ItemArgument {
  public:
   explicit ItemArgument(std::string text) : text_(std::move(text)) {}

@@ -27,12 +27,6 @@ class Page final : public VesselEnumerationObserver {
   std::optional<Error> error;
 };
 
-std::string padded(std::string text, std::size_t width, bool atLeft) {
-  const std::size_t has = displayWidth(text);
-  if (has >= width) return text;
-  return atLeft ? std::string(width - has, ' ') + text : text + std::string(width - has, ' ');
-}
-
 void printRow(const Program& program, const LocalItem& item) {
   std::string size;
   if (item.documentSize()) size = humanSize(item.documentSize()->asUnsigned().value_or(0));
@@ -43,8 +37,9 @@ void printRow(const Program& program, const LocalItem& item) {
   const bool isFolder = item.childItemCount().has_value();
   if (isFolder && program.isTerminal()) name = "\033[1;34m" + name + "\033[0m";
   if (isFolder) name += '/';
-  program.out() << padded(std::move(size), 12, true) << "  " << padded(std::move(date), 16, false)
-                << "  " << padded(printable(item.itemIdentifier()), 14, false) << "  " << name
+  program.out() << padded(std::move(size), 12, Align::right) << "  "
+                << padded(std::move(date), 16, Align::left) << "  "
+                << padded(printable(item.itemIdentifier()), 14, Align::left) << "  " << name
                 << '\n';
 }
 

@@ -147,4 +147,11 @@ std::size_t displayWidth(std::string_view utf8) {
   return width;
 }
 
+std::string padded(std::string text, std::size_t width, Align align) {
+  const std::size_t has = displayWidth(text);
+  if (has >= width) return text;
+  const std::string spaces(width - has, ' ');
+  return align == Align::right ? spaces + text : text + spaces;
+}
+
 }  // namespace mirabel

@@ -25,5 +25,9 @@ namespace mirabel {
 
 /// How many columns text takes on a terminal.
 [[nodiscard]] std::size_t displayWidth(std::string_view utf8);
+/// With spaces before or after it, so that it takes `width` columns; one that takes more is as it
+/// was.
+enum class Align { left, right };
+[[nodiscard]] std::string padded(std::string text, std::size_t width, Align align);
 
 }  // namespace mirabel
