@@ -34,6 +34,8 @@ class Session {
       std::string_view container, LiveUpdates liveUpdates = LiveUpdates::unwanted) {
     return provider().enumeratorForContainerItemIdentifier(container, liveUpdates);
   }
+  /// Keeps up with applications that are installed and removed, see `HostedProvider`.
+  void watchApplications() { hosted_->watchApplications(); }
   [[nodiscard]] const Platform& platform() const { return hosted_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return hosted_->linuxPlatform(); }
 

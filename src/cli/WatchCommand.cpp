@@ -45,6 +45,7 @@ class Watch {
   ExitCode open();
   Result<void> begin();
   Result<void> listen();
+  void followLibraries();
   ExitCode follow();
   Result<void> tell();
   enum class Awaited { changes, end };
@@ -61,6 +62,7 @@ class Watch {
   ContainerArgument container_;
   std::optional<URL> place_;
   std::shared_ptr<VesselEnumerator> signaller_;
+  std::uint64_t librariesVersion_ = 0;  ///< that the signaller listens to, or an earlier one
   std::shared_ptr<VesselEnumerator> enumerator_;
   std::string anchor_;
   bool hasTold_ = false;
@@ -102,13 +104,15 @@ ExitCode Watch::open() {
 }
 
 Result<void> Watch::begin() {
-  // Each notifier names the working set among what changed, whatever it is for.
+  // Whatever is named: notifiers name the root and the working set, whatever they are for, and a
+  // new list of app libraries may be told under either name alone.
   session_->linuxPlatform().manager().setSignalListener(
-      [changed = changed_](std::string_view container, const VesselManager::SignalHandler& done) {
-        if (container == VesselWorkingSetContainerItemIdentifier) changed->set();
+      [changed = changed_](std::string_view, const VesselManager::SignalHandler& done) {
+        changed->set();
         done(std::nullopt);
       });
   if (auto listening = listen(); !listening) return listening;
+  session_->watchApplications();
   // Taken when the notifier exists: that tells of everything since then.
   auto anchor = options_.since ? Result<std::string>(*options_.since) : currentAnchor(*enumerator_);
   if (!anchor) return fail(anchor.error());
@@ -120,12 +124,16 @@ Result<void> Watch::begin() {
 Result<void> Watch::listen() {
   const auto found = container_.followed(*session_);
   if (!found) return fail(found.error());
-  if (signaller_ && found->folder == place_) return {};
+  if (signaller_ && found->folder == place_) {
+    followLibraries();
+    return {};
+  }
   place_ = found->folder;
   // What was named by its path is followed by its identity.
   if (place_) container_ = ContainerArgument(found->identifier);
   // The working set has no notifier of its own; that of all folders looks at the same places.
   const bool isWorkingSet = found->identifier == VesselWorkingSetContainerItemIdentifier;
+  librariesVersion_ = session_->libraries().shared().versionToken();
   auto signaller = session_->enumerator(
       isWorkingSet ? VesselAllDirectoriesContainerItemIdentifier : found->identifier,
       LiveUpdates::wanted);
@@ -135,6 +143,16 @@ Result<void> Watch::listen() {
   signaller_ = *std::move(signaller);
   enumerator_ = *std::move(enumerator);
   return {};
+}
+
+/// Has what happens in app libraries that came meanwhile signalled too. The signaller is never
+/// asked for changes, which would have it take over the new list; but an anchor is always one of
+/// the list of now.
+void Watch::followLibraries() {
+  const std::uint64_t version = session_->libraries().shared().versionToken();
+  if (version == librariesVersion_) return;
+  librariesVersion_ = version;
+  signaller_->currentSyncAnchor([](const std::optional<Data>&) {});
 }
 
 ExitCode Watch::follow() {

@@ -29,7 +29,7 @@ class HostedProvider {
   [[nodiscard]] MRBAppLibraryManager& libraries() { return *libraries_; }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
-  /// Keeps up with applications that are installed and removed from now on.
+  /// Keeps up with applications that are installed and removed, from the first look at them on.
   void watchApplications() { platform_->watchApplications(); }
 
  private:

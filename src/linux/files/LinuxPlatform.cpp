@@ -124,6 +124,7 @@ void LinuxPlatform::watchApplications() {
   if (parts_->applicationMonitor) return;
   parts_->applicationMonitor = std::make_unique<ApplicationMonitor>(
       ApplicationMonitor::Options{parts_->places}, parts_->notifications);
+  parts_->notifications.post(notification::applicationRegistered);
 }
 
 NotificationCenter& LinuxPlatform::notifications() const {

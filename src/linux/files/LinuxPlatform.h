@@ -62,8 +62,9 @@ class LinuxPlatform {
   [[nodiscard]] EventStreams& events() const;
   [[nodiscard]] LinuxApplicationRegistry& applications() const;
   [[nodiscard]] IconService& icons() const;
-  /// From now on it is told when applications are installed or removed; a command that ends soon
-  /// need not hear of it. Not thread-safe.
+  /// From now on it is told when applications are installed or removed, and once at the start, for
+  /// what may have happened since the last look; a command that ends soon need not hear of it. Not
+  /// thread-safe.
   void watchApplications();
   /// Where that is told.
   [[nodiscard]] NotificationCenter& notifications() const;
