@@ -1,5 +1,6 @@
 #include <cerrno>
 #include <fcntl.h>
+#include <map>
 #include <nlohmann/json.hpp>
 #include <ostream>
 #include <vector>
@@ -8,6 +9,7 @@
 #include "cli/ErrorText.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
+#include "linux/apps/LinuxApplicationRegistry.h"
 #include "linux/files/HomeLayout.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/volume/FollowStatus.h"
@@ -126,6 +128,39 @@ Finding stateFinding(const Result<void>& opened, const HomeLayout& layout) {
   return {subject, Health::bad, text, "identities can't be kept until this is mended"};
 }
 
+std::string plural(std::size_t count, const std::string& one, const std::string& several) {
+  return std::to_string(count) + " " + (count == 1 ? one : several);
+}
+
+/// What was left out for the same reason, in one line.
+struct LeftOutKind {
+  std::string names;
+  std::size_t count = 0;
+
+  void add(const std::string& name) {
+    constexpr std::size_t mostNamed = 3;
+    if (count < mostNamed) names += (count == 0 ? "" : ", ") + name;
+    if (count == mostNamed) names += ", ...";
+    ++count;
+  }
+};
+
+void addApplicationFindings(const Session& session, std::vector<Finding>& findings) {
+  const std::size_t shown = session.libraries().rootURLsForAppLibraries()->size();
+  findings.push_back(
+      {"app libraries", Health::good,
+       plural(shown, "application shows its documents", "applications show their documents"), ""});
+  std::map<std::string, LeftOutKind> kinds;
+  for (const LeftOut& leftOut : session.linuxPlatform().applications().leftOut())
+    kinds[leftOut.reason].add(leftOut.identifier);
+  for (const auto& [reason, kind] : kinds) {
+    // What has no name stands for all that there is no room to name.
+    const std::string text =
+        kind.names.empty() ? "left out: " + reason : "left out (" + reason + "): " + kind.names;
+    findings.push_back({"applications", Health::limited, text, ""});
+  }
+}
+
 std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
   std::vector<Finding> findings;
   findings.push_back({"home", Health::good, layout.home, ""});
@@ -151,6 +186,7 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
                            [&](std::string_view text) { program.note(text); }};
   auto session = Session::open(std::move(options));
   findings.push_back(stateFinding(session ? Result<void>() : fail(session.error()), layout));
+  if (session) addApplicationFindings(**session, findings);
   return findings;
 }
 

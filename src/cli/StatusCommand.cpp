@@ -54,6 +54,17 @@ std::string marksText(const FollowStatus& following) {
   return text;
 }
 
+/// The list of now, and the version that anchors of the root and the working set carry with it.
+struct AppLibraries {
+  std::size_t count;
+  std::uint64_t version;
+};
+
+AppLibraries appLibrariesOf(const Session& session) {
+  const LocalAppLibraryManager& libraries = session.libraries().shared();
+  return {libraries.rootURLsForAppLibraries()->size(), libraries.versionToken()};
+}
+
 void printJSON(const Program& program, const Session& session, const VolumeIndex::Status& status) {
   const FollowStatus& following = status.following;
   nlohmann::json object;
@@ -72,6 +83,9 @@ void printJSON(const Program& program, const Session& session, const VolumeIndex
   object["historyUUID"] = session.linuxPlatform().index().historyUUID().description();
   object["firstEventID"] = std::to_string(status.firstEventID);
   object["lastEventID"] = std::to_string(status.lastEventID);
+  const AppLibraries libraries = appLibrariesOf(session);
+  object["appLibraries"] = std::to_string(libraries.count);
+  object["appLibraryVersion"] = std::to_string(libraries.version);
   setText(object, "stateFolder", session.linuxPlatform().stateFolder());
   program.out() << object.dump() << '\n';
 }
@@ -90,6 +104,9 @@ void printRows(const Program& program, const Session& session, const VolumeIndex
   row("events",
       hasEvents ? std::to_string(status.firstEventID) + " to " + std::to_string(status.lastEventID)
                 : "none yet");
+  const AppLibraries libraries = appLibrariesOf(session);
+  row("app libraries",
+      std::to_string(libraries.count) + ", version " + std::to_string(libraries.version));
   row("state", printable(session.linuxPlatform().stateFolder()));
 }
 
