@@ -1,10 +1,13 @@
 #include <algorithm>
+#include <chrono>
 #include <csignal>
+#include <filesystem>
 #include <functional>
 #include <set>
 #include <sys/wait.h>
 
 #include "cli/CommandLineFixture.h"
+#include "cli/InstalledApps.h"
 #include "cli/Running.h"
 
 namespace mirabel::testing {
@@ -39,6 +42,17 @@ class Watch : public CommandLineFixture {
         return true;
       }
       return false;
+    });
+    return found;
+  }
+  /// Waits until an item of that name is told.
+  static Batch awaitUpdate(Running& watch, const std::string& name) {
+    Batch found;
+    await(watch, [&](const Batch& batch) {
+      for (const Batch& item : batch.at("updated")) {
+        if (item.at("filename") == name) found = item;
+      }
+      return !found.is_null();
     });
     return found;
   }
@@ -133,6 +147,48 @@ TEST_F(Watch, FollowsAFolderByItsIdentityToItsEnd) {
   home.makeFolder("renamed/second");
   EXPECT_THAT(watch.output().line(), HasSubstr(home.at("renamed/second")));
   home.remove("renamed");
+  EXPECT_THAT(watch.errors().line(), HasSubstr("no item has this identifier"));
+  EXPECT_EQ(WEXITSTATUS(watch.end()), 3);
+}
+
+TEST_F(Watch, TellsOfApplicationsThatComeAndGoAndOfWhatHappensInThem) {
+  const InstalledApps apps(home);
+  for (const std::string container : {"root", "workingset", "alldirs"}) {
+    const std::string bundle = "org.example." + container;
+    std::filesystem::create_directories(apps.documents(bundle) + "/old");
+    Running watch(command({"--json", "watch", container}));
+    EXPECT_NE(watch.output().line(), "");
+    const bool holdsLibraries = container != "alldirs";
+    apps.install(bundle, "App");
+    EXPECT_FALSE(awaitUpdate(watch, holdsLibraries ? "App" : "old").is_null()) << container;
+
+    // Signalled, where that is shown from a folder that was not there at the start, and not merely
+    // found at the next of the looks that are made every five seconds.
+    const auto before = std::chrono::steady_clock::now();
+    const std::string place = container == "root" ? home.documents() : apps.documents(bundle);
+    std::filesystem::create_directory(place + "/new");
+    const Batch folder = awaitUpdate(watch, "new");
+    ASSERT_FALSE(folder.is_null()) << container;
+    EXPECT_LT(std::chrono::steady_clock::now() - before, std::chrono::seconds(4)) << container;
+
+    apps.remove(bundle);
+    const Batch gone = holdsLibraries ? Batch("#" + bundle) : folder.at("itemIdentifier");
+    const Batch batch =
+        await(watch, [&](const Batch& b) { return std::ranges::count(b.at("deleted"), gone) > 0; });
+    EXPECT_FALSE(batch.is_null()) << container;
+    watch.send(SIGTERM);
+    expectDone(watch.end());
+  }
+}
+
+TEST_F(Watch, OfAnApplicationThatIsRemovedEnds) {
+  const InstalledApps apps(home);
+  apps.install("org.example.Draw", "Draw");
+  Running watch(command({"watch", "#org.example.Draw"}));
+  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  std::filesystem::create_directory(apps.documents("org.example.Draw") + "/new");
+  EXPECT_THAT(watch.output().line(), HasSubstr("/new\n"));
+  apps.remove("org.example.Draw");
   EXPECT_THAT(watch.errors().line(), HasSubstr("no item has this identifier"));
   EXPECT_EQ(WEXITSTATUS(watch.end()), 3);
 }
