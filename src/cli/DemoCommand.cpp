@@ -44,7 +44,7 @@ class Tour {
       : out_(program.out()), home_(home), documents_(home / "Documents") {}
 
   bool run() {
-    say("A temporary home with a few documents.");
+    say("A temporary home with a few documents, and an application that has documents of its own.");
     return makeDocuments() && list() && rename() && save() && moveAndReuse() &&
            changesWhileNothingRan() && trashAndPutBack();
   }
@@ -82,13 +82,23 @@ class Tour {
                       write(documents_ / "budget.csv", "rent,900\nfood,350\n") &&
                       write(documents_ / "Recipes/soup.md", "# Soup\n") &&
                       write(documents_ / "Recipes/bread.md", "# Bread\n") &&
-                      write(documents_ / "Holiday.quill/text.xml", "<text>Sea and sun</text>\n");
+                      write(documents_ / "Holiday.quill/text.xml", "<text>Sea and sun</text>\n") &&
+                      installApplication();
     if (!made) say("The documents can't be written.");
     return made;
   }
 
+  // As Flatpak does: an entry that says that it opens files, and a container.
+  bool installApplication() {
+    return write(home_ / ".local/share/flatpak/exports/share/applications/org.example.Draw.desktop",
+                 "[Desktop Entry]\nType=Application\nName=Draw\nExec=draw %F\n"
+                 "MimeType=image/svg+xml;\n") &&
+           write(home_ / ".var/app/org.example.Draw/Documents/boat.svg", "<svg/>\n");
+  }
+
   bool list() {
-    say("Every item has an identifier; a folder that is one document (Holiday.quill) has one too.");
+    say("Every item has an identifier; a folder that is one document (Holiday.quill) has one too. "
+        "The folder of an application (Draw) stands beside them.");
     const auto listing = [](Program& program, const std::string& item) {
       ListOptions options;
       options.item = item;

@@ -101,9 +101,9 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
     subjects.insert(finding.at("subject"));
     EXPECT_THAT(finding.at("health").get<std::string>(), MatchesRegex("ok|limited|missing"));
   }
-  EXPECT_EQ(subjects,
-            (std::set<std::string>{"home", "documents", "extended attributes", "birth times",
-                                   "file handles", "volume UUID", "watching", "state"}));
+  EXPECT_EQ(subjects, (std::set<std::string>{"home", "documents", "extended attributes",
+                                             "birth times", "file handles", "volume UUID",
+                                             "watching", "state", "app libraries"}));
   home.remove("");
   const Answer missing = run({"doctor"});
   EXPECT_EQ(missing.code, 1);
@@ -114,6 +114,7 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
 TEST_F(Answers, TheDemonstrationFindsItsDocumentToTheEnd) {
   const Answer answer = run({"demo"});
   EXPECT_EQ(answer.code, 0) << answer.out << answer.err;
+  EXPECT_THAT(answer.out, HasSubstr("  #org.example.Draw  Draw/\n"));
   EXPECT_THAT(answer.out, HasSubstr("/Documents/Recipes/thanks.txt\n"));
   EXPECT_THAT(answer.out, HasSubstr("$ mirabel changes workingset --since"));
   EXPECT_THAT(answer.out, HasSubstr("/Documents/Kitchen/thanks.txt\n"));

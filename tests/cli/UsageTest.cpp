@@ -29,6 +29,10 @@ TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
       {"--home", "/", "ls"},  // said twice
       {"doctor", "argument"},
       {"status", "argument"},
+      {"apps", "argument"},
+      {"container"},
+      {"icon", "root"},
+      {"icon", "-o", "file"},
       {"watch", "--since"},
       {"watch", "a", "b"},
       {"ls", "a", "doctor", "b"},
@@ -66,9 +70,10 @@ TEST_F(Usage, TheManualKnowsEveryOptionAndCommandOfTheHelp) {
   const std::regex word("--[a-z-]+|\\n  ([a-z]+) ");
   int count = 0;
   for (const char* command :
-       {"",      "id",       "path",   "info",   "ls",     "anchor", "changes", "watch",
-        "mkdir", "import",   "rename", "mv",     "rm",     "trash",  "restore", "expire",
-        "tag",   "favorite", "used",   "status", "doctor", "demo"}) {
+       {"",        "id",     "path",   "info",     "ls",   "anchor", "changes",
+        "watch",   "mkdir",  "import", "rename",   "mv",   "rm",     "trash",
+        "restore", "expire", "tag",    "favorite", "used", "apps",   "container",
+        "icon",    "status", "doctor", "demo"}) {
     const std::string help = *command == '\0' ? run({"--help"}).out : run({command, "--help"}).out;
     for (std::sregex_iterator it(help.begin(), help.end(), word), end; it != end; ++it, ++count) {
       const std::string found = (*it)[1].matched ? (*it)[1].str() : it->str();
