@@ -34,12 +34,16 @@ void printRows(const Program& program, const VesselItems& libraries) {
   }
 }
 
-Error noSuchContainer(const Session& session, const std::string& bundle) {
+std::string whyNoContainer(const Session& session, const std::string& bundle) {
+  if (auto reason = session.reasonLeftOut(bundle)) return *std::move(reason);
   const bool isKnown = session.platform().applications.proxyForBundleIdentifier(bundle).has_value();
+  return isKnown ? "the application has no folder for documents"
+                 : "no application has this identifier";
+}
+
+Error noSuchContainer(const Session& session, const std::string& bundle) {
   Error error = Error::local(LocalVesselError::itemNotFound);
-  error.userInfo[std::string(errorkey::detail)] =
-      isKnown ? "the application has no folder for documents that can be shown"
-              : "no application has this identifier";
+  error.userInfo[std::string(errorkey::detail)] = whyNoContainer(session, bundle);
   return error;
 }
 

@@ -127,6 +127,11 @@ Result<std::shared_ptr<LocalItem>> ItemArgument::itemByIdentifier(const Session&
     return fail(withDetail(Error::local(LocalVesselError::itemNotFound),
                            "the application is there, but its documents are not shown"));
   }
+  if (identifier.starts_with('#')) {
+    if (auto reason = session.reasonLeftOut(identifier.substr(1))) {
+      return fail(withDetail(Error::local(LocalVesselError::itemNotFound), *std::move(reason)));
+    }
+  }
   const URL& storage = session.platform().manager.documentStorageURL();
   const bool isRoot = identifier == VesselRootContainerItemIdentifier;
   if (isRoot && !session.platform().resources.readValues(storage)) {

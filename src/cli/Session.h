@@ -34,6 +34,9 @@ class Session {
       std::string_view container, LiveUpdates liveUpdates = LiveUpdates::unwanted) {
     return provider().enumeratorForContainerItemIdentifier(container, liveUpdates);
   }
+  /// Why the documents of the application are left out of what is shown, in words, if they are for
+  /// another reason than that it shows none.
+  [[nodiscard]] std::optional<std::string> reasonLeftOut(std::string_view bundle) const;
   /// Keeps up with applications that are installed and removed, see `HostedProvider`.
   void watchApplications() { hosted_->watchApplications(); }
   [[nodiscard]] const Platform& platform() const { return hosted_->platform(); }

@@ -215,7 +215,10 @@ TEST_F(Apps, ThatAreLeftOutAreSaidWhyOncePerReason) {
                                     "through a symbolic link): org.example.Led0, "
                                     "org.example.Led1, org.example.Led2, ...\n"));
   EXPECT_THAT(doctor.out, HasSubstr("): .hidden\\n\n"));
-  expectFailure(run({"info", "#org.example.Led0"}), 3, "no item has this identifier");
+  for (const auto& command : {std::vector<std::string>{"info", "#org.example.Led0"},
+                              std::vector<std::string>{"container", "org.example.Led0"}}) {
+    expectFailure(run(command), 3, "it is left out: its documents are reached through a symbolic");
+  }
   EXPECT_THAT(run({"--json", "ls", "workingset"}).out, ::testing::Not(HasSubstr("passwd")));
 }
 
