@@ -75,7 +75,7 @@ struct MonitoredRoots::Root {
 
 MonitoredRoots::MonitoredRoots(std::vector<std::string> paths)
     : firstPath_(paths.empty() ? std::string() : std::move(paths.front())),
-      first_(std::make_shared<Root>(firstPath_, nextNumber_++, Root::Kept::open)) {
+      first_(std::make_shared<Root>(firstPath_, 0, Root::Kept::open)) {
   static_cast<void>(refresh(*first_));
   if (!paths.empty()) setFurther({paths.begin() + 1, paths.end()});
 }

@@ -78,7 +78,7 @@ class MonitoredRoots {
   mutable std::shared_mutex mutex_;
   std::vector<RootPointer> further_;  // with mutex_, as are the next two
   std::unordered_map<std::string, RootPointer, Hash, std::equal_to<>> furtherByPath_;
-  std::uint64_t nextNumber_ = 0;
+  std::uint64_t nextNumber_ = 1;
 };
 
 }  // namespace mirabel
