@@ -122,13 +122,12 @@ Result<std::shared_ptr<LocalItem>> ItemArgument::itemByIdentifier(const Session&
                                text_));
   }
   const std::string_view identifier = text_ == rootWord ? VesselRootContainerItemIdentifier : text_;
-  if (auto item = session.provider().itemForIdentifier(identifier)) {
-    if (isShown(session, **item)) return item;
-    return fail(withDetail(Error::local(LocalVesselError::itemNotFound),
-                           "the application is there, but its documents are not shown"));
-  }
+  auto item = session.provider().itemForIdentifier(identifier);
+  if (item && isShown(session, **item)) return item;
   if (identifier.starts_with('#')) {
-    if (auto reason = session.reasonLeftOut(identifier.substr(1))) {
+    auto reason = session.reasonLeftOut(identifier.substr(1));
+    if (!reason && item) reason = "the application is there, but its documents are not shown";
+    if (reason) {
       return fail(withDetail(Error::local(LocalVesselError::itemNotFound), *std::move(reason)));
     }
   }
