@@ -82,9 +82,9 @@ OpenProvider::OpenProvider(const std::string& home) {
   LinuxPlatform::Options options;
   options.home = home;
   provider_ = std::move(HostedProvider::open(std::move(options)).value());
-  enumerator_ = provider_->vessel().
-                    enumeratorForContainerItemIdentifier(VesselWorkingSetContainerItemIdentifier,
-                                                           LiveUpdates::unwanted)
+  enumerator_ = provider_->vessel()
+                    .enumeratorForContainerItemIdentifier(VesselWorkingSetContainerItemIdentifier,
+                                                          LiveUpdates::unwanted)
                     .value();
 }
 

@@ -43,7 +43,9 @@ class Provider {
   }
 
   std::shared_ptr<VesselEnumerator> enumerator(const std::string& container) {
-    return provider_->vessel().enumeratorForContainerItemIdentifier(container, LiveUpdates::unwanted).value();
+    return provider_->vessel()
+        .enumeratorForContainerItemIdentifier(container, LiveUpdates::unwanted)
+        .value();
   }
   std::string containerOf(const std::string& folder) const {
     return provider_->vessel().persistentIdentifierForItemAtURL(URL::fileURL(folder)).value();

@@ -43,8 +43,8 @@ class VersionedPage final : public VesselEnumerationObserver {
 std::shared_ptr<LocalRootEnumerator> LocalRootEnumerator::create(
     const EnumerationServices& services, MRBAppLibraryManager& libraries, std::string container,
     LiveUpdates liveUpdates, RunningReaders& liveReaders) {
-  std::shared_ptr<LocalRootEnumerator> enumerator(new LocalRootEnumerator(
-      services, libraries, std::move(container), liveUpdates, liveReaders));
+  std::shared_ptr<LocalRootEnumerator> enumerator(
+      new LocalRootEnumerator(services, libraries, std::move(container), liveUpdates, liveReaders));
   // Of all directories no version is told, so that it need not go on from an older one.
   if (!enumerator->holdsAppLibraries()) enumerator->appLibraryManager_.upgradeFromMainCache();
   enumerator->monitorRoots();
@@ -87,8 +87,7 @@ std::vector<URL> LocalRootEnumerator::monitoredRoots() const {
 
 /// Files are told by a new enumerator; what the former one has under way goes on.
 void LocalRootEnumerator::monitorRoots() {
-  auto next =
-      LocalFileEnumerator::create(services_, container_, monitoredRoots(), liveUpdates_);
+  auto next = LocalFileEnumerator::create(services_, container_, monitoredRoots(), liveUpdates_);
   std::shared_ptr<LocalFileEnumerator> former;
   {
     const std::lock_guard lock(mutex_);
@@ -213,8 +212,8 @@ std::string LocalRootEnumerator::versions(std::uint64_t changeTokenVersion) cons
                      ", localVersion: " + std::to_string(appLibraryManager_.versionToken());
   if (isWorkingSet())
     text += ", workingSetVersion: " + std::to_string(libraries_.shared().versionToken());
-  return text + ", mainCacheVersion: " +
-         std::to_string(libraries_.caches().main.versionToken()) + "]";
+  return text + ", mainCacheVersion: " + std::to_string(libraries_.caches().main.versionToken()) +
+         "]";
 }
 
 void LocalRootEnumerator::currentSyncAnchor(

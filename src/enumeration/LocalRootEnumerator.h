@@ -73,7 +73,7 @@ class LocalRootEnumerator final : public VesselEnumerator {
   LocalAppLibraryManager appLibraryManager_;
   mutable std::mutex mutex_;
   std::shared_ptr<LocalFileEnumerator> localFileEnumerator_;  // with mutex_; replaced on enumQueue_
-  bool isRunning_ = true;                                     // with mutex_; until it is invalidated
+  bool isRunning_ = true;  // with mutex_; until it is invalidated
   /// Bridges come one at a time: each leaves another version behind.
   SerialQueue enumQueue_{"mirabel.root-enumerator.queue"};
 };

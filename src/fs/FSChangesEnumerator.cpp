@@ -109,9 +109,8 @@ void FSChangesEnumerator::stop() {
 
 void FSChangesEnumerator::startReader(FSEventReaderMode mode, std::uint64_t since) {
   passedEventID_ = since;
-  const auto reader =
-      FSEventReader::create(context_, events_, urls_, since, mode, Verbosity::quiet,
-                            eventScopeOf(container_));
+  const auto reader = FSEventReader::create(context_, events_, urls_, since, mode, Verbosity::quiet,
+                                            eventScopeOf(container_));
   SerialQueue readerQueue = reader->streamQueue();
   {
     const std::lock_guard lock(mutex_);

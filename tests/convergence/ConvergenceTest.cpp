@@ -44,6 +44,7 @@ class Convergence : public ::testing::TestWithParam<int> {
         runOne(firstSeed + static_cast<unsigned>(i));
     };
     std::vector<std::thread> threads;
+    threads.reserve(mostAtATime);
     for (int i = 0; i < mostAtATime; ++i)
       threads.emplace_back(work);
     for (std::thread& thread : threads)

@@ -90,8 +90,8 @@ std::string RandomApplications::change(RandomTree& random) {
 
 std::string RandomApplications::damage(RandomTree& random) {
   const fs::path cache = home_ + "/.local/share/Mirabel/" + anyOf(caches, random);
-  const fs::path copy = home_ + "/outside/copy" + std::to_string(random.pick(3)) + "of" +
-                        cache.filename().string();
+  const fs::path copy =
+      home_ + "/outside/copy" + std::to_string(random.pick(3)) + "of" + cache.filename().string();
   std::error_code ignored;
   switch (random.pick(4)) {
     case 0:

@@ -28,6 +28,7 @@ class Follower {
                                    "changes",       "--since", base64(stringView(anchor)),
                                    "workingset"};
     std::vector<char*> arguments;
+    arguments.reserve(words.size() + 1);
     for (std::string& word : words)
       arguments.push_back(word.data());
     arguments.push_back(nullptr);
@@ -77,9 +78,10 @@ class Run {
   Run()
       : outside_(home_.path() + "/outside"),
         applications_(home_.path()),
-        tree_(home_.documents(), applications_.libraries(),
-              [this](const std::string& library) { return applications_.isInstalled(library); },
-              outside_, 0) {
+        tree_(
+            home_.documents(), applications_.libraries(),
+            [this](const std::string& library) { return applications_.isInstalled(library); },
+            outside_, 0) {
     std::filesystem::create_directory(outside_);
     home_.makeFolder("watched");
     open();

@@ -13,9 +13,6 @@ using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
-constexpr const char* workingSetCachePath =
-    "/home/me/.local/share/Mirabel/searchable-app-libraries.plist";
-
 class LocalRootEnumeratorTest : public EnumerationTest {
  protected:
   static inline const std::string root{VesselRootContainerItemIdentifier};
