@@ -45,6 +45,7 @@ LocalAppLibraryManager::Version LocalAppLibraryManager::built(LocalAppLibraryCac
                                                               Reuse reuse) const {
   auto next = std::make_shared<AppLibraryContent>(content.versionToken,
                                                   platform_.manager.documentStorageURL());
+  learnFolders(content.records, former);
   for (const BundleProxy& record : content.records) {
     // Without a container there is nothing to be in anybody's way, and the item says why it fails.
     const bool mayTry = !record.dataContainerURL || next->hasRoomFor(record);
@@ -58,6 +59,22 @@ LocalAppLibraryManager::Version LocalAppLibraryManager::built(LocalAppLibraryCac
   }
   next->finish(std::move(content.records));
   return next;
+}
+
+/// Has the new ones looked at in one go: one by one, each would be a durable write.
+void LocalAppLibraryManager::learnFolders(const std::vector<BundleProxy>& records,
+                                          const AppLibraryContent& former) const {
+  std::vector<URL> folders;
+  for (const BundleProxy& record : records) {
+    if (!record.dataContainerURL) continue;
+    URL folder = documentFolderOf(*record.dataContainerURL);
+    if (former.atRootURL(folder) == nullptr) folders.push_back(std::move(folder));
+  }
+  if (folders.empty()) return;
+  // Where that fails, each is looked at when it is made an item.
+  if (auto fetched = platform_.resources.prefetch(folders); !fetched) {
+    logDebug([&] { return "can't look at the app libraries; " + fetched.error().description(); });
+  }
 }
 
 std::shared_ptr<LocalAppLibraryItem> LocalAppLibraryManager::itemOf(const BundleProxy& record,
@@ -114,7 +131,8 @@ void LocalAppLibraryManager::report(const AppLibraryContent& former, const AppLi
   std::vector<std::string> deleted;
   for (const BundleProxy& record : former.records()) {
     std::string identifier = MRBFileObjectIdentifier::fromBundleProxy(record);
-    if (next.withItemIdentifier(identifier) == nullptr) deleted.push_back(std::move(identifier));
+    if (next.withItemIdentifier(identifier) != nullptr || isUnmade(record, next)) continue;
+    deleted.push_back(std::move(identifier));
   }
   std::ranges::sort(deleted);
   const auto repeated = std::ranges::unique(deleted);
@@ -122,6 +140,16 @@ void LocalAppLibraryManager::report(const AppLibraryContent& former, const AppLi
   if (deleted.empty()) return;
   if (observer != nullptr) observer->didDeleteItemsWithIdentifiers(deleted);
   deleteIndexOfDeletedAppLibraries(platform_.manager, deleted);
+}
+
+/// Whether the library is still in the list, and its folder there, though it can't be made an item
+/// for now.
+bool LocalAppLibraryManager::isUnmade(const BundleProxy& record,
+                                      const AppLibraryContent& next) const {
+  if (next.isComplete() || !record.dataContainerURL) return false;
+  const bool isListed = std::ranges::find(next.records(), record.dataContainerURL,
+                                          &BundleProxy::dataContainerURL) != next.records().end();
+  return isListed && !isGone(documentFolderOf(*record.dataContainerURL));
 }
 
 LocalAppLibraryManager::Version LocalAppLibraryManager::current() const {
@@ -178,6 +206,13 @@ std::optional<BundleProxy> LocalAppLibraryManager::bundleProxyWithRootURL(const 
 
 AppLibraryRoots::List LocalAppLibraryManager::rootURLsForAppLibraries() const {
   return current()->rootURLs();
+}
+
+std::vector<URL> LocalAppLibraryManager::folders() const {
+  std::vector<URL> folders;
+  for (auto& [folder, record] : foldersAndRecords())
+    folders.push_back(std::move(folder));
+  return folders;
 }
 
 std::optional<BundleProxy> LocalAppLibraryManager::applicationOwning(const URL& url) const {

@@ -57,6 +57,7 @@ class LocalAppLibraryManager final : public AppLibraryRoots, public AppLibraryOw
   [[nodiscard]] std::optional<BundleProxy> bundleProxyWithRootURL(const URL& url) const;
 
   [[nodiscard]] List rootURLsForAppLibraries() const override;
+  [[nodiscard]] std::vector<URL> folders() const override;
   [[nodiscard]] std::optional<BundleProxy> applicationOwning(const URL& url) const override;
 
   /// One line for logs.
@@ -70,6 +71,7 @@ class LocalAppLibraryManager final : public AppLibraryRoots, public AppLibraryOw
   void install(Version version);
   [[nodiscard]] Version built(LocalAppLibraryCache::Content content,
                               const AppLibraryContent& former, Reuse reuse) const;
+  void learnFolders(const std::vector<BundleProxy>& records, const AppLibraryContent& former) const;
   [[nodiscard]] std::shared_ptr<LocalAppLibraryItem> itemOf(const BundleProxy& record,
                                                             const AppLibraryContent& former,
                                                             Reuse reuse) const;
@@ -78,6 +80,7 @@ class LocalAppLibraryManager final : public AppLibraryRoots, public AppLibraryOw
       const BundleProxy& record, const std::shared_ptr<LocalAppLibraryItem>& former) const;
   [[nodiscard]] std::shared_ptr<LocalAppLibraryItem> made(const BundleProxy& record) const;
   [[nodiscard]] bool isGone(const URL& folder) const;
+  [[nodiscard]] bool isUnmade(const BundleProxy& record, const AppLibraryContent& next) const;
   void report(const AppLibraryContent& former, const AppLibraryContent& next,
               VesselChangeObserver* observer) const;
 

@@ -18,6 +18,7 @@ bool MRBAppLibraryManager::refreshFromRegistry() {
     std::optional<std::vector<BundleProxy>> latest;
     const bool hasChanged = refreshMainCache(platform_.applications, caches_.main, &latest);
     if (!latest) return hasChanged;
+    hasLibraries_ = !latest->empty();
     latestNames_.clear();
     for (BundleProxy& record : *latest) {
       if (!record.dataContainerURL || !record.localizedName) continue;
@@ -29,6 +30,8 @@ bool MRBAppLibraryManager::refreshFromRegistry() {
 
 void MRBAppLibraryManager::followLibraries(EventStreams& events) {
   backgroundQueue_.sync([&] {
+    // There are libraries and their list can't be kept: no reason to let go of those of before.
+    if (shared_.versionToken() == 0 && hasLibraries_) return;
     std::vector<FollowedLibrary> libraries;
     for (auto& [folder, record] : shared_.foldersAndRecords()) {
       const auto latest = latestNames_.find(record.dataContainerURL->path());

@@ -42,6 +42,7 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   [[nodiscard]] List rootURLsForAppLibraries() const override {
     return shared_.rootURLsForAppLibraries();
   }
+  [[nodiscard]] std::vector<URL> folders() const override { return shared_.folders(); }
   [[nodiscard]] std::optional<BundleProxy> applicationOwning(const URL& url) const override {
     return shared_.applicationOwning(url);
   }
@@ -52,7 +53,9 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   Platform platform_;
   AppLibraryCaches caches_;
   LocalAppLibraryManager shared_;
-  std::map<std::string, std::string> latestNames_;  // by path of the container; background queue
+  // What the registry told last; on the background queue.
+  bool hasLibraries_ = true;
+  std::map<std::string, std::string> latestNames_;  // by path of the container
   SerialQueue backgroundQueue_{"mirabel.app-library.background"};
 };
 

@@ -38,6 +38,26 @@ class VersionedPage final : public VesselEnumerationObserver {
   std::uint64_t version_;
 };
 
+/// Keeps what a host is to be told of app libraries until it can be.
+class ToldLibraries final : public VesselChangeObserver {
+ public:
+  void tell(VesselChangeObserver& observer) const {
+    if (!updated_.empty()) observer.didUpdateItems(updated_);
+    if (!deleted_.empty()) observer.didDeleteItemsWithIdentifiers(deleted_);
+  }
+
+  void didUpdateItems(const VesselItems& items) override { updated_ = items; }
+  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override {
+    deleted_ = identifiers;
+  }
+  void finishEnumeratingChangesUpToSyncAnchor(const Data&, bool) override {}
+  void finishEnumeratingWithError(const Error&) override {}
+
+ private:
+  VesselItems updated_;
+  std::vector<std::string> deleted_;
+};
+
 }  // namespace
 
 std::shared_ptr<LocalRootEnumerator> LocalRootEnumerator::create(
@@ -80,26 +100,33 @@ std::shared_ptr<LocalFileEnumerator> LocalRootEnumerator::localFileEnumerator() 
 
 std::vector<URL> LocalRootEnumerator::monitoredRoots() const {
   std::vector<URL> roots{services_.items.platform.manager.documentStorageURL()};
-  for (auto& [folder, record] : appLibraryManager_.foldersAndRecords())
+  for (URL& folder : appLibraryManager_.folders())
     roots.push_back(std::move(folder));
   return roots;
 }
 
 /// Files are told by a new enumerator; what the former one has under way goes on.
 void LocalRootEnumerator::monitorRoots() {
-  auto next = LocalFileEnumerator::create(services_, container_, monitoredRoots(), liveUpdates_);
+  const std::uint64_t version = appLibraryManager_.versionToken();
+  const auto next =
+      LocalFileEnumerator::create(services_, container_, monitoredRoots(), liveUpdates_);
   std::shared_ptr<LocalFileEnumerator> former;
   {
     const std::lock_guard lock(mutex_);
     former = std::exchange(localFileEnumerator_, next);
-    if (!isRunning_) next = nullptr;
-  }
-  // The new one hears of what happens before the former one stops hearing of it.
-  if (next) {
-    if (const auto& notifier = next->notifier()) liveReaders_.add(notifier->reader());
-    next->startNotifier();
+    monitoredVersion_ = version;
+    // The new one hears of what happens before the former one stops hearing of it.
+    if (isRunning_) {
+      if (const auto& notifier = next->notifier()) liveReaders_.add(notifier->reader());
+      next->startNotifier();
+    }
   }
   if (former) former->stopNotifier();
+}
+
+LocalRootEnumerator::Monitored LocalRootEnumerator::monitored() const {
+  const std::lock_guard lock(mutex_);
+  return {localFileEnumerator_, monitoredVersion_};
 }
 
 // Items -----------------------------------------------------------------------------------------
@@ -107,21 +134,21 @@ void LocalRootEnumerator::monitorRoots() {
 void LocalRootEnumerator::enumerateItems(VesselEnumerationObserver& observer, const Data& page) {
   const LogSection section("enumerate root items for " + container_);
   if (isInitialPage(page)) takeOverMainCache();
-  const std::uint64_t version = appLibraryManager_.versionToken();
+  const auto [files, version] = monitored();
   VersionedPage versioned(observer, version);
   if (isInitialPage(page)) {
     if (holdsAppLibraries()) observer.didEnumerateItems(appLibraryManager_.appLibraries());
-    return localFileEnumerator()->enumerateItems(versioned, page);
+    return files->enumerateItems(versioned, page);
   }
   auto cursor = FSChangeToken::decode(page);
-  if (!cursor) return localFileEnumerator()->enumerateItems(versioned, page);
+  if (!cursor) return files->enumerateItems(versioned, page);
   if (cursor->appLibraryVersionToken != version) {
     logInfo("the app libraries changed while they were listed, need to restart from scratch " +
             versions(cursor->appLibraryVersionToken));
     return observer.finishEnumeratingWithError(Error::syncAnchorExpired());
   }
   cursor->appLibraryVersionToken = 0;
-  localFileEnumerator()->enumerateItems(versioned, cursor->encode());
+  files->enumerateItems(versioned, cursor->encode());
 }
 
 // Changes ---------------------------------------------------------------------------------------
@@ -137,10 +164,13 @@ void LocalRootEnumerator::enumerateChanges(std::shared_ptr<VesselChangeObserver>
   logDebug([&] { return "notifying app library changes since " + token->description(); });
   Result<FSChangeToken> next = *token;
   std::shared_ptr<LocalFileEnumerator> files;
+  ToldLibraries told;
   enumQueue_.sync([&] {
-    next = bridge(*token, *observer);
+    next = bridge(*token, told);
     files = localFileEnumerator();
   });
+  // Off the queue: the host may ask for more when it is told.
+  told.tell(*observer);
   if (!next) return observer->finishEnumeratingWithError(next.error());
   files->enumerateChanges(std::move(observer), next->encode());
 }
@@ -219,9 +249,9 @@ std::string LocalRootEnumerator::versions(std::uint64_t changeTokenVersion) cons
 void LocalRootEnumerator::currentSyncAnchor(
     const std::function<void(std::optional<Data>)>& completionHandler) {
   takeOverMainCache();
-  // Read first: what is told of a later version is told again to whoever holds an earlier one.
-  const std::uint64_t version = appLibraryManager_.versionToken();
-  localFileEnumerator()->currentSyncAnchor([&](std::optional<Data> anchor) {
+  // What is told of a later version is told again to whoever holds an earlier one.
+  const auto [files, version] = monitored();
+  files->currentSyncAnchor([&, version = version](std::optional<Data> anchor) {
     auto token = anchor ? FSChangeToken::decode(*anchor) : std::nullopt;
     if (!token) return completionHandler(std::nullopt);
     token->appLibraryVersionToken = version;

@@ -56,6 +56,12 @@ class LocalRootEnumerator final : public VesselEnumerator {
   [[nodiscard]] std::string versions(std::uint64_t changeTokenVersion) const;
   [[nodiscard]] std::vector<URL> monitoredRoots() const;
   void monitorRoots();
+  /// Files, and the version of the libraries whose folders they are told of.
+  struct Monitored {
+    std::shared_ptr<LocalFileEnumerator> files;
+    std::uint64_t version;
+  };
+  [[nodiscard]] Monitored monitored() const;
 
   /// Takes over the main cache where the anchor can be bridged, telling what the host has to know
   /// of it, and answers the token that the file changes go on from.
@@ -72,7 +78,9 @@ class LocalRootEnumerator final : public VesselEnumerator {
   RunningReaders& liveReaders_;
   LocalAppLibraryManager appLibraryManager_;
   mutable std::mutex mutex_;
-  std::shared_ptr<LocalFileEnumerator> localFileEnumerator_;  // with mutex_; replaced on enumQueue_
+  /// Both with mutex_, replaced together on enumQueue_.
+  std::shared_ptr<LocalFileEnumerator> localFileEnumerator_;
+  std::uint64_t monitoredVersion_ = 0;
   bool isRunning_ = true;  // with mutex_; until it is invalidated
   /// Bridges come one at a time: each leaves another version behind.
   SerialQueue enumQueue_{"mirabel.root-enumerator.queue"};

@@ -64,10 +64,9 @@ void LocalVessel::forEachTrashedEntry(
     }
     return {};
   };
-  const auto roots = roots_.rootURLsForAppLibraries();
   std::vector<URL> trashFolders;
-  for (const URL& root : *roots)
-    trashFolders.push_back(root.appendingPathComponent(trashName));
+  for (const URL& folder : roots_.folders())
+    trashFolders.push_back(folder.appendingPathComponent(trashName));
   trashFolders.push_back(platform_.manager.documentStorageURL().appendingPathComponent(trashName));
   for (URL& folder : trashFolders) {
     // Most folders have no trash, and what is wrong with one of them is not the others' concern.

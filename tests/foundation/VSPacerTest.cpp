@@ -58,8 +58,10 @@ TEST(VSPacer, MergesWhatComesWhileARunIsPending) {
   const auto starts = runs.waitFor(2);
   const auto intervals = (Clock::now() - begin) / interval;
   EXPECT_LE(starts.size(), static_cast<std::size_t>(intervals) + 2);
+  // The pacer counts from before the block, which may have been held up on the way.
+  constexpr auto delay = 20ms;
   for (std::size_t i = 1; i < starts.size(); ++i)
-    EXPECT_GE(starts[i] - starts[i - 1], interval);
+    EXPECT_GE(starts[i] - starts[i - 1], interval - delay);
 }
 
 TEST(VSPacer, ASignalDuringARunMakesAnother) {

@@ -78,8 +78,9 @@ TEST_F(FileObjectURLsTest, RootsAreTheRootContainerAndTheLibraries) {
 
   class Orphan final : public AppLibraryRoots {
     List rootURLsForAppLibraries() const override {
-      return std::make_shared<std::vector<URL>>(1, URL::fileURL("/apps/gone/Documents"));
+      return std::make_shared<std::vector<URL>>(folders());
     }
+    std::vector<URL> folders() const override { return {URL::fileURL("/apps/gone/Documents")}; }
   } orphan;
   const FileObjectURLs other(fake.platform(), orphan);
   EXPECT_FALSE(other.itemIdentifier(URL::fileURL("/apps/gone/Documents")));

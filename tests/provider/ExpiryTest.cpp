@@ -113,6 +113,16 @@ TEST_F(ExpiryTest, OnlyWhatWasTrashedStrictlyBeforeGoes) {
   EXPECT_THAT(errors(), ElementsAre());
 }
 
+// Below "/var" a folder's name to compare with is another than the one to open.
+TEST_F(ExpiryTest, LibrariesAreWalkedUnderTheNamesThatTheyHave) {
+  fake.install("org.example.var", "/var/home/me/.var/app/org.example.var", "Var");
+  fake.volume.makeFolder("/var/home/me/.var/app/org.example.var/Documents/.Trash");
+  const std::string entry = "/var/home/me/.var/app/org.example.var/Documents/.Trash/old";
+  trashed(entry, longAgo);
+  expire();
+  EXPECT_FALSE(existsAt(entry));
+}
+
 TEST_F(ExpiryTest, WithoutAReadableDateAnEntryIsStampedAndGoesOnePeriodLater) {
   const std::string missing = "can't find trash date";
   const std::string unreadable = "can't unarchive xattr data";

@@ -18,10 +18,17 @@ class FakeAppLibraries final : public AppLibraryRoots, public AppLibraryOwners {
 
   List rootURLsForAppLibraries() const override {
     auto roots = std::make_shared<std::vector<URL>>();
-    for (const BundleProxy& proxy : applications_.installed) {
-      if (proxy.dataContainerURL) roots->push_back(documents(proxy).properURL());
-    }
+    for (const URL& folder : folders())
+      roots->push_back(folder.properURL());
     return roots;
+  }
+
+  std::vector<URL> folders() const override {
+    std::vector<URL> folders;
+    for (const BundleProxy& proxy : applications_.installed) {
+      if (proxy.dataContainerURL) folders.push_back(documents(proxy));
+    }
+    return folders;
   }
 
   std::optional<BundleProxy> applicationOwning(const URL& url) const override {

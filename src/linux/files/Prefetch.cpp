@@ -220,6 +220,13 @@ Result<void> prefetchAll(const LookContext& context, std::span<const URL> urls) 
     if (!done) return done;
     folder.descriptor.reset();
   }
+  if (others.size() > 1) {
+    std::vector<std::string> paths;
+    paths.reserve(others.size());
+    for (const URL* url : others)
+      if (url->isFileURL()) paths.push_back(url->path());
+    if (auto learned = context.index.learnPaths(paths); !learned) return learned;
+  }
   for (const URL* url : others) {
     auto values = lookAtObject(context, *url);
     if (!values && values.error().domain == ErrorDomain::store) return fail(values.error());

@@ -33,7 +33,8 @@ class StoredVolumeIndex final : public VolumeIndex {
             {options.makeWatcher, [&roots] { return roots.refresh(); },
              [this] { state_->releaseMemory(); }, options.notice}),
         followsInBackground_(options.followsInBackground && options.makeWatcher),
-        device_(device) {
+        device_(device),
+        isPackageName_(options.isPackageName) {
     learner_.setRecentPlaces(&follower_);
     reserve_.make();
   }
@@ -82,6 +83,23 @@ class StoredVolumeIndex final : public VolumeIndex {
     });
     if (!done) return fail(done.error());
     return answer;
+  }
+
+  Result<void> learnPaths(std::span<const std::string> paths) override {
+    const Ringing ringing(*this);
+    const std::scoped_lock lock(mutex_);
+    return inTransactionAtLast([&]() -> Result<void> {
+      for (const std::string& path : paths) {
+        const std::string plain = plainPath(path);
+        const auto status = statusOf(plain);
+        if (!status) continue;
+        const bool isPackage =
+            status->kind == FileKind::folder && isPackageName_(splitPath(plain).name);
+        auto learned = learner_.learnPath(plain, *status, isPackage);
+        if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
+      }
+      return {};
+    });
   }
 
   Result<std::string> pathOfFileID(std::uint64_t fileID) override {
@@ -308,6 +326,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Follower follower_;
   bool followsInBackground_;
   std::uint64_t device_;
+  std::function<bool(std::string_view)> isPackageName_;
   JournalBell bell_;
   KeptAttributes keptAttributes_{[this](const auto& work) {
     const std::scoped_lock lock(mutex_);

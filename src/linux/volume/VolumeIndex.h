@@ -77,6 +77,10 @@ class VolumeIndex {
   [[nodiscard]] virtual Result<Sighting> learnPath(const std::string& path,
                                                    const ObjectStatus& status, bool isPackage) = 0;
 
+  /// Several of these in one transaction; what can't be looked at is left out. Errors of
+  /// `ErrorDomain::store`.
+  [[nodiscard]] virtual Result<void> learnPaths(std::span<const std::string> paths) = 0;
+
   /// Checked against the disk; looks further when the object is not where it was. ENOENT.
   [[nodiscard]] virtual Result<std::string> pathOfFileID(std::uint64_t fileID) = 0;
   /// Every name of the object that the index has and the disk agrees to; where there is none it
