@@ -64,7 +64,8 @@ std::string RandomTree::anyName() {
 
 // The ways in which editors save.
 void RandomTree::save(const std::string& path, std::size_t way) {
-  if (!fs::is_regular_file(fs::symlink_status(path))) return;
+  // Where the file can't be put aside, it is written over.
+  if (!fs::is_regular_file(fs::symlink_status(path)) || !mayBeWritten(path)) return;
   const std::string temporary = fs::path(path).parent_path() / ".save.tmp";
   const std::string backup = path + "~";
   switch (way) {
