@@ -250,11 +250,11 @@ void LocalRootEnumerator::currentSyncAnchor(
     const std::function<void(std::optional<Data>)>& completionHandler) {
   takeOverMainCache();
   // What is told of a later version is told again to whoever holds an earlier one.
-  const auto [files, version] = monitored();
-  files->currentSyncAnchor([&, version = version](std::optional<Data> anchor) {
+  const Monitored now = monitored();
+  now.files->currentSyncAnchor([&](std::optional<Data> anchor) {
     auto token = anchor ? FSChangeToken::decode(*anchor) : std::nullopt;
     if (!token) return completionHandler(std::nullopt);
-    token->appLibraryVersionToken = version;
+    token->appLibraryVersionToken = now.version;
     completionHandler(token->encode());
   });
 }
