@@ -66,6 +66,8 @@ class LocalRootEnumeratorTest : public EnumerationTest {
       const auto enumeration = made.made.back().lock();
       bridged.next = enumeration->token;
       bridged.urls = enumeration->urls;
+      // Until it finishes it is held by who started it.
+      enumeration->observer->finishEnumeratingChangesUpToSyncAnchor(from, false);
     }
     return bridged;
   }
