@@ -240,7 +240,9 @@ void FSChangesEnumerator::didUpdateItem(FSEventReader& reader,
     const std::string document = MRBFileObjectIdentifier::fromDocumentID(*event.documentID);
     if (document != told) settleIdentifier(document, true, url);
   }
-  if (event.fileID && (event.flags & eventflag::changedKind) != 0) {
+  // What was no document then was known by its file ID.
+  const bool wasKnownByFile = !event.documentID || (event.flags & eventflag::changedKind) != 0;
+  if (event.fileID && wasKnownByFile && !told.starts_with('#')) {
     const std::string file = MRBFileObjectIdentifier::fromFileID(*event.fileID);
     if (file != told) settleIdentifier(file, true, url);
   }
