@@ -80,7 +80,7 @@ Result<PlaceLooks::Presence> PlaceLooks::lookInFolder(FolderWatcher& watcher, st
   auto presence = open(id, folder);
   if (!presence || *presence == Presence::moved) return presence;
   if (*presence == Presence::gone) {
-    // What was linked in it, and unlinked with it, may live on elsewhere.
+    // What was linked in it or written to, and left with it, may live on elsewhere.
     for (const auto& [name, look] : names) {
       if (auto done = noteOthers(look, nullptr); !done) return fail(done.error());
     }
@@ -145,8 +145,9 @@ Result<void> PlaceLooks::endUnlinked(const Folder& folder, const std::string& na
   return wasIt ? context_.learner.leave(std::move(**occupant)) : Result<void>();
 }
 
-// What was linked under a name that does not stand for it any more may have other names: the count
-// of its links has changed there.
+// What was linked or written to under a name that does not stand for it any more may have other
+// names, which the index need not have known together with this one: the count of its links has
+// changed there, or what is in it.
 Result<void> PlaceLooks::noteOthers(const Look& look, const ObjectStatus* status) {
   for (const std::string& handle : look.objects) {
     const std::vector<std::uint64_t> inodes = inodesIn(handle);

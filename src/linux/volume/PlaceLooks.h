@@ -25,8 +25,9 @@ class PlaceLooks {
   /// `pause` is called every so many names.
   [[nodiscard]] Result<LookList::Folders> look(const Transaction& transaction, const Pause& pause,
                                                FolderWatcher& watcher, LookList::Folders folders);
-  /// Looks at what was linked or unlinked somewhere under its other names; to be called when the
-  /// places were looked at. What does not lie where the index has it is kept for the next time.
+  /// Looks at what was linked, unlinked or written to somewhere under its other names; to be called
+  /// when the places were looked at. What does not lie where the index has it is kept for the next
+  /// time.
   [[nodiscard]] Result<void> lookAtOthers();
   /// Further objects to be looked at then.
   void addOthers(std::set<std::uint64_t> fileIDs) { others_.merge(fileIDs); }

@@ -1,5 +1,6 @@
 #include "linux/watch/FanotifyRecords.h"
 
+#include <algorithm>
 #include <cstring>
 #include <sys/fanotify.h>
 
@@ -72,6 +73,12 @@ bool decodeRecord(std::span<const std::byte> bytes, FanotifyRecord& record) {
   return true;
 }
 
+// A file that is written to has a record for each write.
+void note(std::string_view object, Look& look) {
+  if (object.empty() || std::ranges::find(look.objects, object) != look.objects.end()) return;
+  look.objects.emplace_back(object);
+}
+
 }  // namespace
 
 bool decodeFanotify(std::span<const std::byte> bytes,
@@ -103,9 +110,7 @@ bool addLooks(const FanotifyRecord& record, const WatchedFolder& watched, LookLi
     Look& look = looks.at(*folder, place->name == "." ? std::string_view() : place->name);
     if ((record.mask & entryBits) != 0) look.entryChanged = true;
     if ((record.mask & contentBits) != 0) look.contentChanged = true;
-    if ((record.mask & (FAN_CREATE | FAN_DELETE)) != 0 && !record.target.empty()) {
-      look.objects.emplace_back(record.target);
-    }
+    if ((record.mask & (FAN_CREATE | FAN_DELETE | contentBits)) != 0) note(record.target, look);
     if ((record.mask & FAN_DELETE) != 0) look.unlinked.emplace_back(record.target);
   }
   return true;

@@ -15,8 +15,8 @@ namespace mirabel {
 struct Look {
   bool entryChanged = false;    ///< the name came, left, or stands for something else
   bool contentChanged = false;  ///< what it stands for was written to, or its attributes were
-  /// Handles of the objects that were linked or unlinked under this name, where the kernel says so:
-  /// they may have other names, which show that too.
+  /// Handles of the objects that were linked, unlinked or written to under this name, where the
+  /// kernel says so: they may have other names, which show that too.
   std::vector<std::string> objects;
   /// Handles of the objects that were unlinked under this name; "?" where the kernel does not say
   /// which it was.

@@ -58,8 +58,8 @@ Bytes fanotifyRecord(std::uint64_t mask, const std::vector<Info>& infos) {
   return bytes + body;
 }
 
-// "1/name=ec" for each place: e when the entry changed, c when the content did, and "-X" for each
-// object that was unlinked.
+// "1/name=ec" for each place: e when the entry changed, c when the content did, "X" for each object
+// that is said to be what it happened to, and "-X" for each that was unlinked.
 std::string text(const LookList& looks) {
   std::vector<std::string> places;
   for (const auto& [folder, names] : looks.folders()) {
@@ -67,6 +67,8 @@ std::string text(const LookList& looks) {
       std::string place = std::to_string(folder) + "/" + name + "=";
       if (look.entryChanged) place += 'e';
       if (look.contentChanged) place += 'c';
+      for (const std::string& object : look.objects)
+        place += object.back();
       for (const std::string& object : look.unlinked)
         place += "-" + object.substr(object.size() - 1);
       places.push_back(place);
@@ -96,15 +98,15 @@ TEST(FanotifyRecords, SayWhereToLook) {
     const char* looks;
   };
   const Case cases[] = {
-      {FAN_CREATE, {{place, 'A', "f"}, {target, 'x', nullptr}}, "1/f=e"},
+      {FAN_CREATE, {{place, 'A', "f"}, {target, 'x', nullptr}}, "1/f=ex"},
       {FAN_CREATE | FAN_ONDIR, {{place, 'B', "d"}}, "2/d=e"},
-      {FAN_DELETE, {{place, 'A', "f"}, {target, 'x', nullptr}}, "1/f=e-x"},
-      {FAN_MODIFY, {{place, 'A', "f"}}, "1/f=c"},
+      {FAN_DELETE, {{place, 'A', "f"}, {target, 'x', nullptr}}, "1/f=ex-x"},
+      {FAN_MODIFY, {{place, 'A', "f"}, {target, 'x', nullptr}}, "1/f=cx"},
       {FAN_ATTRIB, {{place, 'A', "f"}}, "1/f=c"},
       {FAN_CLOSE_WRITE, {{place, 'A', "f"}}, "1/f=c"},
       {FAN_CREATE | FAN_MODIFY | FAN_DELETE,
        {{place, 'A', "f"}, {target, 'x', nullptr}},
-       "1/f=ec-x"},
+       "1/f=ecx-x"},
       {FAN_ATTRIB | FAN_ONDIR, {{place, 'A', "."}}, "1/=c"},
       {FAN_DELETE_SELF | FAN_ONDIR, {{place, 'A', "."}}, "1/=e"},
       {FAN_RENAME, {{from, 'A', "f"}, {to, 'B', "g"}, {target, 'x', nullptr}}, "1/f=e 2/g=e"},
@@ -128,16 +130,18 @@ TEST(FanotifyRecords, SayWhereToLook) {
 
 TEST(FanotifyRecords, AreMergedByPlaceAndTellOfAnOverflow) {
   Bytes bytes;
-  bytes += (fanotifyRecord(FAN_CREATE, {{FAN_EVENT_INFO_TYPE_DFID_NAME, 'A', "f"}}));
+  const std::vector<Info> infos{{FAN_EVENT_INFO_TYPE_DFID_NAME, 'A', "f"},
+                                {FAN_EVENT_INFO_TYPE_FID, 'x', nullptr}};
+  bytes += (fanotifyRecord(FAN_CREATE, infos));
   bytes += (fanotifyRecord(FAN_Q_OVERFLOW, {}));
-  bytes += (fanotifyRecord(FAN_MODIFY, {{FAN_EVENT_INFO_TYPE_DFID_NAME, 'A', "f"}}));
+  bytes += (fanotifyRecord(FAN_MODIFY, infos));
   LookList looks;
   int lost = 0;
   EXPECT_TRUE(decodeFanotify(bytesOf(bytes), [&](const auto& record) {
     if (!addLooks(record, watched, looks)) ++lost;
   }));
   EXPECT_EQ(lost, 1);
-  EXPECT_EQ(text(looks), "1/f=ec");
+  EXPECT_EQ(text(looks), "1/f=ecx");
 }
 
 TEST(FanotifyRecords, ThatNoKernelWritesAreRefusedWithinTheirBounds) {
