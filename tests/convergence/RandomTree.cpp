@@ -9,6 +9,7 @@
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
+#include <utility>
 
 namespace mirabel::testing {
 namespace {
@@ -20,6 +21,11 @@ void writeFile(const std::string& path, std::size_t size, std::ios::openmode mod
   if (fs::exists(status) && !fs::is_regular_file(status)) return;
   std::ofstream file(path, mode | std::ios::binary);
   file << std::string(size, 'x');
+}
+
+std::uint64_t inodeOf(const std::string& path) {
+  struct stat status {};
+  return ::lstat(path.c_str(), &status) == 0 ? status.st_ino : 0;
 }
 
 }  // namespace
@@ -39,12 +45,45 @@ std::vector<std::string> RandomTree::all(bool folders) const {
   return result;
 }
 
-bool RandomTree::mayBeWritten(const std::string& file) const {
-  struct stat status {};
-  if (::stat(file.c_str(), &status) != 0 || status.st_nlink < 2) return true;
+bool RandomTree::isShown(const std::string& path) const {
   return std::ranges::none_of(others_, [&](const std::string& other) {
-    return file.starts_with(other + "/") && !isPresented_(other);
+    return (path + "/").starts_with(other + "/") && !isPresented_(other);
   });
+}
+
+std::set<std::uint64_t> RandomTree::shownFolders() const {
+  std::set<std::uint64_t> shown;
+  for (const std::string& folder : all(true))
+    if (isShown(folder)) shown.insert(inodeOf(folder));
+  return shown;
+}
+
+void RandomTree::noteFollowed() {
+  followed_ = shownFolders();
+}
+
+void RandomTree::noteWriting(const std::string& file) {
+  struct stat status {};
+  if (::stat(file.c_str(), &status) != 0 || status.st_nlink < 2) return;
+  const fs::path place(file);
+  const std::uint64_t folder = inodeOf(place.parent_path());
+  if (!followed_.contains(folder)) unheard_.push_back({status.st_ino, folder, place.filename()});
+}
+
+void RandomTree::makeUnheardHeard() {
+  auto names = all(false);
+  std::erase_if(names, [&](const std::string& name) { return !isShown(name); });
+  for (const Written& written : std::exchange(unheard_, {})) {
+    const auto isIt = [&](const std::string& name) { return inodeOf(name) == written.file; };
+    const bool shows = std::ranges::any_of(names, [&](const std::string& name) {
+      const fs::path place(name);
+      return isIt(name) && place.filename() == written.name &&
+             inodeOf(place.parent_path()) == written.folder;
+    });
+    const auto other = std::ranges::find_if(names, isIt);
+    if (shows || other == names.end()) continue;
+    ::utimensat(AT_FDCWD, other->c_str(), nullptr, AT_SYMLINK_NOFOLLOW);
+  }
 }
 
 bool RandomTree::isRoot(const std::string& folder) const {
@@ -65,7 +104,8 @@ std::string RandomTree::anyName() {
 // The ways in which editors save.
 void RandomTree::save(const std::string& path, std::size_t way) {
   // Where the file can't be put aside, it is written over.
-  if (!fs::is_regular_file(fs::symlink_status(path)) || !mayBeWritten(path)) return;
+  if (!fs::is_regular_file(fs::symlink_status(path))) return;
+  noteWriting(path);
   const std::string temporary = fs::path(path).parent_path() / ".save.tmp";
   const std::string backup = path + "~";
   switch (way) {
@@ -139,7 +179,7 @@ std::string RandomTree::changeLinked(const std::string& to) {
   const std::string file = anyLinked();
   switch (pick(5)) {
     case 0:
-      if (!mayBeWritten(file)) return "nothing";
+      noteWriting(file);
       writeFile(file, pick(9) + 1, std::ios::app);
       return "append linked " + file;
     case 1:
@@ -160,14 +200,17 @@ std::string RandomTree::change() {
   const std::size_t kind = pick(22);
   const std::string file = any(false), folder = any(true), to = anyName();
   const bool isFixed = isRoot(folder);
+  // What leaves is not followed when it comes back.
+  const auto shown = shownFolders();
+  std::erase_if(followed_, [&](std::uint64_t id) { return !shown.contains(id); });
   switch (kind) {
     case 0:
     case 1:
-      if (!mayBeWritten(to)) return "nothing";
+      noteWriting(to);
       writeFile(to, pick(60), std::ios::trunc);
       return "write " + to;
     case 2:
-      if (!mayBeWritten(file)) return "nothing";
+      noteWriting(file);
       if (file != root_ + "/none") writeFile(file, pick(9) + 1, std::ios::app);
       return "append " + file;
     case 3:
@@ -193,11 +236,11 @@ std::string RandomTree::change() {
       ::renameat2(AT_FDCWD, file.c_str(), AT_FDCWD, to.c_str(), RENAME_EXCHANGE);
       return "exchange " + file + " and " + to;
     case 11:
-      if (!mayBeWritten(file)) return "nothing";
+      noteWriting(file);
       ::chmod(file.c_str(), pick(2) == 0 ? 0400 : 0644);
       return "chmod " + file;
     case 12:
-      if (!mayBeWritten(file)) return "nothing";
+      noteWriting(file);
       ::lsetxattr(file.c_str(), "user.com.norvane.favorite-rank.number#PS", "x", pick(2), 0);
       return "setxattr " + file;
     case 13: {

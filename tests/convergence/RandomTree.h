@@ -1,7 +1,9 @@
 #pragma once
 
+#include <cstdint>
 #include <functional>
 #include <random>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -11,9 +13,7 @@ namespace mirabel::testing {
 /// file system refuses is no change.
 class RandomTree {
  public:
-  /// `others` are further folders in which things happen, whenever they are there. What is written
-  /// to a file through a name in one of them that is not presented at the time is no change that
-  /// its other names must tell.
+  /// `others` are further folders in which things happen, whenever they are there.
   RandomTree(std::string root, std::vector<std::string> others,
              std::function<bool(const std::string&)> isPresented, std::string outside,
              unsigned seed)
@@ -25,6 +25,11 @@ class RandomTree {
 
   /// Makes one, and answers what it was, for people.
   std::string change();
+  /// Everything was caught up with: from now on the folders that are presented are followed.
+  void noteFollowed();
+  /// Before it is caught up: what was written to a file through a name that is gone, in a folder
+  /// that nobody followed, is a change of which nothing tells. Makes another, which shows.
+  void makeUnheardHeard();
   /// What comes next depends on the seed and on the tree alone.
   void reseed(unsigned seed) { random_.seed(seed); }
   [[nodiscard]] std::size_t pick(std::size_t n) { return random_() % n; }
@@ -39,7 +44,13 @@ class RandomTree {
   void linkNameless(const std::string& to);
   std::string changeLinked(const std::string& to);
 
-  [[nodiscard]] bool mayBeWritten(const std::string& file) const;
+  struct Written {
+    std::uint64_t file, folder;  ///< inode numbers
+    std::string name;
+  };
+  void noteWriting(const std::string& file);
+  [[nodiscard]] bool isShown(const std::string& path) const;
+  [[nodiscard]] std::set<std::uint64_t> shownFolders() const;
   [[nodiscard]] bool isRoot(const std::string& folder) const;
 
   std::string root_;
@@ -47,6 +58,8 @@ class RandomTree {
   std::function<bool(const std::string&)> isPresented_;
   std::string outside_;  ///< a folder on the same file system that is not presented
   std::mt19937 random_;
+  std::set<std::uint64_t> followed_;  // inode numbers of folders
+  std::vector<Written> unheard_;
 };
 
 }  // namespace mirabel::testing

@@ -92,6 +92,7 @@ class Run {
           std::string(VesselRootContainerItemIdentifier), watched_}) {
       replicas_.push_back(host_->list(container));
     }
+    tree_.noteFollowed();
   }
 
   /// False when the sequence has failed.
@@ -142,6 +143,7 @@ class Run {
   }
 
   bool catchUp() {
+    tree_.makeUnheardHeard();
     // As whoever hears of applications does. Until then an app library whose folder is gone is
     // left out of listings, and its going is not told yet.
     host_->refreshAppLibraries();
@@ -157,6 +159,7 @@ class Run {
       outcome.failure = difference(replica, host_->list(replica.container));
       if (!outcome.failure.empty()) return false;
     }
+    tree_.noteFollowed();
     tell("caught up");
     return true;
   }
