@@ -151,6 +151,25 @@ TEST_F(Watch, FollowsAFolderByItsIdentityToItsEnd) {
   EXPECT_EQ(WEXITSTATUS(watch.end()), 3);
 }
 
+// What the record of the name that it left says of it is not what it is by now.
+TEST_F(Watch, TellsThatAFolderLeftWhichThenBecameAPackage) {
+  for (const char* folder : {"watched", "watched/x", "other", "other/e.package"})
+    home.makeFolder(folder);
+  const std::string identifier = run({"id", home.at("watched/x")}).out;
+  ASSERT_THAT(identifier, StartsWith("fid="));
+  Running watch(command({"watch", home.at("watched")}));
+  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  home.rename("watched/x", "other/e.package/e.package");
+  home.rename("other/e.package", "other/plain");
+  home.makeFolder("watched/later");
+  std::string told;
+  for (std::string line = "told\n"; !line.empty() && !line.ends_with("/later\n"); told += line)
+    line = watch.output().line();
+  watch.send(SIGTERM);
+  expectDone(watch.end());
+  EXPECT_THAT(told + watch.output().rest(), HasSubstr("deleted  " + identifier));
+}
+
 TEST_F(Watch, TellsOfApplicationsThatComeAndGoAndOfWhatHappensInThem) {
   const InstalledApps apps(home);
   for (const std::string container : {"root", "workingset", "alldirs"}) {
