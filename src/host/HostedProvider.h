@@ -6,6 +6,7 @@
 #include "foundation/Error.h"
 #include "fs/FSChangesEnumerator.h"
 #include "host/HostTrash.h"
+#include "host/SearchableItems.h"
 #include "linux/files/LinuxPlatform.h"
 #include "linux/log/LoggingDiagnosticReporter.h"
 #include "provider/LocalVessel.h"
@@ -20,15 +21,17 @@ class HostedProvider {
   /// Returns when the app libraries are those that are installed now. Errors: those of
   /// `LinuxPlatform::open`.
   [[nodiscard]] static Result<std::unique_ptr<HostedProvider>> open(LinuxPlatform::Options options);
+  ~HostedProvider();
   HostedProvider(const HostedProvider&) = delete;
   HostedProvider& operator=(const HostedProvider&) = delete;
 
   [[nodiscard]] LocalVessel& vessel() { return *vessel_; }
   [[nodiscard]] const LocalVessel& vessel() const { return *vessel_; }
   [[nodiscard]] HostTrash& trash() { return *trash_; }
-  [[nodiscard]] MRBAppLibraryManager& libraries() { return *libraries_; }
+  [[nodiscard]] MRBAppLibraryManager& libraries() const { return *libraries_; }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
+  [[nodiscard]] SearchableItems& searchableItems() { return *searchable_; }
   /// Keeps up with applications that are installed and removed, from the first look at them on.
   void watchApplications() { platform_->watchApplications(); }
 
@@ -36,6 +39,7 @@ class HostedProvider {
   explicit HostedProvider(std::unique_ptr<LinuxPlatform> platform);
 
   std::unique_ptr<LinuxPlatform> platform_;
+  std::unique_ptr<SearchableItems> searchable_;  // asked by the libraries from the first one on
   std::unique_ptr<MRBAppLibraryManager> libraries_;
   LoggingDiagnosticReporter diagnostics_;
   std::unique_ptr<FileObjectURLs> identity_;

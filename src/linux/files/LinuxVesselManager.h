@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -38,10 +39,14 @@ class LinuxVesselManager final : public VesselManager {
     completionHandler(std::nullopt);
   }
 
-  /// Nothing is indexed yet, so that nothing is left of any domain.
-  void deleteSearchableItemsWithDomainIdentifiers(const std::vector<std::string>&,
+  using DomainDeleter = std::function<std::optional<Error>(const std::vector<std::string>&)>;
+  /// Has `deleter` take domains out of the search index from now on; without one there is none that
+  /// anything could be left in. Not while the manager is in use.
+  void setDomainDeleter(DomainDeleter deleter) { domainDeleter_ = std::move(deleter); }
+
+  void deleteSearchableItemsWithDomainIdentifiers(const std::vector<std::string>& domainIdentifiers,
                                                   DeletionHandler completionHandler) override {
-    completionHandler(std::nullopt);
+    completionHandler(domainDeleter_ ? domainDeleter_(domainIdentifiers) : std::nullopt);
   }
 
  private:
@@ -53,6 +58,7 @@ class LinuxVesselManager final : public VesselManager {
   URL documentStorage_;
   std::mutex mutex_;
   std::shared_ptr<SignalListener> listener_;
+  DomainDeleter domainDeleter_;
 };
 
 }  // namespace mirabel

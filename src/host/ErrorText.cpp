@@ -1,4 +1,4 @@
-#include "cli/ErrorText.h"
+#include "host/ErrorText.h"
 
 #include <cerrno>
 #include <string_view>
@@ -32,7 +32,8 @@ std::string posixMeaning(int code) {
 
 // These are chosen for their exit code; their details say everything that their names would.
 bool detailIsEnough(std::int64_t code) {
-  return code == EBUSY || code == EINVAL || code == ENOTDIR || code == EPERM;
+  return code == EBUSY || code == EINVAL || code == ENOTDIR || code == EPERM || code == ENOTCONN ||
+         code == ENOBUFS || code == ECANCELED;
 }
 
 std::string posixText(const Error& error) {
@@ -83,6 +84,8 @@ std::string localText(const Error& error) {
 }  // namespace
 
 std::string explanation(const Error& error) {
+  const auto told = error.userInfo.find(toldExplanation);
+  if (told != error.userInfo.end()) return told->second;
   switch (error.domain) {
     case ErrorDomain::posix:
       return posixText(error);

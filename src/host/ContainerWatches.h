@@ -1,0 +1,64 @@
+#pragma once
+
+#include <condition_variable>
+#include <functional>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "host/Documents.h"
+#include "host/HostedProvider.h"
+
+namespace mirabel {
+
+/// Wakes those who watch containers of a provider: whoever's container has changes, and nobody
+/// else. The provider's signals say that something has changed in some container; what has not
+/// been told is found by asking each watched one. Any thread may call it.
+class ContainerWatches {
+ public:
+  /// Takes the provider's signals. The provider outlives this.
+  explicit ContainerWatches(HostedProvider& provider);
+  /// The watches must have ended.
+  ~ContainerWatches();
+  ContainerWatches(const ContainerWatches&) = delete;
+  ContainerWatches& operator=(const ContainerWatches&) = delete;
+
+  /// `changed` is called on a thread of this class, one call at a time. Once the watch is gone it
+  /// is called no more, and no call is under way, unless it is that call which ended the watch.
+  /// Errors: see `Documents::container`.
+  enum class Wake {
+    forChanges,
+    forAnySignal,  ///< perhaps for nothing: for who asks for the changes anyway
+  };
+  [[nodiscard]] Result<std::unique_ptr<ContainerWatch>> add(const std::string& identifier,
+                                                            std::function<void()> changed,
+                                                            Wake wake = Wake::forChanges);
+
+ private:
+  class Watched;
+  class Watcher;
+  class Entry;
+
+  void remove(const std::shared_ptr<Watcher>& watcher);
+  void run();
+  void check();
+
+  /// What the provider's threads ring; one that is ringing keeps it.
+  struct Bell {
+    std::mutex mutex;
+    std::condition_variable rung;
+    bool isSignalled = false;
+    bool mustEnd = false;
+  };
+
+  HostedProvider& provider_;
+  std::shared_ptr<Bell> bell_ = std::make_shared<Bell>();
+  std::mutex mutex_;  ///< for what follows
+  std::map<std::string, std::shared_ptr<Watched>> watched_;
+  std::thread thread_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,91 @@
+#include "host/ItemLookup.h"
+
+#include <cerrno>
+#include <filesystem>
+#include <system_error>
+
+#include "linux/apps/LinuxApplicationRegistry.h"
+
+namespace mirabel {
+namespace {
+
+namespace fs = std::filesystem;
+
+Error withDetail(Error error, std::string detail) {
+  error.userInfo[std::string(errorkey::detail)] = std::move(detail);
+  return error;
+}
+
+bool isWithin(const std::string& path, const std::string& folder) {
+  return path == folder || (path.starts_with(folder) && path[folder.size()] == '/');
+}
+
+}  // namespace
+
+const std::string& ItemLookup::storage() const {
+  return provider_.platform().manager.documentStorageURL().path();
+}
+
+std::optional<std::string> ItemLookup::reasonLeftOut(std::string_view bundle) const {
+  for (const LeftOut& leftOut : provider_.linuxPlatform().applications().leftOut())
+    if (leftOut.identifier == bundle) return "it is left out: " + leftOut.reason;
+  return {};
+}
+
+bool ItemLookup::isLibrary(const URL& url) const {
+  return provider_.libraries().shared().bundleProxyWithRootURL(url).has_value();
+}
+
+bool ItemLookup::isWithinLibrary(const URL& url) const {
+  return isLibrary(url) || provider_.libraries().applicationOwning(url).has_value();
+}
+
+// The provider answers for every application that has a folder for documents, but nothing follows
+// what lies in one that is not listed.
+bool ItemLookup::isShown(const LocalItem& item) const {
+  return !item.itemIdentifier().starts_with('#') || isLibrary(item.fileURL());
+}
+
+// The document storage may be named by a link to it, "~/Documents" for one, and so may the folder
+// of an app library.
+std::string ItemLookup::withoutLinkToRoot(const std::string& path) const {
+  std::error_code failure;
+  const fs::path target = fs::canonical(path, failure);
+  if (failure || target == path) return path;
+  const bool isRoot = target == storage() || isLibrary(URL::fileURL(target.native()));
+  return isRoot ? target.native() : path;
+}
+
+Result<std::shared_ptr<LocalItem>> ItemLookup::byIdentifier(std::string_view identifier) const {
+  auto item = provider_.vessel().itemForIdentifier(identifier);
+  if (item && isShown(**item)) return item;
+  if (identifier.starts_with('#')) {
+    auto reason = reasonLeftOut(identifier.substr(1));
+    if (!reason && item) reason = "the application is there, but its documents are not shown";
+    if (reason) {
+      return fail(withDetail(Error::local(LocalVesselError::itemNotFound), *std::move(reason)));
+    }
+  }
+  const bool isRoot = identifier == VesselRootContainerItemIdentifier;
+  if (isRoot && !provider_.platform().resources.readValues(URL::fileURL(storage()))) {
+    return fail(Error::posix(ENOENT, "the document storage \"" + storage() + "\""));
+  }
+  return fail(Error::nonExistentItem(identifier));
+}
+
+Result<std::shared_ptr<LocalItem>> ItemLookup::atPath(const std::string& path) const {
+  const std::string place = withoutLinkToRoot(path);
+  const URL url = URL::fileURL(place);
+  if (auto values = provider_.platform().resources.readValues(url); !values) {
+    return fail(values.error());
+  }
+  const Error unknown = Error::local(LocalVesselError::itemNotFound);
+  if (!isWithin(place, storage()) && !isWithinLibrary(url)) {
+    return fail(withDetail(unknown, "it is not below the document storage \"" + storage() +
+                                        "\", nor in the folder of an app library"));
+  }
+  if (auto item = provider_.vessel()._propertiesForItemAtURL(url)) return item;
+  return fail(withDetail(unknown, "it is not shown as an item"));
+}
+
+}  // namespace mirabel

@@ -1,0 +1,88 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/ContainerWatches.h"
+#include "host/Documents.h"
+#include "host/HostedProvider.h"
+#include "host/ItemLookup.h"
+#include "host/Searching.h"
+
+namespace mirabel {
+
+/// The documents through a provider in this process. It holds the volume's state for as long as it
+/// lives; containers and watches must have ended when it goes, and operations have reported.
+class LocalDocuments final : public Documents {
+ public:
+  /// Errors: those of `LinuxPlatform::open`.
+  [[nodiscard]] static Result<std::unique_ptr<LocalDocuments>> open(LinuxPlatform::Options options);
+
+  [[nodiscard]] HostedProvider& provider() { return *provider_; }
+  [[nodiscard]] const ItemLookup& lookup() const { return lookup_; }
+  /// Keeps the search index in step from now on, in the background.
+  void keepSearching() { searching_.follow(watches()); }
+
+  [[nodiscard]] ItemResult item(std::string_view identifier) override;
+  [[nodiscard]] ItemResult itemAtPath(const std::string& path) override;
+  [[nodiscard]] Result<std::unique_ptr<DocumentContainer>> container(
+      std::string_view identifier) override;
+  /// Keeps up with applications that come and go from then on.
+  [[nodiscard]] Result<std::unique_ptr<ContainerWatch>> watch(
+      std::string_view identifier, std::function<void()> changed) override;
+
+  [[nodiscard]] Result<UniqueFd> openFile(std::string_view identifier, Access access) override;
+
+  void importDocument(const std::string& source, const std::string& parent,
+                      ItemHandler handler) override;
+  void createDirectory(const std::string& name, const std::string& parent,
+                       ItemHandler handler) override;
+  void rename(const std::string& identifier, const std::string& name, ItemHandler handler) override;
+  void reparent(const std::string& identifier, const std::string& parent,
+                const std::optional<std::string>& newName, ItemHandler handler) override;
+  void remove(const std::string& identifier, ErrorHandler handler) override;
+  void trash(const std::string& identifier, ItemHandler handler) override;
+  void restore(const std::string& identifier, const std::optional<std::string>& parent,
+               ItemHandler handler) override;
+  void setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,
+                       ItemHandler handler) override;
+  void setTagData(const std::string& identifier, const std::optional<Data>& tagData,
+                  ItemHandler handler) override;
+  void setFavoriteRank(const std::string& identifier, const std::optional<Number>& rank,
+                       ItemHandler handler) override;
+  [[nodiscard]] Result<TrashFindings> itemsTrashedBefore(const Date& date) override;
+  /// As there, the trash is walked on the caller's thread.
+  void removeItemsTrashedBefore(const Date& date, ErrorHandler handler) override;
+  [[nodiscard]] Progress progress() override;
+
+  [[nodiscard]] Result<std::vector<ItemRecord>> appLibraries() override;
+  [[nodiscard]] Result<ApplicationContainer> applicationContainer(
+      const std::string& bundle) override;
+  [[nodiscard]] Result<std::optional<Data>> icon(const std::string& identifier,
+                                                 std::uint32_t side) override;
+
+  [[nodiscard]] Result<std::vector<ItemRecord>> search(const SearchQuery& query) override;
+  [[nodiscard]] Result<std::vector<ItemRecord>> recent(std::size_t limit) override;
+  [[nodiscard]] Result<std::vector<ItemRecord>> favorites(std::size_t limit) override;
+
+  [[nodiscard]] Result<StatusReport> status() override;
+  [[nodiscard]] HomePlaces places() override;
+
+ private:
+  explicit LocalDocuments(std::unique_ptr<HostedProvider> provider);
+  [[nodiscard]] ContainerWatches& watches();
+  [[nodiscard]] std::string whyNoContainer(const std::string& bundle) const;
+  [[nodiscard]] std::vector<ItemRecord> found(const std::vector<std::string>& identifiers);
+
+  std::unique_ptr<HostedProvider> provider_;
+  ItemLookup lookup_;
+  std::once_flag watching_;
+  std::unique_ptr<ContainerWatches> watches_;
+  Searching searching_;
+};
+
+}  // namespace mirabel

@@ -1,0 +1,50 @@
+#pragma once
+
+#include <condition_variable>
+#include <cstddef>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "foundation/Error.h"
+#include "host/ContainerWatches.h"
+#include "host/HostedProvider.h"
+#include "host/search/SearchFeeder.h"
+#include "host/search/SearchQuery.h"
+
+namespace mirabel {
+
+/// Searches the working set of a provider: brings the index in step with it before it answers, as
+/// any host would. Answers are identifiers. Any thread may call it.
+class Searching {
+ public:
+  /// The provider outlives it.
+  explicit Searching(HostedProvider& provider) : provider_(provider) {}
+  ~Searching();
+  Searching(const Searching&) = delete;
+  Searching& operator=(const Searching&) = delete;
+
+  /// Keeps the index in step in the background from now on, whether or not it is asked. `watches`
+  /// outlives it. To be called once.
+  void follow(ContainerWatches& watches);
+
+  // Errors: those of opening the index, and of feeding it.
+
+  [[nodiscard]] Result<std::vector<std::string>> search(const SearchQuery& query);
+  [[nodiscard]] Result<std::vector<std::string>> recent(std::size_t limit);
+  [[nodiscard]] Result<std::vector<std::string>> favorites(std::size_t limit);
+
+ private:
+  [[nodiscard]] Result<SearchIndex*> inStep(std::stop_token stop = {});
+  void feed(const std::stop_token& stop, ContainerWatches& watches);
+
+  HostedProvider& provider_;
+  std::mutex mutex_;  ///< for what is made once
+  std::unique_ptr<SearchFeeder> feeder_;
+  std::shared_ptr<VesselEnumerator> workingSet_;
+  std::jthread feeding_;
+};
+
+}  // namespace mirabel
