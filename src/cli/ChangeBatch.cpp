@@ -1,70 +1,50 @@
 #include "cli/ChangeBatch.h"
 
 #include <nlohmann/json.hpp>
-#include <optional>
 #include <ostream>
 
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
-#include "items/LocalItem.h"
 
 namespace mirabel {
 
-Result<std::string> currentAnchor(VesselEnumerator& enumerator) {
-  std::optional<Data> anchor;
-  enumerator.currentSyncAnchor([&](std::optional<Data> answer) { anchor = std::move(answer); });
-  if (!anchor) return fail(Error::local(LocalVesselError::unableToGetDeviceUUID));
+Result<std::string> ChangeBatch::currentAnchor(DocumentContainer& container) {
+  const auto anchor = container.currentSyncAnchor();
+  if (!anchor) return fail(anchor.error());
   return base64(stringView(*anchor));
 }
 
-Result<std::shared_ptr<const ChangeBatch>> ChangeBatch::ask(VesselEnumerator& enumerator,
-                                                            const std::string& anchor) {
+Result<ChangeBatch> ChangeBatch::ask(DocumentContainer& container, const std::string& anchor) {
   const auto bytes = fromBase64(anchor);
   if (!bytes) return fail(Error::syncAnchorExpired());
-  auto batch = std::make_shared<ChangeBatch>();
-  auto finished = batch->finished_.get_future();
-  enumerator.enumerateChanges(batch, dataFromString(*bytes));
-  if (auto outcome = finished.get(); !outcome) return fail(outcome.error());
-  return batch;
+  auto changes = container.changes(dataFromString(*bytes));
+  if (!changes) return fail(changes.error());
+  return ChangeBatch(*std::move(changes));
+}
+
+std::string ChangeBatch::anchor() const {
+  return base64(stringView(changes_.anchor));
 }
 
 void ChangeBatch::print(const Program& program) const {
   if (program.options().json) {
     nlohmann::json line;
     line["updated"] = nlohmann::json::array();
-    for (const auto& item : updated_)
-      line["updated"].push_back(itemJSON(*item));
-    line["deleted"] = deleted_;
-    line["anchor"] = anchor_;
-    line["moreComing"] = moreComing_;
+    for (const ItemRecord& item : changes_.updated)
+      line["updated"].push_back(itemJSON(item));
+    line["deleted"] = changes_.deleted;
+    line["anchor"] = anchor();
+    line["moreComing"] = moreComing();
     program.out() << line.dump() << '\n';
     return;
   }
-  for (const auto& item : updated_) {
-    program.out() << "updated  " << printable(item->itemIdentifier()) << "  "
-                  << printable(item->url().path()) << '\n';
+  for (const ItemRecord& item : changes_.updated) {
+    program.out() << "updated  " << printable(item.itemIdentifier) << "  " << printable(item.path)
+                  << '\n';
   }
-  for (const std::string& identifier : deleted_) {
+  for (const std::string& identifier : changes_.deleted) {
     program.out() << "deleted  " << printable(identifier) << '\n';
   }
-}
-
-void ChangeBatch::didUpdateItems(const VesselItems& items) {
-  updated_.insert(updated_.end(), items.begin(), items.end());
-}
-
-void ChangeBatch::didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) {
-  deleted_.insert(deleted_.end(), identifiers.begin(), identifiers.end());
-}
-
-void ChangeBatch::finishEnumeratingChangesUpToSyncAnchor(const Data& anchor, bool moreComing) {
-  anchor_ = base64(stringView(anchor));
-  moreComing_ = moreComing;
-  finished_.set_value({});
-}
-
-void ChangeBatch::finishEnumeratingWithError(const Error& error) {
-  finished_.set_value(fail(error));
 }
 
 }  // namespace mirabel

@@ -1,44 +1,33 @@
 #pragma once
 
-#include <future>
-#include <memory>
 #include <string>
-#include <vector>
 
 #include "cli/Program.h"
-#include "platform/EnumerationObservers.h"
 
 namespace mirabel {
 
-/// The anchor of now, as it is printed. Error: `LocalVesselError::unableToGetDeviceUUID`.
-[[nodiscard]] Result<std::string> currentAnchor(VesselEnumerator& enumerator);
-
-/// One batch of changes, as an enumerator tells it and as it is printed.
-class ChangeBatch final : public VesselChangeObserver {
+/// Anchors as they are printed, and what has changed since one.
+class ChangeBatch {
  public:
-  /// Asks what has changed since `anchor` and waits for the answer. Errors: `syncAnchorExpired`,
-  /// also for a text that is no anchor; others of the enumerator.
-  [[nodiscard]] static Result<std::shared_ptr<const ChangeBatch>> ask(VesselEnumerator& enumerator,
-                                                                      const std::string& anchor);
+  /// Errors: see `DocumentContainer::currentSyncAnchor`.
+  [[nodiscard]] static Result<std::string> currentAnchor(DocumentContainer& container);
+  /// Errors: those of `DocumentContainer::changes`; `syncAnchorExpired` for a text that is no
+  /// anchor.
+  [[nodiscard]] static Result<ChangeBatch> ask(DocumentContainer& container,
+                                               const std::string& anchor);
 
   /// A line for each change, or one JSON object for all.
   void print(const Program& program) const;
-  [[nodiscard]] bool isEmpty() const { return updated_.empty() && deleted_.empty(); }
+  [[nodiscard]] bool isEmpty() const {
+    return changes_.updated.empty() && changes_.deleted.empty();
+  }
   /// Where to ask on from, as it is printed.
-  [[nodiscard]] const std::string& anchor() const { return anchor_; }
-  [[nodiscard]] bool moreComing() const { return moreComing_; }
-
-  void didUpdateItems(const VesselItems& items) override;
-  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override;
-  void finishEnumeratingChangesUpToSyncAnchor(const Data& anchor, bool moreComing) override;
-  void finishEnumeratingWithError(const Error& error) override;
+  [[nodiscard]] std::string anchor() const;
+  [[nodiscard]] bool moreComing() const { return changes_.moreComing; }
 
  private:
-  VesselItems updated_;
-  std::vector<std::string> deleted_;
-  std::string anchor_;
-  bool moreComing_ = false;
-  std::promise<Result<void>> finished_;
+  explicit ChangeBatch(ItemChanges changes) : changes_(std::move(changes)) {}
+  ItemChanges changes_;
 };
 
 }  // namespace mirabel

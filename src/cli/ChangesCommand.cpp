@@ -1,4 +1,5 @@
 #include <cerrno>
+#include <memory>
 #include <nlohmann/json.hpp>
 #include <ostream>
 
@@ -9,15 +10,21 @@
 namespace mirabel {
 namespace {
 
-Result<void> tellChanges(Program& program, VesselEnumerator& enumerator, std::string anchor) {
+Result<std::unique_ptr<DocumentContainer>> find(Documents& documents, const std::string& item) {
+  const auto identifier = ContainerArgument(item).identifier(documents);
+  if (!identifier) return fail(identifier.error());
+  return documents.container(*identifier);
+}
+
+Result<void> tellChanges(Program& program, DocumentContainer& container, std::string anchor) {
   for (bool more = true; more;) {
     // The rest of a long history is not read for nobody.
     if (!program.canWrite()) return fail(Error::posix(EPIPE));
-    const auto batch = ChangeBatch::ask(enumerator, anchor);
+    const auto batch = ChangeBatch::ask(container, anchor);
     if (!batch) return fail(batch.error());
-    (*batch)->print(program);
-    more = (*batch)->moreComing();
-    anchor = (*batch)->anchor();
+    batch->print(program);
+    more = batch->moreComing();
+    anchor = batch->anchor();
   }
   // People need the last one only, to ask again from there.
   if (!program.options().json) program.note("the anchor is now " + anchor);
@@ -27,12 +34,11 @@ Result<void> tellChanges(Program& program, VesselEnumerator& enumerator, std::st
 }  // namespace
 
 ExitCode runAnchor(Program& program, const std::string& item) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  auto enumerator = ContainerArgument(item).enumerator(*session);
-  if (!enumerator) return program.report(enumerator.error(), "can't find " + item);
-  const auto anchor = currentAnchor(**enumerator);
-  (*enumerator)->invalidate();
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto container = find(*documents, item);
+  if (!container) return program.report(container.error(), "can't find " + item);
+  const auto anchor = ChangeBatch::currentAnchor(**container);
   if (!anchor) return program.report(anchor.error(), "can't take an anchor of " + item);
   if (program.options().json) {
     program.out() << nlohmann::json{{"anchor", *anchor}}.dump() << '\n';
@@ -43,13 +49,12 @@ ExitCode runAnchor(Program& program, const std::string& item) {
 }
 
 ExitCode runChanges(Program& program, const ChangesOptions& options) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
   const std::string failure = "can't tell the changes of " + options.item;
-  auto enumerator = ContainerArgument(options.item).enumerator(*session);
-  if (!enumerator) return program.report(enumerator.error(), failure);
-  const auto told = tellChanges(program, **enumerator, options.since);
-  (*enumerator)->invalidate();
+  const auto container = find(*documents, options.item);
+  if (!container) return program.report(container.error(), failure);
+  const auto told = tellChanges(program, **container, options.since);
   if (told) return ExitCode::done;
   return program.canWrite() ? program.report(told.error(), failure) : ExitCode::failed;
 }

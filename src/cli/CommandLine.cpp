@@ -5,6 +5,7 @@
 #include <memory>
 
 #include "cli/Commands.h"
+#include "cli/HostCommandLine.h"
 #include "cli/IconCommand.h"
 #include "cli/ItemCommandLine.h"
 #include "foundation/Log.h"
@@ -25,8 +26,9 @@ const std::string containerHelp =
     "ITEM is the word root, a folder's identifier or path, workingset for everything, or alldirs\n"
     "for every folder.\n\n";
 constexpr const char* watchHelp =
-    "It goes on until it is interrupted, and then tells the anchor to go on from. It holds the\n"
-    "volume as long as it runs: other commands wait for that, and then say that it is busy.\n\n";
+    "It goes on until it is interrupted, and then tells the anchor to go on from. Without\n"
+    "the service it holds the volume as long as it runs: other commands wait for that, and then\n"
+    "say that it is busy.\n\n";
 constexpr const char* bundleHelp =
     "BUNDLE is the name of the application's desktop entry without .desktop, org.example.Draw.\n\n";
 constexpr const char* pathHelp =
@@ -50,6 +52,7 @@ struct Arguments {
   std::string bundle;
   IconOptions icon;
   ItemArguments items;
+  HostArguments host;
   bool showVersion = false;
 };
 
@@ -134,6 +137,7 @@ void addCommands(CLI::App& app, Arguments& arguments) {
       ->type_name("ANCHOR");
   addItemCommands(app, arguments.items, itemHelp + globalHelp);
   addAppCommands(app, arguments);
+  addHostCommands(app, arguments.host, globalHelp);
   addCommand(app, "status", "Say how changes are followed, and what the history holds", "");
   addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
   addCommand(app, "demo", "A guided tour in a temporary home", "");
@@ -148,6 +152,7 @@ ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& argume
   if (app.got_subcommand("changes")) return runChanges(program, arguments.changes);
   if (app.got_subcommand("watch")) return runWatch(program, arguments.watch);
   if (const auto code = runItemCommand(app, program, arguments.items)) return *code;
+  if (const auto code = runHostCommand(app, program, arguments.host)) return *code;
   if (app.got_subcommand("apps")) return runApps(program);
   if (app.got_subcommand("container")) return runContainer(program, arguments.bundle);
   if (app.got_subcommand("icon")) return runIcon(program, arguments.icon);

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "cli/Program.h"
 
@@ -38,6 +39,22 @@ ExitCode runWatch(Program& program, const WatchOptions& options);
 ExitCode runApps(Program& program);
 /// Prints the document folder of an application, whether or not it is an app library.
 ExitCode runContainer(Program& program, const std::string& bundle);
+
+/// Serves the documents to other programs until it is asked to end.
+ExitCode runServe(Program& program);
+
+struct SearchOptions {
+  std::vector<std::string> words;
+  std::vector<std::string> tags;
+  std::optional<std::string> type;
+  std::optional<std::string> since;  ///< dates of the last modification
+  std::optional<std::string> before;
+  bool includesTrashed = false;
+  std::uint32_t limit = 100;
+};
+ExitCode runSearch(Program& program, const SearchOptions& options);
+ExitCode runRecent(Program& program, std::uint32_t limit);
+ExitCode runFavorites(Program& program, std::uint32_t limit);
 
 ExitCode runStatus(Program& program);
 ExitCode runDoctor(Program& program);

@@ -6,10 +6,9 @@
 #include <vector>
 
 #include "cli/Commands.h"
-#include "cli/ErrorText.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
-#include "linux/apps/LinuxApplicationRegistry.h"
+#include "host/ErrorText.h"
 #include "linux/files/HomeLayout.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/volume/FollowStatus.h"
@@ -145,13 +144,13 @@ struct LeftOutKind {
   }
 };
 
-void addApplicationFindings(const Session& session, std::vector<Finding>& findings) {
-  const std::size_t shown = session.libraries().rootURLsForAppLibraries()->size();
-  findings.push_back(
-      {"app libraries", Health::good,
-       plural(shown, "application shows its documents", "applications show their documents"), ""});
+void addApplicationFindings(const StatusReport& status, std::vector<Finding>& findings) {
+  findings.push_back({"app libraries", Health::good,
+                      plural(status.appLibraries, "application shows its documents",
+                             "applications show their documents"),
+                      ""});
   std::map<std::string, LeftOutKind> kinds;
-  for (const LeftOut& leftOut : session.linuxPlatform().applications().leftOut())
+  for (const auto& leftOut : status.leftOut)
     kinds[leftOut.reason].add(leftOut.identifier);
   for (const auto& [reason, kind] : kinds) {
     // What has no name stands for all that there is no room to name.
@@ -159,6 +158,14 @@ void addApplicationFindings(const Session& session, std::vector<Finding>& findin
         kind.names.empty() ? "left out: " + reason : "left out (" + reason + "): " + kind.names;
     findings.push_back({"applications", Health::limited, text, ""});
   }
+}
+
+Result<StatusReport> statusOf(const Program& program) {
+  const GlobalOptions& options = program.options();
+  const auto documents = openDocuments({options.home, options.timeout, options.embedded,
+                                        [&](std::string_view text) { program.note(text); }});
+  if (!documents) return fail(documents.error());
+  return (*documents)->status();
 }
 
 std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
@@ -182,11 +189,9 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
     findings.push_back(uuidFinding(abilities->hasUUID));
     findings.push_back(watchingFinding(*volume));
   }
-  Session::Options options{program.options().home, program.options().timeout,
-                           [&](std::string_view text) { program.note(text); }};
-  auto session = Session::open(std::move(options));
-  findings.push_back(stateFinding(session ? Result<void>() : fail(session.error()), layout));
-  if (session) addApplicationFindings(**session, findings);
+  const auto status = statusOf(program);
+  findings.push_back(stateFinding(status ? Result<void>() : fail(status.error()), layout));
+  if (status) addApplicationFindings(*status, findings);
   return findings;
 }
 

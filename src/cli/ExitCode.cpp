@@ -16,6 +16,7 @@ ExitCode exitCodeForPosix(std::int64_t code) {
     case EEXIST:
       return ExitCode::nameTaken;
     case EBUSY:
+    case ENOTCONN:
       return ExitCode::busy;
     default:
       return ExitCode::failed;

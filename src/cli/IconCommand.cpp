@@ -16,24 +16,6 @@ namespace {
 
 constexpr std::int64_t largestSize = 4096;
 
-Result<std::optional<Data>> pictureOf(const LocalVessel& provider, const std::string& identifier,
-                                      std::int64_t size) {
-  Result<std::optional<Data>> picture;
-  const auto side = static_cast<double>(size);
-  provider.fetchThumbnailsForItemIdentifiers(
-      {identifier}, {side, side},
-      AppThumbnails::PerThumbnailHandler(
-          [&](std::string_view, std::optional<Data> image, std::optional<Error> error) {
-            if (error) {
-              picture = fail(*std::move(error));
-            } else {
-              picture = std::move(image);
-            }
-          }),
-      [](const auto&) {});
-  return picture;
-}
-
 Result<void> write(const std::string& file, const Data& bytes) {
   errno = 0;
   std::ofstream out(file, std::ios::binary | std::ios::trunc);
@@ -50,11 +32,12 @@ ExitCode runIcon(Program& program, const IconOptions& options) {
   if (options.size < 1 || options.size > largestSize) {
     return program.reportUsage("--size takes 1 to " + std::to_string(largestSize) + " pixels");
   }
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto found = ItemArgument(options.item).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto found = ItemArgument(options.item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + options.item);
-  const auto picture = pictureOf(session->provider(), (*found)->itemIdentifier(), options.size);
+  const auto picture =
+      documents->icon(found->itemIdentifier, static_cast<std::uint32_t>(options.size));
   if (!picture) return program.report(picture.error(), "can't get the icon of " + options.item);
   if (!*picture) {
     return program.reportFailed(options.item +

@@ -9,11 +9,11 @@
 namespace mirabel {
 
 ExitCode runId(Program& program, const std::string& path) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto item = ItemArgument::itemAtPath(*session, path);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto item = ItemArgument::itemAtPath(*documents, path);
   if (!item) return program.report(item.error(), "can't identify " + path);
-  const std::string& identifier = (*item)->itemIdentifier();
+  const std::string& identifier = item->itemIdentifier;
   if (program.options().json) {
     nlohmann::json line;
     setText(line, "itemIdentifier", identifier);

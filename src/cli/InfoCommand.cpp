@@ -5,6 +5,7 @@
 #include "cli/ItemArgument.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
+#include "items/LocalItem.h"
 #include "items/TagData.h"
 
 namespace mirabel {
@@ -35,45 +36,45 @@ std::string tagLabels(const Data& tagData) {
   return text;
 }
 
-void printItem(std::ostream& out, const LocalItem& item) {
+void printItem(std::ostream& out, const ItemRecord& item) {
   const auto row = [&](std::string_view label, const std::string& value) {
     out << label << std::string(label.size() < 14 ? 14 - label.size() : 1, ' ') << value << '\n';
   };
-  row("name", printable(item.filename()));
-  row("identifier", printable(item.itemIdentifier()));
-  row("parent", printable(item.parentItemIdentifier()));
-  row("type", item.typeIdentifier());
-  if (const auto& size = item.documentSize()) {
+  row("name", printable(item.filename));
+  row("identifier", printable(item.itemIdentifier));
+  row("parent", printable(item.parentItemIdentifier));
+  row("type", item.typeIdentifier);
+  if (const auto& size = item.documentSize) {
     const auto bytes = size->asUnsigned();
     row("size", bytes ? humanSize(*bytes) : size->description());
   }
-  if (item.childItemCount()) row("entries", std::to_string(*item.childItemCount()));
-  if (item.creationDate()) row("created", humanDate(*item.creationDate()));
-  if (item.contentModificationDate()) row("modified", humanDate(*item.contentModificationDate()));
-  if (item.lastUsedDate()) row("last used", humanDate(*item.lastUsedDate()));
-  if (item.tagData()) row("tags", tagLabels(*item.tagData()));
-  if (item.favoriteRank()) row("favourite", item.favoriteRank()->description());
-  row("may", capabilityNames(item.capabilities()));
-  if (item.isTrashed()) row("trashed", "yes");
-  if (item.fileID()) row("file ID", std::to_string(*item.fileID()));
-  if (item.docID()) row("document ID", std::to_string(*item.docID()));
-  if (const auto& bundle = item.vs_appContainerBundleIdentifier()) {
+  if (item.childItemCount) row("entries", std::to_string(*item.childItemCount));
+  if (item.creationDate) row("created", humanDate(*item.creationDate));
+  if (item.contentModificationDate) row("modified", humanDate(*item.contentModificationDate));
+  if (item.lastUsedDate) row("last used", humanDate(*item.lastUsedDate));
+  if (item.tagData) row("tags", tagLabels(*item.tagData));
+  if (item.favoriteRank) row("favourite", item.favoriteRank->description());
+  row("may", capabilityNames(item.capabilities));
+  if (item.isTrashed) row("trashed", "yes");
+  if (item.fileID) row("file ID", std::to_string(*item.fileID));
+  if (item.docID) row("document ID", std::to_string(*item.docID));
+  if (const auto& bundle = item.appContainerBundleIdentifier) {
     row("application", printable(*bundle));
   }
-  row("path", printable(item.fileURL().path()));
+  row("path", printable(item.path));
 }
 
 }  // namespace
 
 ExitCode runInfo(Program& program, const std::string& item) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  auto found = ItemArgument(item).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
   if (program.options().json) {
-    program.out() << itemJSON(**found).dump() << '\n';
+    program.out() << itemJSON(*found).dump() << '\n';
   } else {
-    printItem(program.out(), **found);
+    printItem(program.out(), *found);
   }
   return ExitCode::done;
 }

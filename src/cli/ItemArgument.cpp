@@ -7,17 +7,14 @@
 #include <filesystem>
 #include <system_error>
 
+#include "platform/VesselManager.h"
+
 namespace mirabel {
 namespace {
 
 namespace fs = std::filesystem;
 
 constexpr std::string_view rootWord = "root";
-
-Error withDetail(Error error, std::string detail) {
-  error.userInfo[std::string(errorkey::detail)] = std::move(detail);
-  return error;
-}
 
 bool isNumber(std::string_view text) {
   std::int64_t number = 0;
@@ -65,36 +62,6 @@ Result<std::string> resolved(const std::string& path) {
   return (isName ? *folder / name : *folder).native();
 }
 
-bool isWithin(const std::string& path, const std::string& folder) {
-  return path == folder || (path.starts_with(folder) && path[folder.size()] == '/');
-}
-
-// The document folder of an application that is listed.
-bool isLibrary(const Session& session, const URL& url) {
-  return session.libraries().shared().bundleProxyWithRootURL(url).has_value();
-}
-
-bool isWithinLibrary(const Session& session, const URL& url) {
-  return isLibrary(session, url) || session.libraries().applicationOwning(url).has_value();
-}
-
-// The provider answers for every application that has a folder for documents, but nothing follows
-// what lies in one that is not listed.
-bool isShown(const Session& session, const LocalItem& item) {
-  return !item.itemIdentifier().starts_with('#') || isLibrary(session, item.fileURL());
-}
-
-// The document storage may be named by a link to it, "~/Documents" for one, and so may the folder
-// of an app library.
-std::string withoutLinkToRoot(const Session& session, const std::string& path,
-                              const std::string& storage) {
-  std::error_code failure;
-  const fs::path target = fs::canonical(path, failure);
-  if (failure || target == path) return path;
-  const bool isRoot = target == storage || isLibrary(session, URL::fileURL(target.native()));
-  return isRoot ? target.native() : path;
-}
-
 }  // namespace
 
 bool ItemArgument::isIdentifier() const {
@@ -104,58 +71,28 @@ bool ItemArgument::isIdentifier() const {
          text_ == VesselTemporaryLocalFolderItemIdentifier;
 }
 
-Result<std::shared_ptr<LocalItem>> ItemArgument::item(const Session& session) const {
-  return isIdentifier() ? itemByIdentifier(session) : itemAtPath(session, text_);
+Result<ItemRecord> ItemArgument::item(Documents& documents) const {
+  return isIdentifier() ? itemByIdentifier(documents) : itemAtPath(documents, text_);
 }
 
-Result<URL> ItemArgument::urlOfPath(const std::string& path) {
+Result<std::string> ItemArgument::resolvedPath(const std::string& path) {
+  return resolved(path);
+}
+
+Result<ItemRecord> ItemArgument::itemByIdentifier(Documents& documents) const {
+  if (!hasForm(text_)) {
+    Error error = Error::local(LocalVesselError::invalidItemIdentifier);
+    error.userInfo[std::string(errorkey::detail)] =
+        "identifiers are fid=N, did=N and #bundle; a file of this name is ./" + text_;
+    return fail(std::move(error));
+  }
+  return documents.item(text_ == rootWord ? VesselRootContainerItemIdentifier : text_);
+}
+
+Result<ItemRecord> ItemArgument::itemAtPath(Documents& documents, const std::string& path) {
   const auto place = resolved(path);
   if (!place) return fail(place.error());
-  return URL::fileURL(*place);
-}
-
-Result<std::shared_ptr<LocalItem>> ItemArgument::itemByIdentifier(const Session& session) const {
-  if (!hasForm(text_)) {
-    return fail(withDetail(Error::local(LocalVesselError::invalidItemIdentifier),
-                           "identifiers are fid=N, did=N and #bundle; a file of this name is "
-                           "./" +
-                               text_));
-  }
-  const std::string_view identifier = text_ == rootWord ? VesselRootContainerItemIdentifier : text_;
-  auto item = session.provider().itemForIdentifier(identifier);
-  if (item && isShown(session, **item)) return item;
-  if (identifier.starts_with('#')) {
-    auto reason = session.reasonLeftOut(identifier.substr(1));
-    if (!reason && item) reason = "the application is there, but its documents are not shown";
-    if (reason) {
-      return fail(withDetail(Error::local(LocalVesselError::itemNotFound), *std::move(reason)));
-    }
-  }
-  const URL& storage = session.platform().manager.documentStorageURL();
-  const bool isRoot = identifier == VesselRootContainerItemIdentifier;
-  if (isRoot && !session.platform().resources.readValues(storage)) {
-    return fail(Error::posix(ENOENT, "the document storage \"" + storage.path() + "\""));
-  }
-  return fail(Error::nonExistentItem(identifier));
-}
-
-Result<std::shared_ptr<LocalItem>> ItemArgument::itemAtPath(const Session& session,
-                                                            const std::string& path) {
-  auto place = resolved(path);
-  if (!place) return fail(place.error());
-  const std::string& storage = session.platform().manager.documentStorageURL().path();
-  place = withoutLinkToRoot(session, *place, storage);
-  const URL url = URL::fileURL(*place);
-  if (auto values = session.platform().resources.readValues(url); !values) {
-    return fail(values.error());
-  }
-  const Error unknown = Error::local(LocalVesselError::itemNotFound);
-  if (!isWithin(*place, storage) && !isWithinLibrary(session, url)) {
-    return fail(withDetail(unknown, "it is not below the document storage \"" + storage +
-                                        "\", nor in the folder of an app library"));
-  }
-  if (auto item = session.provider()._propertiesForItemAtURL(url)) return item;
-  return fail(withDetail(unknown, "it is not shown as an item"));
+  return documents.itemAtPath(*place);
 }
 
 }  // namespace mirabel

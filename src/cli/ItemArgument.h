@@ -1,10 +1,9 @@
 #pragma once
 
-#include <memory>
 #include <string>
 #include <string_view>
 
-#include "cli/Session.h"
+#include "host/Documents.h"
 
 namespace mirabel {
 
@@ -19,19 +18,18 @@ class ItemArgument {
   explicit ItemArgument(std::string text) : text_(std::move(text)) {}
 
   [[nodiscard]] bool isIdentifier() const;
-  [[nodiscard]] Result<std::shared_ptr<LocalItem>> item(const Session& session) const;
+  [[nodiscard]] Result<ItemRecord> item(Documents& documents) const;
 
   /// What lies at a path, whatever it is called: relative to the working folder, the links on the
   /// way followed, the last component not.
-  [[nodiscard]] static Result<std::shared_ptr<LocalItem>> itemAtPath(const Session& session,
-                                                                     const std::string& path);
+  [[nodiscard]] static Result<ItemRecord> itemAtPath(Documents& documents, const std::string& path);
 
   /// Where a path leads, inside the documents or outside, its links resolved but for the last
   /// component. POSIX errors.
-  [[nodiscard]] static Result<URL> urlOfPath(const std::string& path);
+  [[nodiscard]] static Result<std::string> resolvedPath(const std::string& path);
 
  private:
-  [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemByIdentifier(const Session& session) const;
+  [[nodiscard]] Result<ItemRecord> itemByIdentifier(Documents& documents) const;
 
   std::string text_;
 };

@@ -10,25 +10,24 @@ namespace mirabel {
 ExitCode runMakeFolder(Program& program, const CreateOptions& options) {
   return runOnItem(program, options.parent, "can't make the folder " + options.name,
                    [&](const std::string& parent, auto done) {
-                     program.session()->provider().createDirectoryWithName(options.name, parent,
-                                                                           std::move(done));
+                     program.documents()->createDirectory(options.name, parent, std::move(done));
                    });
 }
 
 ExitCode runImport(Program& program, const ImportOptions& options) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto parent = ItemArgument(options.parent).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto parent = ItemArgument(options.parent).item(*documents);
   if (!parent) return program.report(parent.error(), "can't find " + options.parent);
-  const OperationRun run(program, *session);
+  const OperationRun run(program, *documents);
   // All at once, for they wait for the disk most of the time, and told in their order.
   std::vector<std::pair<std::string, OperationRun::Begun>> begun;
   for (const std::string& file : options.files) {
-    const auto source = ItemArgument::urlOfPath(file);
+    const auto source = ItemArgument::resolvedPath(file);
     begun.emplace_back(file, OperationRun::begin([&](auto done) {
                          if (!source) return done(fail(source.error()));
-                         session->provider().importDocumentAtURL(
-                             *source, (*parent)->itemIdentifier(), std::move(done));
+                         documents->importDocument(*source, parent->itemIdentifier,
+                                                   std::move(done));
                        }));
   }
   Outcomes outcomes;
@@ -37,7 +36,7 @@ ExitCode runImport(Program& program, const ImportOptions& options) {
     if (!result) {
       outcomes.add(program.report(result.error(), "can't import " + file));
     } else {
-      printOutcome(program, **result);
+      printOutcome(program, *result);
     }
   }
   return outcomes.exitCode();
@@ -46,20 +45,19 @@ ExitCode runImport(Program& program, const ImportOptions& options) {
 ExitCode runRename(Program& program, const RenameOptions& options) {
   return runOnItem(program, options.item, "can't rename " + options.item + " to " + options.name,
                    [&](const std::string& item, auto done) {
-                     program.session()->provider().renameItemWithIdentifier(item, options.name,
-                                                                            std::move(done));
+                     program.documents()->rename(item, options.name, std::move(done));
                    });
 }
 
 ExitCode runMove(Program& program, const MoveOptions& options) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto parent = ItemArgument(options.parent).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto parent = ItemArgument(options.parent).item(*documents);
   if (!parent) return program.report(parent.error(), "can't find " + options.parent);
   return runOnItem(program, options.item, "can't move " + options.item + " to " + options.parent,
                    [&](const std::string& item, auto done) {
-                     session->provider().reparentItemWithIdentifier(
-                         item, (*parent)->itemIdentifier(), options.name, std::move(done));
+                     documents->reparent(item, parent->itemIdentifier, options.name,
+                                         std::move(done));
                    });
 }
 

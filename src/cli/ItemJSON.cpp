@@ -4,7 +4,7 @@
 
 #include "cli/Printing.h"
 #include "foundation/Unicode.h"
-#include "items/LocalItem.h"
+#include "host/ItemRecord.h"
 #include "items/TagData.h"
 
 namespace mirabel {
@@ -39,33 +39,31 @@ void setText(nlohmann::json& object, const std::string& key, std::string_view by
   object[key + "Bytes"] = base64(bytes);
 }
 
-nlohmann::json itemJSON(const LocalItem& item) {
+nlohmann::json itemJSON(const ItemRecord& item) {
   nlohmann::json object;
-  setText(object, "itemIdentifier", item.itemIdentifier());
-  setText(object, "parentItemIdentifier", item.parentItemIdentifier());
-  setText(object, "filename", item.filename());
-  object["typeIdentifier"] = item.typeIdentifier();
-  if (item.documentSize()) object["documentSize"] = numberJSON(*item.documentSize());
-  setDate(object, "creationDate", item.creationDate());
-  setDate(object, "contentModificationDate", item.contentModificationDate());
-  if (item.childItemCount()) object["childItemCount"] = *item.childItemCount();
-  object["capabilities"] = std::to_string(item.capabilities());
-  object["isTrashed"] = item.isTrashed();
-  setDate(object, "lastUsedDate", item.lastUsedDate());
-  setTags(object, item.tagData());
-  if (item.favoriteRank()) object["favoriteRank"] = numberJSON(*item.favoriteRank());
-  if (item.fileID()) object["fileID"] = std::to_string(*item.fileID());
-  if (item.docID()) object["docID"] = std::to_string(*item.docID());
-  if (const auto& domain = item.vs_beaconDomainIdentifier()) {
+  setText(object, "itemIdentifier", item.itemIdentifier);
+  setText(object, "parentItemIdentifier", item.parentItemIdentifier);
+  setText(object, "filename", item.filename);
+  object["typeIdentifier"] = item.typeIdentifier;
+  if (item.documentSize) object["documentSize"] = numberJSON(*item.documentSize);
+  setDate(object, "creationDate", item.creationDate);
+  setDate(object, "contentModificationDate", item.contentModificationDate);
+  if (item.childItemCount) object["childItemCount"] = *item.childItemCount;
+  object["capabilities"] = std::to_string(item.capabilities);
+  object["isTrashed"] = item.isTrashed;
+  setDate(object, "lastUsedDate", item.lastUsedDate);
+  setTags(object, item.tagData);
+  if (item.favoriteRank) object["favoriteRank"] = numberJSON(*item.favoriteRank);
+  if (item.fileID) object["fileID"] = std::to_string(*item.fileID);
+  if (item.docID) object["docID"] = std::to_string(*item.docID);
+  if (const auto& domain = item.beaconDomainIdentifier) {
     setText(object, "vs_beaconDomainIdentifier", *domain);
   }
-  if (const auto& bundle = item.vs_appContainerBundleIdentifier()) {
+  if (const auto& bundle = item.appContainerBundleIdentifier) {
     setText(object, "vs_appContainerBundleIdentifier", *bundle);
   }
-  if (item.isTrashed()) {
-    if (const auto& from = item.putBackURL()) setText(object, "putBackPath", from->path());
-  }
-  setText(object, "path", item.fileURL().path());
+  if (item.putBackPath) setText(object, "putBackPath", *item.putBackPath);
+  setText(object, "path", item.path);
   return object;
 }
 

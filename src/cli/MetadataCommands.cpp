@@ -30,15 +30,15 @@ std::optional<Number> numberFrom(const std::string& text) {
 }
 
 ExitCode tellTags(Program& program, const std::string& item) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto found = ItemArgument(item).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
   if (program.options().json) {
-    program.out() << itemJSON(**found).dump() << '\n';
+    program.out() << itemJSON(*found).dump() << '\n';
     return ExitCode::done;
   }
-  if (const auto& data = (*found)->tagData()) {
+  if (const auto& data = found->tagData) {
     for (const Tag& tag : decodeTagData(*data).value_or(std::vector<Tag>()))
       program.out() << printable(tag.label) << '\n';
   }
@@ -61,7 +61,7 @@ ExitCode runTag(Program& program, const TagOptions& options) {
   }
   return runOnItem(program, options.item, "can't tag " + options.item,
                    [&](const std::string& identifier, const auto& done) {
-                     program.session()->provider().setTagData(tagData, identifier, done);
+                     program.documents()->setTagData(identifier, tagData, done);
                    });
 }
 
@@ -73,7 +73,7 @@ ExitCode runFavorite(Program& program, const FavoriteOptions& options) {
   }
   return runOnItem(program, options.item, "can't rank " + options.item,
                    [&](const std::string& identifier, const auto& done) {
-                     program.session()->provider().setFavoriteRank(rank, identifier, done);
+                     program.documents()->setFavoriteRank(identifier, rank, done);
                    });
 }
 
@@ -88,7 +88,7 @@ ExitCode runUsed(Program& program, const UsedOptions& options) {
   }
   return runOnItem(program, options.item, "can't note when " + options.item + " was used",
                    [&](const std::string& identifier, const auto& done) {
-                     program.session()->provider().setLastUsedDate(date, identifier, done);
+                     program.documents()->setLastUsedDate(identifier, date, done);
                    });
 }
 

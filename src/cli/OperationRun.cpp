@@ -10,7 +10,6 @@
 #include "cli/ItemArgument.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
-#include "linux/operations/OperationProgress.h"
 
 namespace mirabel {
 namespace {
@@ -25,8 +24,8 @@ constexpr auto betweenLines = 200ms;
 /// Shows how far the operations have come while a future is not ready.
 class OperationRun::Waiting {
  public:
-  Waiting(Program& program, const OperationProgress& progress)
-      : program_(program), progress_(progress) {}
+  Waiting(Program& program, Documents& documents)
+      : program_(program), documents_(documents), before_(documents.progress()) {}
 
   template <class T>
   T wait(std::future<T> future) {
@@ -43,9 +42,10 @@ class OperationRun::Waiting {
 
  private:
   void show() {
-    const std::uint64_t copied = progress_.entriesCopied;
-    const std::uint64_t bytes = progress_.bytesCopied;
-    const std::uint64_t removed = progress_.entriesRemoved;
+    const Progress now = documents_.progress();
+    const std::uint64_t copied = now.entriesCopied - before_.entriesCopied;
+    const std::uint64_t bytes = now.bytesCopied - before_.bytesCopied;
+    const std::uint64_t removed = now.entriesRemoved - before_.entriesRemoved;
     std::string line;
     if (copied > 0 || bytes > 0) {
       line = std::to_string(copied) + " copied, " + humanSize(bytes);
@@ -58,53 +58,53 @@ class OperationRun::Waiting {
   }
 
   Program& program_;
-  const OperationProgress& progress_;
+  Documents& documents_;
+  Progress before_;  // the service may have done other work before
   bool hasShown_ = false;
 };
 
 OperationRun::Begun OperationRun::begin(const ItemStart& start) {
-  const auto answer = std::make_shared<std::promise<LocalVessel::ItemResult>>();
-  start([answer](LocalVessel::ItemResult result) { answer->set_value(std::move(result)); });
+  const auto answer = std::make_shared<std::promise<Documents::ItemResult>>();
+  start([answer](Documents::ItemResult result) { answer->set_value(std::move(result)); });
   return answer->get_future();
 }
 
-LocalVessel::ItemResult OperationRun::wait(Begun begun) const {
-  return Waiting(program_, session_.linuxPlatform().progress()).wait(std::move(begun));
+Documents::ItemResult OperationRun::wait(Begun begun) const {
+  return Waiting(program_, documents_).wait(std::move(begun));
 }
 
-LocalVessel::ItemResult OperationRun::item(const ItemStart& start) const {
+Documents::ItemResult OperationRun::item(const ItemStart& start) const {
   return wait(begin(start));
 }
 
 std::optional<Error> OperationRun::error(
-    const std::function<void(LocalVessel::ErrorHandler)>& start) const {
+    const std::function<void(Documents::ErrorHandler)>& start) const {
   const auto answer = std::make_shared<std::promise<std::optional<Error>>>();
   start([answer](std::optional<Error> error) { answer->set_value(std::move(error)); });
-  return Waiting(program_, session_.linuxPlatform().progress()).wait(answer->get_future());
+  return Waiting(program_, documents_).wait(answer->get_future());
 }
 
 ExitCode runOnItem(Program& program, const std::string& item, std::string_view what,
                    const ItemOperation& operation) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto found = ItemArgument(item).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
-  const std::string identifier = (*found)->itemIdentifier();
-  const auto result = OperationRun(program, *session).item([&](auto done) {
+  const std::string identifier = found->itemIdentifier;
+  const auto result = OperationRun(program, *documents).item([&](auto done) {
     operation(identifier, std::move(done));
   });
   if (!result) return program.report(result.error(), what);
-  printOutcome(program, **result);
+  printOutcome(program, *result);
   return ExitCode::done;
 }
 
-void printOutcome(Program& program, const LocalItem& item) {
+void printOutcome(Program& program, const ItemRecord& item) {
   if (program.options().json) {
     program.out() << itemJSON(item).dump() << '\n';
     return;
   }
-  program.out() << printable(item.itemIdentifier()) << "  " << printable(item.fileURL().path())
-                << '\n';
+  program.out() << printable(item.itemIdentifier) << "  " << printable(item.path) << '\n';
 }
 
 }  // namespace mirabel

@@ -8,7 +8,6 @@
 #include <string_view>
 
 #include "cli/Program.h"
-#include "provider/LocalVessel.h"
 
 namespace mirabel {
 
@@ -17,34 +16,34 @@ namespace mirabel {
 class OperationRun {
  public:
   /// Both outlive it.
-  OperationRun(Program& program, Session& session) : program_(program), session_(session) {}
+  OperationRun(Program& program, Documents& documents) : program_(program), documents_(documents) {}
 
-  using ItemStart = std::function<void(LocalVessel::ItemHandler)>;
-  [[nodiscard]] LocalVessel::ItemResult item(const ItemStart& start) const;
+  using ItemStart = std::function<void(Documents::ItemHandler)>;
+  [[nodiscard]] Documents::ItemResult item(const ItemStart& start) const;
   /// The same in two steps, for several that run at once.
-  using Begun = std::future<LocalVessel::ItemResult>;
+  using Begun = std::future<Documents::ItemResult>;
   [[nodiscard]] static Begun begin(const ItemStart& start);
-  [[nodiscard]] LocalVessel::ItemResult wait(Begun begun) const;
+  [[nodiscard]] Documents::ItemResult wait(Begun begun) const;
   [[nodiscard]] std::optional<Error> error(
-      const std::function<void(LocalVessel::ErrorHandler)>& start) const;
+      const std::function<void(Documents::ErrorHandler)>& start) const;
 
  private:
   class Waiting;
 
   Program& program_;
-  Session& session_;
+  Documents& documents_;
 };
 
 /// Finds the item that is named, does something to it and prints what comes of it. `what` says for
 /// a failure what was tried.
 using ItemOperation =
-    std::function<void(const std::string& identifier, LocalVessel::ItemHandler completionHandler)>;
+    std::function<void(const std::string& identifier, Documents::ItemHandler completionHandler)>;
 [[nodiscard]] ExitCode runOnItem(Program& program, const std::string& item, std::string_view what,
                                  const ItemOperation& operation);
 
 /// Prints the item that an operation handed back: its identifier and where it lies, or all of its
 /// properties with --json.
-void printOutcome(Program& program, const LocalItem& item);
+void printOutcome(Program& program, const ItemRecord& item);
 
 /// Ends with the first failure's code, but does what can be done.
 class Outcomes {

@@ -9,11 +9,11 @@
 namespace mirabel {
 
 ExitCode runPath(Program& program, const std::string& item) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  auto found = ItemArgument(item).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
-  const std::string& path = (*found)->fileURL().path();
+  const std::string& path = found->path;
   if (program.options().json) {
     nlohmann::json line;
     setText(line, "path", path);

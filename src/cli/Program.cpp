@@ -3,26 +3,27 @@
 #include <nlohmann/json.hpp>
 #include <ostream>
 
-#include "cli/ErrorText.h"
 #include "cli/Printing.h"
+#include "host/ErrorText.h"
 
 namespace mirabel {
 
-Session* Program::session() {
-  if (session_) return session_.get();
-  Session::Options options;
+Documents* Program::documents() {
+  if (documents_) return documents_.get();
+  SessionOptions options;
   options.home = options_.home;
   options.timeout = options_.timeout;
+  options.embedded = options_.embedded;
   options.notice = [this](std::string_view text) { note(text); };
-  auto opened = Session::open(std::move(options));
+  auto opened = openDocuments(std::move(options));
   if (!opened) {
     exitCode_ = report(opened.error(), "can't open the documents");
     // A home that is not there is no missing item: nothing was looked up yet.
     if (exitCode_ == ExitCode::noSuchItem) exitCode_ = ExitCode::failed;
     return nullptr;
   }
-  session_ = std::move(*opened);
-  return session_.get();
+  documents_ = std::move(*opened);
+  return documents_.get();
 }
 
 bool Program::canWrite() const {

@@ -29,8 +29,8 @@ struct GlobalOptions {
   std::chrono::milliseconds timeout{30'000};
 };
 
-/// What every command works with: opens the session when it is first asked for, so that a command
-/// that needs none does not wait for one.
+/// What every command works with: opens the documents when they are first asked for, so that a
+/// command that needs none does not wait for them.
 class Program {
  public:
   Program(GlobalOptions options, Streams streams)
@@ -44,7 +44,7 @@ class Program {
   [[nodiscard]] int outputDescriptor() const { return streams_.descriptor; }
 
   /// Null after a failure that was reported; `exitCode` tells with what to end.
-  [[nodiscard]] Session* session();
+  [[nodiscard]] Documents* documents();
   [[nodiscard]] ExitCode exitCode() const { return exitCode_; }
 
   /// Tells something beside the answer, on standard error; with --json as {"notice":…}.
@@ -63,7 +63,7 @@ class Program {
  private:
   GlobalOptions options_;
   Streams streams_;
-  std::unique_ptr<Session> session_;
+  std::unique_ptr<Documents> documents_;
   ExitCode exitCode_ = ExitCode::done;
 };
 

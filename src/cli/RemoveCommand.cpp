@@ -47,19 +47,19 @@ Result<Contents> contentsOf(const std::string& path) {
   return contents;
 }
 
-ExitCode tellWhatWouldGo(Program& program, const LocalItem& item) {
-  const std::string& path = item.fileURL().path();
+ExitCode tellWhatWouldGo(Program& program, const ItemRecord& item) {
+  const std::string& path = item.path;
   const auto contents = contentsOf(path);
   if (!contents) return program.report(contents.error(), "can't look at all of " + path);
   if (program.options().json) {
     nlohmann::json line;
-    setText(line, "wouldDelete", item.itemIdentifier());
+    setText(line, "wouldDelete", item.itemIdentifier);
     setText(line, "path", path);
     line["entries"] = contents->entries;
     line["bytes"] = std::to_string(contents->bytes);
     program.out() << line.dump() << '\n';
   } else {
-    program.out() << "would remove " << printable(item.itemIdentifier()) << "  " << printable(path)
+    program.out() << "would remove " << printable(item.itemIdentifier) << "  " << printable(path)
                   << "  (" << contents->entries
                   << (contents->entries == 1 ? " entry, " : " entries, ")
                   << humanSize(contents->bytes) << ")\n";
@@ -68,21 +68,20 @@ ExitCode tellWhatWouldGo(Program& program, const LocalItem& item) {
 }
 
 ExitCode removeOne(Program& program, const std::string& item, bool isDryRun) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
-  const auto found = ItemArgument(item).item(*session);
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
+  const auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
-  if (isDryRun) return tellWhatWouldGo(program, **found);
-  const std::string identifier = (*found)->itemIdentifier();
-  const auto error = OperationRun(program, *session).error([&](auto done) {
-    session->provider().deleteItemWithIdentifier(identifier, std::move(done));
+  if (isDryRun) return tellWhatWouldGo(program, *found);
+  const std::string identifier = found->itemIdentifier;
+  const auto error = OperationRun(program, *documents).error([&](auto done) {
+    documents->remove(identifier, std::move(done));
   });
   if (error) return program.report(*error, "can't remove " + item);
   if (program.options().json) {
     program.out() << nlohmann::json{{"deleted", {utf8Lossy(identifier)}}}.dump() << '\n';
   } else {
-    program.out() << "removed " << printable(identifier) << "  "
-                  << printable((*found)->fileURL().path()) << '\n';
+    program.out() << "removed " << printable(identifier) << "  " << printable(found->path) << '\n';
   }
   return ExitCode::done;
 }

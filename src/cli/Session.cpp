@@ -1,23 +1,31 @@
 #include "cli/Session.h"
 
-#include "linux/apps/LinuxApplicationRegistry.h"
+#include "host/LocalDocuments.h"
+#include "host/bus/RemoteDocuments.h"
+#include "linux/files/HomeLayout.h"
 
 namespace mirabel {
+namespace {
 
-Result<std::unique_ptr<Session>> Session::open(Options options) {
+std::unique_ptr<Documents> servedDocuments(const SessionOptions& options) {
+  HomeLayout::Choices choices;
+  choices.home = options.home;
+  const auto layout = HomeLayout::resolve(choices);
+  if (!layout) return nullptr;
+  return bus::RemoteDocuments::connect({layout->home, layout->stateFolder});
+}
+
+}  // namespace
+
+Result<std::unique_ptr<Documents>> openDocuments(SessionOptions options) {
+  if (!options.embedded) {
+    if (auto served = servedDocuments(options)) return served;
+  }
   LinuxPlatform::Options platformOptions;
   platformOptions.home = std::move(options.home);
   platformOptions.timeout = options.timeout;
   platformOptions.notice = std::move(options.notice);
-  auto hosted = HostedProvider::open(std::move(platformOptions));
-  if (!hosted) return fail(hosted.error());
-  return std::unique_ptr<Session>(new Session(std::move(*hosted)));
-}
-
-std::optional<std::string> Session::reasonLeftOut(std::string_view bundle) const {
-  for (const LeftOut& leftOut : linuxPlatform().applications().leftOut())
-    if (leftOut.identifier == bundle) return "it is left out: " + leftOut.reason;
-  return {};
+  return LocalDocuments::open(std::move(platformOptions));
 }
 
 }  // namespace mirabel

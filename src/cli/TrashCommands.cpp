@@ -3,6 +3,7 @@
 #include "cli/ItemArgument.h"
 #include "cli/ItemCommands.h"
 #include "cli/OperationRun.h"
+#include "host/ErrorText.h"
 
 namespace mirabel {
 namespace {
@@ -10,6 +11,7 @@ namespace {
 /// What a refusal means for this item, in words that say what to do.
 Error explained(Error error, bool isTrashed) {
   if (!error.is(VesselErrorCode::invalidParameter)) return error;
+  error.userInfo.erase(std::string(toldExplanation));
   error.userInfo[std::string(errorkey::detail)] =
       isTrashed ? "the folder that it came from is gone or in the trash itself, or not known; say "
                   "with --to where it shall go"
@@ -19,17 +21,16 @@ Error explained(Error error, bool isTrashed) {
 
 ExitCode restoreOne(Program& program, const std::string& item,
                     const std::optional<std::string>& parent) {
-  Session& session = *program.session();
-  const auto found = ItemArgument(item).item(session);
+  Documents& documents = *program.documents();
+  const auto found = ItemArgument(item).item(documents);
   if (!found) return program.report(found.error(), "can't find " + item);
-  const auto result = OperationRun(program, session).item([&](auto done) {
-    session.trash().restore((*found)->itemIdentifier(), parent, std::move(done));
+  const auto result = OperationRun(program, documents).item([&](auto done) {
+    documents.restore(found->itemIdentifier, parent, std::move(done));
   });
   if (!result) {
-    return program.report(explained(result.error(), (*found)->isTrashed()),
-                          "can't restore " + item);
+    return program.report(explained(result.error(), found->isTrashed), "can't restore " + item);
   }
-  printOutcome(program, **result);
+  printOutcome(program, *result);
   return ExitCode::done;
 }
 
@@ -40,24 +41,24 @@ ExitCode runTrash(Program& program, const std::vector<std::string>& items) {
   for (const std::string& item : items) {
     outcomes.add(runOnItem(program, item, "can't trash " + item,
                            [&](const std::string& identifier, auto done) {
-                             program.session()->trash().trash(identifier, std::move(done));
+                             program.documents()->trash(identifier, std::move(done));
                            }));
   }
   return outcomes.exitCode();
 }
 
 ExitCode runRestore(Program& program, const RestoreOptions& options) {
-  Session* session = program.session();
-  if (session == nullptr) return program.exitCode();
+  Documents* documents = program.documents();
+  if (documents == nullptr) return program.exitCode();
   std::optional<std::string> parent;
   if (options.parent) {
-    const auto found = ItemArgument(*options.parent).item(*session);
+    const auto found = ItemArgument(*options.parent).item(*documents);
     if (!found) return program.report(found.error(), "can't find " + *options.parent);
-    if ((*found)->isTrashed()) {
-      return program.report(Error::invalidParameter("parent", (*found)->itemIdentifier()),
+    if (found->isTrashed) {
+      return program.report(Error::invalidParameter("parent", found->itemIdentifier),
                             "can't restore to " + *options.parent + ", which is in the trash");
     }
-    parent = (*found)->itemIdentifier();
+    parent = found->itemIdentifier;
   }
   Outcomes outcomes;
   for (const std::string& item : options.items)

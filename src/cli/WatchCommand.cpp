@@ -8,34 +8,16 @@
 #include "cli/Commands.h"
 #include "cli/ContainerArgument.h"
 #include "cli/EndSignals.h"
-#include "cli/Printing.h"
 #include "cli/WakeUp.h"
-#include "fs/FSChangeToken.h"
-#include "linux/files/LinuxVesselManager.h"
-#include "linux/volume/VolumeIndex.h"
 
 namespace mirabel {
 namespace {
-
-// How often it is asked whether there are events that no signal has come for.
-constexpr int millisecondsBetweenChecks = 5000;
-
-bool isBehind(const VolumeIndex::Status& status, const std::string& anchor) {
-  const auto bytes = fromBase64(anchor);
-  if (!bytes) return true;
-  const auto token = FSChangeToken::decode(dataFromString(*bytes));
-  return !token || status.lastEventID > token->streamEventID;
-}
 
 /// One run of the command.
 class Watch {
  public:
   Watch(Program& program, const WatchOptions& options)
-      : program_(program),
-        options_(options),
-        failure_("can't watch " + options.item),
-        container_(options.item) {}
-  ~Watch();
+      : program_(program), options_(options), failure_("can't watch " + options.item) {}
   Watch(const Watch&) = delete;
   Watch& operator=(const Watch&) = delete;
 
@@ -44,37 +26,25 @@ class Watch {
  private:
   ExitCode open();
   Result<void> begin();
-  Result<void> listen();
-  void followLibraries();
   ExitCode follow();
   Result<void> tell();
+  [[nodiscard]] bool mustEnd(int milliseconds);
   enum class Awaited { changes, end };
   Awaited await();
-  [[nodiscard]] bool mustEnd(int milliseconds);
 
   Program& program_;
   const WatchOptions& options_;
   std::string failure_;
-  EndSignals signals_;  // before the session and its threads
+  EndSignals signals_;  // before the documents and their threads
   WakeUp opened_;
   std::shared_ptr<WakeUp> changed_ = std::make_shared<WakeUp>();
-  Session* session_ = nullptr;
-  ContainerArgument container_;
-  std::optional<URL> place_;
-  std::shared_ptr<VesselEnumerator> signaller_;
-  std::uint64_t librariesVersion_ = 0;  ///< that the signaller listens to, or an earlier one
-  std::shared_ptr<VesselEnumerator> enumerator_;
+  Documents* documents_ = nullptr;
+  std::unique_ptr<DocumentContainer> container_;
+  std::unique_ptr<ContainerWatch> watch_;
   std::string anchor_;
   bool hasTold_ = false;
+  bool isWaitingForService_ = false;
 };
-
-Watch::~Watch() {
-  if (session_ == nullptr) return;
-  session_->linuxPlatform().manager().setSignalListener({});
-  for (const auto& enumerator : {signaller_, enumerator_}) {
-    if (enumerator) enumerator->invalidate();
-  }
-}
 
 ExitCode Watch::run() {
   if (opened_.descriptor() < 0 || changed_->descriptor() < 0) {
@@ -97,62 +67,28 @@ ExitCode Watch::run() {
 }
 
 ExitCode Watch::open() {
-  session_ = program_.session();
-  if (session_ == nullptr) return program_.exitCode();
+  documents_ = program_.documents();
+  if (documents_ == nullptr) return program_.exitCode();
   const auto begun = begin();
   return begun ? ExitCode::done : program_.report(begun.error(), failure_);
 }
 
 Result<void> Watch::begin() {
-  // Whatever is named: notifiers name the root and the working set, whatever they are for, and a
-  // new list of app libraries may be told under either name alone.
-  session_->linuxPlatform().manager().setSignalListener(
-      [changed = changed_](std::string_view, const VesselManager::SignalHandler& done) {
-        changed->set();
-        done(std::nullopt);
-      });
-  if (auto listening = listen(); !listening) return listening;
-  session_->watchApplications();
-  // Taken when the notifier exists: that tells of everything since then.
-  auto anchor = options_.since ? Result<std::string>(*options_.since) : currentAnchor(*enumerator_);
+  // What was named by its path is followed by its identity.
+  const auto identifier = ContainerArgument(options_.item).identifier(*documents_);
+  if (!identifier) return fail(identifier.error());
+  auto container = documents_->container(*identifier);
+  if (!container) return fail(container.error());
+  auto watch = documents_->watch(*identifier, [changed = changed_] { changed->set(); });
+  if (!watch) return fail(watch.error());
+  container_ = *std::move(container);
+  watch_ = *std::move(watch);
+  // Taken when the watch has begun: that tells of everything since then.
+  auto anchor = options_.since ? Result<std::string>(*options_.since)
+                               : ChangeBatch::currentAnchor(*container_);
   if (!anchor) return fail(anchor.error());
   anchor_ = *std::move(anchor);
   return {};
-}
-
-/// Has whatever happens in the container signalled from now on, also after it was moved.
-Result<void> Watch::listen() {
-  const auto found = container_.followed(*session_);
-  if (!found) return fail(found.error());
-  if (signaller_ && found->folder == place_) {
-    followLibraries();
-    return {};
-  }
-  place_ = found->folder;
-  // What was named by its path is followed by its identity.
-  if (place_) container_ = ContainerArgument(found->identifier);
-  // The working set has no notifier of its own; that of all folders looks at the same places.
-  const bool isWorkingSet = found->identifier == VesselWorkingSetContainerItemIdentifier;
-  librariesVersion_ = session_->libraries().shared().versionToken();
-  auto signaller = session_->enumerator(
-      isWorkingSet ? VesselAllDirectoriesContainerItemIdentifier : found->identifier,
-      LiveUpdates::wanted);
-  if (!signaller) return fail(signaller.error());
-  auto enumerator = session_->enumerator(found->identifier);
-  if (!enumerator) return fail(enumerator.error());
-  signaller_ = *std::move(signaller);
-  enumerator_ = *std::move(enumerator);
-  return {};
-}
-
-/// Has what happens in app libraries that came meanwhile signalled too. The signaller is never
-/// asked for changes, which would have it take over the new list; but an anchor is always one of
-/// the list of now.
-void Watch::followLibraries() {
-  const std::uint64_t version = session_->libraries().shared().versionToken();
-  if (version == librariesVersion_) return;
-  librariesVersion_ = version;
-  signaller_->currentSyncAnchor([](const std::optional<Data>&) {});
 }
 
 ExitCode Watch::follow() {
@@ -160,7 +96,11 @@ ExitCode Watch::follow() {
   for (bool isFirst = true; isFirst || await() == Awaited::changes; isFirst = false) {
     // Before it asks: what is signalled from then on may be too late for the answer.
     changed_->clear();
-    if (auto told = tell(); !told) return program_.report(told.error(), failure_);
+    const auto told = tell();
+    if (!told && !told.error().isPosix(ENOTCONN)) return program_.report(told.error(), failure_);
+    // The anchor holds: when the service is back, everything since is told.
+    if (!told && !isWaitingForService_) program_.note("the service has left; waiting for it");
+    isWaitingForService_ = !told;
     if (isFirst && isForPeople) program_.note("watching " + options_.item + "; Ctrl-C ends it");
   }
   if (isForPeople && program_.canWrite()) program_.note("the anchor is now " + anchor_);
@@ -168,15 +108,14 @@ ExitCode Watch::follow() {
 }
 
 Result<void> Watch::tell() {
-  if (auto listening = listen(); !listening) return listening;
   for (bool more = true; more && !mustEnd(0);) {
-    const auto batch = ChangeBatch::ask(*enumerator_, anchor_);
+    const auto batch = ChangeBatch::ask(*container_, anchor_);
     if (!batch) return fail(batch.error());
-    more = (*batch)->moreComing();
-    anchor_ = (*batch)->anchor();
+    more = batch->moreComing();
+    anchor_ = batch->anchor();
     // The first one says from where on changes are told, even when there are none yet.
-    if (hasTold_ && !more && (*batch)->isEmpty()) break;
-    (*batch)->print(program_);
+    if (hasTold_ && !more && batch->isEmpty()) break;
+    batch->print(program_);
     program_.out().flush();
     hasTold_ = true;
   }
@@ -185,11 +124,9 @@ Result<void> Watch::tell() {
 
 /// Waits for changes, or for a reason to end.
 Watch::Awaited Watch::await() {
-  while (!mustEnd(millisecondsBetweenChecks)) {
+  while (!mustEnd(-1)) {
     pollfd changed{changed_->descriptor(), POLLIN, 0};
     if (::poll(&changed, 1, 0) > 0) return Awaited::changes;
-    // A stream that could not go on reading the history signals nothing any more.
-    if (isBehind(session_->linuxPlatform().index().status(), anchor_)) return Awaited::changes;
   }
   return Awaited::end;
 }

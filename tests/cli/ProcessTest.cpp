@@ -3,7 +3,7 @@
 
 #include "cli/CommandLineFixture.h"
 #include "cli/Running.h"
-#include "cli/Session.h"
+#include "host/LocalDocuments.h"
 
 namespace mirabel::testing {
 namespace {
@@ -13,10 +13,10 @@ using ::testing::MatchesRegex;
 
 class Processes : public CommandLineFixture {
  protected:
-  std::unique_ptr<Session> hold() const {
-    Session::Options options;
+  std::unique_ptr<LocalDocuments> hold() const {
+    LinuxPlatform::Options options;
     options.home = home.path();
-    return Session::open(std::move(options)).value();
+    return LocalDocuments::open(std::move(options)).value();
   }
 };
 

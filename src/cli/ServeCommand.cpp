@@ -1,0 +1,93 @@
+#include <array>
+#include <cerrno>
+#include <chrono>
+#include <memory>
+#include <optional>
+#include <poll.h>
+#include <string>
+#include <systemd/sd-daemon.h>
+
+#include "cli/Commands.h"
+#include "cli/EndSignals.h"
+#include "cli/WakeUp.h"
+#include "host/LocalDocuments.h"
+#include "host/bus/BusService.h"
+
+namespace mirabel {
+namespace {
+
+/// How often the service manager wants to hear that all is well: twice as often as it waits.
+std::optional<std::chrono::milliseconds> watchdogPeriod() {
+  std::uint64_t microseconds = 0;
+  if (::sd_watchdog_enabled(0, &microseconds) <= 0) return {};
+  return std::chrono::milliseconds(microseconds / 2000);
+}
+
+/// One run of the service.
+class Serving {
+ public:
+  explicit Serving(Program& program) : program_(program) {}
+  ExitCode run();
+
+ private:
+  ExitCode open();
+  void wait();
+
+  Program& program_;
+  EndSignals signals_;  // before the threads of the documents
+  WakeUp lost_;
+  // What the documents have under way reports to the service, so that they go first.
+  std::unique_ptr<bus::BusService> service_;
+  std::unique_ptr<LocalDocuments> documents_;
+};
+
+ExitCode Serving::run() {
+  if (const ExitCode code = open(); code != ExitCode::done) return code;
+  documents_->keepSearching();
+  ::sd_notify(0, "READY=1");
+  program_.note("serving the documents of " + documents_->places().home + " on the session bus");
+  wait();
+  ::sd_notify(0, "STOPPING=1");
+  service_->stop();
+  documents_.reset();
+  service_.reset();
+  return ExitCode::done;
+}
+
+ExitCode Serving::open() {
+  LinuxPlatform::Options options;
+  options.home = program_.options().home;
+  options.timeout = program_.options().timeout;
+  options.notice = [this](std::string_view text) { program_.note(text); };
+  auto documents = LocalDocuments::open(std::move(options));
+  if (!documents) return program_.report(documents.error(), "can't open the documents");
+  documents_ = *std::move(documents);
+  auto service = bus::BusService::start(*documents_, [this] { lost_.set(); });
+  if (!service) return program_.report(service.error(), "can't serve the documents");
+  service_ = *std::move(service);
+  return ExitCode::done;
+}
+
+void Serving::wait() {
+  const auto period = watchdogPeriod();
+  while (true) {
+    std::array<pollfd, 2> waiting{pollfd{signals_.descriptor(), POLLIN, 0},
+                                  pollfd{lost_.descriptor(), POLLIN, 0}};
+    const int timeout = period ? static_cast<int>(period->count()) : -1;
+    const int ready = ::poll(waiting.data(), waiting.size(), timeout);
+    if (ready > 0) break;
+    if (ready < 0 && errno != EINTR) break;
+    // Where the index does not answer any more, this does not return, and the manager hears
+    // nothing.
+    static_cast<void>(documents_->provider().linuxPlatform().index().status());
+    ::sd_notify(0, "WATCHDOG=1");
+  }
+}
+
+}  // namespace
+
+ExitCode runServe(Program& program) {
+  return Serving(program).run();
+}
+
+}  // namespace mirabel

@@ -1,0 +1,78 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <sdbus-c++/sdbus-c++.h>
+
+#include "foundation/Error.h"
+#include "host/bus/BusItems.h"
+#include "host/bus/Callers.h"
+
+namespace mirabel::bus {
+
+/// One method call, answered once; where that is forgotten, with an error when it goes. Any thread
+/// may answer it.
+class BusCall {
+ public:
+  BusCall(sdbus::MethodCall message, std::shared_ptr<Caller> caller)
+      : message_(std::move(message)), caller_(std::move(caller)) {}
+  ~BusCall();
+  BusCall(const BusCall&) = delete;
+  BusCall& operator=(const BusCall&) = delete;
+
+  /// The arguments, in their order; the bus has checked their types.
+  template <class Value>
+  [[nodiscard]] Value argument() {
+    Value value{};
+    message_ >> value;
+    return value;
+  }
+  [[nodiscard]] Caller& caller() const { return *caller_; }
+  [[nodiscard]] const std::shared_ptr<Caller>& sharedCaller() const { return caller_; }
+
+  /// `write` puts the results into the reply.
+  void reply(const std::function<void(sdbus::Message& reply)>& write = {});
+  void reply(const Result<ItemRecord>& item);
+  void reply(const Result<std::vector<ItemRecord>>& items);
+  void fail(const Error& error);
+  void fail(const sdbus::Error& error);
+
+  /// The documents as the caller may see them; null, and the call is answered, where it may not.
+  [[nodiscard]] Documents* documents();
+  /// The same for what is no business of a sandboxed caller.
+  [[nodiscard]] Documents* allDocuments();
+
+ private:
+  sdbus::MethodCall message_;
+  std::shared_ptr<Caller> caller_;
+  bool isAnswered_ = false;
+};
+
+/// Which calls wait for which: those of a caller in one lane are answered in their order.
+enum class Lane {
+  lookups,       ///< short
+  enumerations,  ///< listings, changes, watches, searches
+  operations,    ///< what changes items; ends when the operation has begun
+};
+
+/// A method of the service. Names are those of results and arguments in the introspection data.
+struct BusMethod {
+  const char* interface;
+  const char* name;
+  const char* inputSignature;
+  std::vector<std::string> inputNames;
+  const char* outputSignature;
+  std::vector<std::string> outputNames;
+  Lane lane;
+  std::function<void(const std::shared_ptr<BusCall>& call)> answer;
+};
+
+/// Sends a signal of the provider's interface to one connection. Any thread.
+using Signaller = std::function<void(const std::string& caller, const std::string& container)>;
+
+[[nodiscard]] std::vector<BusMethod> providerMethods(Signaller signaller);
+/// `stagingFolder`: where what comes as a descriptor is kept until it is imported.
+[[nodiscard]] std::vector<BusMethod> operationsMethods(const std::string& stagingFolder);
+[[nodiscard]] std::vector<BusMethod> managerMethods();
+
+}  // namespace mirabel::bus

@@ -1,0 +1,118 @@
+#include "host/bus/BusConnection.h"
+
+#include <chrono>
+#include <cstdint>
+#include <cstdlib>
+#include <future>
+#include <optional>
+
+#include "host/bus/BusNames.h"
+
+namespace mirabel::bus {
+namespace {
+
+// Imports and listings take as long as they take. A service that has died is told by the bus.
+constexpr std::uint64_t withoutTimeout = UINT64_MAX;
+constexpr std::chrono::milliseconds betweenLooks{500};
+
+bool isRunning(sdbus::IConnection& connection) {
+  bool hasOwner = false;
+  const auto daemon =
+      sdbus::createProxy(connection, "org.freedesktop.DBus", "/org/freedesktop/DBus");
+  daemon->callMethod("NameHasOwner")
+      .onInterface("org.freedesktop.DBus")
+      .withArguments(std::string(serviceName))
+      .storeResultsTo(hasOwner);
+  return hasOwner;
+}
+
+}  // namespace
+
+std::shared_ptr<BusConnection> BusConnection::open() {
+  // Where neither is set there is no session, and looking for its bus would take its time.
+  if (std::getenv("DBUS_SESSION_BUS_ADDRESS") == nullptr &&
+      std::getenv("XDG_RUNTIME_DIR") == nullptr)
+    return nullptr;
+  try {
+    std::shared_ptr<BusConnection> opened(new BusConnection);
+    opened->connection_ = sdbus::createSessionBusConnection();
+    if (!isRunning(*opened->connection_)) return nullptr;
+    opened->service_ = sdbus::createProxy(*opened->connection_, serviceName, objectPath);
+    opened->loop_ = std::make_unique<BusLoop>(
+        *opened->connection_, [connection = opened.get()] { connection->isLost_ = true; });
+    return opened;
+  } catch (const sdbus::Error&) {
+    return nullptr;
+  }
+}
+
+sdbus::MethodReply BusConnection::send(const char* interface, const char* method,
+                                       const Write& write) {
+  auto message = service_->createMethodCall(interface, method);
+  if (write) write(message);
+  struct Answer {
+    std::promise<void> isThere;
+    sdbus::MethodReply reply;
+    std::optional<sdbus::Error> error;
+  };
+  const auto answer = std::make_shared<Answer>();
+  auto isThere = answer->isThere.get_future();
+  service_->callMethod(
+      message,
+      [answer](sdbus::MethodReply& reply, const sdbus::Error* error) {
+        if (error != nullptr)
+          answer->error = *error;
+        else
+          answer->reply = reply;
+        answer->isThere.set_value();
+      },
+      withoutTimeout);
+  // Where the bus itself goes away, nobody answers any more.
+  while (isThere.wait_for(betweenLooks) != std::future_status::ready) {
+    if (isLost_) throw sdbus::Error("org.freedesktop.DBus.Error.Disconnected", "the bus has gone");
+  }
+  if (answer->error) throw *answer->error;
+  return std::move(answer->reply);
+}
+
+void BusConnection::callAsync(
+    const char* interface, const char* method, const Write& write,
+    std::function<void(sdbus::Message* reply, const Error& error)> handle) {
+  try {
+    auto message = service_->createMethodCall(interface, method);
+    if (write) write(message);
+    service_->callMethod(
+        message,
+        [handle](sdbus::MethodReply& reply, const sdbus::Error* error) {
+          if (error != nullptr) return handle(nullptr, errorFromBus(*error));
+          handle(&reply, {});
+        },
+        withoutTimeout);
+  } catch (const sdbus::Error& error) {
+    handle(nullptr, errorFromBus(error));
+  }
+}
+
+void BusConnection::listen(std::function<void(const std::string& container)> signalled,
+                           std::function<void(bool isThere)> moved) {
+  service_->registerSignalHandler(providerInterface, "EnumeratorSignaled",
+                                  [signalled = std::move(signalled)](sdbus::Signal& signal) {
+                                    std::string container;
+                                    signal >> container;
+                                    signalled(container);
+                                  });
+  service_->finishRegistration();
+  moving_ = connection_->addMatch(
+      std::string("type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
+                  "interface='org.freedesktop.DBus',member='NameOwnerChanged',arg0='") +
+          serviceName + "'",
+      [moved = std::move(moved)](sdbus::Message& message) {
+        std::string name;
+        std::string before;
+        std::string now;
+        message >> name >> before >> now;
+        moved(!now.empty());
+      });
+}
+
+}  // namespace mirabel::bus

@@ -1,0 +1,61 @@
+#pragma once
+
+#include <atomic>
+#include <functional>
+#include <memory>
+#include <sdbus-c++/sdbus-c++.h>
+#include <string>
+#include <type_traits>
+#include <utility>
+
+#include "foundation/Error.h"
+#include "host/bus/BusErrors.h"
+#include "host/bus/BusLoop.h"
+
+namespace mirabel::bus {
+
+/// The client's end of the connection with the service. Any thread may call it.
+class BusConnection {
+ public:
+  /// Null where there is no session bus, or nobody has the service's name; none is started for
+  /// this.
+  [[nodiscard]] static std::shared_ptr<BusConnection> open();
+
+  using Write = std::function<void(sdbus::Message& call)>;
+
+  /// Calls a method and waits for the answer, however long that takes. `read` makes the result of
+  /// it. Errors: see `errorFromBus`.
+  template <class Read>
+  [[nodiscard]] auto call(const char* interface, const char* method, const Write& write,
+                          Read&& read)
+      -> Result<std::remove_cvref_t<decltype(read(std::declval<sdbus::Message&>()))>> {
+    try {
+      auto reply = send(interface, method, write);
+      return read(reply);
+    } catch (const sdbus::Error& error) {
+      return fail(errorFromBus(error));
+    }
+  }
+  /// Calls a method and has the answer handled, on the connection's thread: with the reply, or with
+  /// null and the error.
+  void callAsync(const char* interface, const char* method, const Write& write,
+                 std::function<void(sdbus::Message* reply, const Error& error)> handle);
+
+  /// `signalled` is called for each signal that a container has changed, and `moved` when the
+  /// service has left the bus or come back to it. On the connection's thread. To be called once.
+  void listen(std::function<void(const std::string& container)> signalled,
+              std::function<void(bool isThere)> moved);
+
+ private:
+  BusConnection() = default;
+  [[nodiscard]] sdbus::MethodReply send(const char* interface, const char* method,
+                                        const Write& write);
+
+  std::unique_ptr<sdbus::IConnection> connection_;
+  std::unique_ptr<sdbus::IProxy> service_;
+  sdbus::Slot moving_;
+  std::atomic<bool> isLost_ = false;
+  std::unique_ptr<BusLoop> loop_;
+};
+
+}  // namespace mirabel::bus

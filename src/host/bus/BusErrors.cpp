@@ -1,0 +1,123 @@
+#include "host/bus/BusErrors.h"
+
+#include <array>
+#include <cerrno>
+#include <charconv>
+#include <cstring>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "host/ErrorText.h"
+
+namespace mirabel::bus {
+namespace {
+
+constexpr std::string_view prefix = "com.norvane.Vessel1.Error.";
+constexpr std::string_view posixPrefix = "POSIX.";
+constexpr std::string_view storePrefix = "Store.Code";
+constexpr int largestErrno = 200;
+
+struct NamedError {
+  std::string_view name;
+  ErrorDomain domain;
+  std::int64_t code;
+};
+
+template <class Code>
+constexpr NamedError named(std::string_view name, ErrorDomain domain, Code code) {
+  return {name, domain, static_cast<std::int64_t>(code)};
+}
+
+constexpr std::array namedErrors{
+    named("NoSuchFile", ErrorDomain::file, FileErrorCode::noSuchFile),
+    named("WriteNotPermitted", ErrorDomain::file, FileErrorCode::writeNotPermitted),
+    named("FileExists", ErrorDomain::file, FileErrorCode::fileExists),
+    named("Collision", ErrorDomain::vessel, VesselErrorCode::collision),
+    named("SyncAnchorExpired", ErrorDomain::vessel, VesselErrorCode::syncAnchorExpired),
+    named("NoSuchItem", ErrorDomain::vessel, VesselErrorCode::noSuchItem),
+    named("InvalidParameter", ErrorDomain::vessel, VesselErrorCode::invalidParameter),
+    named("InvalidItemIdentifier", ErrorDomain::localVessel,
+          LocalVesselError::invalidItemIdentifier),
+    named("InvalidItemURL", ErrorDomain::localVessel, LocalVesselError::invalidItemURL),
+    named("ItemNotFound", ErrorDomain::localVessel, LocalVesselError::itemNotFound),
+    named("UnableToGetDeviceUUID", ErrorDomain::localVessel,
+          LocalVesselError::unableToGetDeviceUUID),
+    named("PropertyList", ErrorDomain::propertyList, 0),
+};
+
+// The last element of a bus name may hold letters, digits and underscores only.
+std::string nameOf(const Error& error) {
+  for (const NamedError& candidate : namedErrors)
+    if (candidate.domain == error.domain && candidate.code == error.code)
+      return std::string(candidate.name);
+  if (error.domain == ErrorDomain::posix) {
+    const char* name = ::strerrorname_np(static_cast<int>(error.code));
+    return std::string(posixPrefix) + (name != nullptr ? name : "EIO");
+  }
+  if (error.domain == ErrorDomain::store) {
+    const bool isNegative = error.code < 0;
+    return std::string(storePrefix) + (isNegative ? "_" : "") +
+           std::to_string(isNegative ? -error.code : error.code);
+  }
+  return "Failed";
+}
+
+std::optional<std::int64_t> posixCode(std::string_view name) {
+  for (int code = 1; code <= largestErrno; ++code) {
+    const char* candidate = ::strerrorname_np(code);
+    if (candidate != nullptr && name == candidate) return code;
+  }
+  return {};
+}
+
+Error fromOwnName(std::string_view name) {
+  for (const NamedError& candidate : namedErrors)
+    if (candidate.name == name) return {candidate.domain, candidate.code, {}};
+  if (name.starts_with(posixPrefix)) {
+    return {ErrorDomain::posix, posixCode(name.substr(posixPrefix.size())).value_or(EIO), {}};
+  }
+  if (name.starts_with(storePrefix)) {
+    name.remove_prefix(storePrefix.size());
+    const bool isNegative = name.starts_with('_');
+    if (isNegative) name.remove_prefix(1);
+    std::int64_t code = 0;
+    std::from_chars(name.begin(), name.end(), code);
+    return {ErrorDomain::store, isNegative ? -code : code, {}};
+  }
+  return Error::posix(EIO);
+}
+
+bool isOneOf(std::string_view name, std::initializer_list<std::string_view> names) {
+  for (const std::string_view candidate : names)
+    if (name == candidate) return true;
+  return false;
+}
+
+}  // namespace
+
+sdbus::Error errorForBus(const Error& error) {
+  return {std::string(prefix) + nameOf(error), explanation(error)};
+}
+
+Error errorFromBus(const sdbus::Error& error) {
+  const std::string_view name = error.getName();
+  if (name.starts_with(prefix)) {
+    Error ours = fromOwnName(name.substr(prefix.size()));
+    ours.userInfo[std::string(toldExplanation)] = error.getMessage();
+    return ours;
+  }
+  using namespace std::string_view_literals;
+  if (isOneOf(
+          name,
+          {"org.freedesktop.DBus.Error.ServiceUnknown"sv,
+           "org.freedesktop.DBus.Error.NameHasNoOwner"sv, "org.freedesktop.DBus.Error.NoReply"sv,
+           "org.freedesktop.DBus.Error.Disconnected"sv, "org.freedesktop.DBus.Error.Timeout"sv,
+           "System.Error.ENOTCONN"sv, "System.Error.ECONNRESET"sv, "System.Error.ETIMEDOUT"sv}))
+    return Error::posix(ENOTCONN, "the service does not answer");
+  if (isOneOf(name, {"org.freedesktop.DBus.Error.AccessDenied"sv}))
+    return Error::posix(EACCES, error.getMessage());
+  return Error::posix(EIO, std::string(name) + ": " + error.getMessage());
+}
+
+}  // namespace mirabel::bus

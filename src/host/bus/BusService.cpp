@@ -1,0 +1,164 @@
+#include "host/bus/BusService.h"
+
+#include <atomic>
+#include <cerrno>
+#include <sdbus-c++/sdbus-c++.h>
+#include <utility>
+
+#include "foundation/Log.h"
+#include "host/bus/BusCall.h"
+#include "host/bus/BusErrors.h"
+#include "host/bus/BusLoop.h"
+#include "host/bus/BusNames.h"
+#include "host/bus/CallLane.h"
+#include "host/bus/Callers.h"
+#include "host/bus/StagedImport.h"
+#include "linux/volume/StateFolder.h"
+#include "linux/volume/VolumeIndex.h"
+
+namespace mirabel::bus {
+namespace {
+
+// Answers are made from the disk and the index, which more threads do not make quicker. Listings
+// wait for the disk the longest.
+constexpr std::size_t lookupThreads = 3;
+constexpr std::size_t enumerationThreads = 6;
+constexpr std::size_t operationThreads = 2;
+constexpr std::size_t mostWaiting = 4096;
+
+constexpr const char* leavingMatch =
+    "type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
+    "interface='org.freedesktop.DBus',member='NameOwnerChanged',arg2=''";
+
+}  // namespace
+
+class BusService::Impl {
+ public:
+  Impl(LocalDocuments& documents, std::function<void()> lost)
+      : callers_(documents),
+        stagingFolder_(documents.provider().linuxPlatform().index().stateFolder().path() +
+                       "/imports"),
+        connection_(sdbus::createSessionBusConnection()) {
+    StagedImport::clear(stagingFolder_);
+    object_ = sdbus::createObject(*connection_, objectPath);
+    addMethods();
+    leaving_ = connection_->addMatch(leavingMatch, [this](sdbus::Message& message) {
+      std::string name;
+      message >> name;
+      if (name.starts_with(':')) callerLeft(name);
+    });
+    connection_->requestName(serviceName);
+    loop_ = std::make_unique<BusLoop>(*connection_, std::move(lost));
+  }
+
+  void stop() {
+    if (hasStopped_.exchange(true)) return;
+    try {
+      connection_->releaseName(serviceName);
+    } catch (const sdbus::Error& error) {
+      logDebug("can't release the name on the bus; " + error.getMessage());
+    }
+    for (CallLane* lane : {&lookups_, &enumerations_, &operations_})
+      lane->end();
+    callers_.leaveAll();
+  }
+
+  ~Impl() { stop(); }
+
+ private:
+  void addMethods() {
+    const auto signaller = [this](const std::string& caller, const std::string& container) {
+      signal(caller, container);
+    };
+    for (auto methods :
+         {providerMethods(signaller), operationsMethods(stagingFolder_), managerMethods()}) {
+      for (BusMethod& method : methods)
+        add(std::move(method));
+    }
+    object_->registerSignal(providerInterface, "EnumeratorSignaled", "s", {"container"});
+    object_->registerProperty(managerInterface, "Version", "s", [](sdbus::PropertyGetReply& reply) {
+      reply << std::string(MIRABEL_VERSION);
+    });
+    object_->finishRegistration();
+  }
+
+  void add(BusMethod method) {
+    const auto answer = [this, lane = method.lane,
+                         answer = std::move(method.answer)](sdbus::MethodCall message) {
+      const std::string name = message.getSender();
+      const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
+      if (laneOf(lane).submit(name, [call, answer] { answer(call); })) return;
+      if (hasStopped_) return call->fail(Error::posix(ECANCELED, "the service is about to end"));
+      call->fail(sdbus::Error("org.freedesktop.DBus.Error.LimitsExceeded",
+                              "too many calls of this client wait for their answers"));
+    };
+    object_->registerMethod(method.interface, method.name, method.inputSignature, method.inputNames,
+                            method.outputSignature, method.outputNames, answer);
+  }
+
+  CallLane& laneOf(Lane lane) {
+    switch (lane) {
+      case Lane::lookups:
+        return lookups_;
+      case Lane::enumerations:
+        return enumerations_;
+      case Lane::operations:
+        return operations_;
+    }
+    return lookups_;
+  }
+
+  // On the thread that drives the bus; what has to wait goes to a lane.
+  void callerLeft(const std::string& name) {
+    const auto caller = callers_.take(name);
+    if (!caller) return;
+    for (CallLane* lane : {&lookups_, &enumerations_, &operations_})
+      lane->forget(name);
+    static_cast<void>(enumerations_.submit(name, [caller] { caller->leave(); }));
+  }
+
+  void signal(const std::string& caller, const std::string& container) {
+    try {
+      auto message = object_->createSignal(providerInterface, "EnumeratorSignaled");
+      message.setDestination(caller);
+      message << container;
+      message.send();
+    } catch (const sdbus::Error& error) {
+      logDebug("can't signal \"" + container + "\"; " + error.getMessage());
+    }
+  }
+
+  Callers callers_;
+  std::string stagingFolder_;
+  std::unique_ptr<sdbus::IConnection> connection_;
+  std::unique_ptr<sdbus::IObject> object_;
+  sdbus::Slot leaving_;
+  CallLane lookups_{lookupThreads, mostWaiting};
+  CallLane enumerations_{enumerationThreads, mostWaiting};
+  CallLane operations_{operationThreads, mostWaiting};
+  std::atomic<bool> hasStopped_ = false;
+  std::unique_ptr<BusLoop> loop_;
+};
+
+BusService::BusService(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {}
+BusService::~BusService() = default;
+
+Result<std::unique_ptr<BusService>> BusService::start(LocalDocuments& documents,
+                                                      std::function<void()> lost) {
+  try {
+    return std::unique_ptr<BusService>(
+        new BusService(std::make_unique<Impl>(documents, std::move(lost))));
+  } catch (const sdbus::Error& error) {
+    if (error.getName() == "org.freedesktop.DBus.Error.FileExists" ||
+        error.getName() == "System.Error.EEXIST" || error.getName() == "System.Error.EALREADY") {
+      return fail(Error::posix(EBUSY, "another service is on this bus"));
+    }
+    return fail(Error::posix(ENOTCONN, "no session bus can be reached: " + error.getMessage()));
+  }
+}
+
+void BusService::stop() {
+  impl_->stop();
+}
+
+}  // namespace mirabel::bus

@@ -1,0 +1,242 @@
+#include <cerrno>
+#include <utility>
+
+#include "host/bus/BusCall.h"
+#include "host/bus/BusNames.h"
+#include "host/bus/StagedImport.h"
+#include "items/TagData.h"
+
+namespace mirabel::bus {
+namespace {
+
+using CallPointer = std::shared_ptr<BusCall>;
+
+Documents::ItemHandler answering(const CallPointer& call) {
+  return [call](const Documents::ItemResult& result) { call->reply(result); };
+}
+
+Documents::ErrorHandler answeringError(const CallPointer& call) {
+  return [call](const std::optional<Error>& error) {
+    if (error) return call->fail(*error);
+    call->reply();
+  };
+}
+
+void invalidArgument(const CallPointer& call, const std::string& text) {
+  call->fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", text));
+}
+
+/// Runs `operation` with what the caller may change.
+template <class Operation>
+auto onDocuments(Operation operation) {
+  return [operation](const CallPointer& call) {
+    if (Documents* documents = call->documents()) operation(*documents, call);
+  };
+}
+
+/// A name that stands as text before its options, where its bytes may be.
+std::string nameWith(const Options& options, std::string text) {
+  return nameOption(options, "name").value_or(std::move(text));
+}
+
+void createDirectory(Documents& documents, const CallPointer& call) {
+  auto name = call->argument<std::string>();
+  const auto parent = call->argument<std::string>();
+  name = nameWith(call->argument<Options>(), std::move(name));
+  documents.createDirectory(name, parent, answering(call));
+}
+
+void renameItem(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  auto name = call->argument<std::string>();
+  name = nameWith(call->argument<Options>(), std::move(name));
+  documents.rename(item, name, answering(call));
+}
+
+void reparent(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  const auto parent = call->argument<std::string>();
+  const auto options = call->argument<Options>();
+  documents.reparent(item, parent, nameOption(options, "name"), answering(call));
+}
+
+void importDocument(Documents& documents, const CallPointer& call,
+                    const std::string& stagingFolder) {
+  const auto file = call->argument<sdbus::UnixFd>();
+  auto name = call->argument<std::string>();
+  const auto parent = call->argument<std::string>();
+  name = nameWith(call->argument<Options>(), std::move(name));
+  auto staged = StagedImport::of(file.get(), name, stagingFolder);
+  if (!staged) return call->fail(staged.error());
+  const auto kept = std::make_shared<StagedImport>(*std::move(staged));
+  documents.importDocument(kept->path(), parent, [call, kept](const Documents::ItemResult& result) {
+    call->reply(result);
+  });
+}
+
+void importPath(const CallPointer& call) {
+  Documents* documents = call->allDocuments();
+  if (documents == nullptr) return;
+  const std::string path(stringView(call->argument<Data>()));
+  const auto parent = call->argument<std::string>();
+  documents->importDocument(path, parent, answering(call));
+}
+
+void deleteItem(Documents& documents, const CallPointer& call) {
+  documents.remove(call->argument<std::string>(), answeringError(call));
+}
+
+void trash(Documents& documents, const CallPointer& call) {
+  documents.trash(call->argument<std::string>(), answering(call));
+}
+
+void restore(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  const auto options = call->argument<Options>();
+  documents.restore(item, textOption(options, "parent"), answering(call));
+}
+
+void setLastUsedDate(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  const auto text = call->argument<std::string>();
+  const auto date = Date::fromRFC3339(text);
+  if (!date && !text.empty()) return invalidArgument(call, "this is no date in RFC 3339 form");
+  documents.setLastUsedDate(item, date, answering(call));
+}
+
+void setTags(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  std::vector<Tag> tags;
+  for (std::string& label : call->argument<std::vector<std::string>>())
+    tags.push_back({std::move(label)});
+  if (tags.empty()) return documents.setTagData(item, std::nullopt, answering(call));
+  auto encoded = encodeTagData(tags);
+  if (!encoded) return call->fail(encoded.error());
+  documents.setTagData(item, *std::move(encoded), answering(call));
+}
+
+void setTagData(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  auto bytes = call->argument<Data>();
+  documents.setTagData(item, bytes.empty() ? std::nullopt : std::optional(std::move(bytes)),
+                       answering(call));
+}
+
+std::optional<Number> numberOf(const sdbus::Variant& variant) {
+  if (variant.containsValueOfType<std::int64_t>()) return Number::of(variant.get<std::int64_t>());
+  if (variant.containsValueOfType<std::uint64_t>()) return Number::of(variant.get<std::uint64_t>());
+  if (variant.containsValueOfType<double>()) return Number::of(variant.get<double>());
+  if (variant.containsValueOfType<std::int32_t>())
+    return Number::of(std::int64_t{variant.get<std::int32_t>()});
+  if (variant.containsValueOfType<std::uint32_t>())
+    return Number::of(std::int64_t{variant.get<std::uint32_t>()});
+  return {};
+}
+
+void setFavoriteRank(Documents& documents, const CallPointer& call) {
+  const auto item = call->argument<std::string>();
+  const auto rank = numberOf(call->argument<sdbus::Variant>());
+  if (!rank) return invalidArgument(call, "a rank is a number");
+  documents.setFavoriteRank(item, rank, answering(call));
+}
+
+void clearFavoriteRank(Documents& documents, const CallPointer& call) {
+  documents.setFavoriteRank(call->argument<std::string>(), std::nullopt, answering(call));
+}
+
+}  // namespace
+
+std::vector<BusMethod> operationsMethods(const std::string& stagingFolder) {
+  constexpr const char* of = operationsInterface;
+  constexpr const char* item = "a{sv}";
+  constexpr Lane lane = Lane::operations;
+  return {
+      {of,
+       "ImportDocument",
+       "hssa{sv}",
+       {"file", "name", "parent", "options"},
+       item,
+       {"item"},
+       lane,
+       onDocuments([stagingFolder](Documents& documents, const CallPointer& call) {
+         importDocument(documents, call, stagingFolder);
+       })},
+      {of, "ImportPath", "ays", {"path", "parent"}, item, {"item"}, lane, importPath},
+      {of,
+       "CreateDirectory",
+       "ssa{sv}",
+       {"name", "parent", "options"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(createDirectory)},
+      {of,
+       "Rename",
+       "ssa{sv}",
+       {"itemIdentifier", "name", "options"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(renameItem)},
+      {of,
+       "Reparent",
+       "ssa{sv}",
+       {"itemIdentifier", "parent", "options"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(reparent)},
+      {of, "Delete", "s", {"itemIdentifier"}, "", {}, lane, onDocuments(deleteItem)},
+      {of, "Trash", "s", {"itemIdentifier"}, item, {"item"}, lane, onDocuments(trash)},
+      {of,
+       "Restore",
+       "sa{sv}",
+       {"itemIdentifier", "options"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(restore)},
+      {of,
+       "SetLastUsedDate",
+       "ss",
+       {"itemIdentifier", "date"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(setLastUsedDate)},
+      {of,
+       "SetTags",
+       "sas",
+       {"itemIdentifier", "labels"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(setTags)},
+      {of,
+       "SetTagData",
+       "say",
+       {"itemIdentifier", "tagData"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(setTagData)},
+      {of,
+       "SetFavoriteRank",
+       "sv",
+       {"itemIdentifier", "rank"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(setFavoriteRank)},
+      {of,
+       "ClearFavoriteRank",
+       "s",
+       {"itemIdentifier"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(clearFavoriteRank)},
+  };
+}
+
+}  // namespace mirabel::bus

@@ -1,0 +1,251 @@
+#include <cerrno>
+#include <utility>
+
+#include "host/bus/BusCall.h"
+#include "host/bus/BusNames.h"
+#include "host/search/SearchQuery.h"
+#include "platform/EnumerationObservers.h"
+
+namespace mirabel::bus {
+namespace {
+
+using CallPointer = std::shared_ptr<BusCall>;
+
+constexpr std::uint32_t largestIcon = 4096;
+constexpr std::uint32_t mostFound = 10'000;
+
+void getItem(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents != nullptr) call->reply(documents->item(call->argument<std::string>()));
+}
+
+void getItemAtPath(const CallPointer& call) {
+  Documents* documents = call->allDocuments();
+  if (documents == nullptr) return;
+  call->reply(documents->itemAtPath(std::string(stringView(call->argument<Data>()))));
+}
+
+/// The container that the first argument names; null, and the call is answered, where it can't be
+/// had.
+DocumentContainer* containerOf(const CallPointer& call) {
+  if (call->documents() == nullptr) return nullptr;
+  const auto container = call->caller().container(call->argument<std::string>());
+  if (container) return *container;
+  call->fail(container.error());
+  return nullptr;
+}
+
+void listItems(const CallPointer& call) {
+  DocumentContainer* container = containerOf(call);
+  if (container == nullptr) return;
+  Data page = call->argument<Data>();
+  if (page.empty()) page = dataFromString(VesselInitialPageSortedByName);
+  const auto answer = container->items(page);
+  if (!answer) return call->fail(answer.error());
+  call->reply([&](sdbus::Message& reply) {
+    write(reply, answer->items);
+    write(reply, answer->nextPage.value_or(Data()));
+  });
+}
+
+void getCurrentSyncAnchor(const CallPointer& call) {
+  DocumentContainer* container = containerOf(call);
+  if (container == nullptr) return;
+  const auto anchor = container->currentSyncAnchor();
+  if (!anchor) return call->fail(anchor.error());
+  call->reply([&](sdbus::Message& reply) { write(reply, *anchor); });
+}
+
+void enumerateChanges(const CallPointer& call) {
+  DocumentContainer* container = containerOf(call);
+  if (container == nullptr) return;
+  const auto changes = container->changes(call->argument<Data>());
+  if (!changes) return call->fail(changes.error());
+  call->reply([&](sdbus::Message& reply) {
+    write(reply, changes->updated);
+    write(reply, changes->deleted);
+    write(reply, changes->anchor);
+    reply << changes->moreComing;
+  });
+}
+
+void watch(const CallPointer& call, const Signaller& signaller) {
+  if (call->documents() == nullptr) return;
+  const auto container = call->argument<std::string>();
+  const auto watching = call->caller().watch(
+      container,
+      [signaller, container, name = call->caller().name()] { signaller(name, container); });
+  if (!watching) return call->fail(watching.error());
+  call->reply();
+}
+
+void unwatch(const CallPointer& call) {
+  if (call->documents() == nullptr) return;
+  call->caller().unwatch(call->argument<std::string>());
+  call->reply();
+}
+
+void openItem(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents == nullptr) return;
+  const auto identifier = call->argument<std::string>();
+  const auto mode = call->argument<std::string>();
+  if (mode != "r" && mode != "rw") {
+    return call->fail(
+        sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", "the mode is \"r\" or \"rw\""));
+  }
+  auto file = documents->openFile(
+      identifier, mode == "r" ? Documents::Access::reading : Documents::Access::readingAndWriting);
+  if (!file) return call->fail(file.error());
+  const sdbus::UnixFd handedOut(file->release(), sdbus::adopt_fd);
+  call->reply([&](sdbus::Message& reply) { reply << handedOut; });
+}
+
+void getIcon(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents == nullptr) return;
+  const auto identifier = call->argument<std::string>();
+  const auto side = call->argument<std::uint32_t>();
+  if (side < 1 || side > largestIcon) return call->fail(Error::posix(EINVAL, "1 to 4096 pixels"));
+  const auto picture = documents->icon(identifier, side);
+  if (!picture) return call->fail(picture.error());
+  call->reply([&](sdbus::Message& reply) { write(reply, picture->value_or(Data())); });
+}
+
+void getDefaultContainer(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents == nullptr) return;
+  const auto container = documents->applicationContainer(call->argument<std::string>());
+  if (!container) return call->fail(container.error());
+  call->reply([&](sdbus::Message& reply) {
+    write(reply, container->item);
+    reply << container->isAppLibrary;
+  });
+}
+
+void listAppLibraries(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents != nullptr) call->reply(documents->appLibraries());
+}
+
+std::optional<Date> dateOption(const Options& options, const std::string& key) {
+  const auto text = textOption(options, key);
+  return text ? Date::fromRFC3339(*text) : std::nullopt;
+}
+
+/// What of the options is wanted and can't be understood.
+std::optional<std::string> misunderstood(const Options& options) {
+  for (const std::string key : {"modifiedSince", "modifiedBefore"})
+    if (options.contains(key) && !dateOption(options, key))
+      return key + " is no date in RFC 3339 form";
+  return {};
+}
+
+SearchQuery queryOf(std::vector<std::string> words, const Options& options) {
+  SearchQuery query;
+  query.words = std::move(words);
+  if (const auto tags = options.find("tags");
+      tags != options.end() && tags->second.containsValueOfType<std::vector<std::string>>())
+    query.tags = tags->second.get<std::vector<std::string>>();
+  query.type = textOption(options, "type");
+  query.modifiedSince = dateOption(options, "modifiedSince");
+  query.modifiedBefore = dateOption(options, "modifiedBefore");
+  if (const auto trashed = options.find("includesTrashed");
+      trashed != options.end() && trashed->second.containsValueOfType<bool>())
+    query.includesTrashed = trashed->second.get<bool>();
+  if (const auto limit = options.find("limit");
+      limit != options.end() && limit->second.containsValueOfType<std::uint32_t>())
+    query.limit = std::min(limit->second.get<std::uint32_t>(), mostFound);
+  return query;
+}
+
+void search(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents == nullptr) return;
+  auto words = call->argument<std::vector<std::string>>();
+  const auto options = call->argument<Options>();
+  if (const auto what = misunderstood(options)) {
+    return call->fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", *what));
+  }
+  call->reply(documents->search(queryOf(std::move(words), options)));
+}
+
+void getRecent(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents == nullptr) return;
+  call->reply(documents->recent(std::min(call->argument<std::uint32_t>(), mostFound)));
+}
+
+void getFavorites(const CallPointer& call) {
+  Documents* documents = call->documents();
+  if (documents == nullptr) return;
+  call->reply(documents->favorites(std::min(call->argument<std::uint32_t>(), mostFound)));
+}
+
+}  // namespace
+
+std::vector<BusMethod> providerMethods(Signaller signaller) {
+  constexpr const char* of = providerInterface;
+  constexpr const char* item = "a{sv}";
+  constexpr const char* items = "aa{sv}";
+  return {
+      {of, "GetItem", "s", {"itemIdentifier"}, item, {"item"}, Lane::lookups, getItem},
+      {of, "GetItemAtPath", "ay", {"path"}, item, {"item"}, Lane::lookups, getItemAtPath},
+      {of,
+       "ListItems",
+       "say",
+       {"container", "page"},
+       "aa{sv}ay",
+       {"items", "nextPage"},
+       Lane::enumerations,
+       listItems},
+      {of,
+       "GetCurrentSyncAnchor",
+       "s",
+       {"container"},
+       "ay",
+       {"anchor"},
+       Lane::enumerations,
+       getCurrentSyncAnchor},
+      {of,
+       "EnumerateChanges",
+       "say",
+       {"container", "anchor"},
+       "aa{sv}asayb",
+       {"updated", "deleted", "anchor", "moreComing"},
+       Lane::enumerations,
+       enumerateChanges},
+      {of,
+       "Watch",
+       "s",
+       {"container"},
+       "",
+       {},
+       Lane::enumerations,
+       [signaller = std::move(signaller)](const CallPointer& call) { watch(call, signaller); }},
+      {of, "Unwatch", "s", {"container"}, "", {}, Lane::enumerations, unwatch},
+      {of, "OpenItem", "ss", {"itemIdentifier", "mode"}, "h", {"file"}, Lane::lookups, openItem},
+      {of,
+       "GetIcon",
+       "su",
+       {"itemIdentifier", "side"},
+       "ay",
+       {"picture"},
+       Lane::enumerations,
+       getIcon},
+      {of,
+       "GetDefaultContainer",
+       "s",
+       {"bundleIdentifier"},
+       "a{sv}b",
+       {"item", "isAppLibrary"},
+       Lane::lookups,
+       getDefaultContainer},
+      {of, "ListAppLibraries", "", {}, items, {"items"}, Lane::enumerations, listAppLibraries},
+      {of, "Search", "asa{sv}", {"words", "options"}, items, {"items"}, Lane::enumerations, search},
+      {of, "GetRecent", "u", {"limit"}, items, {"items"}, Lane::enumerations, getRecent},
+      {of, "GetFavorites", "u", {"limit"}, items, {"items"}, Lane::enumerations, getFavorites},
+  };
+}
+
+}  // namespace mirabel::bus

@@ -1,0 +1,287 @@
+#include "host/bus/RemoteDocuments.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <utility>
+
+#include "host/bus/BusConnection.h"
+#include "host/bus/BusItems.h"
+#include "host/bus/BusNames.h"
+#include "host/bus/RemoteWatches.h"
+
+namespace mirabel::bus {
+namespace {
+
+using Write = BusConnection::Write;
+
+/// Writes arguments that the bus has types for.
+template <class... Arguments>
+Write arguments(const Arguments&... values) {
+  return [values...](sdbus::Message& call) { (call << ... << values); };
+}
+
+std::uint32_t limited(std::size_t limit) {
+  return static_cast<std::uint32_t>(std::min<std::size_t>(limit, UINT32_MAX));
+}
+
+/// A name for arguments "sa{sv}" at the end of others: as text, or as bytes in the options.
+struct NameArgument {
+  explicit NameArgument(const std::string& name) {
+    setNameOption(options, "name", name);
+    text = textOption(options, "name").value_or("");
+    options.erase("name");
+  }
+  std::string text;
+  Options options;
+};
+
+/// A container that is asked for with each question.
+class RemoteContainer final : public DocumentContainer {
+ public:
+  RemoteContainer(std::shared_ptr<BusConnection> connection, std::string identifier)
+      : connection_(std::move(connection)), identifier_(std::move(identifier)) {}
+
+  Result<ItemPage> items(const Data& page) override {
+    return connection_->call(providerInterface, "ListItems", arguments(identifier_, page),
+                             [](sdbus::Message& reply) {
+                               ItemPage answer;
+                               answer.items = readItems(reply);
+                               Data next = readBytes(reply);
+                               if (!next.empty()) answer.nextPage = std::move(next);
+                               return answer;
+                             });
+  }
+  Result<ItemChanges> changes(const Data& anchor) override {
+    return connection_->call(providerInterface, "EnumerateChanges", arguments(identifier_, anchor),
+                             [](sdbus::Message& reply) {
+                               ItemChanges answer;
+                               answer.updated = readItems(reply);
+                               reply >> answer.deleted;
+                               answer.anchor = readBytes(reply);
+                               reply >> answer.moreComing;
+                               return answer;
+                             });
+  }
+  Result<Data> currentSyncAnchor() override {
+    return connection_->call(providerInterface, "GetCurrentSyncAnchor", arguments(identifier_),
+                             readBytes);
+  }
+
+ private:
+  std::shared_ptr<BusConnection> connection_;
+  std::string identifier_;
+};
+
+/// Begins an operation that hands back the item.
+void begin(BusConnection& connection, const char* method, const Write& write,
+           Documents::ItemHandler handler) {
+  connection.callAsync(operationsInterface, method, write,
+                       [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
+                         if (reply == nullptr) return handler(fail(error));
+                         handler(readItem(*reply));
+                       });
+}
+
+void beginWithoutItem(BusConnection& connection, const char* interface, const char* method,
+                      const Write& write, Documents::ErrorHandler handler) {
+  connection.callAsync(interface, method, write,
+                       [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
+                         handler(reply == nullptr ? std::optional(error) : std::nullopt);
+                       });
+}
+
+}  // namespace
+
+std::unique_ptr<RemoteDocuments> RemoteDocuments::connect(const HomePlaces& places) {
+  auto connection = BusConnection::open();
+  if (!connection) return nullptr;
+  const auto served = connection->call(managerInterface, "GetHome", {}, [](sdbus::Message& reply) {
+    HomePlaces answer;
+    answer.home = stringView(readBytes(reply));
+    answer.stateFolder = stringView(readBytes(reply));
+    return answer;
+  });
+  if (!served || *served != places) return nullptr;
+  return std::unique_ptr<RemoteDocuments>(new RemoteDocuments(std::move(connection), places));
+}
+
+RemoteDocuments::RemoteDocuments(std::shared_ptr<BusConnection> connection, HomePlaces places)
+    : connection_(std::move(connection)),
+      watches_(std::make_shared<RemoteWatches>(*connection_)),
+      places_(std::move(places)) {
+  connection_->listen(
+      [watches = watches_](const std::string& container) { watches->signalled(container); },
+      [watches = watches_](bool isThere) { watches->serviceMoved(isThere); });
+}
+
+RemoteDocuments::~RemoteDocuments() = default;
+
+Documents::ItemResult RemoteDocuments::item(std::string_view identifier) {
+  return connection_->call(providerInterface, "GetItem", arguments(std::string(identifier)),
+                           readItem);
+}
+
+Documents::ItemResult RemoteDocuments::itemAtPath(const std::string& path) {
+  return connection_->call(providerInterface, "GetItemAtPath", arguments(dataFromString(path)),
+                           readItem);
+}
+
+Result<std::unique_ptr<DocumentContainer>> RemoteDocuments::container(std::string_view identifier) {
+  return std::make_unique<RemoteContainer>(connection_, std::string(identifier));
+}
+
+Result<std::unique_ptr<ContainerWatch>> RemoteDocuments::watch(std::string_view identifier,
+                                                               std::function<void()> changed) {
+  return RemoteWatches::add(watches_, std::string(identifier), std::move(changed));
+}
+
+Result<UniqueFd> RemoteDocuments::openFile(std::string_view identifier, Access access) {
+  const std::string mode = access == Access::reading ? "r" : "rw";
+  return connection_->call(providerInterface, "OpenItem", arguments(std::string(identifier), mode),
+                           [](sdbus::Message& reply) {
+                             sdbus::UnixFd file;
+                             reply >> file;
+                             return UniqueFd(file.release());
+                           });
+}
+
+void RemoteDocuments::importDocument(const std::string& source, const std::string& parent,
+                                     ItemHandler handler) {
+  begin(*connection_, "ImportPath", arguments(dataFromString(source), parent), std::move(handler));
+}
+
+void RemoteDocuments::createDirectory(const std::string& name, const std::string& parent,
+                                      ItemHandler handler) {
+  const NameArgument named(name);
+  begin(*connection_, "CreateDirectory", arguments(named.text, parent, named.options),
+        std::move(handler));
+}
+
+void RemoteDocuments::rename(const std::string& identifier, const std::string& name,
+                             ItemHandler handler) {
+  const NameArgument named(name);
+  begin(*connection_, "Rename", arguments(identifier, named.text, named.options),
+        std::move(handler));
+}
+
+void RemoteDocuments::reparent(const std::string& identifier, const std::string& parent,
+                               const std::optional<std::string>& newName, ItemHandler handler) {
+  Options options;
+  if (newName) setNameOption(options, "name", *newName);
+  begin(*connection_, "Reparent", arguments(identifier, parent, options), std::move(handler));
+}
+
+void RemoteDocuments::remove(const std::string& identifier, ErrorHandler handler) {
+  beginWithoutItem(*connection_, operationsInterface, "Delete", arguments(identifier),
+                   std::move(handler));
+}
+
+void RemoteDocuments::trash(const std::string& identifier, ItemHandler handler) {
+  begin(*connection_, "Trash", arguments(identifier), std::move(handler));
+}
+
+void RemoteDocuments::restore(const std::string& identifier,
+                              const std::optional<std::string>& parent, ItemHandler handler) {
+  Options options;
+  if (parent) options["parent"] = sdbus::Variant(*parent);
+  begin(*connection_, "Restore", arguments(identifier, options), std::move(handler));
+}
+
+void RemoteDocuments::setLastUsedDate(const std::string& identifier,
+                                      const std::optional<Date>& date, ItemHandler handler) {
+  const std::string text = date ? date->rfc3339() : std::string();
+  begin(*connection_, "SetLastUsedDate", arguments(identifier, text), std::move(handler));
+}
+
+void RemoteDocuments::setTagData(const std::string& identifier, const std::optional<Data>& tagData,
+                                 ItemHandler handler) {
+  begin(*connection_, "SetTagData", arguments(identifier, tagData.value_or(Data())),
+        std::move(handler));
+}
+
+void RemoteDocuments::setFavoriteRank(const std::string& identifier,
+                                      const std::optional<Number>& rank, ItemHandler handler) {
+  if (!rank) {
+    return begin(*connection_, "ClearFavoriteRank", arguments(identifier), std::move(handler));
+  }
+  const auto variant =
+      std::visit([](const auto& value) { return sdbus::Variant(value); }, rank->value);
+  begin(*connection_, "SetFavoriteRank", arguments(identifier, variant), std::move(handler));
+}
+
+Result<TrashFindings> RemoteDocuments::itemsTrashedBefore(const Date& date) {
+  return connection_->call(managerInterface, "FindTrashedItems", arguments(date.rfc3339()),
+                           [](sdbus::Message& reply) {
+                             TrashFindings found;
+                             found.old = readTrashedItems(reply);
+                             reply >> found.undated;
+                             return found;
+                           });
+}
+
+void RemoteDocuments::removeItemsTrashedBefore(const Date& date, ErrorHandler handler) {
+  beginWithoutItem(*connection_, managerInterface, "RemoveTrashedItems", arguments(date.rfc3339()),
+                   std::move(handler));
+}
+
+Progress RemoteDocuments::progress() {
+  const auto progress =
+      connection_->call(managerInterface, "GetProgress", {}, [](sdbus::Message& reply) {
+        Progress answer;
+        reply >> answer.entriesCopied >> answer.bytesCopied >> answer.entriesRemoved;
+        return answer;
+      });
+  return progress.value_or(Progress());
+}
+
+Result<std::vector<ItemRecord>> RemoteDocuments::appLibraries() {
+  return connection_->call(providerInterface, "ListAppLibraries", {}, readItems);
+}
+
+Result<ApplicationContainer> RemoteDocuments::applicationContainer(const std::string& bundle) {
+  return connection_->call(providerInterface, "GetDefaultContainer", arguments(bundle),
+                           [](sdbus::Message& reply) {
+                             ApplicationContainer container;
+                             container.item = readItem(reply);
+                             reply >> container.isAppLibrary;
+                             return container;
+                           });
+}
+
+Result<std::optional<Data>> RemoteDocuments::icon(const std::string& identifier,
+                                                  std::uint32_t side) {
+  return connection_->call(
+      providerInterface, "GetIcon", arguments(identifier, side), [](sdbus::Message& reply) {
+        Data picture = readBytes(reply);
+        return picture.empty() ? std::nullopt : std::optional(std::move(picture));
+      });
+}
+
+Result<std::vector<ItemRecord>> RemoteDocuments::search(const SearchQuery& query) {
+  Options options;
+  if (!query.tags.empty()) options["tags"] = sdbus::Variant(query.tags);
+  if (query.type) options["type"] = sdbus::Variant(*query.type);
+  if (query.modifiedSince) {
+    options["modifiedSince"] = sdbus::Variant(query.modifiedSince->rfc3339());
+  }
+  if (query.modifiedBefore) {
+    options["modifiedBefore"] = sdbus::Variant(query.modifiedBefore->rfc3339());
+  }
+  options["includesTrashed"] = sdbus::Variant(query.includesTrashed);
+  options["limit"] = sdbus::Variant(limited(query.limit));
+  return connection_->call(providerInterface, "Search", arguments(query.words, options), readItems);
+}
+
+Result<std::vector<ItemRecord>> RemoteDocuments::recent(std::size_t limit) {
+  return connection_->call(providerInterface, "GetRecent", arguments(limited(limit)), readItems);
+}
+
+Result<std::vector<ItemRecord>> RemoteDocuments::favorites(std::size_t limit) {
+  return connection_->call(providerInterface, "GetFavorites", arguments(limited(limit)), readItems);
+}
+
+Result<StatusReport> RemoteDocuments::status() {
+  return connection_->call(managerInterface, "GetStatus", {}, readStatus);
+}
+
+}  // namespace mirabel::bus

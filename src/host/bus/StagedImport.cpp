@@ -1,0 +1,104 @@
+#include "host/bus/StagedImport.h"
+
+#include <array>
+#include <cerrno>
+#include <cstdlib>
+#include <fcntl.h>
+#include <filesystem>
+#include <sys/stat.h>
+#include <system_error>
+#include <unistd.h>
+
+#include "linux/kernel/UniqueFd.h"
+
+namespace mirabel::bus {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr std::size_t longestName = 255;
+constexpr std::size_t pieceSize = 1 << 20;
+
+Result<void> requireReadableFile(int file) {
+  struct stat status {};
+  if (::fstat(file, &status) != 0) return fail(Error::posix(errno));
+  if (S_ISDIR(status.st_mode)) return fail(Error::posix(EISDIR));
+  if (!S_ISREG(status.st_mode)) return fail(Error::posix(ENOTSUP));
+  const int flags = ::fcntl(file, F_GETFL);
+  const bool isReadable = flags >= 0 && (flags & O_PATH) == 0 && (flags & O_ACCMODE) != O_WRONLY;
+  if (!isReadable) return fail(Error::posix(EBADF, "the file is not open for reading"));
+  return {};
+}
+
+Result<void> requireName(const std::string& name) {
+  if (name.empty() || name == "." || name == ".." ||
+      name.find_first_of(std::string_view("/\0", 2)) != std::string::npos)
+    return fail(Error::posix(EINVAL));
+  if (name.size() > longestName) return fail(Error::posix(ENAMETOOLONG));
+  return {};
+}
+
+Result<void> writeAll(int to, const char* bytes, std::size_t count) {
+  while (count > 0) {
+    const ssize_t written = ::write(to, bytes, count);
+    if (written < 0 && errno == EINTR) continue;
+    if (written < 0) return fail(Error::posix(errno));
+    bytes += written;
+    count -= static_cast<std::size_t>(written);
+  }
+  return {};
+}
+
+// The kernel copies by itself where both files are on one volume, and shares blocks where it can.
+Result<void> copyAll(int from, int to) {
+  off_t position = 0;
+  while (true) {
+    const ssize_t count = ::copy_file_range(from, &position, to, nullptr, std::size_t{1} << 30, 0);
+    if (count == 0) break;
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) break;
+  }
+  // It also says nothing of files that the kernel makes up as they are read.
+  std::string piece(pieceSize, '\0');
+  while (true) {
+    const ssize_t count = ::pread(from, piece.data(), piece.size(), position);
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return fail(Error::posix(errno));
+    if (count == 0) return {};
+    if (auto written = writeAll(to, piece.data(), static_cast<std::size_t>(count)); !written)
+      return written;
+    position += count;
+  }
+}
+
+}  // namespace
+
+Result<StagedImport> StagedImport::of(int file, const std::string& name,
+                                      const std::string& stagingFolder) {
+  if (auto readable = requireReadableFile(file); !readable) return fail(readable.error());
+  if (auto named = requireName(name); !named) return fail(named.error());
+  if (::mkdir(stagingFolder.c_str(), 0700) != 0 && errno != EEXIST)
+    return fail(Error::posix(errno));
+  std::string folder = stagingFolder + "/XXXXXX";
+  if (::mkdtemp(folder.data()) == nullptr) return fail(Error::posix(errno));
+  StagedImport staged;
+  staged.folder_ = folder;
+  staged.path_ = folder + "/" + name;
+  const UniqueFd copy(
+      ::open(staged.path_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
+  if (!copy) return fail(Error::posix(errno));
+  if (auto copied = copyAll(file, copy.get()); !copied) return fail(copied.error());
+  return staged;
+}
+
+StagedImport::~StagedImport() {
+  std::error_code ignored;
+  if (!folder_.empty()) fs::remove_all(folder_, ignored);
+}
+
+void StagedImport::clear(const std::string& stagingFolder) {
+  std::error_code ignored;
+  fs::remove_all(stagingFolder, ignored);
+}
+
+}  // namespace mirabel::bus

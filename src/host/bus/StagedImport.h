@@ -1,0 +1,37 @@
+#pragma once
+
+#include <string>
+#include <utility>
+
+#include "foundation/Error.h"
+
+namespace mirabel::bus {
+
+/// What came as an open file, copied to where it can be imported from under its name. It is read
+/// through the descriptor alone, so that a caller gets in what it could read, and nothing else. The
+/// copy goes with this; what a crash leaves is cleared when the service starts.
+class StagedImport {
+ public:
+  /// `file` is left open, with its position where it was. POSIX errors: EBADF where it is not open
+  /// for reading, EISDIR, ENOTSUP for what is no regular file; EINVAL and ENAMETOOLONG for the
+  /// name; those of writing.
+  [[nodiscard]] static Result<StagedImport> of(int file, const std::string& name,
+                                               const std::string& stagingFolder);
+  StagedImport(StagedImport&& other) noexcept : folder_(std::exchange(other.folder_, {})) {
+    path_.swap(other.path_);
+  }
+  StagedImport& operator=(StagedImport&&) = delete;
+  ~StagedImport();
+
+  [[nodiscard]] const std::string& path() const { return path_; }
+
+  /// Removes what is left of others; there must be none.
+  static void clear(const std::string& stagingFolder);
+
+ private:
+  StagedImport() = default;
+  std::string folder_;  ///< of its own; empty when there is nothing to remove
+  std::string path_;
+};
+
+}  // namespace mirabel::bus
