@@ -82,5 +82,6 @@ void runPagesBenchmarks(const Scale& scale);
 void runFollowingBenchmarks(const Scale& scale);
 void runOperationBenchmarks(const Scale& scale);
 void runApplicationsBenchmarks(const Scale& scale);
+void runServiceBenchmarks(const Scale& scale);
 
 }  // namespace mirabel::bench

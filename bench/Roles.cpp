@@ -15,6 +15,8 @@
 
 #include "BenchTree.h"
 #include "Following.h"
+#include "host/LocalDocuments.h"
+#include "host/bus/BusService.h"
 
 namespace mirabel::bench {
 namespace {
@@ -126,6 +128,17 @@ void list(const std::string& home, std::size_t files) {
   });
 }
 
+void serveOnBus(const std::string& home) {
+  LinuxPlatform::Options options;
+  options.home = home;
+  auto documents = LocalDocuments::open(std::move(options)).value();
+  const auto service = bus::BusService::start(*documents, [] {}).value();
+  documents->keepSearching();
+  serve([] { return std::string(); });
+  service->stop();
+  documents.reset();
+}
+
 }  // namespace
 
 int runRole(const std::vector<std::string>& arguments) {
@@ -138,6 +151,8 @@ int runRole(const std::vector<std::string>& arguments) {
     serve([&] { return std::to_string(reader.drain()); });
   } else if (role == "write") {
     write(BenchTree(arguments.at(1), number(2), number(3)));
+  } else if (role == "serve") {
+    serveOnBus(arguments.at(1));
   } else if (role == "list") {
     list(arguments.at(1), number(2));
   } else {

@@ -14,6 +14,7 @@ namespace mirabel::bench {
 ///   drain FOLDER             a bare reader of the kernel's queue, with a mark on each folder; a
 ///                            line drains it: the number of records so far
 ///   write FOLDER FOLDERS FILES  a line has each file written over: the seconds that it took
+///   serve HOME               serves it on the session bus until the input ends
 ///   list HOME FILES           a line has everything listed: resident KiB after the first tenth of
 ///                            the items, and at the end
 ///

@@ -29,6 +29,7 @@ int run(int count, char** arguments) {
   mirabel::bench::runFollowingBenchmarks(scale);
   mirabel::bench::runOperationBenchmarks(scale);
   mirabel::bench::runApplicationsBenchmarks(scale);
+  mirabel::bench::runServiceBenchmarks(scale);
   return 0;
 }
 
