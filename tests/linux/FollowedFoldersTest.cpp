@@ -1,4 +1,7 @@
+#include <fcntl.h>
 #include <filesystem>
+#include <functional>
+#include <gmock/gmock.h>
 #include <limits>
 #include <map>
 #include <optional>
@@ -39,6 +42,14 @@ class FollowedFoldersTest : public VolumeFixture,
   std::uint32_t documentAt(const std::string& path) {
     const auto seen = index().learnPath(path, statusOf(path).value(), false);
     return seen ? seen->documentID : 0;
+  }
+
+  void list(const std::string& folder, const std::vector<std::string>& names) {
+    const UniqueFd opened(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    std::vector<Sighting> sightings;
+    for (const std::string& name : names)
+      sightings.push_back({name, statusAt(opened.get(), name).value()});
+    EXPECT_TRUE(index().learn(folder, opened.get(), sightings));
   }
 
   /// The paths that were told since, below the folder of all, and the documents that are gone.
@@ -100,6 +111,39 @@ TEST_P(FollowedFoldersTest, WhatComesAndGoesWithThemIsTold) {
   EXPECT_EQ(index().lastEventUnder(1), between);
   EXPECT_EQ(index().lastEventUnder(2), last);
   EXPECT_EQ(index().lastEventUnder(3), noLater);
+}
+
+// As whoever reads of what left does: a client that has not heard of it yet.
+TEST_P(FollowedFoldersTest, WhatWasLookedAtWhileNobodyFollowedThemIsToldWhenTheyCome) {
+  const std::string library = libraryOf("one");
+  fs::create_hard_link(library + "/sub/a.txt", path("linked.txt"));
+  fs::create_hard_link(library + "/sub/a.txt", library + "/linked.txt");
+  auto expected = contentsOf("one");
+  expected.insert("apps/one/Documents/linked.txt");
+  const std::function<void()> looks[] = {
+      [&] {
+        for (const char* place : {"/sub/a.txt", "/sub", "/linked.txt", ""})
+          documentAt(library + place);
+      },
+      [&] {
+        for (const char* place : {"", "/linked.txt", "/sub", "/sub/a.txt"})
+          documentAt(library + place);
+      },
+      [&] {
+        list(library, {"sub", "linked.txt"}), list(library + "/sub", {"a.txt"});
+      },
+  };
+  std::uint64_t version = 0;
+  for (const auto& look : looks) {
+    follow({{library, "One"}}, ++version);
+    anchor();
+    follow({}, ++version);
+    look();
+    const std::uint64_t since = anchor();
+    follow({{library, "One"}}, ++version);
+    EXPECT_THAT(toldSince(since).paths, ::testing::IsSupersetOf(expected));
+    EXPECT_EQ(index().pathsOfFileID(inode("linked.txt")).value().size(), 3u);
+  }
 }
 
 TEST_P(FollowedFoldersTest, AreKnownToTheNextProcess) {

@@ -299,4 +299,23 @@ Result<void> Learner::leave(ObjectRow row) {
   return store_.put(row);
 }
 
+Result<void> Learner::leaveOutside(const std::string& path) {
+  const auto isMeant = [&](const std::string& name) {
+    return name == path || name.starts_with(path + "/");
+  };
+  auto links = store_.linksIn(0);
+  if (!links) return fail(links.error());
+  for (const auto& [name, slot] : *links) {
+    if (!isMeant(name)) continue;
+    if (auto removed = store_.removeLink(0, name); !removed) return removed;
+  }
+  auto outside = store_.childrenOf(0);
+  if (!outside) return fail(outside.error());
+  for (ObjectRow& row : *outside) {
+    if (!isMeant(row.location->name)) continue;
+    if (auto left = leave(std::move(row)); !left) return left;
+  }
+  return {};
+}
+
 }  // namespace mirabel

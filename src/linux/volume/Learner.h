@@ -64,6 +64,9 @@ class Learner final : private FolderIdentities {
   /// Takes in that the object is not at its place, nor anywhere that was looked at: it goes on
   /// under another of its names, or is detached.
   [[nodiscard]] Result<void> leave(ObjectRow row);
+  /// The folder at `path`, which becomes a root, with all below it, is nowhere as yet: what was
+  /// learned of it before, by its whole path, was of no concern to those who are told of it now.
+  [[nodiscard]] Result<void> leaveOutside(const std::string& path);
   /// File ID of the object that holds the document now.
   [[nodiscard]] Result<std::optional<std::uint64_t>> holderOf(std::uint32_t documentID);
 

@@ -193,6 +193,9 @@ class StoredVolumeIndex final : public VolumeIndex {
       for (const std::string& path : difference.gone) {
         if (auto left = leaveRoot(path); !left) return left;
       }
+      for (const std::string& path : difference.come) {
+        if (auto left = learner_.leaveOutside(path); !left) return left;
+      }
       for (const std::string& path : difference.relabelled) {
         if (auto told = tellOfRoot(path); !told) return told;
       }
