@@ -1,6 +1,5 @@
 #include "linux/watch/FanotifyRecords.h"
 
-#include <algorithm>
 #include <cstring>
 #include <sys/fanotify.h>
 
@@ -73,9 +72,9 @@ bool decodeRecord(std::span<const std::byte> bytes, FanotifyRecord& record) {
   return true;
 }
 
-// A file that is written to has a record for each write.
+// A file that is written to has a record for each write, mostly one after the other.
 void note(std::string_view object, Look& look) {
-  if (object.empty() || std::ranges::find(look.objects, object) != look.objects.end()) return;
+  if (object.empty() || (!look.objects.empty() && look.objects.back() == object)) return;
   look.objects.emplace_back(object);
 }
 
