@@ -408,6 +408,17 @@ std::vector<TrashedItem> readTrashedItems(sdbus::Message& message) {
   return items;
 }
 
+std::optional<std::string> mistypedOption(const Options& options,
+                                          std::initializer_list<KnownOption> known) {
+  for (const auto& [key, signature] : known) {
+    const auto found = options.find(std::string(key));
+    if (found == options.end() || found->second.peekValueType() == signature) continue;
+    return "the option \"" + std::string(key) + "\" takes a value of type " +
+           std::string(signature);
+  }
+  return {};
+}
+
 std::optional<std::string> textOption(const Options& options, const std::string& key) {
   const auto found = options.find(key);
   if (found == options.end() || !found->second.containsValueOfType<std::string>()) return {};

@@ -76,9 +76,12 @@ class BusService::Impl {
         add(std::move(method));
     }
     object_->registerSignal(providerInterface, "EnumeratorSignaled", "s", {"container"});
-    object_->registerProperty(managerInterface, "Version", "s", [](sdbus::PropertyGetReply& reply) {
+    sdbus::Flags constant;
+    constant.set(sdbus::Flags::CONST_PROPERTY_VALUE);
+    const auto tellVersion = [](sdbus::PropertyGetReply& reply) {
       reply << std::string(MIRABEL_VERSION);
-    });
+    };
+    object_->registerProperty(managerInterface, "Version", "s", tellVersion, constant);
     object_->finishRegistration();
   }
 

@@ -34,39 +34,53 @@ auto onDocuments(Operation operation) {
   };
 }
 
-/// A name that stands as text before its options, where its bytes may be.
-std::string nameWith(const Options& options, std::string text) {
-  return nameOption(options, "name").value_or(std::move(text));
+/// The last argument; nothing, and the call is answered, where an option has another type than it
+/// must have: what it asks for would silently not be done.
+std::optional<Options> optionsOf(const CallPointer& call,
+                                 std::initializer_list<KnownOption> known) {
+  auto options = call->argument<Options>();
+  const auto mistyped = mistypedOption(options, known);
+  if (!mistyped) return options;
+  invalidArgument(call, *mistyped);
+  return {};
+}
+
+/// A name that stands as text before the options, where its bytes may be; nothing as there.
+std::optional<std::string> nameOf(const CallPointer& call, std::string text) {
+  const auto options = optionsOf(call, {{"name", "s"}, {"nameBytes", "ay"}});
+  if (!options) return {};
+  return nameOption(*options, "name").value_or(std::move(text));
 }
 
 void createDirectory(Documents& documents, const CallPointer& call) {
-  auto name = call->argument<std::string>();
+  auto text = call->argument<std::string>();
   const auto parent = call->argument<std::string>();
-  name = nameWith(call->argument<Options>(), std::move(name));
-  documents.createDirectory(name, parent, answering(call));
+  const auto name = nameOf(call, std::move(text));
+  if (name) documents.createDirectory(*name, parent, answering(call));
 }
 
 void renameItem(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
-  auto name = call->argument<std::string>();
-  name = nameWith(call->argument<Options>(), std::move(name));
-  documents.rename(item, name, answering(call));
+  auto text = call->argument<std::string>();
+  const auto name = nameOf(call, std::move(text));
+  if (name) documents.rename(item, *name, answering(call));
 }
 
 void reparent(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
   const auto parent = call->argument<std::string>();
-  const auto options = call->argument<Options>();
-  documents.reparent(item, parent, nameOption(options, "name"), answering(call));
+  const auto options = optionsOf(call, {{"name", "s"}, {"nameBytes", "ay"}});
+  if (options) documents.reparent(item, parent, nameOption(*options, "name"), answering(call));
 }
 
 void importDocument(Documents& documents, const CallPointer& call,
                     const std::string& stagingFolder) {
   const auto file = call->argument<sdbus::UnixFd>();
-  auto name = call->argument<std::string>();
+  auto text = call->argument<std::string>();
   const auto parent = call->argument<std::string>();
-  name = nameWith(call->argument<Options>(), std::move(name));
-  auto staged = StagedImport::of(file.get(), name, stagingFolder);
+  const auto name = nameOf(call, std::move(text));
+  if (!name) return;
+  auto staged = StagedImport::of(file.get(), *name, stagingFolder);
   if (!staged) return call->fail(staged.error());
   const auto kept = std::make_shared<StagedImport>(*std::move(staged));
   documents.importDocument(kept->path(), parent, [call, kept](const Documents::ItemResult& result) {
@@ -92,8 +106,8 @@ void trash(Documents& documents, const CallPointer& call) {
 
 void restore(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
-  const auto options = call->argument<Options>();
-  documents.restore(item, textOption(options, "parent"), answering(call));
+  const auto options = optionsOf(call, {{"parent", "s"}});
+  if (options) documents.restore(item, textOption(*options, "parent"), answering(call));
 }
 
 void setLastUsedDate(Documents& documents, const CallPointer& call) {

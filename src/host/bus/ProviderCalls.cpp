@@ -135,26 +135,31 @@ std::optional<Date> dateOption(const Options& options, const std::string& key) {
 
 /// What of the options is wanted and can't be understood.
 std::optional<std::string> misunderstood(const Options& options) {
+  if (auto mistyped = mistypedOption(options, {{"tags", "as"},
+                                               {"type", "s"},
+                                               {"modifiedSince", "s"},
+                                               {"modifiedBefore", "s"},
+                                               {"includesTrashed", "b"},
+                                               {"limit", "u"}}))
+    return mistyped;
   for (const std::string key : {"modifiedSince", "modifiedBefore"})
     if (options.contains(key) && !dateOption(options, key))
       return key + " is no date in RFC 3339 form";
   return {};
 }
 
+/// `options` are understood.
 SearchQuery queryOf(std::vector<std::string> words, const Options& options) {
   SearchQuery query;
   query.words = std::move(words);
-  if (const auto tags = options.find("tags");
-      tags != options.end() && tags->second.containsValueOfType<std::vector<std::string>>())
+  if (const auto tags = options.find("tags"); tags != options.end())
     query.tags = tags->second.get<std::vector<std::string>>();
   query.type = textOption(options, "type");
   query.modifiedSince = dateOption(options, "modifiedSince");
   query.modifiedBefore = dateOption(options, "modifiedBefore");
-  if (const auto trashed = options.find("includesTrashed");
-      trashed != options.end() && trashed->second.containsValueOfType<bool>())
+  if (const auto trashed = options.find("includesTrashed"); trashed != options.end())
     query.includesTrashed = trashed->second.get<bool>();
-  if (const auto limit = options.find("limit");
-      limit != options.end() && limit->second.containsValueOfType<std::uint32_t>())
+  if (const auto limit = options.find("limit"); limit != options.end())
     query.limit = std::min(limit->second.get<std::uint32_t>(), mostFound);
   return query;
 }
