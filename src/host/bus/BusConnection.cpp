@@ -15,15 +15,16 @@ namespace {
 constexpr std::uint64_t withoutTimeout = UINT64_MAX;
 constexpr std::chrono::milliseconds betweenLooks{500};
 
-bool isRunning(sdbus::IConnection& connection) {
-  bool hasOwner = false;
+/// Fails where nobody has the service's name.
+std::string ownerOfName(sdbus::IConnection& connection) {
+  std::string owner;
   const auto daemon =
       sdbus::createProxy(connection, "org.freedesktop.DBus", "/org/freedesktop/DBus");
-  daemon->callMethod("NameHasOwner")
+  daemon->callMethod("GetNameOwner")
       .onInterface("org.freedesktop.DBus")
       .withArguments(std::string(serviceName))
-      .storeResultsTo(hasOwner);
-  return hasOwner;
+      .storeResultsTo(owner);
+  return owner;
 }
 
 }  // namespace
@@ -36,7 +37,7 @@ std::shared_ptr<BusConnection> BusConnection::open() {
   try {
     std::shared_ptr<BusConnection> opened(new BusConnection);
     opened->connection_ = sdbus::createSessionBusConnection();
-    if (!isRunning(*opened->connection_)) return nullptr;
+    opened->setOwner(ownerOfName(*opened->connection_));
     opened->service_ = sdbus::createProxy(*opened->connection_, serviceName, objectPath);
     opened->loop_ = std::make_unique<BusLoop>(
         *opened->connection_, [connection = opened.get()] { connection->isLost_ = true; });
@@ -46,9 +47,24 @@ std::shared_ptr<BusConnection> BusConnection::open() {
   }
 }
 
+void BusConnection::setOwner(const std::string& uniqueName) {
+  const std::lock_guard lock(mutex_);
+  owner_ = nullptr;
+  if (uniqueName.empty()) return;
+  owners_.push_back(sdbus::createProxy(*connection_, uniqueName, objectPath));
+  owner_ = owners_.back().get();
+}
+
+sdbus::IProxy& BusConnection::owner() {
+  const std::lock_guard lock(mutex_);
+  if (owner_ != nullptr) return *owner_;
+  throw sdbus::Error("org.freedesktop.DBus.Error.ServiceUnknown", "the service has left");
+}
+
 sdbus::MethodReply BusConnection::send(const char* interface, const char* method,
                                        const Write& write) {
-  auto message = service_->createMethodCall(interface, method);
+  sdbus::IProxy& service = owner();
+  auto message = service.createMethodCall(interface, method);
   if (write) write(message);
   struct Answer {
     std::promise<void> isThere;
@@ -57,7 +73,7 @@ sdbus::MethodReply BusConnection::send(const char* interface, const char* method
   };
   const auto answer = std::make_shared<Answer>();
   auto isThere = answer->isThere.get_future();
-  service_->callMethod(
+  service.callMethod(
       message,
       [answer](sdbus::MethodReply& reply, const sdbus::Error* error) {
         if (error != nullptr)
@@ -79,9 +95,10 @@ void BusConnection::callAsync(
     const char* interface, const char* method, const Write& write,
     std::function<void(sdbus::Message* reply, const Error& error)> handle) {
   try {
-    auto message = service_->createMethodCall(interface, method);
+    sdbus::IProxy& service = owner();
+    auto message = service.createMethodCall(interface, method);
     if (write) write(message);
-    service_->callMethod(
+    service.callMethod(
         message,
         [handle](sdbus::MethodReply& reply, const sdbus::Error* error) {
           if (error != nullptr) return handle(nullptr, errorFromBus(*error));
@@ -106,11 +123,12 @@ void BusConnection::listen(std::function<void(const std::string& container)> sig
       std::string("type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
                   "interface='org.freedesktop.DBus',member='NameOwnerChanged',arg0='") +
           serviceName + "'",
-      [moved = std::move(moved)](sdbus::Message& message) {
+      [this, moved = std::move(moved)](sdbus::Message& message) {
         std::string name;
         std::string before;
         std::string now;
         message >> name >> before >> now;
+        setOwner(now);
         moved(!now.empty());
       });
 }

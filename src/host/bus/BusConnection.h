@@ -3,10 +3,12 @@
 #include <atomic>
 #include <functional>
 #include <memory>
+#include <mutex>
 #include <sdbus-c++/sdbus-c++.h>
 #include <string>
 #include <type_traits>
 #include <utility>
+#include <vector>
 
 #include "foundation/Error.h"
 #include "host/bus/BusErrors.h"
@@ -51,8 +53,17 @@ class BusConnection {
   [[nodiscard]] sdbus::MethodReply send(const char* interface, const char* method,
                                         const Write& write);
 
+  /// Who has the service's name; empty: nobody.
+  void setOwner(const std::string& uniqueName);
+  [[nodiscard]] sdbus::IProxy& owner();
+
   std::unique_ptr<sdbus::IConnection> connection_;
-  std::unique_ptr<sdbus::IProxy> service_;
+  std::unique_ptr<sdbus::IProxy> service_;  ///< whose signals are heard
+  std::mutex mutex_;                        ///< for the owners
+  /// By their own names, so that a call starts no service, perhaps of another home, in the place of
+  /// one that has left. Those that left stay, for calls that were sent to them may be pending.
+  std::vector<std::unique_ptr<sdbus::IProxy>> owners_;
+  sdbus::IProxy* owner_ = nullptr;
   sdbus::Slot moving_;
   std::atomic<bool> isLost_ = false;
   std::unique_ptr<BusLoop> loop_;
