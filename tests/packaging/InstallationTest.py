@@ -2,6 +2,7 @@
 
 import os
 import pathlib
+import select
 import shutil
 import subprocess
 import tempfile
@@ -47,6 +48,27 @@ class Installation(unittest.TestCase):
             home = ", ".join(f"0x{byte:02x}" for byte in bytes(private.home))
             self.assertIn(f"[byte {home}]", private.call("Manager.GetHome"))
             self.assertTrue(private.end_started_service())
+
+    def test_a_client_does_not_start_a_service_that_was_ended_and_goes_on_when_it_is_back(self):
+        with bus.PrivateBus(data_folders=str(self.prefix / "share")) as private:
+            private.call("Manager.GetHome")
+            watch = subprocess.Popen([self.prefix / "bin/mirabel", "--json", "watch"], text=True,
+                                     env=private.environment, stdout=subprocess.PIPE,
+                                     stderr=subprocess.PIPE)
+            try:
+                self.assertIn("anchor", watch.stdout.readline())
+                self.assertTrue(private.end_started_service())
+                said, _, _ = select.select([watch.stderr, watch.stdout], [], [], 60)
+                self.assertEqual(said, [watch.stderr])
+                self.assertIn("the service has left", watch.stderr.readline())
+                self.assertFalse(private.has_service())
+                (private.home / "Documents/letter.txt").write_text("Dear")
+                private.call("Manager.GetHome")
+                self.assertTrue(any("letter.txt" in line for line in watch.stdout))
+                self.assertTrue(private.end_started_service())
+            finally:
+                watch.terminate()
+                watch.communicate()
 
     @unittest.skipUnless(shutil.which("systemd-analyze"), "systemd is not installed")
     def test_systemd_takes_the_unit(self):

@@ -68,14 +68,19 @@ class PrivateBus:
         return interfaces(self.run("gdbus", "introspect", "--session", "--dest", NAME,
                                    "--object-path", OBJECT, "--xml"))
 
+    def ask_bus(self, method, *arguments):
+        return self.run("gdbus", "call", "--session", "--dest", "org.freedesktop.DBus",
+                        "--object-path", "/", "--method", f"org.freedesktop.DBus.{method}",
+                        *arguments)
+
+    def has_service(self):
+        return "true" in self.ask_bus("NameHasOwner", NAME)
+
     def end_started_service(self):
         """Ends a service that the bus started, and waits until it has."""
-        answer = self.run("gdbus", "call", "--session", "--dest", "org.freedesktop.DBus",
-                          "--object-path", "/", "--method",
-                          "org.freedesktop.DBus.GetConnectionUnixProcessID", NAME)
-        process = int(re.search(r"uint32 (\d+)", answer)[1])
+        process = int(re.search(r"uint32 (\d+)", self.ask_bus("GetConnectionUnixProcessID", NAME))[1])
         end = os.pidfd_open(process)
-        os.kill(process, signal.SIGTERM)
+        signal.pidfd_send_signal(end, signal.SIGTERM)
         ended, _, _ = select.select([end], [], [], 60)
         os.close(end)
         return bool(ended)
