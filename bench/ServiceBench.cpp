@@ -9,6 +9,7 @@
 #include "ChildProcess.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/BusNames.h"
+#include "platform/VesselManager.h"
 
 namespace mirabel::bench {
 namespace {

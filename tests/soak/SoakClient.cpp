@@ -90,10 +90,12 @@ std::size_t SoakClient::list() {
 
 std::size_t SoakClient::leaveInTheMiddle() {
   const auto folder = std::next(truth_.folders.begin(), pick(truth_.folders.size()));
-  auto message = service_->createMethodCall(bus::providerInterface, "ListItems");
-  message << folder->first << std::vector<std::uint8_t>();
-  message.dontExpectReply();
-  service_->callMethod(message, 0);
+  {
+    auto message = service_->createMethodCall(bus::providerInterface, "ListItems");
+    message << folder->first << std::vector<std::uint8_t>();
+    message.dontExpectReply();
+    static_cast<void>(service_->callMethod(message, 0));
+  }
   connect();
   return 1;
 }
