@@ -83,5 +83,6 @@ void runFollowingBenchmarks(const Scale& scale);
 void runOperationBenchmarks(const Scale& scale);
 void runApplicationsBenchmarks(const Scale& scale);
 void runServiceBenchmarks(const Scale& scale);
+void runSearchBenchmarks(const Scale& scale);
 
 }  // namespace mirabel::bench

@@ -30,6 +30,7 @@ int run(int count, char** arguments) {
   mirabel::bench::runOperationBenchmarks(scale);
   mirabel::bench::runApplicationsBenchmarks(scale);
   mirabel::bench::runServiceBenchmarks(scale);
+  mirabel::bench::runSearchBenchmarks(scale);
   return 0;
 }
 

@@ -56,7 +56,7 @@ Result<void> SearchIndex::openStore() {
   if (auto made = files_.make(); !made) return made;
   auto store = SearchStore::open(files_.path());
   if (!store) return fail(store.error());
-  auto run = SearchRun::create((*store)->database());
+  auto run = SearchRun::create(**store);
   if (!run) return fail(run.error());
   store_ = *std::move(store);
   run_ = *std::move(run);
@@ -129,9 +129,7 @@ Result<void> SearchIndex::apply(const VesselItems& updated,
 
 Result<void> SearchIndex::deleteDomains(const std::vector<std::string>& domains) {
   const std::lock_guard lock(writing_);
-  if (const auto load = load_.lock()) {
-    if (auto removed = load->removeDomains(domains); !removed) return removed;
-  }
+  if (const auto load = load_.lock()) load->removeDomains(domains);
   auto deleted = write([&]() -> Result<void> {
     for (const std::string& domain : domains)
       if (auto removed = store_->removeDomain(domain); !removed) return removed;

@@ -1,144 +1,80 @@
 #include "host/search/SearchLoad.h"
 
-#include <cerrno>
+#include <functional>
 #include <utility>
 
-#include "foundation/Log.h"
 #include "host/search/SearchRow.h"
-#include "host/search/SearchSchema.h"
-#include "host/search/SearchText.h"
 #include "items/LocalItem.h"
 
 namespace mirabel {
-namespace {
-
-// A crash leaves nothing of this file, so that nothing of it need be on disk before the end. Rows
-// wait in a table of their own, in a file without a name where they are many: the tables are filled
-// in the order of modification, so that reading them from the end meets the newest first.
-constexpr const char* preparation =
-    "PRAGMA synchronous=OFF;"
-    "PRAGMA temp_store=FILE;"
-    "CREATE TEMP TABLE staged(identifier, name, tags, type, modified, recency, favorite, domain,"
-    " flags);"
-    "BEGIN";
-
-// The words of some hundred thousand names; more are written in several pieces.
-constexpr const char* bulkSettings =
-    "INSERT INTO words(words, rank) VALUES('hashsize', 33554432);"
-    "INSERT INTO words(words, rank) VALUES('automerge', 0)";
-constexpr const char* usualSettings =
-    "INSERT INTO words(words) VALUES('optimize');"
-    "INSERT INTO words(words, rank) VALUES('hashsize', 1048576);"
-    "INSERT INTO words(words, rank) VALUES('automerge', 4)";
-
-}  // namespace
-
-struct SearchLoad::Statements {
-  Statement stage, unstage, unstageDomain;
-};
-
-SearchLoad::SearchLoad(const SearchFiles& files) : files_(files) {}
-
-SearchLoad::~SearchLoad() {
-  statements_.reset();
-  if (!database_) return;
-  database_.reset();
-  files_.removeNew();
-}
 
 Result<std::unique_ptr<SearchLoad>> SearchLoad::begin(const SearchFiles& files) {
   if (auto made = files.makeNew(); !made) return fail(made.error());
   std::unique_ptr<SearchLoad> load(new SearchLoad(files));
-  auto database = Database::open(files.newPath());
-  if (!database) return fail(database.error());
-  load->database_ = *std::move(database);
-  if (auto prepared = load->prepare(); !prepared) return fail(prepared.error());
+  auto store = SearchStore::beginFilling(files.newPath());
+  if (!store) return fail(store.error());
+  load->store_ = *std::move(store);
   return load;
 }
 
-Result<void> SearchLoad::prepare() {
-  if (auto prepared = database_->execute(preparation); !prepared) return prepared;
-  auto stage =
-      database_->prepare("INSERT INTO staged VALUES(" + std::string(searchParameters) + ")");
-  if (!stage) return fail(stage.error());
-  auto unstage = database_->prepare("DELETE FROM staged WHERE identifier = ?");
-  if (!unstage) return fail(unstage.error());
-  auto unstageDomain = database_->prepare("DELETE FROM staged WHERE domain = ?");
-  if (!unstageDomain) return fail(unstageDomain.error());
-  statements_.reset(
-      new Statements{*std::move(stage), *std::move(unstage), *std::move(unstageDomain)});
+SearchLoad::~SearchLoad() {
+  queue_.sync([this] {
+    store_.reset();
+    if (!isFinished_) files_.removeNew();
+  });
+}
+
+Result<void> SearchLoad::outcome() {
+  const std::lock_guard lock(mutex_);
+  return outcome_;
+}
+
+// Nothing is done after an error: half of a page must not be taken for the whole.
+void SearchLoad::run(const std::function<Result<void>()>& work) {
+  if (!store_ || !outcome()) return;
+  auto done = work();
+  if (done) return;
+  const std::lock_guard lock(mutex_);
+  outcome_ = std::move(done);
+}
+
+Result<void> SearchLoad::add(VesselItems items) {
+  if (auto sofar = outcome(); !sofar) return sofar;
+  pages_.acquire();
+  queue_.async([this, items = std::move(items)] {
+    run([&] { return write(items); });
+    pages_.release();
+  });
   return {};
 }
 
-Result<void> SearchLoad::add(const VesselItems& items) {
-  const std::lock_guard lock(mutex_);
+Result<void> SearchLoad::write(const VesselItems& items) {
   for (const auto& item : items) {
     const SearchRow row = searchRowOf(*item);
-    if (!hashes_.insert(std::hash<std::string>()(row.identifier)).second) {
-      auto gone = statements_->unstage.bindBlob(1, row.identifier).run();
-      if (!gone) return gone;
-    }
-    bindSearchRow(statements_->stage, 1, row);
-    if (auto staged = statements_->stage.run(); !staged) return staged;
+    const bool isNew = hashes_.insert(std::hash<std::string>()(row.identifier)).second;
+    // Looking it up means to read everything, while there is no index.
+    auto added = isNew ? store_->add(row) : store_->put(row);
+    if (!added) return added;
   }
-  return {};
+  return store_->writeWords();
 }
 
-Result<void> SearchLoad::removeDomains(const std::vector<std::string>& domains) {
-  const std::lock_guard lock(mutex_);
-  if (!database_) return {};
-  for (const std::string& domain : domains) {
-    if (auto gone = statements_->unstageDomain.bindBlob(1, domain).run(); !gone) return gone;
-  }
-  return {};
+void SearchLoad::removeDomains(const std::vector<std::string>& domains) {
+  queue_.sync([&] {
+    run([&]() -> Result<void> {
+      for (const std::string& domain : domains)
+        if (auto removed = store_->removeDomain(domain); !removed) return removed;
+      return store_->writeWords();
+    });
+  });
 }
 
 Result<void> SearchLoad::finish(const Data& anchor) {
-  const std::lock_guard lock(mutex_);
-  if (auto made = makeSearchTables(*database_); !made) return made;
-  if (auto moved = moveRows(); !moved) return moved;
-  if (auto added = addWords(); !added) return added;
-  if (auto made = makeSearchIndexes(*database_); !made) return made;
-  return close(anchor);
-}
-
-Result<void> SearchLoad::moveRows() {
-  const std::string columns = searchColumns;
-  const std::string move = "INSERT INTO items(" + columns + ") SELECT " + columns +
-                           " FROM staged ORDER BY modified, identifier";
-  return database_->execute(move.c_str());
-}
-
-Result<void> SearchLoad::addWords() {
-  if (auto set = database_->execute(bulkSettings); !set) return set;
-  auto rows = database_->prepare("SELECT place, name, tags FROM items ORDER BY place");
-  if (!rows) return fail(rows.error());
-  auto add = database_->prepare("INSERT INTO words(rowid, text) VALUES(?, ?)");
-  if (!add) return fail(add.error());
-  std::string text;
-  while (true) {
-    const auto row = rows->step();
-    if (!row) return fail(row.error());
-    if (!*row) break;
-    text = rows->blob(1);
-    text += rows->blob(2);
-    const std::string words = wordsOf(text);
-    auto added = add->bind(1, rows->integer(0)).bindBlob(2, words).run();
-    if (!added) return added;
-  }
-  return database_->execute(usualSettings);
-}
-
-Result<void> SearchLoad::close(const Data& anchor) {
-  auto set = database_->prepare(setSearchAnchor);
-  if (!set) return fail(set.error());
-  if (auto stored = set->bindBlob(1, stringView(anchor)).run(); !stored) return stored;
-  statements_.reset();
-  *set = Statement(nullptr);
-  if (auto committed = database_->execute("COMMIT"); !committed) return committed;
-  if (auto moved = database_->checkpoint(Database::Log::emptied); !moved) return moved;
-  database_.reset();
-  return {};
+  queue_.sync([&] {
+    run([&] { return SearchStore::finishFilling(std::move(store_), anchor); });
+    isFinished_ = outcome().has_value();
+  });
+  return outcome();
 }
 
 }  // namespace mirabel

@@ -12,17 +12,15 @@
 namespace mirabel {
 namespace {
 
-// Of what a very common word finds, the newest are put in order. It is far more than a person
-// looks at, and few enough to be read within a millisecond or two.
+// How many rows that match are compared, the newest of them, in one pass. Reading a row takes about
+// a microsecond.
 constexpr std::size_t fewestCandidates = 1024;
 
-constexpr const char* ofWords =
-    "SELECT i.place, i.identifier, i.name, i.tags, i.type, i.modified, i.domain, i.flags"
-    " FROM words CROSS JOIN items i ON i.place = words.rowid"
-    " WHERE words MATCH ? ORDER BY words.rowid DESC";
-constexpr const char* ofAll =
-    "SELECT place, identifier, name, tags, type, modified, domain, flags FROM items"
-    " ORDER BY place DESC";
+#define MIRABEL_ROW "SELECT place, identifier, name, tags, type, modified, domain, flags FROM items"
+constexpr const char* oneRow = MIRABEL_ROW " WHERE place = ?";
+constexpr const char* allRows = MIRABEL_ROW;
+#undef MIRABEL_ROW
+constexpr const char* placesOfWords = "SELECT rowid FROM words WHERE words MATCH ?";
 constexpr const char* recentItems =
     "SELECT identifier FROM items WHERE flags = 0 AND recency IS NOT NULL"
     " ORDER BY recency DESC, identifier LIMIT ?";
@@ -49,59 +47,6 @@ SearchRowView viewOf(const Statement& row) {
   return view;
 }
 
-/// Collects what matches a query, from one statement after the other.
-class Candidates {
- public:
-  Candidates(const SearchWanted& wanted, std::size_t limit) : wanted_(wanted), limit_(limit) {}
-
-  enum class End { reached, notReached };
-  /// Rows whose words match at least as well as `worst`, up to the bound.
-  Result<End> collect(Statement& statement, Match worst) {
-    const StatementScope scope(statement);
-    std::size_t found = 0;
-    while (true) {
-      const auto row = statement.step();
-      if (!row) return fail(row.error());
-      if (!*row) return End::reached;
-      const SearchRowView view = viewOf(statement);
-      const auto match = wanted_.match(view);
-      if (!match || *match > worst) continue;
-      add(statement, view, *match);
-      if (++found == bound()) return End::notReached;
-    }
-  }
-
-  [[nodiscard]] std::size_t bound() const {
-    return std::max(fewestCandidates, std::min(limit_, limit_ * 2));
-  }
-  [[nodiscard]] std::size_t wholeWords() const {
-    return static_cast<std::size_t>(
-        std::ranges::count(found_, Match::wholeWord, &Candidate::match));
-  }
-  [[nodiscard]] std::vector<std::string> best() {
-    const std::size_t count = std::min(limit_, found_.size());
-    std::partial_sort(found_.begin(), found_.begin() + static_cast<std::ptrdiff_t>(count),
-                      found_.end());
-    std::vector<std::string> identifiers;
-    identifiers.reserve(count);
-    for (std::size_t i = 0; i < count; ++i)
-      identifiers.push_back(std::move(found_[i].identifier));
-    return identifiers;
-  }
-
- private:
-  void add(const Statement& statement, const SearchRowView& view, Match match) {
-    if (!places_.insert(statement.integer(0)).second) return;
-    constexpr auto undated = std::numeric_limits<std::int64_t>::min();
-    found_.push_back({match, view.modified.value_or(undated), std::string(statement.blob(1))});
-  }
-
-  const SearchWanted& wanted_;
-  std::size_t limit_;
-  std::unordered_set<std::int64_t> places_;
-  std::vector<Candidate> found_;
-};
-
 Result<std::vector<std::string>> identifiersOf(Statement& statement) {
   const StatementScope scope(statement);
   std::vector<std::string> identifiers;
@@ -115,48 +60,148 @@ Result<std::vector<std::string>> identifiersOf(Statement& statement) {
 
 }  // namespace
 
-struct SearchRun::Statements {
-  Statement ofWords, ofAll, recents, favorites;
+/// The best of the rows that it was shown.
+class SearchRun::Candidates {
+ public:
+  Candidates(const SearchWanted& wanted, std::size_t limit) : wanted_(wanted), limit_(limit) {}
+
+  [[nodiscard]] const SearchWanted& wanted() const { return wanted_; }
+  /// So many that those of one class that are wanted can't be pushed out by those of a better one.
+  [[nodiscard]] std::size_t bound() const {
+    return std::max(fewestCandidates, limit_ < largest / 2 ? limit_ * 2 : limit_);
+  }
+  /// Whether the row matches at least as well as `worst`.
+  bool consider(const Statement& row, Match worst) {
+    const SearchRowView view = viewOf(row);
+    const auto match = wanted_.match(view);
+    if (!match || *match > worst) return false;
+    if (!places_.insert(row.integer(0)).second) return true;
+    found_.push_back(
+        {*match, view.modified.value_or(SearchTimes::undated), std::string(row.blob(1))});
+    if (found_.size() / 2 >= bound()) keepBest(bound());
+    return true;
+  }
+  [[nodiscard]] bool hasEnough(Match worst) const {
+    const auto isGood = [worst](const Candidate& candidate) { return candidate.match <= worst; };
+    return static_cast<std::size_t>(std::ranges::count_if(found_, isGood)) >= limit_;
+  }
+  [[nodiscard]] std::vector<std::string> best() {
+    keepBest(limit_);
+    std::sort(found_.begin(), found_.end());
+    std::vector<std::string> identifiers;
+    identifiers.reserve(found_.size());
+    for (Candidate& candidate : found_)
+      identifiers.push_back(std::move(candidate.identifier));
+    return identifiers;
+  }
+
+ private:
+  static constexpr std::size_t largest = std::numeric_limits<std::size_t>::max();
+
+  void keepBest(std::size_t count) {
+    if (found_.size() <= count) return;
+    const auto end = found_.begin() + static_cast<std::ptrdiff_t>(count);
+    std::nth_element(found_.begin(), end, found_.end());
+    found_.erase(end, found_.end());
+  }
+
+  const SearchWanted& wanted_;
+  std::size_t limit_;
+  std::unordered_set<std::int64_t> places_;
+  std::vector<Candidate> found_;
 };
 
-SearchRun::SearchRun(std::unique_ptr<Statements> statements) : statements_(std::move(statements)) {}
+struct SearchRun::Statements {
+  Statement oneRow, allRows, placesOfWords, recents, favorites;
+};
+
+SearchRun::SearchRun(SearchStore& store, std::unique_ptr<Statements> statements)
+    : store_(store), statements_(std::move(statements)) {}
 SearchRun::~SearchRun() = default;
 
-Result<std::unique_ptr<SearchRun>> SearchRun::create(Database& database) {
-  auto words = database.prepare(ofWords);
-  if (!words) return fail(words.error());
-  auto all = database.prepare(ofAll);
-  if (!all) return fail(all.error());
-  auto recents = database.prepare(recentItems);
-  if (!recents) return fail(recents.error());
-  auto favorites = database.prepare(favoriteItems);
-  if (!favorites) return fail(favorites.error());
-  return std::unique_ptr<SearchRun>(new SearchRun(std::unique_ptr<Statements>(new Statements{
-      *std::move(words), *std::move(all), *std::move(recents), *std::move(favorites)})));
+Result<std::unique_ptr<SearchRun>> SearchRun::create(SearchStore& store) {
+  std::optional<Error> error;
+  const auto make = [&](const char* sql) {
+    auto statement = store.database().prepare(sql);
+    if (statement) return *std::move(statement);
+    error = statement.error();
+    return Statement(nullptr);
+  };
+  std::unique_ptr<Statements> statements(new Statements{
+      make(oneRow), make(allRows), make(placesOfWords), make(recentItems), make(favoriteItems)});
+  if (error) return fail(*error);
+  return std::unique_ptr<SearchRun>(new SearchRun(store, std::move(statements)));
 }
 
+// Rows are collected from what is sure to have all that match, until there are no more; or else the
+// newest of all, of whole words, and of beginnings of words, which are listed as well. Whatever the
+// passes leave out is older than enough of its class.
 Result<std::vector<std::string>> SearchRun::search(const SearchQuery& query) {
   const auto wanted = SearchWanted::from(query);
   if (!wanted || query.limit == 0) return {};
   Candidates candidates(*wanted, query.limit);
-  const auto collect = [&](Match worst) {
-    const std::string expression = wanted->expression(worst);
-    if (expression.empty() && worst == Match::insideWord) {
-      return candidates.collect(statements_->ofAll, worst);
-    }
-    if (expression.empty()) return Result<Candidates::End>(Candidates::End::reached);
-    statements_->ofWords.bindBlob(1, expression);
-    return candidates.collect(statements_->ofWords, worst);
-  };
-  const auto end = collect(Match::insideWord);
-  if (!end) return fail(end.error());
-  if (*end == Candidates::End::reached) return candidates.best();
-  // There are more than were looked at, and better ones may be among them.
-  if (auto whole = collect(Match::wholeWord); !whole) return fail(whole.error());
-  if (candidates.wholeWords() < query.limit) {
-    if (auto begun = collect(Match::beginningOfWord); !begun) return fail(begun.error());
+  const bool isListed = !wanted->expression(Match::insideWord).empty();
+  if (isListed) {
+    const auto isComplete = collect(candidates, Match::insideWord);
+    if (!isComplete) return fail(isComplete.error());
+    if (*isComplete) return candidates.best();
+  }
+  for (const Match worst : {Match::wholeWord, Match::beginningOfWord}) {
+    if (auto collected = collect(candidates, worst); !collected) return fail(collected.error());
+    if (candidates.hasEnough(worst)) return candidates.best();
+  }
+  if (!isListed) {
+    if (auto collected = collectFromAll(candidates); !collected) return fail(collected.error());
   }
   return candidates.best();
+}
+
+/// The newest that match at least as well as `worst`, as far as trigrams lead to them.
+Result<bool> SearchRun::collect(Candidates& candidates, Match worst) {
+  const std::string expression = candidates.wanted().expression(worst);
+  if (expression.empty()) return true;
+  auto places = placesOf(expression);
+  if (!places) return fail(places.error());
+  const auto times = store_.times();
+  if (!times) return fail(times.error());
+  const auto isOlder = [&](std::int64_t a, std::int64_t b) {
+    return (*times)->at(a) < (*times)->at(b);
+  };
+  std::ranges::make_heap(*places, isOlder);
+  Statement& row = statements_->oneRow;
+  for (std::size_t found = 0; !places->empty(); places->pop_back()) {
+    if (found == candidates.bound()) return false;
+    std::ranges::pop_heap(*places, isOlder);
+    const StatementScope scope(row);
+    const auto isThere = row.bind(1, places->back()).step();
+    if (!isThere) return fail(isThere.error());
+    if (*isThere && candidates.consider(row, worst)) ++found;
+  }
+  return true;
+}
+
+Result<std::vector<std::int64_t>> SearchRun::placesOf(const std::string& expression) {
+  Statement& statement = statements_->placesOfWords;
+  const StatementScope scope(statement);
+  statement.bindBlob(1, expression);
+  std::vector<std::int64_t> places;
+  while (true) {
+    const auto row = statement.step();
+    if (!row) return fail(row.error());
+    if (!*row) return places;
+    places.push_back(statement.integer(0));
+  }
+}
+
+Result<void> SearchRun::collectFromAll(Candidates& candidates) {
+  Statement& rows = statements_->allRows;
+  const StatementScope scope(rows);
+  while (true) {
+    const auto row = rows.step();
+    if (!row) return fail(row.error());
+    if (!*row) return {};
+    candidates.consider(rows, Match::insideWord);
+  }
 }
 
 Result<std::vector<std::string>> SearchRun::recent(std::size_t limit) {

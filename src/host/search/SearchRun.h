@@ -1,18 +1,21 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "host/search/SearchQuery.h"
-#include "linux/volume/Database.h"
+#include "host/search/SearchStore.h"
+#include "host/search/SearchText.h"
 
 namespace mirabel {
 
 /// Answers questions from the tables of a search index. Used under the lock of the index.
 class SearchRun {
  public:
-  [[nodiscard]] static Result<std::unique_ptr<SearchRun>> create(Database& database);
+  /// `store` outlives it.
+  [[nodiscard]] static Result<std::unique_ptr<SearchRun>> create(SearchStore& store);
   ~SearchRun();
   SearchRun(const SearchRun&) = delete;
   SearchRun& operator=(const SearchRun&) = delete;
@@ -24,7 +27,14 @@ class SearchRun {
 
  private:
   struct Statements;
-  explicit SearchRun(std::unique_ptr<Statements> statements);
+  class Candidates;
+  SearchRun(SearchStore& store, std::unique_ptr<Statements> statements);
+  [[nodiscard]] Result<std::vector<std::int64_t>> placesOf(const std::string& expression);
+  /// Whether there was nothing more to be collected.
+  [[nodiscard]] Result<bool> collect(Candidates& candidates, Match worst);
+  [[nodiscard]] Result<void> collectFromAll(Candidates& candidates);
+
+  SearchStore& store_;
   std::unique_ptr<Statements> statements_;
 };
 

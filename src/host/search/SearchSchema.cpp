@@ -28,19 +28,19 @@ constexpr const char* indexes =
     "CREATE INDEX recents ON items(recency) WHERE flags = 0;"
     "CREATE INDEX favorites ON items(favorite) WHERE favorite IS NOT NULL;";
 
-Result<std::int64_t> numberOf(Database& database, const char* sql) {
+Error anotherFormat() {
+  return Error::store(SQLITE_SCHEMA, "the index has another format");
+}
+
+}  // namespace
+
+Result<std::int64_t> searchNumber(Database& database, const char* sql) {
   auto statement = database.prepare(sql);
   if (!statement) return fail(statement.error());
   const auto row = statement->step();
   if (!row) return fail(row.error());
   return *row ? statement->integer(0) : 0;
 }
-
-Error anotherFormat() {
-  return Error::store(SQLITE_SCHEMA, "the index has another format");
-}
-
-}  // namespace
 
 bool isDamagedIndex(const Error& error) {
   if (error.domain != ErrorDomain::store) return false;
@@ -56,18 +56,18 @@ bool isDamagedIndex(const Error& error) {
   }
 }
 
-void bindSearchRow(Statement& statement, int first, const SearchRow& row) {
+void bindSearchRow(Statement& statement, const SearchRow& row) {
   const std::int64_t flags =
       (row.isFolder ? searchFolder : 0) | (row.isTrashed ? searchTrashed : 0);
-  statement.bindBlob(first, row.identifier)
-      .bindBlob(first + 1, row.name)
-      .bindBlob(first + 2, row.tags)
-      .bindBlob(first + 3, row.type)
-      .bind(first + 4, row.modified)
-      .bind(first + 5, row.recency)
-      .bind(first + 6, row.favoriteOrder)
-      .bindBlob(first + 7, row.domain)
-      .bind(first + 8, flags);
+  statement.bindBlob(1, row.identifier)
+      .bindBlob(2, row.name)
+      .bindBlob(3, row.tags)
+      .bindBlob(4, row.type)
+      .bind(5, row.modified)
+      .bind(6, row.recency)
+      .bind(7, row.favoriteOrder)
+      .bindBlob(8, row.domain)
+      .bind(9, flags);
 }
 
 Result<void> makeSearchTables(Database& database) {
@@ -86,9 +86,9 @@ Result<void> makeSearchIndexes(Database& database) {
 }
 
 Result<void> requireSearchFormat(Database& database) {
-  const auto application = numberOf(database, "PRAGMA application_id");
+  const auto application = searchNumber(database, "PRAGMA application_id");
   if (!application) return fail(application.error());
-  const auto version = numberOf(database, "PRAGMA user_version");
+  const auto version = searchNumber(database, "PRAGMA user_version");
   if (!version) return fail(version.error());
   if (*application != applicationID || *version != formatVersion) return fail(anotherFormat());
   auto folding = database.prepare("SELECT value FROM facts WHERE name = 'folding'");

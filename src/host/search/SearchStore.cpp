@@ -8,6 +8,23 @@
 
 namespace mirabel {
 
+namespace {
+
+// Words of a million names or so are collected before they are written; of more, in several pieces
+// that are made one in the end. Nothing of the file has to outlive a crash before that.
+constexpr const char* fillingSettings =
+    "PRAGMA synchronous=OFF;"
+    "BEGIN;";
+constexpr const char* wordsInOnePiece =
+    "INSERT INTO words(words, rank) VALUES('hashsize', 33554432);"
+    "INSERT INTO words(words, rank) VALUES('automerge', 0)";
+constexpr const char* wordsAsUsual =
+    "INSERT INTO words(words) VALUES('optimize');"
+    "INSERT INTO words(words, rank) VALUES('hashsize', 1048576);"
+    "INSERT INTO words(words, rank) VALUES('automerge', 4)";
+
+}  // namespace
+
 struct SearchStore::Statements {
   Statement anchor, setAnchor, count, find, ofDomain, add, addWords, remove, removeWords, update;
 };
@@ -16,7 +33,6 @@ struct SearchStore::Known {
   std::int64_t place = 0;
   std::string name;
   std::string tags;
-  std::optional<std::int64_t> modified;
 };
 
 SearchStore::SearchStore(std::unique_ptr<Database> database) : database_(std::move(database)) {}
@@ -33,21 +49,43 @@ Result<std::unique_ptr<SearchStore>> SearchStore::open(const std::string& path) 
 }
 
 Result<void> SearchStore::fillIfEmpty() {
-  {
-    auto any = database_->prepare("SELECT 1 FROM sqlite_schema");
-    if (!any) return fail(any.error());
-    const auto row = any->step();
-    if (!row) return fail(row.error());
-    if (*row) return {};
-  }
+  const auto tables = searchNumber(*database_, "SELECT count(*) FROM sqlite_schema");
+  if (!tables) return fail(tables.error());
+  if (*tables > 0) return {};
   return transaction([this]() -> Result<void> {
     if (auto made = makeSearchTables(*database_); !made) return made;
     return makeSearchIndexes(*database_);
   });
 }
 
+Result<std::unique_ptr<SearchStore>> SearchStore::beginFilling(const std::string& path) {
+  auto opened = Database::open(path);
+  if (!opened) return fail(opened.error());
+  std::unique_ptr<SearchStore> store(new SearchStore(std::move(*opened)));
+  Database& database = *store->database_;
+  if (auto begun = database.execute(fillingSettings); !begun) return fail(begun.error());
+  if (auto made = makeSearchTables(database); !made) return fail(made.error());
+  if (auto set = database.execute(wordsInOnePiece); !set) return fail(set.error());
+  if (auto prepared = store->prepare(); !prepared) return fail(prepared.error());
+  return store;
+}
+
+Result<void> SearchStore::finishFilling(std::unique_ptr<SearchStore> store, const Data& anchor) {
+  Database& database = *store->database_;
+  if (auto written = store->writeWords(); !written) return written;
+  if (auto set = database.execute(wordsAsUsual); !set) return set;
+  if (auto made = makeSearchIndexes(database); !made) return made;
+  if (auto set = store->setAnchor(anchor); !set) return set;
+  if (auto committed = database.execute("COMMIT"); !committed) return committed;
+  return database.checkpoint(Database::Log::emptied);
+}
+
 Result<void> SearchStore::prepare() {
+  const auto lastPlace = searchNumber(*database_, "SELECT max(place) FROM items");
+  if (!lastPlace) return fail(lastPlace.error());
+  lastPlace_ = *lastPlace;
   const std::string columns = searchColumns;
+  const std::string parameters = searchParameters;
   std::optional<Error> error;
   const auto make = [&](const std::string& sql) {
     auto statement = database_->prepare(sql);
@@ -57,28 +95,36 @@ Result<void> SearchStore::prepare() {
   };
   statements_.reset(new Statements{
       .anchor = make("SELECT value FROM facts WHERE name = 'anchor'"),
-      .setAnchor = make(setSearchAnchor),
+      .setAnchor = make("INSERT OR REPLACE INTO facts VALUES('anchor', ?)"),
       .count = make("SELECT count(*) FROM items"),
-      .find = make("SELECT place, name, tags, modified FROM items WHERE identifier = ?"),
-      .ofDomain = make("SELECT place, name, tags, modified FROM items WHERE domain = ?"
-                       " ORDER BY place LIMIT 1"),
-      .add = make("INSERT INTO items(" + columns + ") VALUES(" + searchParameters + ")" +
-                  " RETURNING place"),
+      .find = make("SELECT place, name, tags FROM items WHERE identifier = ?"),
+      .ofDomain = make("SELECT place, name, tags FROM items WHERE domain = ? LIMIT 1"),
+      .add = make("INSERT INTO items(" + columns + ", place) VALUES(" + parameters + ", ?)"),
       .addWords = make("INSERT INTO words(rowid, text) VALUES(?, ?)"),
       .remove = make("DELETE FROM items WHERE place = ?"),
       .removeWords = make("INSERT INTO words(words, rowid, text) VALUES('delete', ?, ?)"),
-      .update = make("UPDATE items SET (" + columns + ") = (" + searchParameters + ")" +
-                     " WHERE place = ?"),
+      .update = make("UPDATE items SET (" + columns + ") = (" + parameters + ") WHERE place = ?"),
   });
   if (error) return fail(*error);
   return {};
 }
 
+Result<const SearchTimes*> SearchStore::times() {
+  if (auto loaded = times_.load(*database_); !loaded) return fail(loaded.error());
+  return &times_;
+}
+
 Result<void> SearchStore::transaction(const std::function<Result<void>()>& work) {
   if (auto begun = database_->execute("BEGIN IMMEDIATE"); !begun) return begun;
   auto done = work();
+  if (done) done = writeWords();
   if (done) done = database_->execute("COMMIT");
-  if (done) return {};
+  if (done) {
+    times_.commit();
+    return {};
+  }
+  words_.clear();
+  times_.rollBack();
   if (auto undone = database_->execute("ROLLBACK"); !undone) {
     logDebug([&] { return "can't roll back; " + undone.error().description(); });
   }
@@ -109,15 +155,23 @@ Result<void> SearchStore::put(const SearchRow& row) {
   const auto known = find(statements_->find, row.identifier);
   if (!known) return fail(known.error());
   if (!*known) return add(row);
-  const Known& former = **known;
-  if (former.name != row.name || former.tags != row.tags || former.modified != row.modified) {
-    // To the end: the newest are looked at first.
-    if (auto removed = remove(former); !removed) return removed;
-    return add(row);
+  const auto& [place, name, tags] = **known;
+  if (name != row.name || tags != row.tags) {
+    setWords(place, wordsOf(name + tags), wordsOf(row.name + row.tags));
   }
+  times_.set(place, row.modified);
   Statement& update = statements_->update;
-  bindSearchRow(update, 1, row);
-  return update.bind(searchColumnCount + 1, former.place).run();
+  bindSearchRow(update, row);
+  return update.bind(searchColumnCount + 1, place).run();
+}
+
+Result<void> SearchStore::add(const SearchRow& row) {
+  const std::int64_t place = ++lastPlace_;
+  setWords(place, {}, wordsOf(row.name + row.tags));
+  times_.set(place, row.modified);
+  Statement& add = statements_->add;
+  bindSearchRow(add, row);
+  return add.bind(searchColumnCount + 1, place).run();
 }
 
 Result<void> SearchStore::remove(std::string_view identifier) {
@@ -135,6 +189,11 @@ Result<void> SearchStore::removeDomain(std::string_view domain) {
   }
 }
 
+Result<void> SearchStore::remove(const Known& known) {
+  setWords(known.place, wordsOf(known.name + known.tags), {});
+  return statements_->remove.bind(1, known.place).run();
+}
+
 Result<std::optional<SearchStore::Known>> SearchStore::find(Statement& statement,
                                                             std::string_view key) {
   const StatementScope scope(statement);
@@ -142,33 +201,34 @@ Result<std::optional<SearchStore::Known>> SearchStore::find(Statement& statement
   const auto row = statement.step();
   if (!row) return fail(row.error());
   if (!*row) return std::nullopt;
-  Known known{statement.integer(0), std::string(statement.blob(1)), std::string(statement.blob(2)),
-              std::nullopt};
-  if (!statement.isNull(3)) known.modified = statement.integer(3);
-  return known;
+  return Known{statement.integer(0), std::string(statement.blob(1)),
+               std::string(statement.blob(2))};
 }
 
-// The table of words forgets only what it is told to: exactly what it was given.
-Result<void> SearchStore::remove(const Known& known) {
-  const std::string words = wordsOf(known.name + known.tags);
-  if (auto done = statements_->removeWords.bind(1, known.place).bindBlob(2, words).run(); !done) {
-    return done;
-  }
-  return statements_->remove.bind(1, known.place).run();
+// Words ----------------------------------------------------------------------------------------
+
+// The table of words forgets what it is told that it was given, letter for letter. A place that
+// changes twice was given only what it had at first.
+void SearchStore::setWords(std::int64_t place, std::optional<std::string> former,
+                           std::optional<std::string> next) {
+  const auto [entry, isNew] = words_.try_emplace(place, Words{std::move(former), {}});
+  entry->second.next = std::move(next);
 }
 
-Result<void> SearchStore::add(const SearchRow& row) {
-  std::int64_t place = 0;
-  {
-    Statement& add = statements_->add;
-    const StatementScope scope(add);
-    bindSearchRow(add, 1, row);
-    const auto added = add.step();
-    if (!added) return fail(added.error());
-    place = add.integer(0);
+// In the order of places: each step back makes the table write a piece of its own.
+Result<void> SearchStore::writeWords() {
+  for (const auto& [place, words] : words_) {
+    if (words.former) {
+      auto removed = statements_->removeWords.bind(1, place).bindBlob(2, *words.former).run();
+      if (!removed) return removed;
+    }
+    if (words.next) {
+      auto added = statements_->addWords.bind(1, place).bindBlob(2, *words.next).run();
+      if (!added) return added;
+    }
   }
-  const std::string words = wordsOf(row.name + row.tags);
-  return statements_->addWords.bind(1, place).bindBlob(2, words).run();
+  words_.clear();
+  return {};
 }
 
 }  // namespace mirabel
