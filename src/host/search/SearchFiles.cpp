@@ -22,19 +22,28 @@ Result<SearchFiles> SearchFiles::open(const std::string& folder) {
   SearchFiles files(folder, std::move(descriptor));
   files.removeNew();
   // A log of a database that is gone must not be taken for that of the next.
-  if (!files.has(database)) files.remove();
+  if (files.sizeOf(database) < 0) files.remove();
   return files;
 }
 
-bool SearchFiles::has(const char* name) const {
+std::int64_t SearchFiles::sizeOf(const char* name) const {
   struct stat status {};
-  return ::fstatat(descriptor_.get(), name, &status, AT_SYMLINK_NOFOLLOW) == 0;
+  if (::fstatat(descriptor_.get(), name, &status, AT_SYMLINK_NOFOLLOW) != 0) return -1;
+  return status.st_size;
 }
 
 Result<void> SearchFiles::make(const char* name) const {
   // SQLite gives its log the mode of the database.
-  const UniqueFd made(::openat(descriptor_.get(), name,
-                               O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK, 0600));
+  const auto open = [&] {
+    const int flags = O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK;
+    return UniqueFd(::openat(descriptor_.get(), name, flags, 0600));
+  };
+  UniqueFd made = open();
+  // A link or a FIFO is nothing that was put there to be kept.
+  if (!made && (errno == ELOOP || errno == ENXIO)) {
+    ::unlinkat(descriptor_.get(), name, 0);
+    made = open();
+  }
   if (!made) return fail(Error::posix(errno, folder_ + "/" + name));
   return {};
 }
@@ -61,8 +70,10 @@ void SearchFiles::removeNew() const {
 Result<void> SearchFiles::replaceByNew() const {
   const UniqueFd made(::openat(descriptor_.get(), newDatabase, O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
   if (!made || ::fsync(made.get()) != 0) return fail(Error::posix(errno, newPath()));
-  // Nothing of the former log may be on disk once the new database has its name.
-  remove();
+  // Nothing of the former log may be on disk once the new database has its name. A database that
+  // needs its log was not closed in order, because it is damaged.
+  if (sizeOf(databaseLog) > 0) ::unlinkat(descriptor_.get(), database, 0);
+  ::unlinkat(descriptor_.get(), databaseLog, 0);
   if (auto removed = synchronize(); !removed) return removed;
   const int folder = descriptor_.get();
   if (::renameat(folder, newDatabase, folder, database) != 0) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 #include "foundation/Error.h"
@@ -24,7 +25,8 @@ class SearchFiles {
   void remove() const;
   void removeNew() const;
   /// Has the new index, which is closed and has no log, take the place of the former, which is
-  /// closed too. When this is cut short, there is the former, none or the new one.
+  /// closed too. When this is cut short, there is the former or the new one; none where the former
+  /// was damaged.
   [[nodiscard]] Result<void> replaceByNew() const;
 
  private:
@@ -32,7 +34,8 @@ class SearchFiles {
       : folder_(std::move(folder)), descriptor_(std::move(descriptor)) {}
   [[nodiscard]] Result<void> make(const char* name) const;
   [[nodiscard]] Result<void> synchronize() const;
-  [[nodiscard]] bool has(const char* name) const;
+  /// In bytes; -1 where there is none.
+  [[nodiscard]] std::int64_t sizeOf(const char* name) const;
 
   std::string folder_;
   UniqueFd descriptor_;

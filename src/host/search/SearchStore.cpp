@@ -36,7 +36,12 @@ struct SearchStore::Known {
 };
 
 SearchStore::SearchStore(std::unique_ptr<Database> database) : database_(std::move(database)) {}
-SearchStore::~SearchStore() = default;
+
+// A log that is left behind would be taken for that of another copy of the database.
+SearchStore::~SearchStore() {
+  statements_.reset();
+  static_cast<void>(database_->checkpoint(Database::Log::emptied));
+}
 
 Result<std::unique_ptr<SearchStore>> SearchStore::open(const std::string& path) {
   auto database = Database::open(path);

@@ -45,7 +45,11 @@ std::string foldedUTF8(const std::string& text) {
     if (!isAccent && g_unichar_type(c) != G_UNICODE_FORMAT) append(bare, c);
   }
   const Text folded(g_utf8_casefold(bare.data(), static_cast<gssize>(bare.size())));
-  return folded.get();
+  // Small Cherokee letters have been made capitals.
+  std::string lower;
+  for (const char* at = folded.get(); *at != '\0'; at = g_utf8_next_char(at))
+    append(lower, g_unichar_tolower(g_utf8_get_char(at)));
+  return lower;
 }
 
 gunichar characterBefore(std::string_view text, std::size_t at) {
