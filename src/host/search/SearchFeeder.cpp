@@ -90,8 +90,9 @@ Result<void> SearchFeeder::catchUp(VesselEnumerator& workingSet, std::stop_token
     auto anchor = isUsable ? index_.anchor() : std::nullopt;
     Result<void> outcome;
     if (!anchor) {
-      outcome = list(workingSet, stop);
-      if (outcome) anchor = index_.anchor();
+      auto listed = list(workingSet, stop);
+      if (!listed) outcome = fail(listed.error());
+      if (listed) anchor = *std::move(listed);
     }
     if (anchor) outcome = followChanges(workingSet, *std::move(anchor), stop);
     if (!isExpired(outcome)) return outcome;
@@ -100,7 +101,7 @@ Result<void> SearchFeeder::catchUp(VesselEnumerator& workingSet, std::stop_token
   return fail(Error::syncAnchorExpired());
 }
 
-Result<void> SearchFeeder::list(VesselEnumerator& workingSet, const std::stop_token& stop) {
+Result<Data> SearchFeeder::list(VesselEnumerator& workingSet, const std::stop_token& stop) {
   // Before the listing: what it passes over because it happens meanwhile is told as a change.
   std::optional<Data> anchor;
   workingSet.currentSyncAnchor([&](std::optional<Data> answer) { anchor = std::move(answer); });
@@ -111,8 +112,11 @@ Result<void> SearchFeeder::list(VesselEnumerator& workingSet, const std::stop_to
   while (!stop.stop_requested()) {
     Page page(**content);
     workingSet.enumerateItems(page, next);
-    if (!page.outcome) return page.outcome;
-    if (!page.next) return (*content)->commit(*anchor);
+    if (!page.outcome) return fail(page.outcome.error());
+    if (!page.next) {
+      if (auto committed = (*content)->commit(*anchor); !committed) return fail(committed.error());
+      return *std::move(anchor);
+    }
     next = *std::move(page.next);
   }
   return fail(stopped());

@@ -25,7 +25,8 @@ class SearchFeeder {
   [[nodiscard]] Result<void> catchUp(VesselEnumerator& workingSet, std::stop_token stop = {});
 
  private:
-  [[nodiscard]] Result<void> list(VesselEnumerator& workingSet, const std::stop_token& stop);
+  /// Answers the anchor that the rows have now.
+  [[nodiscard]] Result<Data> list(VesselEnumerator& workingSet, const std::stop_token& stop);
   [[nodiscard]] Result<void> followChanges(VesselEnumerator& workingSet, Data anchor,
                                            const std::stop_token& stop);
 

@@ -67,9 +67,13 @@ void SearchFiles::removeNew() const {
   ::unlinkat(descriptor_.get(), newDatabaseLog, 0);
 }
 
-Result<void> SearchFiles::replaceByNew() const {
+Result<void> SearchFiles::synchronizeNew() const {
   const UniqueFd made(::openat(descriptor_.get(), newDatabase, O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
   if (!made || ::fsync(made.get()) != 0) return fail(Error::posix(errno, newPath()));
+  return {};
+}
+
+Result<void> SearchFiles::replaceByNew() const {
   // Nothing of the former log may be on disk once the new database has its name. A database that
   // needs its log was not closed in order, because it is damaged.
   if (sizeOf(databaseLog) > 0) ::unlinkat(descriptor_.get(), database, 0);

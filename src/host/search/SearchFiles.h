@@ -24,9 +24,10 @@ class SearchFiles {
   [[nodiscard]] Result<void> makeNew() const;
   void remove() const;
   void removeNew() const;
-  /// Has the new index, which is closed and has no log, take the place of the former, which is
-  /// closed too. When this is cut short, there is the former or the new one; none where the former
-  /// was damaged.
+  [[nodiscard]] Result<void> synchronizeNew() const;
+  /// Has the new index, which is on disk, is closed and has no log, take the place of the former,
+  /// which is closed too. When this is cut short, there is the former or the new one; none where
+  /// the former was damaged.
   [[nodiscard]] Result<void> replaceByNew() const;
 
  private:

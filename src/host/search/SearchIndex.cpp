@@ -168,6 +168,7 @@ Result<void> SearchIndex::StartingOver::commit(const Data& anchor) {
   // Domains that are deleted now are in neither of the two.
   const std::lock_guard lock(index_.writing_);
   if (auto finished = load_->finish(anchor); !finished) return finished;
+  if (auto written = index_.files_.synchronizeNew(); !written) return written;
   return index_.replaceByNew();
 }
 

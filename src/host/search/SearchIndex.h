@@ -78,9 +78,8 @@ class SearchIndex {
   [[nodiscard]] Result<void> deleteDomains(const std::vector<std::string>& domains);
 
   /// What matches, the best first: where the worst of the words is a whole word of the name or of
-  /// a tag, then where it begins one, then the others; among those what was modified last. Where
-  /// very many match (1,024, or twice the limit), these are the ones that changed last, and the
-  /// newest of those that match best.
+  /// a tag, then where it begins one, then the others; among those what was modified last, and in
+  /// the end by identifier. So the same rows give the same answer, whatever way they came.
   [[nodiscard]] Result<std::vector<std::string>> search(const SearchQuery& query);
   /// What was used or modified last, neither folders nor what is in the trash.
   [[nodiscard]] Result<std::vector<std::string>> recent(std::size_t limit);

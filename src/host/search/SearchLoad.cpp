@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "host/search/SearchRow.h"
+#include "host/search/SearchSchema.h"
 #include "items/LocalItem.h"
 
 namespace mirabel {
@@ -52,7 +53,10 @@ Result<void> SearchLoad::write(const VesselItems& items) {
   for (const auto& item : items) {
     const SearchRow row = searchRowOf(*item);
     const bool isNew = hashes_.insert(std::hash<std::string>()(row.identifier)).second;
-    // Looking it up means to read everything, while there is no index.
+    // It has to be looked up, and so may others: what was moved is told once more.
+    if (!isNew) {
+      if (auto made = makeSearchIndexes(store_->database()); !made) return made;
+    }
     auto added = isNew ? store_->add(row) : store_->put(row);
     if (!added) return added;
   }

@@ -35,6 +35,6 @@ struct SearchRow {
 
 /// The bound of folded names and tags: what is longer is in no row. Names are shorter by nature,
 /// and further tags are left out.
-inline constexpr std::size_t longestSearchText = 16 << 10;
+inline constexpr std::size_t longestSearchText = 4 << 10;
 
 }  // namespace mirabel

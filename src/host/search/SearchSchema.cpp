@@ -24,9 +24,9 @@ constexpr const char* tables =
     " tokenize='trigram case_sensitive 1');";
 
 constexpr const char* indexes =
-    "CREATE UNIQUE INDEX identifiers ON items(identifier);"
-    "CREATE INDEX recents ON items(recency) WHERE flags = 0;"
-    "CREATE INDEX favorites ON items(favorite) WHERE favorite IS NOT NULL;";
+    "CREATE UNIQUE INDEX IF NOT EXISTS identifiers ON items(identifier);"
+    "CREATE INDEX IF NOT EXISTS recents ON items(recency) WHERE flags = 0;"
+    "CREATE INDEX IF NOT EXISTS favorites ON items(favorite) WHERE favorite IS NOT NULL;";
 
 Error anotherFormat() {
   return Error::store(SQLITE_SCHEMA, "the index has another format");

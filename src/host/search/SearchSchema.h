@@ -22,8 +22,8 @@ inline constexpr std::int64_t searchTrashed = 2;
 /// Binds them to the first parameters. The row lives until the statement was run.
 void bindSearchRow(Statement& statement, const SearchRow& row);
 
-/// Makes the tables in an empty database, and the indexes, which cost less once the tables are
-/// filled. Part of a transaction.
+/// Makes the tables in an empty database, and the indexes where they are missing, which
+/// cost less once the tables are filled. Part of a transaction.
 [[nodiscard]] Result<void> makeSearchTables(Database& database);
 [[nodiscard]] Result<void> makeSearchIndexes(Database& database);
 /// What a query of one row and one column answers; 0 for null.

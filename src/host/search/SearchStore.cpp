@@ -1,6 +1,7 @@
 #include "host/search/SearchStore.h"
 
 #include <utility>
+#include <vector>
 
 #include "foundation/Log.h"
 #include "host/search/SearchSchema.h"
@@ -103,7 +104,7 @@ Result<void> SearchStore::prepare() {
       .setAnchor = make("INSERT OR REPLACE INTO facts VALUES('anchor', ?)"),
       .count = make("SELECT count(*) FROM items"),
       .find = make("SELECT place, name, tags FROM items WHERE identifier = ?"),
-      .ofDomain = make("SELECT place, name, tags FROM items WHERE domain = ? LIMIT 1"),
+      .ofDomain = make("SELECT place, name, tags FROM items WHERE domain = ?"),
       .add = make("INSERT INTO items(" + columns + ", place) VALUES(" + parameters + ", ?)"),
       .addWords = make("INSERT INTO words(rowid, text) VALUES(?, ?)"),
       .remove = make("DELETE FROM items WHERE place = ?"),
@@ -157,7 +158,7 @@ Result<std::uint64_t> SearchStore::count() {
 }
 
 Result<void> SearchStore::put(const SearchRow& row) {
-  const auto known = find(statements_->find, row.identifier);
+  const auto known = find(row.identifier);
   if (!known) return fail(known.error());
   if (!*known) return add(row);
   const auto& [place, name, tags] = **known;
@@ -180,18 +181,27 @@ Result<void> SearchStore::add(const SearchRow& row) {
 }
 
 Result<void> SearchStore::remove(std::string_view identifier) {
-  const auto known = find(statements_->find, identifier);
+  const auto known = find(identifier);
   if (!known) return fail(known.error());
   return *known ? remove(**known) : Result<void>();
 }
 
 Result<void> SearchStore::removeDomain(std::string_view domain) {
-  while (true) {
-    const auto known = find(statements_->ofDomain, domain);
-    if (!known) return fail(known.error());
-    if (!*known) return {};
-    if (auto removed = remove(**known); !removed) return removed;
+  std::vector<Known> all;
+  {
+    Statement& rows = statements_->ofDomain;
+    const StatementScope scope(rows);
+    rows.bindBlob(1, domain);
+    while (true) {
+      const auto row = rows.step();
+      if (!row) return fail(row.error());
+      if (!*row) break;
+      all.push_back(knownOf(rows));
+    }
   }
+  for (const Known& known : all)
+    if (auto removed = remove(known); !removed) return removed;
+  return {};
 }
 
 Result<void> SearchStore::remove(const Known& known) {
@@ -199,15 +209,17 @@ Result<void> SearchStore::remove(const Known& known) {
   return statements_->remove.bind(1, known.place).run();
 }
 
-Result<std::optional<SearchStore::Known>> SearchStore::find(Statement& statement,
-                                                            std::string_view key) {
-  const StatementScope scope(statement);
-  statement.bindBlob(1, key);
-  const auto row = statement.step();
-  if (!row) return fail(row.error());
-  if (!*row) return std::nullopt;
-  return Known{statement.integer(0), std::string(statement.blob(1)),
-               std::string(statement.blob(2))};
+Result<std::optional<SearchStore::Known>> SearchStore::find(std::string_view identifier) {
+  Statement& row = statements_->find;
+  const StatementScope scope(row);
+  const auto isThere = row.bindBlob(1, identifier).step();
+  if (!isThere) return fail(isThere.error());
+  if (!*isThere) return std::nullopt;
+  return knownOf(row);
+}
+
+SearchStore::Known SearchStore::knownOf(const Statement& row) {
+  return {row.integer(0), std::string(row.blob(1)), std::string(row.blob(2))};
 }
 
 // Words ----------------------------------------------------------------------------------------

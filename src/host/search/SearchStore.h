@@ -68,8 +68,8 @@ class SearchStore {
   explicit SearchStore(std::unique_ptr<Database> database);
   [[nodiscard]] Result<void> fillIfEmpty();
   [[nodiscard]] Result<void> prepare();
-  [[nodiscard]] static Result<std::optional<Known>> find(Statement& statement,
-                                                         std::string_view key);
+  [[nodiscard]] Result<std::optional<Known>> find(std::string_view identifier);
+  [[nodiscard]] static Known knownOf(const Statement& row);
   [[nodiscard]] Result<void> remove(const Known& known);
   void setWords(std::int64_t place, std::optional<std::string> former,
                 std::optional<std::string> next);

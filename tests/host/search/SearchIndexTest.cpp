@@ -1,6 +1,8 @@
 #include <filesystem>
 #include <gmock/gmock.h>
+#include <iterator>
 #include <limits>
+#include <map>
 #include <random>
 #include <tuple>
 
@@ -201,53 +203,89 @@ TEST_F(SearchIndexTest, DomainsLeaveAndMayComeBack) {
   EXPECT_THAT(search({"draw"}), ElementsAre("drawing.txt"));
 }
 
-/// The answer as it is defined, from the names alone.
-Names expected(const std::vector<std::tuple<std::string, std::int64_t>>& rows, const Names& words,
-               std::size_t limit, SearchItems& items) {
-  std::vector<std::tuple<Match, std::int64_t, std::string, std::string>> found;
-  for (const auto& [name, modified] : rows) {
-    Match worst = Match::wholeWord;
-    bool isFound = true;
-    for (const std::string& word : words) {
-      const auto match = bestMatch(foldedText(name), foldedText(word));
-      isFound = isFound && match;
-      worst = std::max(worst, match.value_or(Match::insideWord));
-    }
-    if (isFound) found.emplace_back(worst, -modified, items.item(name)->itemIdentifier(), name);
-  }
-  std::ranges::sort(found);
-  Names names;
-  for (std::size_t i = 0; i < std::min(limit, found.size()); ++i)
-    names.push_back(std::get<3>(found[i]));
-  return names;
-}
-
-// Few words that many names have, so that there are far more matches than are looked at.
-TEST_F(SearchIndexTest, ManyMatchesAreAnsweredAsIfAllWereCompared) {
-  std::mt19937 random(7);
-  const Names parts{"art", "smart", "party", "a", "ar", "tart", "Größe", "x-ray", "12", "2"};
-  std::vector<std::tuple<std::string, std::int64_t>> rows;
-  VesselItems all;
-  for (int i = 0; i < 5000; ++i) {
+class ManyItems : public SearchIndexTest {
+ protected:
+  /// Few words that many names have, so that there are far more matches than are looked at.
+  std::string anyName() {
+    static const Names parts{"art", "smart", "party", "a", "ar", "tart", "Größe", "x-ray", "12"};
     std::string name;
     for (int word = 0; word < 2; ++word)
       name += parts[random() % parts.size()] + (random() % 4 == 0 ? "" : " ");
-    name += " " + std::to_string(i);
-    items.item(name);
-    const std::int64_t modified = 1'000 + static_cast<std::int64_t>(random() % 1'000'000);
-    items.node(name).modified = {modified, 0};
-    rows.emplace_back(name, modified);
-    all.push_back(items.item(name));
+    return name + " " + std::to_string(++number);
   }
+  std::shared_ptr<LocalItem> make(const std::string& name) {
+    items.item(name);
+    items.node(name).modified = {1'000 + static_cast<std::int64_t>(random() % 1'000'000), 0};
+    auto made = items.item(name);
+    rows[made->itemIdentifier()] = {foldedText(name), items.node(name).modified.seconds, name};
+    return made;
+  }
+  struct Row {
+    std::string folded;
+    std::int64_t modified = 0;
+    std::string name;
+  };
+
+  /// The answer as it is defined, from all rows.
+  Names expected(const Names& words, std::size_t limit) {
+    std::vector<std::tuple<Match, std::int64_t, std::string>> found;
+    for (const auto& [identifier, row] : rows) {
+      Match worst = Match::wholeWord;
+      bool isFound = true;
+      for (const std::string& word : words) {
+        const auto match = bestMatch(row.folded, foldedText(word));
+        isFound = isFound && match;
+        worst = std::max(worst, match.value_or(Match::insideWord));
+      }
+      if (isFound) found.emplace_back(worst, -row.modified, identifier);
+    }
+    std::ranges::sort(found);
+    found.resize(std::min(limit, found.size()));
+    Names identifiers;
+    for (const auto& each : found)
+      identifiers.push_back(std::get<2>(each));
+    return identifiers;
+  }
+  void expectRightAnswers(const std::string& after) {
+    const Names asked{"art", "mart", "ar", "a", "12", "2", "x-", "ray", "größ", "rt", "tar", "y s"};
+    for (int i = 0; i < 40; ++i) {
+      SearchQuery query;
+      for (std::size_t words = 1 + random() % 2; words > 0; --words)
+        query.words.push_back(asked[random() % asked.size()]);
+      query.limit = i % 3 == 0 ? 1500 : 20;
+      EXPECT_EQ(index->search(query).value(), expected(query.words, query.limit))
+          << after << ::testing::PrintToString(query.words) << query.limit;
+    }
+  }
+
+  std::mt19937 random{7};
+  std::map<std::string, Row> rows;
+  int number = 0;
+};
+
+TEST_F(ManyItems, AreAnsweredAsIfAllWereCompared) {
+  VesselItems all;
+  for (int i = 0; i < 5000; ++i)
+    all.push_back(make(anyName()));
   fill(all);
-  const Names asked{"art", "mart", "ar", "a", "12", "2", "x-", "ray", "größ", "rt", "tar", "y s"};
-  for (int i = 0; i < 60; ++i) {
-    SearchQuery query;
-    for (std::size_t words = 1 + random() % 2; words > 0; --words)
-      query.words.push_back(asked[random() % asked.size()]);
-    query.limit = i % 3 == 0 ? 1500 : 20;
-    EXPECT_EQ(search(query), expected(rows, query.words, query.limit, items))
-        << ::testing::PrintToString(query.words) << query.limit;
+  expectRightAnswers("the first feed");
+  for (int batch = 0; batch < 5; ++batch) {
+    VesselItems updated;
+    Names deleted;
+    const auto before = rows;
+    for (int i = 0; i < 100; ++i) {
+      // Each once: nothing is both updated and deleted in one batch.
+      const auto step = static_cast<std::ptrdiff_t>(i + 100 * (random() % 40));
+      const auto& [identifier, former] = *std::next(before.begin(), step);
+      rows.erase(identifier);
+      const std::string name = i % 3 == 0 ? former.name : anyName();
+      if (i % 3 == 1) deleted.push_back(identifier);
+      if (i % 3 == 2)
+        items.fake().volume.rename(items.fake().path(former.name), items.fake().path(name));
+      updated.push_back(make(name));
+    }
+    ASSERT_TRUE(index->apply(updated, deleted, anchorOf("b")));
+    expectRightAnswers("batch " + std::to_string(batch));
   }
 }
 
