@@ -9,6 +9,7 @@
 #include <string_view>
 
 #include "host/ErrorText.h"
+#include "host/bus/BusText.h"
 
 namespace mirabel::bus {
 namespace {
@@ -97,7 +98,8 @@ bool isOneOf(std::string_view name, std::initializer_list<std::string_view> name
 }  // namespace
 
 sdbus::Error errorForBus(const Error& error) {
-  return {std::string(prefix) + nameOf(error), explanation(error)};
+  // Paths in it may hold any bytes, and an answer that can't be sent leaves the caller waiting.
+  return {std::string(prefix) + nameOf(error), escaped(explanation(error))};
 }
 
 Error errorFromBus(const sdbus::Error& error) {

@@ -6,18 +6,13 @@
 #include <string_view>
 #include <type_traits>
 
-#include "foundation/Unicode.h"
+#include "host/bus/BusText.h"
 #include "items/TagData.h"
 
 namespace mirabel::bus {
 namespace {
 
 constexpr const char* entry = "sv";
-
-/// D-Bus texts are UTF-8 without NUL.
-bool isBusText(std::string_view text) {
-  return isUTF8(text) && text.find('\0') == std::string_view::npos;
-}
 
 bool isAtEnd(sdbus::Message& message) {
   std::string type;
@@ -100,20 +95,6 @@ class DictionaryWriter {
   void close() {
     message_.closeVariant();
     message_.closeDictEntry();
-  }
-  static std::string shown(std::string_view bytes) {
-    std::string text;
-    while (!bytes.empty()) {
-      const std::string_view before = bytes;
-      const auto character = takeUTF8Character(bytes);
-      if (character && *character != 0) {
-        text += before.substr(0, before.size() - bytes.size());
-      } else {
-        text += "\uFFFD";
-        if (!character) bytes.remove_prefix(1);
-      }
-    }
-    return text;
   }
 
   sdbus::Message& message_;

@@ -5,14 +5,28 @@
 #include <utility>
 
 #include "host/bus/BusConnection.h"
+#include "host/bus/BusErrors.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/BusNames.h"
+#include "host/bus/BusText.h"
 #include "host/bus/RemoteWatches.h"
 
 namespace mirabel::bus {
 namespace {
 
 using Write = BusConnection::Write;
+
+/// An identifier as an argument. None holds what is no text for the bus: there is no such item, as
+/// the service would say.
+struct Identifier {
+  explicit Identifier(std::string_view identifier) : text(identifier) {}
+  std::string text;
+};
+
+sdbus::Message& operator<<(sdbus::Message& call, const Identifier& identifier) {
+  if (!isBusText(identifier.text)) throw errorForBus(Error::nonExistentItem(identifier.text));
+  return call << identifier.text;
+}
 
 /// Writes arguments that the bus has types for.
 template <class... Arguments>
@@ -35,13 +49,22 @@ struct NameArgument {
   Options options;
 };
 
+/// What is searched for as text: bytes that are none are looked for like this anyway.
+std::vector<std::string> allShown(std::vector<std::string> texts) {
+  for (std::string& text : texts)
+    text = shown(text);
+  return texts;
+}
+
 /// A container that is asked for with each question.
 class RemoteContainer final : public DocumentContainer {
  public:
-  RemoteContainer(std::shared_ptr<BusConnection> connection, std::string identifier)
-      : connection_(std::move(connection)), identifier_(std::move(identifier)) {}
+  RemoteContainer(std::shared_ptr<BusConnection> connection, std::string_view identifier)
+      : connection_(std::move(connection)), identifier_(identifier) {}
 
   Result<ItemPage> items(const Data& page) override {
+    // For the service that would be the first one, and it is none that was handed out.
+    if (page.empty()) return fail(Error::syncAnchorExpired());
     return connection_->call(providerInterface, "ListItems", arguments(identifier_, page),
                              [](sdbus::Message& reply) {
                                ItemPage answer;
@@ -69,7 +92,7 @@ class RemoteContainer final : public DocumentContainer {
 
  private:
   std::shared_ptr<BusConnection> connection_;
-  std::string identifier_;
+  Identifier identifier_;
 };
 
 /// Begins an operation that hands back the item.
@@ -117,7 +140,7 @@ RemoteDocuments::RemoteDocuments(std::shared_ptr<BusConnection> connection, Home
 RemoteDocuments::~RemoteDocuments() = default;
 
 Documents::ItemResult RemoteDocuments::item(std::string_view identifier) {
-  return connection_->call(providerInterface, "GetItem", arguments(std::string(identifier)),
+  return connection_->call(providerInterface, "GetItem", arguments(Identifier(identifier)),
                            readItem);
 }
 
@@ -127,17 +150,22 @@ Documents::ItemResult RemoteDocuments::itemAtPath(const std::string& path) {
 }
 
 Result<std::unique_ptr<DocumentContainer>> RemoteDocuments::container(std::string_view identifier) {
-  return std::make_unique<RemoteContainer>(connection_, std::string(identifier));
+  auto container = std::make_unique<RemoteContainer>(connection_, identifier);
+  const auto anchor = container->currentSyncAnchor();
+  const bool isThere = anchor || anchor.error().is(LocalVesselError::unableToGetDeviceUUID);
+  if (!isThere) return fail(anchor.error());
+  return container;
 }
 
 Result<std::unique_ptr<ContainerWatch>> RemoteDocuments::watch(std::string_view identifier,
                                                                std::function<void()> changed) {
+  if (!isBusText(identifier)) return fail(Error::nonExistentItem(identifier));
   return RemoteWatches::add(watches_, std::string(identifier), std::move(changed));
 }
 
 Result<UniqueFd> RemoteDocuments::openFile(std::string_view identifier, Access access) {
   const std::string mode = access == Access::reading ? "r" : "rw";
-  return connection_->call(providerInterface, "OpenItem", arguments(std::string(identifier), mode),
+  return connection_->call(providerInterface, "OpenItem", arguments(Identifier(identifier), mode),
                            [](sdbus::Message& reply) {
                              sdbus::UnixFd file;
                              reply >> file;
@@ -147,20 +175,21 @@ Result<UniqueFd> RemoteDocuments::openFile(std::string_view identifier, Access a
 
 void RemoteDocuments::importDocument(const std::string& source, const std::string& parent,
                                      ItemHandler handler) {
-  begin(*connection_, "ImportPath", arguments(dataFromString(source), parent), std::move(handler));
+  begin(*connection_, "ImportPath", arguments(dataFromString(source), Identifier(parent)),
+        std::move(handler));
 }
 
 void RemoteDocuments::createDirectory(const std::string& name, const std::string& parent,
                                       ItemHandler handler) {
   const NameArgument named(name);
-  begin(*connection_, "CreateDirectory", arguments(named.text, parent, named.options),
+  begin(*connection_, "CreateDirectory", arguments(named.text, Identifier(parent), named.options),
         std::move(handler));
 }
 
 void RemoteDocuments::rename(const std::string& identifier, const std::string& name,
                              ItemHandler handler) {
   const NameArgument named(name);
-  begin(*connection_, "Rename", arguments(identifier, named.text, named.options),
+  begin(*connection_, "Rename", arguments(Identifier(identifier), named.text, named.options),
         std::move(handler));
 }
 
@@ -168,45 +197,50 @@ void RemoteDocuments::reparent(const std::string& identifier, const std::string&
                                const std::optional<std::string>& newName, ItemHandler handler) {
   Options options;
   if (newName) setNameOption(options, "name", *newName);
-  begin(*connection_, "Reparent", arguments(identifier, parent, options), std::move(handler));
+  begin(*connection_, "Reparent", arguments(Identifier(identifier), Identifier(parent), options),
+        std::move(handler));
 }
 
 void RemoteDocuments::remove(const std::string& identifier, ErrorHandler handler) {
-  beginWithoutItem(*connection_, operationsInterface, "Delete", arguments(identifier),
+  beginWithoutItem(*connection_, operationsInterface, "Delete", arguments(Identifier(identifier)),
                    std::move(handler));
 }
 
 void RemoteDocuments::trash(const std::string& identifier, ItemHandler handler) {
-  begin(*connection_, "Trash", arguments(identifier), std::move(handler));
+  begin(*connection_, "Trash", arguments(Identifier(identifier)), std::move(handler));
 }
 
 void RemoteDocuments::restore(const std::string& identifier,
                               const std::optional<std::string>& parent, ItemHandler handler) {
+  if (parent && !isBusText(*parent)) return handler(fail(Error::nonExistentItem(*parent)));
   Options options;
   if (parent) options["parent"] = sdbus::Variant(*parent);
-  begin(*connection_, "Restore", arguments(identifier, options), std::move(handler));
+  begin(*connection_, "Restore", arguments(Identifier(identifier), options), std::move(handler));
 }
 
 void RemoteDocuments::setLastUsedDate(const std::string& identifier,
                                       const std::optional<Date>& date, ItemHandler handler) {
   const std::string text = date ? date->rfc3339() : std::string();
-  begin(*connection_, "SetLastUsedDate", arguments(identifier, text), std::move(handler));
+  begin(*connection_, "SetLastUsedDate", arguments(Identifier(identifier), text),
+        std::move(handler));
 }
 
 void RemoteDocuments::setTagData(const std::string& identifier, const std::optional<Data>& tagData,
                                  ItemHandler handler) {
-  begin(*connection_, "SetTagData", arguments(identifier, tagData.value_or(Data())),
+  begin(*connection_, "SetTagData", arguments(Identifier(identifier), tagData.value_or(Data())),
         std::move(handler));
 }
 
 void RemoteDocuments::setFavoriteRank(const std::string& identifier,
                                       const std::optional<Number>& rank, ItemHandler handler) {
   if (!rank) {
-    return begin(*connection_, "ClearFavoriteRank", arguments(identifier), std::move(handler));
+    return begin(*connection_, "ClearFavoriteRank", arguments(Identifier(identifier)),
+                 std::move(handler));
   }
   const auto variant =
       std::visit([](const auto& value) { return sdbus::Variant(value); }, rank->value);
-  begin(*connection_, "SetFavoriteRank", arguments(identifier, variant), std::move(handler));
+  begin(*connection_, "SetFavoriteRank", arguments(Identifier(identifier), variant),
+        std::move(handler));
 }
 
 Result<TrashFindings> RemoteDocuments::itemsTrashedBefore(const Date& date) {
@@ -239,7 +273,7 @@ Result<std::vector<ItemRecord>> RemoteDocuments::appLibraries() {
 }
 
 Result<ApplicationContainer> RemoteDocuments::applicationContainer(const std::string& bundle) {
-  return connection_->call(providerInterface, "GetDefaultContainer", arguments(bundle),
+  return connection_->call(providerInterface, "GetDefaultContainer", arguments(shown(bundle)),
                            [](sdbus::Message& reply) {
                              ApplicationContainer container;
                              container.item = readItem(reply);
@@ -250,17 +284,18 @@ Result<ApplicationContainer> RemoteDocuments::applicationContainer(const std::st
 
 Result<std::optional<Data>> RemoteDocuments::icon(const std::string& identifier,
                                                   std::uint32_t side) {
-  return connection_->call(
-      providerInterface, "GetIcon", arguments(identifier, side), [](sdbus::Message& reply) {
-        Data picture = readBytes(reply);
-        return picture.empty() ? std::nullopt : std::optional(std::move(picture));
-      });
+  return connection_->call(providerInterface, "GetIcon", arguments(Identifier(identifier), side),
+                           [](sdbus::Message& reply) {
+                             Data picture = readBytes(reply);
+                             return picture.empty() ? std::nullopt
+                                                    : std::optional(std::move(picture));
+                           });
 }
 
 Result<std::vector<ItemRecord>> RemoteDocuments::search(const SearchQuery& query) {
   Options options;
-  if (!query.tags.empty()) options["tags"] = sdbus::Variant(query.tags);
-  if (query.type) options["type"] = sdbus::Variant(*query.type);
+  if (!query.tags.empty()) options["tags"] = sdbus::Variant(allShown(query.tags));
+  if (query.type) options["type"] = sdbus::Variant(shown(*query.type));
   if (query.modifiedSince) {
     options["modifiedSince"] = sdbus::Variant(query.modifiedSince->rfc3339());
   }
@@ -269,7 +304,8 @@ Result<std::vector<ItemRecord>> RemoteDocuments::search(const SearchQuery& query
   }
   options["includesTrashed"] = sdbus::Variant(query.includesTrashed);
   options["limit"] = sdbus::Variant(limited(query.limit));
-  return connection_->call(providerInterface, "Search", arguments(query.words, options), readItems);
+  return connection_->call(providerInterface, "Search", arguments(allShown(query.words), options),
+                           readItems);
 }
 
 Result<std::vector<ItemRecord>> RemoteDocuments::recent(std::size_t limit) {

@@ -24,7 +24,6 @@ class RemoteDocuments final : public Documents {
 
   [[nodiscard]] ItemResult item(std::string_view identifier) override;
   [[nodiscard]] ItemResult itemAtPath(const std::string& path) override;
-  /// What is wrong with the container shows when it is asked.
   [[nodiscard]] Result<std::unique_ptr<DocumentContainer>> container(
       std::string_view identifier) override;
   [[nodiscard]] Result<std::unique_ptr<ContainerWatch>> watch(
