@@ -182,6 +182,9 @@ ContainerWatches::~ContainerWatches() {
 Result<std::unique_ptr<ContainerWatch>> ContainerWatches::add(const std::string& identifier,
                                                               std::function<void()> changed,
                                                               Wake wake) {
+  // What others watch may have gone since.
+  if (auto place = LocalContainer::placeOf(provider_, identifier); !place)
+    return fail(place.error());
   auto watcher = std::make_shared<Watcher>(std::move(changed), wake);
   std::unique_ptr<ContainerWatch> entry = std::make_unique<Entry>(*this, watcher);
   {
