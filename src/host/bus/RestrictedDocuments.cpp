@@ -66,7 +66,10 @@ class RestrictedContainer final : public DocumentContainer {
     answer->updated = std::move(updated);
     return answer;
   }
-  Result<Data> currentSyncAnchor() override { return container_->currentSyncAnchor(); }
+  Result<Data> currentSyncAnchor() override {
+    if (auto own = documents_.requireOwn(identifier_); !own) return fail(own.error());
+    return container_->currentSyncAnchor();
+  }
 
  private:
   RestrictedDocuments documents_;
@@ -126,7 +129,12 @@ Result<std::unique_ptr<ContainerWatch>> RestrictedDocuments::watch(std::string_v
                                                                    std::function<void()> changed) {
   if (isMadeOfSeveralFolders(identifier)) return fail(notForSandboxes());
   if (auto own = requireOwn(identifier); !own) return fail(own.error());
-  return all_.watch(identifier, std::move(changed));
+  // Of one that has left the application's folder it is told that, and nothing more.
+  return all_.watch(identifier, [documents = *this, watched = std::string(identifier),
+                                 wasOwn = true, changed = std::move(changed)]() mutable {
+    const bool isOwn = documents.requireOwn(watched).has_value();
+    if (std::exchange(wasOwn, isOwn) || isOwn) changed();
+  });
 }
 
 Result<UniqueFd> RestrictedDocuments::openFile(std::string_view identifier, Access access) {
