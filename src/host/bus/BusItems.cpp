@@ -13,6 +13,7 @@ namespace mirabel::bus {
 namespace {
 
 constexpr const char* entry = "sv";
+constexpr std::string_view numberTypes = "xtd";
 
 bool isAtEnd(sdbus::Message& message) {
   std::string type;
@@ -129,7 +130,7 @@ Number readNumber(sdbus::Message& message, std::string_view signature) {
 template <class Record>
 struct Property {
   std::string_view key;
-  std::string_view signatures;  ///< one or several of a letter each
+  std::string_view signatures;  ///< the type, or those of numbers
   void (*read)(sdbus::Message& message, std::string_view signature, Record& record);
 };
 
@@ -137,8 +138,9 @@ template <class Record>
 bool isExpected(const Property<Record>& property, std::string_view key,
                 std::string_view signature) {
   if (property.key != key) return false;
-  return property.signatures == signature ||
-         (signature.size() == 1 && property.signatures.find(signature) != std::string_view::npos);
+  if (property.signatures == signature) return true;
+  return property.signatures == numberTypes && signature.size() == 1 &&
+         numberTypes.find(signature) != std::string_view::npos;
 }
 
 /// Reads a dictionary a{sv}; what no property expects is passed over.
@@ -205,7 +207,7 @@ constexpr std::array itemProperties{
     ofItem<&ItemRecord::filename>("filename", "s"),
     ofItem<&ItemRecord::filename>("filenameBytes", "ay"),
     ofItem<&ItemRecord::typeIdentifier>("typeIdentifier", "s"),
-    ofItem<&ItemRecord::documentSize>("documentSize", "xtd"),
+    ofItem<&ItemRecord::documentSize>("documentSize", numberTypes),
     ofItem<&ItemRecord::creationDate>("creationDate", "(xu)"),
     ofItem<&ItemRecord::contentModificationDate>("contentModificationDate", "(xu)"),
     ofItem<&ItemRecord::childItemCount>("childItemCount", "q"),
@@ -213,7 +215,7 @@ constexpr std::array itemProperties{
     ofItem<&ItemRecord::isTrashed>("isTrashed", "b"),
     ofItem<&ItemRecord::lastUsedDate>("lastUsedDate", "(xu)"),
     ofItem<&ItemRecord::tagData>("tagData", "ay"),
-    ofItem<&ItemRecord::favoriteRank>("favoriteRank", "xtd"),
+    ofItem<&ItemRecord::favoriteRank>("favoriteRank", numberTypes),
     ofItem<&ItemRecord::fileID>("fileID", "t"),
     ofItem<&ItemRecord::docID>("docID", "t"),
     ofItem<&ItemRecord::beaconDomainIdentifier>("vs_beaconDomainIdentifier", "s"),
