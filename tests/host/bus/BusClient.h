@@ -28,7 +28,7 @@ class BusClient {
   template <class... Arguments>
   Answer call(const char* interface, const char* method, const Arguments&... arguments) {
     auto message = service_->createMethodCall(interface, method);
-    (message << ... << arguments);
+    static_cast<void>((message << ... << arguments));
     return send(message);
   }
   template <class... Arguments>
