@@ -83,7 +83,7 @@ class Batch final : public VesselChangeObserver {
 
 }  // namespace
 
-Result<void> SearchFeeder::catchUp(VesselEnumerator& workingSet, std::stop_token stop) {
+Result<void> SearchFeeder::catchUp(VesselEnumerator& workingSet, const std::stop_token& stop) {
   const std::lock_guard lock(mutex_);
   bool isUsable = true;
   for (int listings = 0; listings < mostListings; ++listings) {

@@ -22,7 +22,8 @@ class SearchFeeder {
   /// asked by this thread, under no lock of the index. Errors: those of the enumerator and of the
   /// index; `syncAnchorExpired` when listings expired time and again, which may be tried later;
   /// POSIX ECANCELED when it was asked to stop. Whatever the error, what was committed stays.
-  [[nodiscard]] Result<void> catchUp(VesselEnumerator& workingSet, std::stop_token stop = {});
+  [[nodiscard]] Result<void> catchUp(VesselEnumerator& workingSet,
+                                     const std::stop_token& stop = {});
 
  private:
   /// Answers the anchor that the rows have now.

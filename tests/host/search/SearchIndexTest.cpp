@@ -4,6 +4,8 @@
 #include <limits>
 #include <map>
 #include <random>
+#include <stop_token>
+#include <thread>
 #include <tuple>
 
 #include "host/search/SearchFixture.h"
@@ -201,6 +203,40 @@ TEST_F(SearchIndexTest, DomainsLeaveAndMayComeBack) {
   EXPECT_THAT(search({"txt"}), UnorderedElementsAreArray({"own.txt", "song.txt"}));
   ASSERT_TRUE(index->apply({drawn}, {}, anchorOf("c")));
   EXPECT_THAT(search({"draw"}), ElementsAre("drawing.txt"));
+}
+
+// Each answer is of one state, while states follow each other by changes and by starting over.
+TEST_F(SearchIndexTest, WhoSearchesMeanwhileSeesOneStateOrAnother) {
+  const auto namesOf = [](int generation) {
+    Names names;
+    for (int i = 0; i < 50; ++i)
+      names.push_back("gen" + std::to_string(generation) + " " + std::to_string(i));
+    return names;
+  };
+  fill(items.items({}));
+  std::jthread searching([this](const std::stop_token& stop) {
+    while (!stop.stop_requested()) {
+      const auto found = index->search({.words = {"gen"}}).value();
+      if (found.empty()) continue;
+      const std::string generation = found.front().substr(0, found.front().find(' '));
+      EXPECT_EQ(found.size(), 50u);
+      for (const std::string& identifier : found)
+        EXPECT_TRUE(identifier.starts_with(generation + " ")) << identifier;
+    }
+  });
+  for (int generation = 1; generation < 20; ++generation) {
+    VesselItems next;
+    for (const std::string& name : namesOf(generation)) {
+      ItemOverrides overrides;
+      overrides.customItemID = name;
+      next.push_back(items.item(name, overrides));
+    }
+    if (generation % 2 == 0) {
+      fill(next);
+    } else {
+      ASSERT_TRUE(index->apply(next, namesOf(generation - 1), anchorOf("b")));
+    }
+  }
 }
 
 class ManyItems : public SearchIndexTest {
