@@ -9,6 +9,7 @@
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
 #include "host/ErrorText.h"
+#include "host/bus/RemoteDocuments.h"
 #include "linux/files/HomeLayout.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/volume/FollowStatus.h"
@@ -160,6 +161,21 @@ void addApplicationFindings(const StatusReport& status, std::vector<Finding>& fi
   }
 }
 
+Finding serviceFinding(const HomeLayout& layout) {
+  const std::string subject = "service";
+  if (bus::RemoteDocuments::connect({layout.home, layout.stateFolder})) {
+    return {subject, Health::good, "it runs for this home, and commands go through it", ""};
+  }
+  if (bus::RemoteDocuments::hasBus()) {
+    return {subject, Health::good,
+            "it does not run for this home; commands do without, other programs can't",
+            "\"systemctl --user enable --now mirabel\" starts it"};
+  }
+  return {subject, Health::limited,
+          "there is no session bus: other programs can't reach the documents; commands do without",
+          "log in to a session that has one"};
+}
+
 Result<StatusReport> statusOf(const Program& program) {
   const GlobalOptions& options = program.options();
   const auto documents = openDocuments({options.home, options.timeout, options.embedded,
@@ -189,6 +205,7 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
     findings.push_back(uuidFinding(abilities->hasUUID));
     findings.push_back(watchingFinding(*volume));
   }
+  findings.push_back(serviceFinding(layout));
   const auto status = statusOf(program);
   findings.push_back(stateFinding(status ? Result<void>() : fail(status.error()), layout));
   if (status) addApplicationFindings(*status, findings);

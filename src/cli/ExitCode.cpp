@@ -17,6 +17,7 @@ ExitCode exitCodeForPosix(std::int64_t code) {
       return ExitCode::nameTaken;
     case EBUSY:
     case ENOTCONN:
+    case EADDRINUSE:
       return ExitCode::busy;
     default:
       return ExitCode::failed;

@@ -33,7 +33,7 @@ std::string posixMeaning(int code) {
 // These are chosen for their exit code; their details say everything that their names would.
 bool detailIsEnough(std::int64_t code) {
   return code == EBUSY || code == EINVAL || code == ENOTDIR || code == EPERM || code == ENOTCONN ||
-         code == ENOBUFS || code == ECANCELED;
+         code == ENOBUFS || code == EADDRINUSE || code == ECANCELED;
 }
 
 std::string posixText(const Error& error) {

@@ -103,7 +103,7 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
   }
   EXPECT_EQ(subjects, (std::set<std::string>{"home", "documents", "extended attributes",
                                              "birth times", "file handles", "volume UUID",
-                                             "watching", "state", "app libraries"}));
+                                             "watching", "service", "state", "app libraries"}));
   home.remove("");
   const Answer missing = run({"doctor"});
   EXPECT_EQ(missing.code, 1);

@@ -39,6 +39,7 @@ class Running {
   Running(const Running&) = delete;
   Running& operator=(const Running&) = delete;
 
+  [[nodiscard]] pid_t id() const { return process_; }
   [[nodiscard]] Lines& output() { return output_; }
   [[nodiscard]] Lines& errors() { return errors_; }
   /// Neither may be called once its end was waited for: they throw.

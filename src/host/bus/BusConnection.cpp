@@ -47,6 +47,14 @@ std::shared_ptr<BusConnection> BusConnection::open() {
   }
 }
 
+bool BusConnection::hasBus() {
+  try {
+    return sdbus::createSessionBusConnection() != nullptr;
+  } catch (const sdbus::Error&) {
+    return false;
+  }
+}
+
 void BusConnection::setOwner(const std::string& uniqueName) {
   const std::lock_guard lock(mutex_);
   owner_ = nullptr;

@@ -22,6 +22,8 @@ class BusConnection {
   /// Null where there is no session bus, or nobody has the service's name; none is started for
   /// this.
   [[nodiscard]] static std::shared_ptr<BusConnection> open();
+  /// Whether there is a session bus that can be reached.
+  [[nodiscard]] static bool hasBus();
 
   using Write = std::function<void(sdbus::Message& call)>;
 

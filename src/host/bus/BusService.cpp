@@ -154,7 +154,7 @@ Result<std::unique_ptr<BusService>> BusService::start(LocalDocuments& documents,
   } catch (const sdbus::Error& error) {
     if (error.getName() == "org.freedesktop.DBus.Error.FileExists" ||
         error.getName() == "System.Error.EEXIST" || error.getName() == "System.Error.EALREADY") {
-      return fail(Error::posix(EBUSY, "another service is on this bus"));
+      return fail(Error::posix(EADDRINUSE, "another service is on this bus"));
     }
     return fail(Error::posix(ENOTCONN, "no session bus can be reached: " + error.getMessage()));
   }

@@ -15,7 +15,7 @@ class BusService {
  public:
   /// Takes the service's name. `documents` outlives the service's calls: until `stop` has returned.
   /// `lost` is called when the bus has gone away, on a thread of the service.
-  /// Errors: POSIX ENOTCONN where there is no session bus; EBUSY where another service has the
+  /// Errors: POSIX ENOTCONN where there is no session bus; EADDRINUSE where another service has the
   /// name.
   [[nodiscard]] static Result<std::unique_ptr<BusService>> start(LocalDocuments& documents,
                                                                  std::function<void()> lost);

@@ -128,6 +128,10 @@ std::unique_ptr<RemoteDocuments> RemoteDocuments::connect(const HomePlaces& plac
   return std::unique_ptr<RemoteDocuments>(new RemoteDocuments(std::move(connection), places));
 }
 
+bool RemoteDocuments::hasBus() {
+  return BusConnection::hasBus();
+}
+
 RemoteDocuments::RemoteDocuments(std::shared_ptr<BusConnection> connection, HomePlaces places)
     : connection_(std::move(connection)),
       watches_(std::make_shared<RemoteWatches>(*connection_)),

@@ -20,6 +20,8 @@ class RemoteDocuments final : public Documents {
  public:
   /// Null where the service does not run, or runs for another home or with another state.
   [[nodiscard]] static std::unique_ptr<RemoteDocuments> connect(const HomePlaces& places);
+  /// Whether there is a session bus that a service could be on.
+  [[nodiscard]] static bool hasBus();
   ~RemoteDocuments() override;
 
   [[nodiscard]] ItemResult item(std::string_view identifier) override;
