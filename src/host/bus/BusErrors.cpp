@@ -49,9 +49,10 @@ constexpr std::array namedErrors{
 
 // The last element of a bus name may hold letters, digits and underscores only.
 std::string nameOf(const Error& error) {
-  for (const NamedError& candidate : namedErrors)
+  for (const NamedError& candidate : namedErrors) {
     if (candidate.domain == error.domain && candidate.code == error.code)
       return std::string(candidate.name);
+  }
   if (error.domain == ErrorDomain::posix) {
     const char* name = ::strerrorname_np(static_cast<int>(error.code));
     return std::string(posixPrefix) + (name != nullptr ? name : "EIO");
