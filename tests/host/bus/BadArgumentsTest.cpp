@@ -125,6 +125,7 @@ std::vector<Write> hostileOptions() {
       {"name", sdbus::Variant(large)},
       {"name", sdbus::Variant(std::string("../up"))},
       {"name", sdbus::Variant(std::int32_t{7})},
+      {"name", sdbus::Variant(sdbus::UnixFd(STDIN_FILENO))},
       {"nameBytes", sdbus::Variant(Data{'a', 0, 'b'})},
       {"nameBytes", sdbus::Variant(Data{'.', '.'})},
       {"nameBytes", sdbus::Variant(Data())},

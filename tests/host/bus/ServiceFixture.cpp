@@ -1,7 +1,5 @@
 #include "host/bus/ServiceFixture.h"
 
-#include <csignal>
-
 namespace mirabel::testing {
 
 void ServiceFixture::SetUp() {
@@ -15,13 +13,6 @@ void ServiceFixture::serve() {
   // It says so once its name is taken and calls are answered.
   const std::string line = service->errors().line();
   ASSERT_THAT(line, ::testing::StartsWith("mirabel: serving "));
-}
-
-int ServiceFixture::end() {
-  service->send(SIGTERM);
-  const int status = service->end();
-  service.reset();
-  return status;
 }
 
 }  // namespace mirabel::testing

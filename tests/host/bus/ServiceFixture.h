@@ -19,8 +19,6 @@ class ServiceFixture : public ::testing::Test {
   /// Starts the service and waits until it answers. What the home holds by then is found by its
   /// first look, and what comes later is followed.
   void serve();
-  /// Asks it to end, and answers the wait status.
-  int end();
 
   TempHome home;
   std::unique_ptr<PrivateBus> bus;
