@@ -57,6 +57,8 @@ bool BusConnection::hasBus() {
 
 void BusConnection::setOwner(const std::string& uniqueName) {
   const std::lock_guard lock(mutex_);
+  if (uniqueName == ownerName_) return;
+  ownerName_ = uniqueName;
   owner_ = nullptr;
   if (uniqueName.empty()) return;
   owners_.push_back(sdbus::createProxy(*connection_, uniqueName, objectPath));
@@ -69,8 +71,35 @@ sdbus::IProxy& BusConnection::owner() {
   throw sdbus::Error("org.freedesktop.DBus.Error.ServiceUnknown", "the service has left");
 }
 
+bool BusConnection::findNewOwner() {
+  try {
+    const std::string now = ownerOfName(*connection_);
+    {
+      const std::lock_guard lock(mutex_);
+      if (now == ownerName_) return false;
+    }
+    setOwner(now);
+    return true;
+  } catch (const sdbus::Error&) {
+    return false;
+  }
+}
+
 sdbus::MethodReply BusConnection::send(const char* interface, const char* method,
                                        const Write& write) {
+  try {
+    return sendToOwner(interface, method, write);
+  } catch (const sdbus::Error& error) {
+    // It never arrived. That another service is there may not have been heard of yet.
+    const bool isNobody = error.getName() == "org.freedesktop.DBus.Error.ServiceUnknown" ||
+                          error.getName() == "org.freedesktop.DBus.Error.NameHasNoOwner";
+    if (!isNobody || !findNewOwner()) throw;
+  }
+  return sendToOwner(interface, method, write);
+}
+
+sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char* method,
+                                              const Write& write) {
   sdbus::IProxy& service = owner();
   auto message = service.createMethodCall(interface, method);
   if (write) write(message);

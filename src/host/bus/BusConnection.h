@@ -55,8 +55,12 @@ class BusConnection {
   [[nodiscard]] sdbus::MethodReply send(const char* interface, const char* method,
                                         const Write& write);
 
+  [[nodiscard]] sdbus::MethodReply sendToOwner(const char* interface, const char* method,
+                                               const Write& write);
   /// Who has the service's name; empty: nobody.
   void setOwner(const std::string& uniqueName);
+  /// Asks the bus who has the name now; whether that is somebody else than was known.
+  [[nodiscard]] bool findNewOwner();
   [[nodiscard]] sdbus::IProxy& owner();
 
   std::unique_ptr<sdbus::IConnection> connection_;
@@ -66,6 +70,7 @@ class BusConnection {
   /// one that has left. Those that left stay, for calls that were sent to them may be pending.
   std::vector<std::unique_ptr<sdbus::IProxy>> owners_;
   sdbus::IProxy* owner_ = nullptr;
+  std::string ownerName_;
   sdbus::Slot moving_;
   std::atomic<bool> isLost_ = false;
   std::unique_ptr<BusLoop> loop_;
