@@ -46,9 +46,10 @@ TEST(BusErrors, ComeBackWithDomainCodeAndWords) {
 
 TEST(BusErrors, HoldNothingThatTheBusRefuses) {
   using namespace std::string_literals;
-  const std::string bytes = "caf\xe9 \0 \xed\xa0\x80 end"s;
+  const std::string bytes = "caf\xe9 \0 \xed\xa0\x80 \xef\xbf\xbe end"s;
   const sdbus::Error told = bus::errorForBus(Error::posix(ENOENT, bytes));
-  EXPECT_EQ(told.getMessage(), "caf\\xe9 \\x00 \\xed\\xa0\\x80 end: no such file or folder");
+  EXPECT_EQ(told.getMessage(),
+            "caf\\xe9 \\x00 \\xed\\xa0\\x80 \\xef\\xbf\\xbe end: no such file or folder");
 }
 
 TEST(BusErrors, OfTheBusAndOfNewerServicesAreUnderstood) {

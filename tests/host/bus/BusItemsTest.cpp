@@ -47,11 +47,12 @@ rc::Gen<std::optional<Value>> maybe(rc::Gen<Value> value) {
                         }));
 }
 
-// Texts, and bytes that are none: NUL, cut characters, surrogates.
+// Texts, and bytes that are none for the bus: NUL, cut characters, surrogates, noncharacters.
 rc::Gen<std::string> anyName() {
   return rc::gen::oneOf(rc::gen::arbitrary<std::string>(),
-                        rc::gen::element<std::string>("", "caf\xe9", "a\nb", "\xed\xa0\x80",
-                                                      std::string("a\0b", 3), "Gr\u00fcn"));
+                        rc::gen::element<std::string>(
+                            "", "caf\xe9", "a\nb", "\xed\xa0\x80", "\xef\xb7\xa5", "\xef\xbf\xbf",
+                            "\xf0\x9f\xbf\xbe", std::string("a\0b", 3), "Gr\u00fcn"));
 }
 
 rc::Gen<Data> anyData() {

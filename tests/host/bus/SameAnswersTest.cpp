@@ -19,6 +19,7 @@ using Words = std::vector<std::string>;
 const std::string longName(255, 'n');
 const std::string bytes = "caf\xe9";
 const std::string lines = "two\nlines\t\033[31m";
+const std::string noCharacter = "\xef\xb7\xa5";  // UTF-8, but no text for the bus
 const std::string notUTF8 = "\xff\xfe";
 
 /// The order of what is of one moment would be another in each home.
@@ -202,6 +203,9 @@ const Words commands[] = {
     {"mkdir", "new", "--in", "root"},
     {"mkdir", bytes, "--in", "@/folder"},
     {"mkdir", lines, "--in", "@/folder"},
+    {"mkdir", noCharacter, "--in", "@/folder"},
+    {"rename", "@/folder/" + noCharacter, noCharacter + "2"},
+    {"ls", "@/folder"},
     {"mkdir", longName, "--in", "@/folder"},
     {"mkdir", longName + "n", "--in", "@/folder"},
     {"mkdir", "", "--in", "@/folder"},
