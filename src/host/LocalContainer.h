@@ -27,7 +27,7 @@ class LocalContainer final : public DocumentContainer {
   LocalContainer(const LocalContainer&) = delete;
   LocalContainer& operator=(const LocalContainer&) = delete;
 
-  [[nodiscard]] Result<ItemPage> items(const Data& page) override;
+  [[nodiscard]] Result<ItemPage> items(const Data& cursor) override;
   [[nodiscard]] Result<ItemChanges> changes(const Data& anchor) override;
   [[nodiscard]] Result<Data> currentSyncAnchor() override;
 

@@ -20,7 +20,7 @@ Searching::~Searching() {
   if (workingSet_) workingSet_->invalidate();
 }
 
-Result<SearchIndex*> Searching::inStep(std::stop_token stop) {
+Result<SearchIndex*> Searching::inStep(const std::stop_token& stop) {
   const auto index = provider_.searchableItems().index();
   if (!index) return fail(index.error());
   {
@@ -33,7 +33,7 @@ Result<SearchIndex*> Searching::inStep(std::stop_token stop) {
       workingSet_ = *std::move(made);
     }
   }
-  if (auto fed = feeder_->catchUp(*workingSet_, std::move(stop)); !fed) return fail(fed.error());
+  if (auto fed = feeder_->catchUp(*workingSet_, stop); !fed) return fail(fed.error());
   return *index;
 }
 

@@ -37,7 +37,7 @@ class Searching {
   [[nodiscard]] Result<std::vector<std::string>> favorites(std::size_t limit);
 
  private:
-  [[nodiscard]] Result<SearchIndex*> inStep(std::stop_token stop = {});
+  [[nodiscard]] Result<SearchIndex*> inStep(const std::stop_token& stop = {});
   void feed(const std::stop_token& stop, ContainerWatches& watches);
 
   HostedProvider& provider_;

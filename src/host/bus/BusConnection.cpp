@@ -71,15 +71,16 @@ sdbus::IProxy& BusConnection::owner() {
   throw sdbus::Error("org.freedesktop.DBus.Error.ServiceUnknown", "the service has left");
 }
 
-bool BusConnection::findNewOwner() {
+std::string BusConnection::ownerName() {
+  const std::lock_guard lock(mutex_);
+  return ownerName_;
+}
+
+bool BusConnection::findOwnerOtherThan(const std::string& former) {
   try {
     const std::string now = ownerOfName(*connection_);
-    {
-      const std::lock_guard lock(mutex_);
-      if (now == ownerName_) return false;
-    }
     setOwner(now);
-    return true;
+    return now != former;
   } catch (const sdbus::Error&) {
     return false;
   }
@@ -87,13 +88,14 @@ bool BusConnection::findNewOwner() {
 
 sdbus::MethodReply BusConnection::send(const char* interface, const char* method,
                                        const Write& write) {
+  const std::string former = ownerName();
   try {
     return sendToOwner(interface, method, write);
   } catch (const sdbus::Error& error) {
     // It never arrived. That another service is there may not have been heard of yet.
     const bool isNobody = error.getName() == "org.freedesktop.DBus.Error.ServiceUnknown" ||
                           error.getName() == "org.freedesktop.DBus.Error.NameHasNoOwner";
-    if (!isNobody || !findNewOwner()) throw;
+    if (!isNobody || !findOwnerOtherThan(former)) throw;
   }
   return sendToOwner(interface, method, write);
 }
@@ -113,10 +115,11 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
   service.callMethod(
       message,
       [answer](sdbus::MethodReply& reply, const sdbus::Error* error) {
-        if (error != nullptr)
+        if (error != nullptr) {
           answer->error = *error;
-        else
+        } else {
           answer->reply = reply;
+        }
         answer->isThere.set_value();
       },
       withoutTimeout);
@@ -130,7 +133,7 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
 
 void BusConnection::callAsync(
     const char* interface, const char* method, const Write& write,
-    std::function<void(sdbus::Message* reply, const Error& error)> handle) {
+    const std::function<void(sdbus::Message* reply, const Error& error)>& handle) {
   try {
     sdbus::IProxy& service = owner();
     auto message = service.createMethodCall(interface, method);

@@ -43,7 +43,7 @@ class BusConnection {
   /// Calls a method and has the answer handled, on the connection's thread: with the reply, or with
   /// null and the error.
   void callAsync(const char* interface, const char* method, const Write& write,
-                 std::function<void(sdbus::Message* reply, const Error& error)> handle);
+                 const std::function<void(sdbus::Message* reply, const Error& error)>& handle);
 
   /// `signalled` is called for each signal that a container has changed, and `moved` when the
   /// service has left the bus or come back to it. On the connection's thread. To be called once.
@@ -59,8 +59,9 @@ class BusConnection {
                                                const Write& write);
   /// Who has the service's name; empty: nobody.
   void setOwner(const std::string& uniqueName);
-  /// Asks the bus who has the name now; whether that is somebody else than was known.
-  [[nodiscard]] bool findNewOwner();
+  /// Asks the bus who has the name now; whether that is somebody else than `former`.
+  [[nodiscard]] bool findOwnerOtherThan(const std::string& former);
+  [[nodiscard]] std::string ownerName();
   [[nodiscard]] sdbus::IProxy& owner();
 
   std::unique_ptr<sdbus::IConnection> connection_;

@@ -10,6 +10,7 @@
 #include "host/bus/BusNames.h"
 #include "host/bus/BusText.h"
 #include "host/bus/RemoteWatches.h"
+#include "platform/VesselManager.h"
 
 namespace mirabel::bus {
 namespace {
@@ -155,6 +156,10 @@ Documents::ItemResult RemoteDocuments::itemAtPath(const std::string& path) {
 
 Result<std::unique_ptr<DocumentContainer>> RemoteDocuments::container(std::string_view identifier) {
   auto container = std::make_unique<RemoteContainer>(connection_, identifier);
+  // These are always there; and an anchor of the working set is more than a question.
+  if (identifier == VesselWorkingSetContainerItemIdentifier ||
+      identifier == VesselAllDirectoriesContainerItemIdentifier)
+    return container;
   const auto anchor = container->currentSyncAnchor();
   const bool isThere = anchor || anchor.error().is(LocalVesselError::unableToGetDeviceUUID);
   if (!isThere) return fail(anchor.error());

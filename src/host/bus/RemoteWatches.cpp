@@ -28,7 +28,7 @@ class RemoteWatches::Entry final : public ContainerWatch {
 };
 
 Result<std::unique_ptr<ContainerWatch>> RemoteWatches::add(
-    const std::shared_ptr<RemoteWatches>& watches, std::string container,
+    const std::shared_ptr<RemoteWatches>& watches, const std::string& container,
     std::function<void()> changed) {
   auto entry = std::make_unique<Entry>(watches);
   {
@@ -71,6 +71,7 @@ void RemoteWatches::signalled(const std::string& container) {
 void RemoteWatches::wakeAll() {
   const std::lock_guard lock(mutex_);
   std::vector<std::function<void()>> woken;
+  woken.reserve(watching_.size());
   for (const auto& [entry, watching] : watching_)
     woken.push_back(watching.changed);
   for (const auto& wake : woken)

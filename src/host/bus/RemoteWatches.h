@@ -19,7 +19,7 @@ class RemoteWatches {
   explicit RemoteWatches(BusConnection& connection) : connection_(connection) {}
 
   [[nodiscard]] static Result<std::unique_ptr<ContainerWatch>> add(
-      const std::shared_ptr<RemoteWatches>& watches, std::string container,
+      const std::shared_ptr<RemoteWatches>& watches, const std::string& container,
       std::function<void()> changed);
 
   // On the connection's thread.
