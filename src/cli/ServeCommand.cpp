@@ -5,6 +5,7 @@
 #include <optional>
 #include <poll.h>
 #include <string>
+#include <sys/resource.h>
 #include <systemd/sd-daemon.h>
 
 #include "cli/Commands.h"
@@ -54,7 +55,17 @@ ExitCode Serving::run() {
   return ExitCode::done;
 }
 
+/// Watches, listings and the files of calls take descriptors, more than most sessions allow at
+/// first.
+void allowManyDescriptors() {
+  rlimit files{};
+  if (::getrlimit(RLIMIT_NOFILE, &files) != 0) return;
+  files.rlim_cur = files.rlim_max;
+  static_cast<void>(::setrlimit(RLIMIT_NOFILE, &files));
+}
+
 ExitCode Serving::open() {
+  allowManyDescriptors();
   LinuxPlatform::Options options;
   options.home = program_.options().home;
   options.timeout = program_.options().timeout;

@@ -1,9 +1,11 @@
 #include "host/bus/BusConnection.h"
 
+#include <cerrno>
 #include <chrono>
 #include <cstdint>
 #include <cstdlib>
 #include <future>
+#include <map>
 #include <optional>
 
 #include "host/bus/BusNames.h"
@@ -29,6 +31,35 @@ std::string ownerOfName(sdbus::IConnection& connection) {
 
 }  // namespace
 
+class BusConnection::Pending {
+ public:
+  std::uint64_t add(Handler handle) {
+    const std::lock_guard lock(mutex_);
+    handlers_.emplace(++last_, std::move(handle));
+    return last_;
+  }
+  void answer(std::uint64_t number, sdbus::Message* reply, const Error& error) {
+    std::unique_lock lock(mutex_);
+    auto node = handlers_.extract(number);
+    lock.unlock();
+    if (node) node.mapped()(reply, error);
+  }
+  void refuseAll(const Error& error) {
+    std::unique_lock lock(mutex_);
+    const auto refused = std::exchange(handlers_, {});
+    lock.unlock();
+    for (const auto& [number, handle] : refused)
+      handle(nullptr, error);
+  }
+
+ private:
+  std::mutex mutex_;
+  std::uint64_t last_ = 0;
+  std::map<std::uint64_t, Handler> handlers_;
+};
+
+BusConnection::BusConnection() : pending_(std::make_shared<Pending>()) {}
+
 std::shared_ptr<BusConnection> BusConnection::open() {
   // Where neither is set there is no session, and looking for its bus would take its time.
   if (std::getenv("DBUS_SESSION_BUS_ADDRESS") == nullptr &&
@@ -39,8 +70,10 @@ std::shared_ptr<BusConnection> BusConnection::open() {
     opened->connection_ = sdbus::createSessionBusConnection();
     opened->setOwner(ownerOfName(*opened->connection_));
     opened->service_ = sdbus::createProxy(*opened->connection_, serviceName, objectPath);
-    opened->loop_ = std::make_unique<BusLoop>(
-        *opened->connection_, [connection = opened.get()] { connection->isLost_ = true; });
+    opened->loop_ = std::make_unique<BusLoop>(*opened->connection_, [connection = opened.get()] {
+      connection->isLost_ = true;
+      connection->pending_->refuseAll(Error::posix(ENOTCONN, "the bus has gone"));
+    });
     return opened;
   } catch (const sdbus::Error&) {
     return nullptr;
@@ -131,23 +164,33 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
   return std::move(answer->reply);
 }
 
-void BusConnection::callAsync(
-    const char* interface, const char* method, const Write& write,
-    const std::function<void(sdbus::Message* reply, const Error& error)>& handle) {
+void BusConnection::callAsync(const char* interface, const char* method, const Write& write,
+                              Handler handle) {
+  const std::uint64_t number = pending_->add(std::move(handle));
   try {
     sdbus::IProxy& service = owner();
     auto message = service.createMethodCall(interface, method);
     if (write) write(message);
     service.callMethod(
         message,
-        [handle](sdbus::MethodReply& reply, const sdbus::Error* error) {
-          if (error != nullptr) return handle(nullptr, errorFromBus(*error));
-          handle(&reply, {});
+        [pending = pending_, number](sdbus::MethodReply& reply, const sdbus::Error* error) {
+          if (error != nullptr) return pending->answer(number, nullptr, errorFromBus(*error));
+          pending->answer(number, &reply, {});
         },
         withoutTimeout);
   } catch (const sdbus::Error& error) {
-    handle(nullptr, errorFromBus(error));
+    pending_->answer(number, nullptr, errorFromBus(error));
   }
+}
+
+void BusConnection::callInTurn(const char* interface, const char* method, const Write& write,
+                               Handler handle) {
+  underway_.acquire();
+  callAsync(interface, method, write,
+            [this, handle = std::move(handle)](sdbus::Message* reply, const Error& error) {
+              underway_.release();
+              handle(reply, error);
+            });
 }
 
 void BusConnection::listen(std::function<void(const std::string& container)> signalled,

@@ -5,6 +5,7 @@
 #include <memory>
 #include <mutex>
 #include <sdbus-c++/sdbus-c++.h>
+#include <semaphore>
 #include <string>
 #include <type_traits>
 #include <utility>
@@ -26,6 +27,7 @@ class BusConnection {
   [[nodiscard]] static bool hasBus();
 
   using Write = std::function<void(sdbus::Message& call)>;
+  using Handler = std::function<void(sdbus::Message* reply, const Error& error)>;
 
   /// Calls a method and waits for the answer, however long that takes. `read` makes the result of
   /// it. Errors: see `errorFromBus`.
@@ -42,8 +44,11 @@ class BusConnection {
   }
   /// Calls a method and has the answer handled, on the connection's thread: with the reply, or with
   /// null and the error.
-  void callAsync(const char* interface, const char* method, const Write& write,
-                 const std::function<void(sdbus::Message* reply, const Error& error)>& handle);
+  void callAsync(const char* interface, const char* method, const Write& write, Handler handle);
+
+  /// The same, but waits while many that were called like this have no answer yet: a bus lets a
+  /// client have so many, and no more. Not on the connection's thread.
+  void callInTurn(const char* interface, const char* method, const Write& write, Handler handle);
 
   /// `signalled` is called for each signal that a container has changed, and `moved` when the
   /// service has left the bus or come back to it. On the connection's thread. To be called once.
@@ -51,7 +56,10 @@ class BusConnection {
               std::function<void(bool isThere)> moved);
 
  private:
-  BusConnection() = default;
+  BusConnection();
+  /// What waits for answers; those that come no more, for the bus has gone, are refused.
+  class Pending;
+
   [[nodiscard]] sdbus::MethodReply send(const char* interface, const char* method,
                                         const Write& write);
 
@@ -64,6 +72,7 @@ class BusConnection {
   [[nodiscard]] std::string ownerName();
   [[nodiscard]] sdbus::IProxy& owner();
 
+  std::shared_ptr<Pending> pending_;
   std::unique_ptr<sdbus::IConnection> connection_;
   std::unique_ptr<sdbus::IProxy> service_;  ///< whose signals are heard
   std::mutex mutex_;                        ///< for the owners
@@ -74,6 +83,8 @@ class BusConnection {
   std::string ownerName_;
   sdbus::Slot moving_;
   std::atomic<bool> isLost_ = false;
+  static constexpr std::ptrdiff_t mostUnderway = 64;
+  std::counting_semaphore<mostUnderway> underway_{mostUnderway};
   std::unique_ptr<BusLoop> loop_;
 };
 

@@ -1,6 +1,9 @@
 #include "host/bus/CallLane.h"
 
+#include <exception>
 #include <utility>
+
+#include "foundation/Log.h"
 
 namespace mirabel::bus {
 
@@ -59,7 +62,13 @@ void CallLane::run() {
     found->second.calls.pop_front();
     found->second.isRunning = true;
     lock.unlock();
-    call();
+    try {
+      call();
+    } catch (const std::exception& exception) {
+      // No memory for one answer is no reason to give none to others; the call answers that it was
+      // given up.
+      logError(std::string("can't answer a call; ") + exception.what());
+    }
     call = {};
     lock.lock();
     found->second.isRunning = false;

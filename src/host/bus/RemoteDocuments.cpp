@@ -99,19 +99,19 @@ class RemoteContainer final : public DocumentContainer {
 /// Begins an operation that hands back the item.
 void begin(BusConnection& connection, const char* method, const Write& write,
            Documents::ItemHandler handler) {
-  connection.callAsync(operationsInterface, method, write,
-                       [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
-                         if (reply == nullptr) return handler(fail(error));
-                         handler(readItem(*reply));
-                       });
+  connection.callInTurn(operationsInterface, method, write,
+                        [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
+                          if (reply == nullptr) return handler(fail(error));
+                          handler(readItem(*reply));
+                        });
 }
 
 void beginWithoutItem(BusConnection& connection, const char* interface, const char* method,
                       const Write& write, Documents::ErrorHandler handler) {
-  connection.callAsync(interface, method, write,
-                       [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
-                         handler(reply == nullptr ? std::optional(error) : std::nullopt);
-                       });
+  connection.callInTurn(interface, method, write,
+                        [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
+                          handler(reply == nullptr ? std::optional(error) : std::nullopt);
+                        });
 }
 
 }  // namespace
