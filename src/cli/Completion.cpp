@@ -60,6 +60,7 @@ std::string joined(const std::vector<std::string>& words) {
 
 std::string names(const std::vector<CommandOption>& options) {
   std::vector<std::string> all;
+  all.reserve(options.size());
   for (const CommandOption& option : options)
     all.push_back(option.name);
   return joined(all);
@@ -165,9 +166,10 @@ std::string forFish(const CLI::App& app) {
             shellQuoted(command.help) + "\n";
     const std::string condition =
         " -n " + shellQuoted("__fish_seen_subcommand_from " + command.name);
-    if (!command.words.empty())
+    if (!command.words.empty()) {
       text +=
           "complete -c mirabel" + condition + " -a " + shellQuoted(joined(command.words)) + "\n";
+    }
     for (const CommandOption& option : command.options)
       text += line(condition, option);
   }

@@ -1,6 +1,5 @@
 #include "host/ContainerWatches.h"
 
-#include <algorithm>
 #include <chrono>
 #include <cstdint>
 #include <optional>
@@ -26,10 +25,7 @@ constexpr auto betweenChecks = 5s;
 /// Somebody who watches.
 class ContainerWatches::Watcher {
  public:
-  Watcher(std::function<void()> changed, Wake condition)
-      : condition_(condition), changed_(std::move(changed)) {}
-
-  [[nodiscard]] Wake condition() const { return condition_; }
+  explicit Watcher(std::function<void()> changed) : changed_(std::move(changed)) {}
 
   void wake() {
     const std::lock_guard lock(mutex_);
@@ -42,7 +38,6 @@ class ContainerWatches::Watcher {
   }
 
  private:
-  const Wake condition_;
   std::recursive_mutex mutex_;
   std::function<void()> changed_;
 };
@@ -185,11 +180,11 @@ Result<std::unique_ptr<ContainerWatch>> ContainerWatches::add(const std::string&
   // What others watch may have gone since.
   if (auto place = LocalContainer::placeOf(provider_, identifier); !place)
     return fail(place.error());
-  auto watcher = std::make_shared<Watcher>(std::move(changed), wake);
+  auto watcher = std::make_shared<Watcher>(std::move(changed));
   std::unique_ptr<ContainerWatch> entry = std::make_unique<Entry>(*this, watcher);
   {
     const std::lock_guard lock(mutex_);
-    if (const auto found = watched_.find(identifier); found != watched_.end()) {
+    if (const auto found = watched_.find({identifier, wake}); found != watched_.end()) {
       found->second->watchers.push_back(std::move(watcher));
       return entry;
     }
@@ -198,7 +193,7 @@ Result<std::unique_ptr<ContainerWatch>> ContainerWatches::add(const std::string&
   auto watched = Watched::open(provider_, identifier);
   if (!watched) return fail(watched.error());
   const std::lock_guard lock(mutex_);
-  const auto place = watched_.try_emplace(identifier, *std::move(watched)).first;
+  const auto place = watched_.try_emplace({identifier, wake}, *std::move(watched)).first;
   place->second->watchers.push_back(std::move(watcher));
   return entry;
 }
@@ -207,11 +202,11 @@ void ContainerWatches::remove(const std::shared_ptr<Watcher>& watcher) {
   watcher->end();
   std::shared_ptr<Watched> unwatched;  // let go of without the lock
   const std::lock_guard lock(mutex_);
-  for (auto& [identifier, watched] : watched_) {
+  for (auto& [key, watched] : watched_) {
     if (std::erase(watched->watchers, watcher) == 0) continue;
     if (watched->watchers.empty()) {
       unwatched = watched;
-      watched_.erase(identifier);
+      watched_.erase(key);
     }
     return;
   }
@@ -233,26 +228,24 @@ void ContainerWatches::run() {
 }
 
 void ContainerWatches::check() {
-  std::vector<std::shared_ptr<Watched>> all;
+  std::vector<std::pair<Wake, std::shared_ptr<Watched>>> all;
   {
     const std::lock_guard lock(mutex_);
-    for (const auto& [identifier, watched] : watched_)
-      all.push_back(watched);
+    for (const auto& [key, watched] : watched_)
+      all.emplace_back(key.second, watched);
   }
-  for (const auto& watched : all) {
+  for (const auto& [wake, watched] : all) {
+    // What nobody waits for the changes of is not asked for them.
+    const bool hasNews = watched->hasNews(wake == Wake::forChanges);
+    if (!hasNews && wake == Wake::forChanges) continue;
+    // Who watches now: the question may have taken in what came after somebody's first anchor.
     std::vector<std::shared_ptr<Watcher>> watchers;
     {
       const std::lock_guard lock(mutex_);
       watchers = watched->watchers;
     }
-    const auto wantsNews = [](const auto& watcher) {
-      return watcher->condition() == Wake::forChanges;
-    };
-    // What nobody waits for the changes of is not asked for them.
-    const bool isAsked = std::any_of(watchers.begin(), watchers.end(), wantsNews);
-    const bool hasNews = watched->hasNews(isAsked);
     for (const auto& watcher : watchers)
-      if (hasNews || !wantsNews(watcher)) watcher->wake();
+      watcher->wake();
   }
 }
 

@@ -7,6 +7,7 @@
 #include <mutex>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include "host/Documents.h"
@@ -57,7 +58,8 @@ class ContainerWatches {
   HostedProvider& provider_;
   std::shared_ptr<Bell> bell_ = std::make_shared<Bell>();
   std::mutex mutex_;  ///< for what follows
-  std::map<std::string, std::shared_ptr<Watched>> watched_;
+  /// Apart by what wakes: an anchor is only as good as the last question for its changes.
+  std::map<std::pair<std::string, Wake>, std::shared_ptr<Watched>> watched_;
   std::thread thread_;
 };
 

@@ -41,30 +41,43 @@ void Searching::follow(ContainerWatches& watches) {
   feeding_ = std::jthread([this, &watches](const std::stop_token& stop) { feed(stop, watches); });
 }
 
+Result<void> Searching::beginWatch(ContainerWatches& watches, const std::function<void()>& changed,
+                                   std::unique_ptr<ContainerWatch>& watch) {
+  auto begun = watches.add(std::string(VesselWorkingSetContainerItemIdentifier), changed,
+                           ContainerWatches::Wake::forAnySignal);
+  if (!begun) return fail(begun.error());
+  watch = *std::move(begun);
+  return {};
+}
+
+Result<void> Searching::feedOnce(const std::stop_token& stop) {
+  const auto index = inStep(stop);
+  if (!index) return fail(index.error());
+  return {};
+}
+
 void Searching::feed(const std::stop_token& stop, ContainerWatches& watches) {
   std::mutex mutex;
   std::condition_variable_any wake;
   bool hasChanged = true;
   // Whatever is signalled: whether there is anything for the index shows when it is asked for.
-  const auto watch = watches.add(
-      std::string(VesselWorkingSetContainerItemIdentifier),
-      [&] {
-        {
-          const std::lock_guard lock(mutex);
-          hasChanged = true;
-        }
-        wake.notify_one();
-      },
-      ContainerWatches::Wake::forAnySignal);
-  if (!watch) logError("can't keep the search index in step; " + watch.error().description());
+  const auto changed = [&] {
+    {
+      const std::lock_guard lock(mutex);
+      hasChanged = true;
+    }
+    wake.notify_one();
+  };
+  std::unique_ptr<ContainerWatch> watch;
   while (!stop.stop_requested()) {
+    const auto begun = watch ? Result<void>() : beginWatch(watches, changed, watch);
     {
       std::unique_lock lock(mutex);
       wake.wait(lock, stop, [&] { return hasChanged; });
       hasChanged = false;
     }
     if (stop.stop_requested()) return;
-    const auto fed = inStep(stop);
+    const auto fed = begun ? feedOnce(stop) : begun;
     if (fed || stop.stop_requested()) continue;
     logError("can't bring the search index in step; " + fed.error().description());
     std::unique_lock lock(mutex);

@@ -2,6 +2,7 @@
 
 #include <condition_variable>
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -38,6 +39,10 @@ class Searching {
 
  private:
   [[nodiscard]] Result<SearchIndex*> inStep(const std::stop_token& stop = {});
+  [[nodiscard]] static Result<void> beginWatch(ContainerWatches& watches,
+                                               const std::function<void()>& changed,
+                                               std::unique_ptr<ContainerWatch>& watch);
+  [[nodiscard]] Result<void> feedOnce(const std::stop_token& stop);
   void feed(const std::stop_token& stop, ContainerWatches& watches);
 
   HostedProvider& provider_;

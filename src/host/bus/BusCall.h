@@ -27,6 +27,9 @@ class BusCall {
     message_ >> value;
     return value;
   }
+  /// The caller's turn in its lane, which ends with the call: when it is answered.
+  void keepTurn(std::shared_ptr<void> turn) { turn_ = std::move(turn); }
+
   [[nodiscard]] Caller& caller() const { return *caller_; }
   [[nodiscard]] const std::shared_ptr<Caller>& sharedCaller() const { return caller_; }
 
@@ -46,13 +49,15 @@ class BusCall {
   sdbus::MethodCall message_;
   std::shared_ptr<Caller> caller_;
   bool isAnswered_ = false;
+  std::shared_ptr<void> turn_;
 };
 
-/// Which calls wait for which: those of a caller in one lane are answered in their order.
+/// Which calls wait for which. Those of a caller in one lane are answered one after the other, in
+/// their order; of operations a few run at a time.
 enum class Lane {
   lookups,       ///< short
   enumerations,  ///< listings, changes, watches, searches
-  operations,    ///< what changes items; ends when the operation has begun
+  operations,    ///< what changes items
 };
 
 /// A method of the service. Names are those of results and arguments in the introspection data.

@@ -23,7 +23,9 @@ namespace {
 // wait for the disk the longest.
 constexpr std::size_t lookupThreads = 3;
 constexpr std::size_t enumerationThreads = 6;
-constexpr std::size_t operationThreads = 2;
+constexpr std::size_t operationThreads = 4;
+// Fewer than run at a time, so that nobody's wait for all that somebody else has asked for.
+constexpr std::size_t operationsOfACaller = 2;
 constexpr std::size_t mostWaiting = 4096;
 
 constexpr const char* leavingMatch =
@@ -90,7 +92,11 @@ class BusService::Impl {
                          answer = std::move(method.answer)](sdbus::MethodCall message) {
       const std::string name = message.getSender();
       const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
-      if (laneOf(lane).submit(name, [call, answer] { answer(call); })) return;
+      const auto run = [call, answer](std::shared_ptr<void> turn) {
+        call->keepTurn(std::move(turn));
+        answer(call);
+      };
+      if (laneOf(lane).submit(name, run)) return;
       if (hasStopped_) return call->fail(Error::posix(ECANCELED, "the service is about to end"));
       call->fail(sdbus::Error("org.freedesktop.DBus.Error.LimitsExceeded",
                               "too many calls of this client wait for their answers"));
@@ -117,7 +123,10 @@ class BusService::Impl {
     if (!caller) return;
     for (CallLane* lane : {&lookups_, &enumerations_, &operations_})
       lane->forget(name);
-    static_cast<void>(enumerations_.submit(name, [caller] { caller->leave(); }));
+    // Not here, where the bus is driven: a signal that is being sent would wait for this.
+    if (!enumerations_.submit(name, [caller](const auto&) { caller->leave(); })) {
+      callers_.putBack(caller);
+    }
   }
 
   void signal(const std::string& caller, const std::string& container) {
@@ -136,9 +145,9 @@ class BusService::Impl {
   std::unique_ptr<sdbus::IConnection> connection_;
   std::unique_ptr<sdbus::IObject> object_;
   sdbus::Slot leaving_;
-  CallLane lookups_{lookupThreads, mostWaiting};
-  CallLane enumerations_{enumerationThreads, mostWaiting};
-  CallLane operations_{operationThreads, mostWaiting};
+  CallLane lookups_{{lookupThreads, 1, mostWaiting}};
+  CallLane enumerations_{{enumerationThreads, 1, mostWaiting}};
+  CallLane operations_{{operationThreads, operationsOfACaller, mostWaiting}};
   std::atomic<bool> hasStopped_ = false;
   std::unique_ptr<BusLoop> loop_;
 };

@@ -7,13 +7,13 @@
 
 namespace mirabel::bus {
 
-CallLane::CallLane(std::size_t threads, std::size_t mostWaiting) : mostWaiting_(mostWaiting) {
-  for (std::size_t i = 0; i < threads; ++i)
+CallLane::CallLane(Limits limits) : limits_(limits) {
+  for (std::size_t i = 0; i < limits_.threads; ++i)
     threads_.emplace_back([this] { run(); });
 }
 
 void CallLane::end() {
-  std::map<std::string, Waiting> dropped;  // let go of without the lock
+  std::vector<std::deque<Call>> dropped;  // let go of without the lock
   {
     const std::lock_guard lock(mutex_);
     mustEnd_ = true;
@@ -23,30 +23,47 @@ void CallLane::end() {
     thread.join();
   threads_.clear();
   const std::lock_guard lock(mutex_);
-  dropped.swap(waiting_);
+  dropped.reserve(waiting_.size());
+  for (auto& [caller, waiting] : waiting_)
+    dropped.push_back(std::exchange(waiting.calls, {}));
 }
 
-bool CallLane::submit(const std::string& caller, std::function<void()> call) {
-  {
-    const std::lock_guard lock(mutex_);
-    if (mustEnd_) return false;
-    Waiting& waiting = waiting_[caller];
-    if (waiting.calls.size() >= mostWaiting_) return false;
-    waiting.calls.push_back(std::move(call));
-    if (waiting.isRunning || waiting.calls.size() > 1) return true;
-    turns_.push_back(caller);
-  }
-  wake_.notify_one();
+bool CallLane::submit(const std::string& caller, Call call) {
+  const std::lock_guard lock(mutex_);
+  if (mustEnd_) return false;
+  Waiting& waiting = waiting_[caller];
+  if (waiting.calls.size() >= limits_.mostWaiting) return false;
+  waiting.calls.push_back(std::move(call));
+  queueIfItCanRun(caller, waiting);
   return true;
 }
 
+void CallLane::queueIfItCanRun(const std::string& caller, Waiting& waiting) {
+  const bool canRun =
+      !waiting.isInTurn && !waiting.calls.empty() && waiting.running < limits_.mostRunning;
+  if (!canRun) return;
+  waiting.isInTurn = true;
+  turns_.push_back(caller);
+  wake_.notify_one();
+}
+
 void CallLane::forget(const std::string& caller) {
-  std::deque<std::function<void()>> dropped;  // let go of without the lock
+  std::deque<Call> dropped;  // let go of without the lock
   const std::lock_guard lock(mutex_);
   const auto found = waiting_.find(caller);
   if (found == waiting_.end()) return;
   dropped.swap(found->second.calls);
-  if (!found->second.isRunning) waiting_.erase(found);
+  if (found->second.running == 0 && !found->second.isInTurn) waiting_.erase(found);
+}
+
+void CallLane::finish(const std::string& caller) {
+  const std::lock_guard lock(mutex_);
+  const auto found = waiting_.find(caller);
+  if (found == waiting_.end()) return;
+  --found->second.running;
+  queueIfItCanRun(caller, found->second);
+  const Waiting& waiting = found->second;
+  if (waiting.running == 0 && waiting.calls.empty() && !waiting.isInTurn) waiting_.erase(found);
 }
 
 void CallLane::run() {
@@ -57,13 +74,19 @@ void CallLane::run() {
     const std::string caller = std::move(turns_.front());
     turns_.pop_front();
     const auto found = waiting_.find(caller);
-    if (found == waiting_.end() || found->second.calls.empty()) continue;
-    std::function<void()> call = std::move(found->second.calls.front());
+    found->second.isInTurn = false;
+    if (found->second.calls.empty()) {
+      // It was forgotten meanwhile.
+      if (found->second.running == 0) waiting_.erase(found);
+      continue;
+    }
+    Call call = std::move(found->second.calls.front());
     found->second.calls.pop_front();
-    found->second.isRunning = true;
+    ++found->second.running;
+    queueIfItCanRun(caller, found->second);
     lock.unlock();
     try {
-      call();
+      call(std::shared_ptr<void>(nullptr, [this, caller](void*) { finish(caller); }));
     } catch (const std::exception& exception) {
       // No memory for one answer is no reason to give none to others; the call answers that it was
       // given up.
@@ -71,13 +94,6 @@ void CallLane::run() {
     }
     call = {};
     lock.lock();
-    found->second.isRunning = false;
-    if (found->second.calls.empty()) {
-      waiting_.erase(found);
-    } else {
-      turns_.push_back(caller);
-      wake_.notify_one();
-    }
   }
 }
 

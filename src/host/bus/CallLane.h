@@ -5,6 +5,7 @@
 #include <deque>
 #include <functional>
 #include <map>
+#include <memory>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -12,33 +13,43 @@
 
 namespace mirabel::bus {
 
-/// Runs calls of one kind: those of one caller one after the other, callers in turn, on a fixed
-/// number of threads. So no caller waits for all that another has asked for. Any thread may call
-/// it.
+/// Runs calls of one kind: few of one caller at a time, callers in turn, on a fixed number of
+/// threads. So no caller waits for all that another has asked for. Any thread may call it.
 class CallLane {
  public:
-  /// `mostWaiting`: calls that a caller may have waiting.
-  CallLane(std::size_t threads, std::size_t mostWaiting);
+  struct Limits {
+    std::size_t threads;
+    std::size_t mostRunning;  ///< calls of one caller at a time
+    std::size_t mostWaiting;  ///< calls that a caller may have waiting
+  };
+  explicit CallLane(Limits limits);
   ~CallLane() { end(); }
   CallLane(const CallLane&) = delete;
   CallLane& operator=(const CallLane&) = delete;
 
-  /// Takes no further calls and waits for those that run; those that wait are dropped.
+  /// Takes no further calls and waits for those that run on its threads; those that wait are
+  /// dropped.
   void end();
 
+  /// A call runs for as long as somebody keeps its turn, which may be longer than it takes itself.
+  /// No turn may outlive the lane.
+  using Call = std::function<void(std::shared_ptr<void> turn)>;
   /// False, and nothing is run, where the caller has too many waiting, or the lane has ended.
-  [[nodiscard]] bool submit(const std::string& caller, std::function<void()> call);
+  [[nodiscard]] bool submit(const std::string& caller, Call call);
   /// Drops what of that caller waits.
   void forget(const std::string& caller);
 
  private:
   struct Waiting {
-    std::deque<std::function<void()>> calls;
-    bool isRunning = false;
+    std::deque<Call> calls;
+    std::size_t running = 0;
+    bool isInTurn = false;  ///< whether it stands among the turns
   };
   void run();
+  void finish(const std::string& caller);
+  void queueIfItCanRun(const std::string& caller, Waiting& waiting);
 
-  const std::size_t mostWaiting_;
+  const Limits limits_;
   std::mutex mutex_;
   std::condition_variable wake_;
   bool mustEnd_ = false;

@@ -102,6 +102,7 @@ CallerIdentities::~CallerIdentities() = default;
 
 Result<CallerIdentity> CallerIdentities::identify(const std::string& uniqueName) {
   const auto ask = [&] {
+    const std::lock_guard lock(asking_);
     std::map<std::string, sdbus::Variant> credentials;
     daemon_->callMethod("GetConnectionCredentials")
         .onInterface(daemonName)
@@ -118,7 +119,7 @@ Result<CallerIdentity> CallerIdentities::identify(const std::string& uniqueName)
     }
     if (!process || isConfinedByLabel(credentials)) return CallerIdentity{std::string()};
     auto identity = identityOfProcess(*process);
-    // The number may have gone to another process meanwhile, but not while the caller was there.
+    // Where the caller has left meanwhile, its number may be another process's.
     if (number(ask(), "ProcessID") != process) return fail(Error::posix(ESRCH));
     return identity;
   } catch (const sdbus::Error& error) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -25,8 +26,8 @@ struct CallerIdentity {
 /// names none.
 [[nodiscard]] std::string applicationOfSandbox(std::string_view flatpakInfo);
 
-/// Finds out who calls, by the process that the bus says is at the other end of the connection. One
-/// thread at a time.
+/// Finds out who calls, by the process that the bus says is at the other end of the connection. Any
+/// thread.
 class CallerIdentities {
  public:
   CallerIdentities();
@@ -36,6 +37,7 @@ class CallerIdentities {
   [[nodiscard]] Result<CallerIdentity> identify(const std::string& uniqueName);
 
  private:
+  std::mutex asking_;  ///< for the connection; never held while files are looked at
   std::unique_ptr<sdbus::IConnection> connection_;
   std::unique_ptr<sdbus::IProxy> daemon_;
 };

@@ -17,8 +17,10 @@ constexpr std::size_t mostWatches = 256;
 }  // namespace
 
 Result<Documents*> Caller::documents() {
+  // Whoever is known waits for nobody who is not.
+  if (Documents* known = documents_) return known;
   const std::lock_guard lock(identifying_);
-  if (documents_ != nullptr) return documents_;
+  if (Documents* known = documents_) return known;
   auto identity = identities_.identify(name_);
   if (!identity) return fail(identity.error());
   if (identity->sandboxedApplication) {
@@ -27,7 +29,7 @@ Result<Documents*> Caller::documents() {
   } else {
     documents_ = &all_;
   }
-  return documents_;
+  return documents_.load();
 }
 
 Result<DocumentContainer*> Caller::container(const std::string& identifier) {
@@ -73,6 +75,7 @@ void Caller::unwatch(const std::string& identifier) {
 }
 
 void Caller::leave() {
+  opened_.clear();
   std::map<std::string, std::unique_ptr<ContainerWatch>> ended;  // without the lock
   const std::lock_guard lock(mutex_);
   hasLeft_ = true;
@@ -82,7 +85,7 @@ void Caller::leave() {
 std::shared_ptr<Caller> Callers::of(const std::string& uniqueName) {
   const std::lock_guard lock(mutex_);
   auto& caller = callers_[uniqueName];
-  if (!caller) caller = std::make_shared<Caller>(uniqueName, all_, identities_, identifying_);
+  if (!caller) caller = std::make_shared<Caller>(uniqueName, all_, identities_);
   return caller;
 }
 
@@ -90,6 +93,12 @@ std::shared_ptr<Caller> Callers::take(const std::string& uniqueName) {
   const std::lock_guard lock(mutex_);
   auto node = callers_.extract(uniqueName);
   return node ? std::move(node.mapped()) : nullptr;
+}
+
+void Callers::putBack(std::shared_ptr<Caller> caller) {
+  const std::lock_guard lock(mutex_);
+  std::string name = caller->name();
+  callers_.try_emplace(std::move(name), std::move(caller));
 }
 
 void Callers::leaveAll() {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <functional>
 #include <list>
 #include <map>
@@ -16,8 +17,8 @@ namespace mirabel::bus {
 /// A connection on the bus that has called, with what is kept for it until it leaves.
 class Caller {
  public:
-  Caller(std::string name, Documents& all, CallerIdentities& identities, std::mutex& identifying)
-      : name_(std::move(name)), all_(all), identities_(identities), identifying_(identifying) {}
+  Caller(std::string name, Documents& all, CallerIdentities& identities)
+      : name_(std::move(name)), all_(all), identities_(identities) {}
 
   [[nodiscard]] const std::string& name() const { return name_; }
   /// The documents as the caller may see them. It is asked who it is once. Errors: those of
@@ -49,8 +50,8 @@ class Caller {
   const std::string name_;
   Documents& all_;
   CallerIdentities& identities_;
-  std::mutex& identifying_;
-  Documents* documents_ = nullptr;
+  std::mutex identifying_;
+  std::atomic<Documents*> documents_ = nullptr;
   std::unique_ptr<Documents> restricted_;
 
   std::list<Opened> opened_;  ///< the last used first
@@ -71,13 +72,14 @@ class Callers {
   [[nodiscard]] std::shared_ptr<Caller> of(const std::string& uniqueName);
   /// Forgets the caller; whoever gets it has it leave. Null for one that has not called.
   [[nodiscard]] std::shared_ptr<Caller> take(const std::string& uniqueName);
+  /// Takes it back, for whoever can't have it leave yet.
+  void putBack(std::shared_ptr<Caller> caller);
   /// Has all of them leave.
   void leaveAll();
 
  private:
   Documents& all_;
   CallerIdentities identities_;
-  std::mutex identifying_;
   std::mutex mutex_;
   std::map<std::string, std::shared_ptr<Caller>> callers_;
 };

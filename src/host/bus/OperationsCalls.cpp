@@ -80,6 +80,8 @@ void importDocument(Documents& documents, const CallPointer& call,
   const auto parent = call->argument<std::string>();
   const auto name = nameOf(call, std::move(text));
   if (!name) return;
+  // Before anything is copied for somebody who has no place to put it.
+  if (auto place = documents.item(parent); !place) return call->fail(place.error());
   auto staged = StagedImport::of(file.get(), *name, stagingFolder);
   if (!staged) return call->fail(staged.error());
   const auto kept = std::make_shared<StagedImport>(*std::move(staged));

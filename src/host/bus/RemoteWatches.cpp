@@ -57,6 +57,20 @@ void RemoteWatches::remove(const Entry* entry) {
   // A service that does not hear it has left, or sees us leave.
   connection_.callAsync(providerInterface, "Unwatch", named(container),
                         [](sdbus::Message*, const Error&) {});
+  watchAgain(container);
+}
+
+// Who began to watch it while the others' end was on its way is not to be ended with them.
+void RemoteWatches::watchAgain(const std::string& container) {
+  {
+    const std::lock_guard lock(mutex_);
+    const bool isWatched = std::any_of(watching_.begin(), watching_.end(), [&](auto& other) {
+      return other.second.container == container;
+    });
+    if (!isWatched) return;
+  }
+  connection_.callAsync(providerInterface, "Watch", named(container),
+                        [this, container](sdbus::Message*, const Error&) { signalled(container); });
 }
 
 void RemoteWatches::signalled(const std::string& container) {

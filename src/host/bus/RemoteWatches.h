@@ -30,6 +30,7 @@ class RemoteWatches {
  private:
   class Entry;
   void remove(const Entry* entry);
+  void watchAgain(const std::string& container);
   void wakeAll();
 
   BusConnection& connection_;

@@ -53,7 +53,7 @@ Result<void> writeAll(int to, const char* bytes, std::size_t count) {
 Result<void> copyAll(int from, int to) {
   off_t position = 0;
   while (true) {
-    const ssize_t count = ::copy_file_range(from, &position, to, nullptr, std::size_t{1} << 30, 0);
+    const ssize_t count = ::copy_file_range(from, &position, to, nullptr, std::size_t{1} << 26, 0);
     if (count == 0) break;
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) break;

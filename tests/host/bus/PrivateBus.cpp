@@ -21,7 +21,15 @@ std::string configuration(const std::string& folder) {
   return "<busconfig><type>session</type><listen>unix:path=" + folder +
          "/bus</listen><policy context='default'><allow user='*'/>"
          "<allow send_destination='*' eavesdrop='true'/><allow eavesdrop='true'/>"
-         "<allow own='*'/></policy></busconfig>\n";
+         "<allow own='*'/></policy>"
+         // Those of a session's bus.
+         "<limit name='max_incoming_bytes'>1000000000</limit>"
+         "<limit name='max_outgoing_bytes'>1000000000</limit>"
+         "<limit name='max_completed_connections'>100000</limit>"
+         "<limit name='max_incomplete_connections'>10000</limit>"
+         "<limit name='max_connections_per_user'>100000</limit>"
+         "<limit name='max_match_rules_per_connection'>50000</limit>"
+         "<limit name='max_replies_per_connection'>50000</limit></busconfig>\n";
 }
 
 }  // namespace
