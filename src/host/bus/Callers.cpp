@@ -95,10 +95,9 @@ std::shared_ptr<Caller> Callers::take(const std::string& uniqueName) {
   return node ? std::move(node.mapped()) : nullptr;
 }
 
-void Callers::putBack(std::shared_ptr<Caller> caller) {
+void Callers::putBack(const std::shared_ptr<Caller>& caller) {
   const std::lock_guard lock(mutex_);
-  std::string name = caller->name();
-  callers_.try_emplace(std::move(name), std::move(caller));
+  callers_.try_emplace(caller->name(), caller);
 }
 
 void Callers::leaveAll() {

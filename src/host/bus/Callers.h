@@ -73,7 +73,7 @@ class Callers {
   /// Forgets the caller; whoever gets it has it leave. Null for one that has not called.
   [[nodiscard]] std::shared_ptr<Caller> take(const std::string& uniqueName);
   /// Takes it back, for whoever can't have it leave yet.
-  void putBack(std::shared_ptr<Caller> caller);
+  void putBack(const std::shared_ptr<Caller>& caller);
   /// Has all of them leave.
   void leaveAll();
 

@@ -28,7 +28,7 @@ void invalidArgument(const CallPointer& call, const std::string& text) {
 
 /// Runs `operation` with what the caller may change.
 template <class Operation>
-auto onDocuments(Operation operation) {
+auto onDocuments(const Operation& operation) {
   return [operation](const CallPointer& call) {
     if (Documents* documents = call->documents()) operation(*documents, call);
   };
