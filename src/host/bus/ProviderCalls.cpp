@@ -142,9 +142,10 @@ std::optional<std::string> misunderstood(const Options& options) {
                                                {"includesTrashed", "b"},
                                                {"limit", "u"}}))
     return mistyped;
-  for (const std::string key : {"modifiedSince", "modifiedBefore"})
+  for (const std::string key : {"modifiedSince", "modifiedBefore"}) {
     if (options.contains(key) && !dateOption(options, key))
       return key + " is no date in RFC 3339 form";
+  }
   return {};
 }
 
