@@ -102,12 +102,16 @@ void print(const Comparison& comparison) {
     ratios.push_back(comparison.ours[i] / comparison.reference[i]);
   }
   const double ratio = median(ratios);
-  const bool isAtMost = comparison.bound == Bound::atMost;
-  const bool holds = isAtMost ? ratio <= comparison.target : ratio >= comparison.target;
-  std::printf("%-54s %14s %14s   %5.2f  (%s %.2f)%s\n", comparison.name.c_str(),
+  std::printf("%-54s %14s %14s   %5.2f", comparison.name.c_str(),
               text(median(comparison.ours), comparison.unit).c_str(),
-              text(median(comparison.reference), comparison.unit).c_str(), ratio,
-              isAtMost ? "at most" : "at least", comparison.target, holds ? "" : "  MISSED");
+              text(median(comparison.reference), comparison.unit).c_str(), ratio);
+  if (comparison.target) {
+    const bool isAtMost = comparison.bound == Bound::atMost;
+    const bool holds = isAtMost ? ratio <= *comparison.target : ratio >= *comparison.target;
+    std::printf("  (%s %.2f)%s", isAtMost ? "at most" : "at least", *comparison.target,
+                holds ? "" : "  MISSED");
+  }
+  std::printf("\n");
   std::fflush(stdout);
 }
 

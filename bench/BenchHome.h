@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <functional>
 #include <initializer_list>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <sys/types.h>
@@ -56,7 +57,8 @@ struct Comparison {
   std::string name;
   std::vector<double> ours;
   std::vector<double> reference;
-  double target;  ///< of the median of the ratios: what was promised
+  /// Of the median of the ratios: what was promised, if anything was.
+  std::optional<double> target{};
   Unit unit = Unit::seconds;
   Bound bound = Bound::atMost;
 };

@@ -1,8 +1,11 @@
 // The service on a private bus, asked by a program that waits for each answer: what a look-up of an
 // item costs beside a call that does nothing. Both go from the client through the bus to the
-// service and back. The items are those of a folder, asked for in turn.
+// service and back. The items are those of a folder, asked for in turn: after the first rounds the
+// service knows them and makes sure only that they are as they were. Folders it looks up each time,
+// like documents that it has not been asked for lately.
 #include <array>
 #include <cstdlib>
+#include <filesystem>
 #include <sdbus-c++/sdbus-c++.h>
 
 #include "BenchHome.h"
@@ -15,7 +18,8 @@ namespace mirabel::bench {
 namespace {
 
 constexpr const char* itemRow = "service: one item / a call that does nothing";
-constexpr int callsPerRound = 2000;
+constexpr const char* lookUpRow = "service: one look-up / a call that does nothing";
+constexpr std::size_t callsPerRound = 2000;
 
 /// A bus of our own, which the environment names for as long as it lives.
 class PrivateBus {
@@ -33,17 +37,11 @@ class PrivateBus {
   bool isThere_ = false;
 };
 
-std::vector<std::string> identifiersOf(sdbus::IProxy& service) {
-  std::vector<std::string> identifiers;
-  std::string container(VesselRootContainerItemIdentifier);
+std::vector<std::string> identifiersIn(sdbus::IProxy& service, std::string_view container) {
   auto call = service.createMethodCall(bus::providerInterface, "ListItems");
-  call << container << Data();
+  call << std::string(container) << Data();
   auto reply = service.callMethod(call);
-  const auto top = bus::readItems(reply);
-  require(top.size() == 1, "there is one folder");
-  call = service.createMethodCall(bus::providerInterface, "ListItems");
-  call << top.front().itemIdentifier << Data();
-  reply = service.callMethod(call);
+  std::vector<std::string> identifiers;
   for (const ItemRecord& item : bus::readItems(reply))
     identifiers.push_back(item.itemIdentifier);
   return identifiers;
@@ -64,9 +62,11 @@ void askFor(sdbus::IProxy& service, const std::string& identifier) {
 }  // namespace
 
 void runServiceBenchmarks(const Scale& scale) {
-  if (!scale.includesAny({itemRow})) return;
+  if (!scale.includesAny({itemRow, lookUpRow})) return;
   const BenchHome home(BenchHome::Where::memory);
   static_cast<void>(home.makeFolder("folder", 200));
+  for (int i = 0; i < 50; ++i)
+    std::filesystem::create_directory(home.documents() + "/folder " + std::to_string(i));
   const PrivateBus bus;
   if (!bus.isThere()) return;
   printHeading("a service on a bus of its own, median of " + std::to_string(scale.rounds) +
@@ -75,20 +75,33 @@ void runServiceBenchmarks(const Scale& scale) {
   require(serving.hear() == "ready", "the service starts");
   const auto connection = sdbus::createSessionBusConnection();
   const auto service = sdbus::createProxy(*connection, bus::serviceName, bus::objectPath);
-  const auto identifiers = identifiersOf(*service);
-  require(identifiers.size() == 200, "all items are listed");
+  const auto folders = identifiersIn(*service, VesselRootContainerItemIdentifier);
+  require(folders.size() == 51, "all folders are listed");
+  std::vector<std::string> files;
+  for (const std::string& folder : folders) {
+    for (std::string& file : identifiersIn(*service, folder))
+      files.push_back(std::move(file));
+  }
+  require(files.size() == 200, "all items are listed");
+  const auto secondsToAskFor = [&](const std::vector<std::string>& identifiers) {
+    return secondsOf([&] {
+      for (std::size_t i = 0; i < callsPerRound; ++i)
+        askFor(*service, identifiers[i % identifiers.size()]);
+    });
+  };
   Comparison item{itemRow, {}, {}, 1.5};
+  Comparison lookUp{lookUpRow, {}, {}};
   for (int round = 0; round < scale.rounds; ++round) {
     item.reference.push_back(secondsOf([&] {
-      for (int i = 0; i < callsPerRound; ++i)
+      for (std::size_t i = 0; i < callsPerRound; ++i)
         askForNothing(*service);
     }));
-    item.ours.push_back(secondsOf([&] {
-      for (int i = 0; i < callsPerRound; ++i)
-        askFor(*service, identifiers[static_cast<std::size_t>(i) % identifiers.size()]);
-    }));
+    lookUp.reference.push_back(item.reference.back());
+    item.ours.push_back(secondsToAskFor(files));
+    lookUp.ours.push_back(secondsToAskFor(folders));
   }
   print(item);
+  print(lookUp);
 }
 
 }  // namespace mirabel::bench

@@ -24,12 +24,14 @@ Result<std::unique_ptr<LocalDocuments>> LocalDocuments::open(LinuxPlatform::Opti
 }
 
 LocalDocuments::LocalDocuments(std::unique_ptr<HostedProvider> provider)
-    : provider_(std::move(provider)), lookup_(*provider_), searching_(*provider_) {}
+    : provider_(std::move(provider)),
+      lookup_(*provider_),
+      recent_(lookup_, provider_->linuxPlatform().index(),
+              provider_->platform().manager.documentStorageURL().path()),
+      searching_(*provider_) {}
 
 Documents::ItemResult LocalDocuments::item(std::string_view identifier) {
-  const auto item = lookup_.byIdentifier(identifier);
-  if (!item) return fail(item.error());
-  return recordOf(**item);
+  return recent_.item(identifier);
 }
 
 Documents::ItemResult LocalDocuments::itemAtPath(const std::string& path) {

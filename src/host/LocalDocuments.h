@@ -11,6 +11,7 @@
 #include "host/Documents.h"
 #include "host/HostedProvider.h"
 #include "host/ItemLookup.h"
+#include "host/RecentItems.h"
 #include "host/Searching.h"
 
 namespace mirabel {
@@ -26,6 +27,11 @@ class LocalDocuments final : public Documents {
   [[nodiscard]] const ItemLookup& lookup() const { return lookup_; }
   /// Keeps the search index in step from now on, in the background.
   void keepSearching() { searching_.follow(watches()); }
+
+  /// The item, if that can be told without waiting for anything, or else null.
+  [[nodiscard]] std::shared_ptr<const ItemRecord> itemAtOnce(std::string_view identifier) {
+    return recent_.recall(identifier);
+  }
 
   [[nodiscard]] ItemResult item(std::string_view identifier) override;
   [[nodiscard]] ItemResult itemAtPath(const std::string& path) override;
@@ -80,6 +86,7 @@ class LocalDocuments final : public Documents {
 
   std::unique_ptr<HostedProvider> provider_;
   ItemLookup lookup_;
+  RecentItems recent_;
   std::once_flag watching_;
   std::unique_ptr<ContainerWatches> watches_;
   Searching searching_;

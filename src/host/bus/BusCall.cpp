@@ -25,9 +25,13 @@ void BusCall::reply(const std::function<void(sdbus::Message&)>& write) {
   }
 }
 
+void BusCall::reply(const ItemRecord& item) {
+  reply([&](sdbus::Message& answer) { write(answer, item); });
+}
+
 void BusCall::reply(const Result<ItemRecord>& item) {
   if (!item) return fail(item.error());
-  reply([&](sdbus::Message& answer) { write(answer, *item); });
+  reply(*item);
 }
 
 void BusCall::reply(const Result<std::vector<ItemRecord>>& items) {

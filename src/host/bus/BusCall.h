@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <sdbus-c++/sdbus-c++.h>
+#include <string_view>
 
 #include "foundation/Error.h"
 #include "host/bus/BusItems.h"
@@ -30,11 +31,15 @@ class BusCall {
   /// The caller's turn in its lane, which ends with the call: when it is answered.
   void keepTurn(std::shared_ptr<void> turn) { turn_ = std::move(turn); }
 
+  /// Has the next argument be the first again.
+  void readAgain() { message_.rewind(true); }
+
   [[nodiscard]] Caller& caller() const { return *caller_; }
   [[nodiscard]] const std::shared_ptr<Caller>& sharedCaller() const { return caller_; }
 
   /// `write` puts the results into the reply.
   void reply(const std::function<void(sdbus::Message& reply)>& write = {});
+  void reply(const ItemRecord& item);
   void reply(const Result<ItemRecord>& item);
   void reply(const Result<std::vector<ItemRecord>>& items);
   void fail(const Error& error);
@@ -70,12 +75,18 @@ struct BusMethod {
   std::vector<std::string> outputNames;
   Lane lane;
   std::function<void(const std::shared_ptr<BusCall>& call)> answer;
+  /// On the thread that drives the bus, and so without waiting for anything: whether it could
+  /// answer. Where it could not, or there is none, the call goes to its lane.
+  std::function<bool(BusCall& call)> answerAtOnce{};
 };
+
+/// The item of an identifier, if that can be told without waiting for anything, or else null.
+using Recall = std::function<std::shared_ptr<const ItemRecord>(std::string_view identifier)>;
 
 /// Sends a signal of the provider's interface to one connection. Any thread.
 using Signaller = std::function<void(const std::string& caller, const std::string& container)>;
 
-[[nodiscard]] std::vector<BusMethod> providerMethods(Signaller signaller);
+[[nodiscard]] std::vector<BusMethod> providerMethods(Signaller signaller, Recall recall);
 /// `stagingFolder`: where what comes as a descriptor is kept until it is imported.
 [[nodiscard]] std::vector<BusMethod> operationsMethods(const std::string& stagingFolder);
 [[nodiscard]] std::vector<BusMethod> managerMethods();

@@ -37,7 +37,8 @@ constexpr const char* leavingMatch =
 class BusService::Impl {
  public:
   Impl(LocalDocuments& documents, std::function<void()> lost)
-      : callers_(documents),
+      : documents_(documents),
+        callers_(documents),
         stagingFolder_(documents.provider().linuxPlatform().index().stateFolder().path() +
                        "/imports"),
         connection_(sdbus::createSessionBusConnection()) {
@@ -72,8 +73,11 @@ class BusService::Impl {
     const auto signaller = [this](const std::string& caller, const std::string& container) {
       signal(caller, container);
     };
-    for (auto methods :
-         {providerMethods(signaller), operationsMethods(stagingFolder_), managerMethods()}) {
+    const auto recall = [this](std::string_view identifier) {
+      return documents_.itemAtOnce(identifier);
+    };
+    for (auto methods : {providerMethods(signaller, recall), operationsMethods(stagingFolder_),
+                         managerMethods()}) {
       for (BusMethod& method : methods)
         add(std::move(method));
     }
@@ -88,10 +92,11 @@ class BusService::Impl {
   }
 
   void add(BusMethod method) {
-    const auto answer = [this, lane = method.lane,
-                         answer = std::move(method.answer)](sdbus::MethodCall message) {
+    const auto answer = [this, lane = method.lane, answer = std::move(method.answer),
+                         atOnce = std::move(method.answerAtOnce)](sdbus::MethodCall message) {
       const std::string name = message.getSender();
       const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
+      if (atOnce && atOnce(*call)) return;
       const auto run = [call, answer](std::shared_ptr<void> turn) {
         call->keepTurn(std::move(turn));
         answer(call);
@@ -140,6 +145,7 @@ class BusService::Impl {
     }
   }
 
+  LocalDocuments& documents_;
   Callers callers_;
   std::string stagingFolder_;
   std::unique_ptr<sdbus::IConnection> connection_;

@@ -24,6 +24,8 @@ class Caller {
   /// The documents as the caller may see them. It is asked who it is once. Errors: those of
   /// `CallerIdentities::identify`. Any thread.
   [[nodiscard]] Result<Documents*> documents();
+  /// Whether it has been asked who it is, and may see all documents. Waits for nobody.
+  [[nodiscard]] bool isKnownToSeeAll() const { return documents_ == &all_; }
   /// Whether it runs in a sandbox; to be asked when `documents` was.
   [[nodiscard]] bool isSandboxed() const { return restricted_ != nullptr; }
 

@@ -19,6 +19,19 @@ void getItem(const CallPointer& call) {
   if (documents != nullptr) call->reply(documents->item(call->argument<std::string>()));
 }
 
+std::function<bool(BusCall&)> getItemAtOnce(Recall recall) {
+  return [recall = std::move(recall)](BusCall& call) {
+    if (!call.caller().isKnownToSeeAll()) return false;
+    const auto item = recall(call.argument<std::string>());
+    if (item) {
+      call.reply(*item);
+    } else {
+      call.readAgain();
+    }
+    return item != nullptr;
+  };
+}
+
 void getItemAtPath(const CallPointer& call) {
   Documents* documents = call->allDocuments();
   if (documents == nullptr) return;
@@ -190,12 +203,20 @@ void getFavorites(const CallPointer& call) {
 
 }  // namespace
 
-std::vector<BusMethod> providerMethods(Signaller signaller) {
+std::vector<BusMethod> providerMethods(Signaller signaller, Recall recall) {
   constexpr const char* of = providerInterface;
   constexpr const char* item = "a{sv}";
   constexpr const char* items = "aa{sv}";
   return {
-      {of, "GetItem", "s", {"itemIdentifier"}, item, {"item"}, Lane::lookups, getItem},
+      {of,
+       "GetItem",
+       "s",
+       {"itemIdentifier"},
+       item,
+       {"item"},
+       Lane::lookups,
+       getItem,
+       getItemAtOnce(std::move(recall))},
       {of, "GetItemAtPath", "ay", {"path"}, item, {"item"}, Lane::lookups, getItemAtPath},
       {of,
        "ListItems",

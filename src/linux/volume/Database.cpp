@@ -80,6 +80,23 @@ Result<void> Database::checkpoint(Log log) {
   return {};
 }
 
+Result<void> Database::begin() {
+  return runKept(begin_, "BEGIN");
+}
+
+Result<void> Database::commit() {
+  return runKept(commit_, "COMMIT");
+}
+
+Result<void> Database::runKept(std::optional<Statement>& statement, const char* sql) {
+  if (!statement) {
+    auto prepared = prepare(sql);
+    if (!prepared) return fail(prepared.error());
+    statement = *std::move(prepared);
+  }
+  return statement->run();
+}
+
 Result<void> Database::execute(const char* sql) {
   if (sqlite3_exec(handle_, sql, nullptr, nullptr, nullptr) != SQLITE_OK) return fail(lastError());
   return {};

@@ -225,6 +225,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     return status;
   }
 
+  std::uint64_t commits() const override { return commits_; }
   UUID historyUUID() const override { return state_->history(); }
   const StateFolder& stateFolder() const override { return state_->folder(); }
 
@@ -249,6 +250,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<void> inTransaction(const std::function<Result<void>()>& work) {
     auto done = state_->transaction(work);
     lastEventID_ = state_->journal().lastID();
+    commits_ = state_->commits();
     return done;
   }
 
@@ -336,6 +338,7 @@ class StoredVolumeIndex final : public VolumeIndex {
     return inTransactionAtLast([&] { return work(state_->database()); });
   }};
   std::atomic<std::uint64_t> lastEventID_ = 0;
+  std::atomic<std::uint64_t> commits_ = 0;
   std::unique_ptr<FollowThread> thread_;
 };
 

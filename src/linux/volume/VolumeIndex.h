@@ -120,6 +120,9 @@ class VolumeIndex {
   };
   [[nodiscard]] virtual Status status() = 0;
 
+  /// How often something was written to it. Waits for nobody.
+  [[nodiscard]] virtual std::uint64_t commits() const = 0;
+
   /// What is remembered of objects by file ID.
   [[nodiscard]] virtual KeptAttributes& keptAttributes() = 0;
 

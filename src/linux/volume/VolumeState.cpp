@@ -150,7 +150,7 @@ Result<void> VolumeState::startOver(bool isFirst) {
 
 Result<void> VolumeState::transaction(const std::function<Result<void>()>& work) {
   if (broken_) return fail(*broken_);
-  if (auto begun = database_->execute("BEGIN"); !begun) return begun;
+  if (auto begun = database_->begin(); !begun) return begun;
   const std::int64_t changesBefore = database_->changeCount();
   Result<void> done = work();
   if (done) done = commit(changesBefore);
@@ -172,14 +172,14 @@ void VolumeState::releaseMemory() {
 }
 
 Result<void> VolumeState::commit(std::int64_t changesBefore) {
-  if (database_->changeCount() == changesBefore) return database_->execute("COMMIT");
+  if (database_->changeCount() == changesBefore) return database_->commit();
   if (auto saved = allocator_->save(); !saved) return saved;
   if (auto saved = journal_->saveBounds(); !saved) return saved;
   if (auto counted = store_->setNumber("commits", commits_ + 1); !counted) return counted;
   if (!isLogBegun_) {
     if (auto begun = beginLog(); !begun) return begun;
   }
-  if (auto committed = database_->execute("COMMIT"); !committed) return committed;
+  if (auto committed = database_->commit(); !committed) return committed;
   isLogBegun_ = hasWritten_ = true;
   // Only now: a witness ahead of the database would call it an older copy.
   witness_.commits = ++commits_;

@@ -53,6 +53,8 @@ class VolumeState {
   [[nodiscard]] EventJournal& journal() { return *journal_; }
   [[nodiscard]] Database& database() { return *database_; }
   [[nodiscard]] const StateFolder& folder() const { return folder_; }
+  /// Transactions that wrote something.
+  [[nodiscard]] std::uint64_t commits() const { return commits_; }
   [[nodiscard]] const UUID& history() const { return witness_.history; }
 
   /// Runs `work` in a transaction. What it wrote is on disk when this returns without an error,

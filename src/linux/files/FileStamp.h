@@ -1,0 +1,30 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "linux/kernel/ObjectStatus.h"
+
+namespace mirabel {
+
+/// What tells the state of a regular file, and of the place where it lies, from every other: its
+/// contents, its attributes and its name have changed when the stamp has. Taken before and after
+/// something was read of the file, equal, and settled, it says that what was read holds for as long
+/// as the same stamp is found at that path.
+struct FileStamp {
+  ObjectStatus folder;
+  ObjectStatus file;
+  bool isWritable = false;  ///< a mount may become read-only without a trace on the file
+
+  [[nodiscard]] bool isSameAs(const FileStamp& other) const;
+  /// Whether the next change is sure to get another time than the last.
+  [[nodiscard]] bool isSettled() const;
+};
+
+/// The stamp of the file at an absolute path, without waiting for a disk or a network. Nothing for
+/// what is no regular file; where the way there is not in the kernel's memory or leads over a
+/// symbolic link; and where the file system keeps no birth times.
+[[nodiscard]] std::optional<FileStamp> stampOf(const std::string& path);
+
+}  // namespace mirabel
