@@ -6,9 +6,9 @@
 #include <string>
 
 #include "BenchHome.h"
-#include "foundation/Values.h"
 #include "host/HostedProvider.h"
 #include "linux/volume/VolumeIndex.h"
+#include "mirabel/Values.h"
 
 namespace mirabel::bench {
 

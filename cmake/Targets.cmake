@@ -1,7 +1,8 @@
 # Settings that every target of ours shares, and the small functions that declare them.
 
 add_library(mirabel_settings INTERFACE)
-target_include_directories(mirabel_settings INTERFACE ${CMAKE_SOURCE_DIR}/src)
+target_include_directories(mirabel_settings INTERFACE ${CMAKE_SOURCE_DIR}/src
+                                                      ${CMAKE_SOURCE_DIR}/include)
 target_compile_options(mirabel_settings INTERFACE -Wall -Wextra -Wpedantic -Wshadow -Wconversion
                                                   -Wno-sign-conversion -Wnon-virtual-dtor)
 if(MIRABEL_WERROR)

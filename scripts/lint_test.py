@@ -61,6 +61,25 @@ class Layers(unittest.TestCase):
             with self.subTest(name=name, text=text):
                 self.assertEqual(1, len(self.found(**{name: text})))
 
+    def test_a_public_header_counts_as_one_of_its_folder(self):
+        public = {"include/mirabel/Error.h": "#include <expected>\n",
+                  "include/mirabel/UniqueFd.h": '#include <unistd.h>\n#include "mirabel/Error.h"\n'}
+        fine = {"src/linux/files/A.h": '#include "mirabel/UniqueFd.h"\n',
+                "src/fs/A.h": '#include "mirabel/Error.h"\n'}
+        self.assertEqual([], problems(LAYERS.check, {**self.LEAVES, **public, **fine}))
+        table = {
+            "src/fs/A.h": '#include "mirabel/UniqueFd.h"',
+            "src/fs/B.h": '#include "mirabel/Missing.h"',
+            "include/mirabel/Error.h": '#include "foundation/Leaf.h"',
+            "include/mirabel/Values.h": "#include <unistd.h>",
+            "include/mirabel/UniqueFd.h": "#include <sqlite3.h>",
+            "include/mirabel/Unknown.h": "",
+        }
+        for name, text in table.items():
+            with self.subTest(name=name):
+                self.assertEqual(1, len(problems(LAYERS.check,
+                                                 {**self.LEAVES, **public, name: text})))
+
     def test_a_cycle_of_three_folders_is_found_once(self):
         found = self.found(src__linux__a__A='#include "linux/b/A.h"',
                            src__linux__b__A='#include "linux/c/A.h"',

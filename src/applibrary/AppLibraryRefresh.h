@@ -4,7 +4,7 @@
 #include <vector>
 
 #include "applibrary/LocalAppLibraryCache.h"
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 #include "platform/ApplicationRegistry.h"
 
 namespace mirabel {

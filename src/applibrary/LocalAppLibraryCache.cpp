@@ -5,6 +5,7 @@
 #include <variant>
 
 #include "applibrary/BundleProxyArchive.h"
+#include "foundation/FatalError.h"
 #include "foundation/KeyedArchive.h"
 #include "foundation/Log.h"
 

@@ -6,9 +6,9 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/SerialQueue.h"
 #include "foundation/URL.h"
+#include "mirabel/Error.h"
 #include "platform/ApplicationRegistry.h"
 #include "platform/CacheFiles.h"
 

@@ -3,7 +3,7 @@
 #include <string>
 #include <utility>
 
-#include "host/Documents.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel {
 

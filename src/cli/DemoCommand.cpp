@@ -11,7 +11,7 @@
 #include "cli/Commands.h"
 #include "cli/ItemCommands.h"
 #include "cli/Printing.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 namespace {

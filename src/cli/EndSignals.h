@@ -2,7 +2,7 @@
 
 #include <csignal>
 
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

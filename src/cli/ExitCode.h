@@ -1,6 +1,6 @@
 #pragma once
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

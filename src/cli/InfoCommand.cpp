@@ -6,7 +6,7 @@
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
 #include "items/LocalItem.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel {
 namespace {

@@ -3,7 +3,7 @@
 #include <string>
 #include <string_view>
 
-#include "host/Documents.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel {
 

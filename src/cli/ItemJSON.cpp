@@ -4,8 +4,8 @@
 
 #include "cli/Printing.h"
 #include "foundation/Unicode.h"
-#include "host/ItemRecord.h"
-#include "items/TagData.h"
+#include "mirabel/ItemRecord.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel {
 namespace {

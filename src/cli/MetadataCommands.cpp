@@ -8,7 +8,7 @@
 #include "cli/ItemJSON.h"
 #include "cli/OperationRun.h"
 #include "cli/Printing.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel {
 namespace {

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "cli/ExitCode.h"
-#include "cli/Session.h"
+#include "mirabel/Session.h"
 
 namespace mirabel {
 

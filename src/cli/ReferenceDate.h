@@ -3,7 +3,7 @@
 #include <optional>
 #include <string_view>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -4,7 +4,7 @@
 #include <sys/eventfd.h>
 #include <unistd.h>
 
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

@@ -7,11 +7,11 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "fs/FSDirectoryWalk.h"
 #include "fs/HiddenTest.h"
 #include "fs/ItemLook.h"
 #include "fs/LinkNames.h"
+#include "mirabel/Error.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {

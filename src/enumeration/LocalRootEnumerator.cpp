@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "fs/LogText.h"
 #include "items/LocalAppLibraryItem.h"

@@ -6,8 +6,8 @@
 #include <mutex>
 #include <string>
 
-#include "foundation/Values.h"
 #include "fs/FSDirectoryWalk.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -2,7 +2,7 @@
 #include <cmath>
 #include <cstdio>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 namespace {

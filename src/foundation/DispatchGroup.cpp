@@ -6,8 +6,9 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
+#include "foundation/FatalError.h"
 #include "foundation/SerialQueue.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

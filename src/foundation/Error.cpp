@@ -1,10 +1,7 @@
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
-#include <cstdlib>
 #include <system_error>
 #include <utility>
-
-#include "foundation/Log.h"
 
 namespace mirabel {
 namespace {
@@ -158,11 +155,6 @@ std::string Error::description() const {
     text += detail->second;
   }
   return text;
-}
-
-void fatalError(std::string_view message) {
-  logError(message);
-  std::abort();
 }
 
 }  // namespace mirabel

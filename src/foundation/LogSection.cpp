@@ -1,9 +1,10 @@
 #include <limits>
 #include <string>
 
-#include "foundation/Error.h"
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "foundation/LogSectionCounter.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -9,8 +9,8 @@
 #include <variant>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

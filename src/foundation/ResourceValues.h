@@ -7,8 +7,8 @@
 #include <string_view>
 #include <variant>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -5,7 +5,8 @@
 #include <mutex>
 #include <utility>
 
-#include "foundation/Error.h"
+#include "foundation/FatalError.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -8,7 +8,8 @@
 #include <thread>
 #include <utility>
 
-#include "foundation/Error.h"
+#include "foundation/FatalError.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -8,8 +8,8 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -1,4 +1,4 @@
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 #include <algorithm>
 #include <charconv>

@@ -1,5 +1,6 @@
 #include "fs/FSChangeToken.h"
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 
 namespace mirabel {

@@ -6,7 +6,7 @@
 #include <string>
 
 #include "foundation/PropertyList.h"
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "fs/DocumentIDPath.h"
 #include "identity/MRBFileObjectIdentifier.h"

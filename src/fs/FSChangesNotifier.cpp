@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "foundation/DispatchGroup.h"
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "fs/LogText.h"
 

@@ -1,5 +1,7 @@
 #include "fs/FSDirectoryEnumerator.h"
 
+#include "foundation/FatalError.h"
+
 namespace mirabel {
 
 Result<std::uint64_t> FSDirectoryEnumerator::enumerate(DirectoryStreams& directories,

@@ -3,6 +3,7 @@
 #include <string_view>
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/PropertyList.h"
 
 namespace mirabel {

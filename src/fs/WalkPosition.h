@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -10,8 +10,8 @@
 #include <utility>
 #include <vector>
 
-#include "host/Documents.h"
 #include "host/HostedProvider.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel {
 

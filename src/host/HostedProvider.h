@@ -3,12 +3,12 @@
 #include <memory>
 
 #include "applibrary/MRBAppLibraryManager.h"
-#include "foundation/Error.h"
 #include "fs/FSChangesEnumerator.h"
 #include "host/HostTrash.h"
 #include "host/SearchableItems.h"
 #include "linux/files/LinuxPlatform.h"
 #include "linux/log/LoggingDiagnosticReporter.h"
+#include "mirabel/Error.h"
 #include "provider/LocalVessel.h"
 
 namespace mirabel {

@@ -2,9 +2,9 @@
 
 #include <string_view>
 
-#include "host/Documents.h"
 #include "host/ItemLookup.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Documents.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

@@ -5,9 +5,9 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "host/HostedProvider.h"
 #include "items/LocalItem.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -5,6 +5,7 @@
 
 #include "foundation/ResourceValues.h"
 #include "host/ItemLookup.h"
+#include "host/ItemRecords.h"
 
 namespace mirabel {
 namespace {

@@ -5,8 +5,8 @@
 #include <string>
 
 #include "foundation/URL.h"
-#include "host/Documents.h"
 #include "host/HostedProvider.h"
+#include "mirabel/Documents.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {

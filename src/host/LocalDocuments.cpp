@@ -3,7 +3,9 @@
 #include <utility>
 
 #include "host/ItemFile.h"
+#include "host/ItemRecords.h"
 #include "host/LocalContainer.h"
+#include "host/ProviderStatus.h"
 
 namespace mirabel {
 namespace {

@@ -8,11 +8,11 @@
 #include <vector>
 
 #include "host/ContainerWatches.h"
-#include "host/Documents.h"
 #include "host/HostedProvider.h"
 #include "host/ItemLookup.h"
 #include "host/RecentItems.h"
 #include "host/Searching.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel {
 

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "host/ItemRecords.h"
 #include "linux/volume/VolumeIndex.h"
 
 namespace mirabel {

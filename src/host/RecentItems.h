@@ -10,8 +10,9 @@
 #include <string_view>
 
 #include "host/ItemLookup.h"
-#include "host/ItemRecord.h"
 #include "linux/files/FileStamp.h"
+#include "mirabel/Error.h"
+#include "mirabel/ItemRecord.h"
 
 namespace mirabel {
 

@@ -6,8 +6,8 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "host/search/SearchIndex.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -9,11 +9,11 @@
 #include <thread>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "host/ContainerWatches.h"
 #include "host/HostedProvider.h"
 #include "host/search/SearchFeeder.h"
-#include "host/search/SearchQuery.h"
+#include "mirabel/Error.h"
+#include "mirabel/SearchQuery.h"
 
 namespace mirabel {
 

@@ -4,8 +4,8 @@
 #include <optional>
 #include <string>
 
-#include "foundation/Error.h"
 #include "linux/volume/KeptAttributes.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

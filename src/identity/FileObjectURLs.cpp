@@ -6,6 +6,7 @@
 #include <limits>
 #include <string>
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "identity/MRBFileObjectIdentifier.h"
 

@@ -4,8 +4,8 @@
 #include <span>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "items/LocalItem.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

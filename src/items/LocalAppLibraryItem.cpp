@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "identity/MRBFileObjectIdentifier.h"
 

@@ -4,10 +4,11 @@
 #include <charconv>
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/KeyedArchive.h"
 #include "foundation/Log.h"
 #include "items/AttributeNames.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel {
 namespace {

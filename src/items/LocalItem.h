@@ -7,22 +7,13 @@
 #include <string_view>
 
 #include "foundation/URL.h"
-#include "foundation/Values.h"
 #include "identity/FileObjectURLs.h"
 #include "items/AppLibraryOwners.h"
+#include "mirabel/Capability.h"
+#include "mirabel/Values.h"
 #include "platform/Platform.h"
 
 namespace mirabel {
-
-/// What the host may do with an item; the host's bit values.
-enum Capability : std::uint64_t {
-  capabilityReading = 1,  ///< and enumerating the contents
-  capabilityWriting = 2,  ///< and adding sub-items
-  capabilityReparenting = 4,
-  capabilityRenaming = 8,
-  capabilityTrashing = 16,
-  capabilityDeleting = 32,
-};
 
 /// What building an item needs; references that outlive every item.
 struct ItemContext {

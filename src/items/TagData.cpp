@@ -1,4 +1,4 @@
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 #include <utility>
 

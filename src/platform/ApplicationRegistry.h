@@ -6,9 +6,9 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/PropertyList.h"
 #include "foundation/URL.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -5,9 +5,9 @@
 #include <optional>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

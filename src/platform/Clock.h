@@ -2,7 +2,7 @@
 
 #include <chrono>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -2,8 +2,8 @@
 
 #include <cstdint>
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

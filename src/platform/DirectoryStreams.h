@@ -5,9 +5,9 @@
 #include <optional>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
 #include "foundation/URL.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

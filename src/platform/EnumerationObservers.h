@@ -7,8 +7,9 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Containers.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 
@@ -16,8 +17,7 @@ class LocalItem;
 
 using VesselItems = std::vector<std::shared_ptr<LocalItem>>;
 
-/// The pages that start a listing. Their bytes are those of the text.
-inline constexpr std::string_view VesselInitialPageSortedByName = "VesselInitialPageSortedByName";
+/// The other page that starts a listing.
 inline constexpr std::string_view VesselInitialPageSortedByDate = "VesselInitialPageSortedByDate";
 
 /// What the host hands over to be told one page of a listing: `didEnumerateItems` once or twice,

@@ -9,10 +9,10 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/SerialQueue.h"
 #include "foundation/URL.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 #include "platform/FileObjects.h"
 
 namespace mirabel {

@@ -5,9 +5,9 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/ExtendedAttributes.h"
 #include "foundation/URL.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <expected>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 #include "platform/ApplicationRegistry.h"
 
 namespace mirabel {

@@ -6,20 +6,15 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
+#include "mirabel/Containers.h"
+#include "mirabel/Error.h"
 #include "platform/DirectorySizer.h"
 #include "platform/VolumeHistory.h"
 
 namespace mirabel {
 
-/// Identifiers of the containers that are no files.
-inline constexpr std::string_view VesselRootContainerItemIdentifier =
-    "VesselRootContainerItemIdentifier";
-inline constexpr std::string_view VesselWorkingSetContainerItemIdentifier =
-    "VesselWorkingSetContainerItemIdentifier";
-inline constexpr std::string_view VesselAllDirectoriesContainerItemIdentifier =
-    "VesselAllDirectoriesContainerItemIdentifier";
+/// The identifier of a folder that is no container of the host's.
 inline constexpr std::string_view VesselTemporaryLocalFolderItemIdentifier =
     "VesselTemporaryLocalFolderItemIdentifier";
 

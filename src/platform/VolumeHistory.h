@@ -1,8 +1,8 @@
 #pragma once
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "fs/LogText.h"
 

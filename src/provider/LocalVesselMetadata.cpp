@@ -5,7 +5,7 @@
 
 #include "foundation/Log.h"
 #include "items/AttributeNames.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 #include "provider/AttributePayload.h"
 #include "provider/LocalVessel.h"
 

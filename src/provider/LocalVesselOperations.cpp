@@ -1,6 +1,7 @@
 #include <string>
 #include <utility>
 
+#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "items/LocalAppLibraryItem.h"
 #include "provider/LocalVessel.h"

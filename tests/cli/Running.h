@@ -5,7 +5,7 @@
 #include <sys/types.h>
 #include <vector>
 
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel::testing {
 

@@ -5,7 +5,7 @@
 #include <stdexcept>
 #include <utility>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel::testing {
 namespace {

@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

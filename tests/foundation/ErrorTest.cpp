@@ -4,7 +4,8 @@
 #include <string>
 #include <utility>
 
-#include "foundation/Error.h"
+#include "foundation/FatalError.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 namespace {

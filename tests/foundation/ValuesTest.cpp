@@ -3,7 +3,7 @@
 #include <limits>
 #include <rapidcheck/gtest.h>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 namespace {

@@ -6,7 +6,7 @@
 
 #include "foundation/KeyedArchive.h"
 #include "items/LocalItem.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 #include "support/FakeAppLibraries.h"
 #include "support/FakePlatform.h"
 #include "support/LogCapture.h"

@@ -2,7 +2,7 @@
 #include <limits>
 
 #include "foundation/PropertyList.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel {
 namespace {

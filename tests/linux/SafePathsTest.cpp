@@ -7,7 +7,7 @@
 #include <sys/mount.h>
 
 #include "linux/FilesFixture.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel::testing {
 namespace {

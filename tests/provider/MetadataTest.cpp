@@ -9,7 +9,7 @@
 
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 #include "provider/ProviderFixture.h"
 
 namespace mirabel::testing {

@@ -9,9 +9,9 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel::testing {
 

@@ -6,7 +6,7 @@
 #include <optional>
 #include <vector>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel::testing {
 

@@ -5,9 +5,9 @@
 #include <sdbus-c++/sdbus-c++.h>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/Callers.h"
+#include "mirabel/Error.h"
 
 namespace mirabel::bus {
 

@@ -11,9 +11,9 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "host/bus/BusErrors.h"
 #include "host/bus/BusLoop.h"
+#include "mirabel/Error.h"
 
 namespace mirabel::bus {
 

@@ -2,7 +2,7 @@
 
 #include <sdbus-c++/Error.h>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel::bus {
 

@@ -7,7 +7,7 @@
 #include <type_traits>
 
 #include "host/bus/BusText.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel::bus {
 namespace {

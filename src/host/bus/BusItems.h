@@ -9,10 +9,10 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Values.h"
-#include "host/Documents.h"
-#include "host/ItemRecord.h"
-#include "host/StatusReport.h"
+#include "mirabel/Documents.h"
+#include "mirabel/ItemRecord.h"
+#include "mirabel/StatusReport.h"
+#include "mirabel/Values.h"
 
 namespace mirabel::bus {
 

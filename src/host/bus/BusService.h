@@ -4,8 +4,8 @@
 #include <memory>
 #include <string>
 
-#include "foundation/Error.h"
 #include "host/LocalDocuments.h"
+#include "mirabel/Error.h"
 
 namespace mirabel::bus {
 

@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace sdbus {
 class IConnection;

@@ -9,8 +9,8 @@
 #include <optional>
 #include <string>
 
-#include "host/Documents.h"
 #include "host/bus/CallerIdentity.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel::bus {
 

@@ -4,7 +4,7 @@
 #include "host/bus/BusCall.h"
 #include "host/bus/BusNames.h"
 #include "host/bus/StagedImport.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel::bus {
 namespace {

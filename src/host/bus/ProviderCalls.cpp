@@ -3,7 +3,7 @@
 
 #include "host/bus/BusCall.h"
 #include "host/bus/BusNames.h"
-#include "host/search/SearchQuery.h"
+#include "mirabel/SearchQuery.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel::bus {

@@ -7,7 +7,7 @@
 #include <string_view>
 #include <vector>
 
-#include "host/Documents.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel::bus {
 

@@ -6,8 +6,8 @@
 #include <mutex>
 #include <string>
 
-#include "host/Documents.h"
 #include "host/bus/BusConnection.h"
+#include "mirabel/Documents.h"
 
 namespace mirabel::bus {
 

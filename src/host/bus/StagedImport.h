@@ -3,7 +3,7 @@
 #include <string>
 #include <utility>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel::bus {
 

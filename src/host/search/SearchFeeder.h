@@ -3,9 +3,9 @@
 #include <mutex>
 #include <stop_token>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "host/search/SearchIndex.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {

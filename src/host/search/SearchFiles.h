@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <string>
 
-#include "foundation/Error.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

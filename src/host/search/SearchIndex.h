@@ -9,10 +9,10 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "host/search/SearchFiles.h"
-#include "host/search/SearchQuery.h"
+#include "mirabel/Error.h"
+#include "mirabel/SearchQuery.h"
+#include "mirabel/Values.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {

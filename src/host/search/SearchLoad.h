@@ -8,11 +8,11 @@
 #include <unordered_set>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/SerialQueue.h"
-#include "foundation/Values.h"
 #include "host/search/SearchFiles.h"
 #include "host/search/SearchStore.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {

@@ -6,7 +6,7 @@
 #include <limits>
 
 #include "host/search/SearchText.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel {
 namespace {

@@ -5,9 +5,9 @@
 #include <string>
 #include <vector>
 
-#include "host/search/SearchQuery.h"
 #include "host/search/SearchStore.h"
 #include "host/search/SearchText.h"
+#include "mirabel/SearchQuery.h"
 
 namespace mirabel {
 

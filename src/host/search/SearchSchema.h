@@ -2,10 +2,10 @@
 
 #include <cstdint>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "host/search/SearchRow.h"
 #include "linux/volume/Database.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

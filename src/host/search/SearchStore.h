@@ -8,11 +8,11 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "host/search/SearchRow.h"
 #include "host/search/SearchTimes.h"
 #include "linux/volume/Database.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

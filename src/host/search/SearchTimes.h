@@ -6,8 +6,8 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/volume/Database.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

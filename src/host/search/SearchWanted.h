@@ -6,8 +6,8 @@
 #include <string_view>
 #include <vector>
 
-#include "host/search/SearchQuery.h"
 #include "host/search/SearchText.h"
+#include "mirabel/SearchQuery.h"
 
 namespace mirabel {
 

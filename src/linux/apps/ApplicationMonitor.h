@@ -7,7 +7,7 @@
 
 #include "linux/apps/ApplicationWatches.h"
 #include "linux/apps/LocalNotificationCenter.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

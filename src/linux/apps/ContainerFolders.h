@@ -4,9 +4,9 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

@@ -4,8 +4,8 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/apps/LeftOut.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

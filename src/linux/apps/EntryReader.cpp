@@ -7,7 +7,7 @@
 #include <utility>
 
 #include "linux/apps/PassingErrors.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 namespace {

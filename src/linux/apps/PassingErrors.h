@@ -2,7 +2,7 @@
 
 #include <cerrno>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

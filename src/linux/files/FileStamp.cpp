@@ -6,7 +6,7 @@
 
 #include "linux/files/ObjectLook.h"
 #include "linux/kernel/LongPath.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 namespace {

@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <string>
 
-#include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -3,7 +3,7 @@
 #include <optional>
 #include <string>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -11,7 +11,7 @@
 #include <system_error>
 #include <unistd.h>
 
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 namespace {

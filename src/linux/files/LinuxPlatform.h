@@ -8,11 +8,11 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/files/LinuxVesselManager.h"
 #include "linux/operations/OperationProgress.h"
 #include "linux/volume/VolumeIndex.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/Error.h"
 #include "platform/EventStreams.h"
 #include "platform/IconService.h"
 #include "platform/NotificationCenter.h"

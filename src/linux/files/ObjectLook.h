@@ -3,11 +3,11 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
 #include "linux/files/TypeTable.h"
 #include "linux/kernel/EntryPlace.h"
 #include "linux/volume/VolumeIndex.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

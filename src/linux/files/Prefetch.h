@@ -2,8 +2,8 @@
 
 #include <span>
 
-#include "foundation/Error.h"
 #include "linux/files/ObjectLook.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -5,8 +5,8 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

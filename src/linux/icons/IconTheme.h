@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

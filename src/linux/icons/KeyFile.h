@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

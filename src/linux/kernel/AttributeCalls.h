@@ -4,8 +4,8 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -2,9 +2,9 @@
 
 #include <string>
 
-#include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

@@ -5,8 +5,8 @@
 #include <linux/openat2.h>
 #include <string>
 
-#include "foundation/Error.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

@@ -9,9 +9,9 @@
 #include <unordered_map>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/kernel/LongPath.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

@@ -6,9 +6,9 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -5,9 +5,9 @@
 #include <optional>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/ResourceValues.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

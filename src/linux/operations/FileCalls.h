@@ -8,10 +8,10 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "linux/kernel/ObjectStatus.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

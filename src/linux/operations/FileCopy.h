@@ -3,9 +3,9 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/operations/FileCalls.h"
 #include "linux/operations/OperationProgress.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

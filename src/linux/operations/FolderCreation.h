@@ -1,8 +1,8 @@
 #pragma once
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
 #include "linux/kernel/MonitoredRoots.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

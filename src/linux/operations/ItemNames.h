@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

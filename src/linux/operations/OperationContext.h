@@ -4,7 +4,6 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "foundation/URL.h"
 #include "linux/kernel/EntryPlace.h"
 #include "linux/kernel/MonitoredRoots.h"
@@ -12,6 +11,7 @@
 #include "linux/operations/ItemNames.h"
 #include "linux/operations/OperationProgress.h"
 #include "linux/operations/PendingWork.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -7,10 +7,10 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/operations/FileCalls.h"
 #include "linux/operations/PendingRecords.h"
 #include "linux/volume/VolumeIndex.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

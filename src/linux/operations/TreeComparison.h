@@ -2,8 +2,8 @@
 
 #include <string>
 
-#include "foundation/Error.h"
 #include "linux/operations/FileCalls.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -6,10 +6,10 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/operations/FileCalls.h"
 #include "linux/operations/FileCopy.h"
 #include "linux/operations/OperationProgress.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

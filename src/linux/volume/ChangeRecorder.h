@@ -8,11 +8,11 @@
 #include <string_view>
 #include <utility>
 
-#include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/volume/EventJournal.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/IndexedPaths.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

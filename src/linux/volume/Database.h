@@ -7,7 +7,7 @@
 #include <string_view>
 #include <utility>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 struct sqlite3;
 struct sqlite3_stmt;

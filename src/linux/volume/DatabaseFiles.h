@@ -5,8 +5,8 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "linux/volume/StateFolder.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

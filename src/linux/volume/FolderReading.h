@@ -3,9 +3,9 @@
 #include <optional>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/kernel/RawDirectory.h"
 #include "linux/volume/VolumeIndex.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

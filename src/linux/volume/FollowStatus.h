@@ -3,9 +3,9 @@
 #include <cstddef>
 #include <optional>
 
-#include "foundation/Error.h"
 #include "linux/watch/FolderWatcher.h"
 #include "linux/watch/WatchLimits.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -4,8 +4,8 @@
 #include <memory>
 #include <thread>
 
-#include "linux/kernel/UniqueFd.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

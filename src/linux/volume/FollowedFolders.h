@@ -5,8 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/volume/Database.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -11,7 +11,6 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/volume/FollowStatus.h"
 #include "linux/volume/IndexContext.h"
 #include "linux/volume/MissingNames.h"
@@ -19,6 +18,7 @@
 #include "linux/volume/RecentNames.h"
 #include "linux/volume/TreeScan.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -2,9 +2,9 @@
 
 #include <cstdint>
 
-#include "foundation/Error.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/Witness.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -8,11 +8,11 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "linux/volume/Database.h"
 #include "linux/volume/FolderPaths.h"
 #include "linux/volume/ObjectRow.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -5,9 +5,9 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/volume/IdentityStore.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -9,9 +9,9 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "linux/volume/Database.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

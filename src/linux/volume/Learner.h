@@ -9,11 +9,11 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/volume/Newcomers.h"
 #include "linux/volume/Placer.h"
 #include "linux/volume/VolumeIndex.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -8,13 +8,13 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/volume/ChangeRecorder.h"
 #include "linux/volume/IdentifierAllocator.h"
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/IndexedPaths.h"
 #include "linux/volume/ObjectFinder.h"
 #include "linux/volume/ObjectMatcher.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

@@ -1,7 +1,7 @@
 #pragma once
 
-#include "foundation/Error.h"
 #include "linux/volume/StateFolder.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

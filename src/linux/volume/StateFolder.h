@@ -5,9 +5,9 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

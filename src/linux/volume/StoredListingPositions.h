@@ -8,8 +8,8 @@
 #include <string>
 #include <string_view>
 
-#include "linux/kernel/UniqueFd.h"
 #include "linux/volume/StateFolder.h"
+#include "mirabel/UniqueFd.h"
 #include "platform/ListingPositions.h"
 
 namespace mirabel {

@@ -8,11 +8,11 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/Error.h"
 #include "linux/volume/FolderReading.h"
 #include "linux/volume/IndexContext.h"
 #include "linux/volume/MissingNames.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

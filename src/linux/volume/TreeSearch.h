@@ -5,8 +5,8 @@
 #include <set>
 #include <string>
 
-#include "foundation/Error.h"
 #include "linux/kernel/MonitoredRoots.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

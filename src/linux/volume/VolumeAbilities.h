@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "foundation/Error.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

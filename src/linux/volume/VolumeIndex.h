@@ -10,8 +10,6 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
 #include "linux/kernel/MonitoredRoots.h"
 #include "linux/kernel/ObjectStatus.h"
 #include "linux/volume/EventJournal.h"
@@ -21,6 +19,8 @@
 #include "linux/volume/KeptAttributes.h"
 #include "linux/volume/StateFolder.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/Error.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

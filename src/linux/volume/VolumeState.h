@@ -5,7 +5,6 @@
 #include <string>
 #include <string_view>
 
-#include "foundation/Error.h"
 #include "linux/volume/Database.h"
 #include "linux/volume/DatabaseFiles.h"
 #include "linux/volume/EventJournal.h"
@@ -13,6 +12,7 @@
 #include "linux/volume/IdentityStore.h"
 #include "linux/volume/StateFolder.h"
 #include "linux/volume/Witness.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

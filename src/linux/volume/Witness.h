@@ -4,10 +4,10 @@
 #include <cstdint>
 #include <optional>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
-#include "linux/kernel/UniqueFd.h"
 #include "linux/volume/StateFolder.h"
+#include "mirabel/Error.h"
+#include "mirabel/UniqueFd.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -9,8 +9,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include "linux/kernel/UniqueFd.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

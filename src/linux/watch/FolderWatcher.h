@@ -6,8 +6,8 @@
 #include <optional>
 #include <string>
 
-#include "foundation/Error.h"
 #include "linux/watch/LookList.h"
+#include "mirabel/Error.h"
 
 namespace mirabel {
 

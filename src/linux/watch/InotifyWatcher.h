@@ -5,8 +5,8 @@
 #include <memory>
 #include <unordered_map>
 
-#include "linux/kernel/UniqueFd.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 

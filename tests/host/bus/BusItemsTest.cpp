@@ -8,7 +8,7 @@
 #include "host/bus/BusClient.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/PrivateBus.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 namespace mirabel::testing {
 namespace {

@@ -7,7 +7,7 @@
 #include "host/bus/BusClient.h"
 #include "host/bus/Confined.h"
 #include "host/bus/ServiceFixture.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 #include "platform/VesselManager.h"
 #include "support/OrdinaryUser.h"
 

@@ -8,7 +8,7 @@
 
 #include "host/bus/BusClient.h"
 #include "host/bus/ServiceFixture.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel::testing {
 namespace {

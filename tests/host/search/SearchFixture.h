@@ -12,7 +12,7 @@
 #include "host/search/SearchIndex.h"
 #include "items/AttributeNames.h"
 #include "items/LocalItem.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 #include "support/FakeAppLibraries.h"
 #include "support/FakePlatform.h"
 #include "support/TempHome.h"

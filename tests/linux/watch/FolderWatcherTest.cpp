@@ -10,8 +10,8 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
-#include "linux/kernel/UniqueFd.h"
 #include "linux/watch/FolderWatcher.h"
+#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 namespace {

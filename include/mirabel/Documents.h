@@ -8,29 +8,35 @@
 #include <string_view>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
-#include "host/ItemRecord.h"
-#include "host/StatusReport.h"
-#include "host/search/SearchQuery.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/Containers.h"
+#include "mirabel/Error.h"
+#include "mirabel/Export.h"
+#include "mirabel/ItemRecord.h"
+#include "mirabel/SearchQuery.h"
+#include "mirabel/StatusReport.h"
+#include "mirabel/UniqueFd.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 
+/// Up to 200 items.
 struct ItemPage {
   std::vector<ItemRecord> items;
-  std::optional<Data> nextPage;  ///< nothing when the listing is complete
+  /// What to ask for next; nothing when the listing is complete. Outlives the process.
+  std::optional<Data> nextPage;
 };
 
+/// What has changed: things as they are now, and the identifiers of those that have gone. Either
+/// may name what the client had been told already, or never knew. None is in both.
 struct ItemChanges {
   std::vector<ItemRecord> updated;
   std::vector<std::string> deleted;
-  Data anchor;              ///< where to ask on from
+  Data anchor;              ///< where to ask on from; outlives the process
   bool moreComing = false;  ///< ask again at once
 };
 
 /// A container that is listed and followed by one client. Not shared between threads.
-class DocumentContainer {
+class MIRABEL_EXPORT DocumentContainer {
  public:
   virtual ~DocumentContainer() = default;
   /// The page that a cursor stands for; `VesselInitialPageSortedByName` begins. Errors:
@@ -39,12 +45,15 @@ class DocumentContainer {
   /// A batch of what has changed since the anchor. Errors: `syncAnchorExpired` for one that can't
   /// be used any more; the container has to be listed again.
   [[nodiscard]] virtual Result<ItemChanges> changes(const Data& anchor) = 0;
-  /// Error: `LocalVesselError::unableToGetDeviceUUID`.
+  /// The moment of now in its history. Who keeps a copy asks for it before listing, so that what
+  /// happens during the listing is told afterwards. Error:
+  /// `LocalVesselError::unableToGetDeviceUUID`.
   [[nodiscard]] virtual Result<Data> currentSyncAnchor() = 0;
 };
 
-/// Tells that a container has changed for as long as it lives.
-class ContainerWatch {
+/// Tells that a container has changed for as long as it lives: once it is gone, no call is under
+/// way any more, unless it is that call which ended it.
+class MIRABEL_EXPORT ContainerWatch {
  public:
   virtual ~ContainerWatch() = default;
 };
@@ -82,13 +91,13 @@ struct ApplicationContainer {
   bool isAppLibrary = false;  ///< whether its documents are shown
 };
 
-/// The documents of a home as a program sees them: through the provider in its own process, or
-/// through the service that runs. Both answer the same. Any thread may call it; handlers are called
-/// exactly once, on any thread, perhaps before the call returns.
+/// The documents of a home as a program sees them: through a provider in its own process, or
+/// through the service that runs; `openDocuments` chooses. Both answer the same. Any thread may
+/// call it. Its containers and watches have to go before it does.
 ///
-/// Containers are named by an item's identifier or by one of the host's constants. Where the
-/// service does not answer (any more), the error is POSIX ENOTCONN.
-class Documents {
+/// Containers are named by an item's identifier or by one of the constants in mirabel/Containers.h.
+/// Where the service does not answer (any more), the error is POSIX ENOTCONN.
+class MIRABEL_EXPORT Documents {
  public:
   using ItemResult = Result<ItemRecord>;
   using ItemHandler = std::function<void(ItemResult)>;
@@ -96,7 +105,7 @@ class Documents {
 
   virtual ~Documents() = default;
 
-  // Lookups. Errors: the host's no-such-item error; `LocalVesselError::itemNotFound` for what is
+  // Lookups. Errors: `VesselErrorCode::noSuchItem`; `LocalVesselError::itemNotFound` for what is
   // there and not shown, with the reason; POSIX and file errors for a path that leads nowhere.
 
   [[nodiscard]] virtual ItemResult item(std::string_view identifier) = 0;
@@ -116,43 +125,75 @@ class Documents {
   /// anything else that is no regular file, EACCES.
   [[nodiscard]] virtual Result<UniqueFd> openFile(std::string_view identifier, Access access) = 0;
 
-  // Operations, as `LocalVessel` and `HostTrash` have them, with their errors.
+  // Operations. Handlers are called exactly once, on any thread, perhaps before the call returns,
+  // with the item as it is then; they must not wait for another operation. On success the change is
+  // on disk; after a crash it is done or undone, never half. Errors: `VesselErrorCode::noSuchItem`
+  // for an identifier that leads nowhere; `VesselErrorCode::collision`, or where what is in the way
+  // is no item `FileErrorCode::fileExists`, for a name that is taken, for nothing is ever replaced;
+  // `FileErrorCode::writeNotPermitted` for a place in the root container itself; POSIX EINVAL for
+  // a name that none can have, and other POSIX errors. Where the change was made and its item can't
+  // be built, the error is the lookup's, and the change stays.
 
-  /// Copies what lies at the path, anywhere, into the parent.
+  /// Copies the file or the whole folder at an absolute path, anywhere, into the parent, with
+  /// times, permissions and user attributes.
   virtual void importDocument(const std::string& source, const std::string& parent,
                               ItemHandler handler) = 0;
   virtual void createDirectory(const std::string& name, const std::string& parent,
                                ItemHandler handler) = 0;
   virtual void rename(const std::string& identifier, const std::string& name,
                       ItemHandler handler) = 0;
+  /// Moves it into another folder, under another name if one is given. Where parent and item are
+  /// both unknown, the error names the parent.
   virtual void reparent(const std::string& identifier, const std::string& parent,
                         const std::optional<std::string>& newName, ItemHandler handler) = 0;
+  /// Deletes it for good, a folder with everything in it.
   virtual void remove(const std::string& identifier, ErrorHandler handler) = 0;
+  /// Moves it to the trash of its documents, under a name made from its own where that is taken.
+  /// Where it came from is on disk first. Errors of `ErrorDomain::store` too.
   virtual void trash(const std::string& identifier, ItemHandler handler) = 0;
+  /// Moves it out of the trash: into the parent if one is given, or else back to where it came from
+  /// under the name that it had, or one made from it where that is taken. Error: invalid parameter
+  /// `itemIdentifier` for what is not in the trash, or has no place to go.
   virtual void restore(const std::string& identifier, const std::optional<std::string>& parent,
                        ItemHandler handler) = 0;
+
+  // What the user says of a file; nothing given takes it away. It lies in an extended attribute of
+  // the file, which stays as it was after an error.
+
   virtual void setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,
                                ItemHandler handler) = 0;
+  /// In the encoding of mirabel/TagData.h; anything else counts as no tags.
   virtual void setTagData(const std::string& identifier, const std::optional<Data>& tagData,
                           ItemHandler handler) = 0;
   virtual void setFavoriteRank(const std::string& identifier, const std::optional<Number>& rank,
                                ItemHandler handler) = 0;
+
+  // The trash.
+
   [[nodiscard]] virtual Result<TrashFindings> itemsTrashedBefore(const Date& date) = 0;
-  /// See `LocalVessel::_removeTrashedItemsOlderThanDate`.
+  /// Deletes for good what was trashed before the date. What has no date, because another program
+  /// put it there, gets the one of now, and so goes one period later. The trash is walked before
+  /// the call returns; not to be called from a handler. What can't be deleted stays for the next
+  /// time, and is no error.
   virtual void removeItemsTrashedBefore(const Date& date, ErrorHandler handler) = 0;
+
+  /// How far the operations of the process have come that holds the documents.
   [[nodiscard]] virtual Progress progress() = 0;
 
   // Applications.
 
+  /// Those that show their documents.
   [[nodiscard]] virtual Result<std::vector<ItemRecord>> appLibraries() = 0;
-  /// Error: `LocalVesselError::itemNotFound`, with the reason.
+  /// The document folder of an application, whether or not its documents are shown. Error:
+  /// `LocalVesselError::itemNotFound`, with the reason.
   [[nodiscard]] virtual Result<ApplicationContainer> applicationContainer(
       const std::string& bundle) = 0;
   /// A PNG file of at most `side` pixels each way; nothing for what has no picture.
   [[nodiscard]] virtual Result<std::optional<Data>> icon(const std::string& identifier,
                                                          std::uint32_t side) = 0;
 
-  // The search index, in step with the disk as of the call. Errors: those of feeding it.
+  // The search index, in step with the disk as of the call, in which it may have to be fed first.
+  // Errors: `ErrorDomain::store`, POSIX.
 
   [[nodiscard]] virtual Result<std::vector<ItemRecord>> search(const SearchQuery& query) = 0;
   /// The documents that were used or changed last, the last first.
@@ -160,6 +201,7 @@ class Documents {
   /// In the order of their ranks, `limit` at most.
   [[nodiscard]] virtual Result<std::vector<ItemRecord>> favorites(std::size_t limit) = 0;
 
+  /// Error: that the index can't be brought in step with the disk.
   [[nodiscard]] virtual Result<StatusReport> status() = 0;
   [[nodiscard]] virtual HomePlaces places() = 0;
 };

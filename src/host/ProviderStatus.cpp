@@ -1,4 +1,4 @@
-#include "host/StatusReport.h"
+#include "host/ProviderStatus.h"
 
 #include <algorithm>
 #include <cerrno>

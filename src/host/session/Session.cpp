@@ -1,4 +1,4 @@
-#include "cli/Session.h"
+#include "mirabel/Session.h"
 
 #include "host/LocalDocuments.h"
 #include "host/bus/RemoteDocuments.h"

@@ -1,10 +1,17 @@
 #pragma once
 
+#if __cplusplus <= 202002L
+#error "Mirabel's headers need C++23 (-std=c++23)"
+#endif
+
 #include <cstdint>
 #include <expected>
 #include <map>
 #include <string>
 #include <string_view>
+#include <utility>
+
+#include "mirabel/Export.h"
 
 namespace mirabel {
 
@@ -13,7 +20,7 @@ enum class ErrorDomain {
   posix,         ///< code is an errno value
   file,          ///< general file errors, see `FileErrorCode`
   vessel,        ///< errors that the host acts on, see `VesselErrorCode`
-  localVessel,   ///< the program's own, see `LocalVesselError`
+  localVessel,   ///< Mirabel's own, see `LocalVesselError`
   propertyList,  ///< bytes that are no property list or archive of ours
   store,         ///< the volume's database
 };
@@ -52,7 +59,7 @@ inline constexpr std::string_view detail = "detail";  ///< free text, ends the d
 }  // namespace errorkey
 
 /// Why something failed. A value; equal when domain, code and user info are.
-struct Error {
+struct MIRABEL_EXPORT Error {
   ErrorDomain domain = ErrorDomain::posix;
   std::int64_t code = 0;
   std::map<std::string, std::string, std::less<>> userInfo;
@@ -89,6 +96,7 @@ struct Error {
   friend bool operator==(const Error&, const Error&) = default;
 };
 
+/// What can fail: a value, or why there is none.
 template <class T>
 using Result = std::expected<T, Error>;
 
@@ -96,9 +104,5 @@ using Result = std::expected<T, Error>;
 [[nodiscard]] inline std::unexpected<Error> fail(Error error) {
   return std::unexpected<Error>(std::move(error));
 }
-
-/// Logs `message` at error level and ends the process with SIGABRT: a programming error, or a
-/// state in which going on would harm.
-[[noreturn]] void fatalError(std::string_view message);
 
 }  // namespace mirabel

@@ -1,4 +1,4 @@
-#include "host/ItemRecord.h"
+#include "host/ItemRecords.h"
 
 #include "items/LocalItem.h"
 

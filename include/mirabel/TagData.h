@@ -5,8 +5,9 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Error.h"
+#include "mirabel/Export.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 
@@ -20,8 +21,9 @@ struct Tag {
 
 /// The host's encoding of a list of tags: a binary property list, an array of dictionaries with
 /// the keys "label" and "color".
-[[nodiscard]] Result<Data> encodeTagData(const std::vector<Tag>& tags);
+[[nodiscard]] MIRABEL_EXPORT Result<Data> encodeTagData(const std::vector<Tag>& tags);
 /// Nothing for bytes that are no tag data.
-[[nodiscard]] std::optional<std::vector<Tag>> decodeTagData(std::span<const std::uint8_t> bytes);
+[[nodiscard]] MIRABEL_EXPORT std::optional<std::vector<Tag>> decodeTagData(
+    std::span<const std::uint8_t> bytes);
 
 }  // namespace mirabel

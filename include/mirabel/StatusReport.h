@@ -5,8 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "foundation/Error.h"
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 
@@ -35,9 +34,5 @@ struct StatusReport {
   std::string home;
   std::string stateFolder;
 };
-
-class HostedProvider;
-/// Error: that the index can't be brought in step with the disk.
-[[nodiscard]] Result<StatusReport> statusOf(const HostedProvider& provider);
 
 }  // namespace mirabel

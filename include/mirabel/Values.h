@@ -10,16 +10,19 @@
 #include <variant>
 #include <vector>
 
+#include "mirabel/Export.h"
+
 namespace mirabel {
 
 /// A byte string.
 using Data = std::vector<std::uint8_t>;
 
-Data dataFromString(std::string_view bytes);
-std::string_view stringView(const Data& data);
+MIRABEL_EXPORT Data dataFromString(std::string_view bytes);
+/// Holds as long as the data does and is not changed.
+MIRABEL_EXPORT std::string_view stringView(const Data& data);
 
 /// A moment: seconds since 1970-01-01T00:00:00Z (may be negative) and nanoseconds 0..999,999,999.
-struct Date {
+struct MIRABEL_EXPORT Date {
   std::int64_t seconds = 0;
   std::uint32_t nanoseconds = 0;
 
@@ -49,7 +52,7 @@ inline constexpr Date Date::earliest{-62'135'596'800, 0};
 inline constexpr Date Date::latest{253'402'300'799, 999'999'999};
 
 /// An integer or floating value, as extended attributes and property lists carry them.
-struct Number {
+struct MIRABEL_EXPORT Number {
   std::variant<std::int64_t, std::uint64_t, double> value;
 
   static Number of(std::int64_t v) { return {v}; }
@@ -63,11 +66,11 @@ struct Number {
 
   /// By mathematical value: 3, 3u and 3.0 are equal. Not-a-number equals itself, so that a value
   /// that was written and read back is the same value.
-  friend bool operator==(const Number& a, const Number& b);
+  MIRABEL_EXPORT friend bool operator==(const Number& a, const Number& b);
 };
 
 /// A universally unique identifier.
-struct UUID {
+struct MIRABEL_EXPORT UUID {
   std::array<std::uint8_t, 16> bytes{};
 
   static UUID random();
