@@ -1,8 +1,8 @@
 // The service on a private bus, asked by a program that waits for each answer: what a look-up of an
 // item costs beside a call that does nothing. Both go from the client through the bus to the
-// service and back. The items are those of a folder, asked for in turn: after the first rounds the
-// service knows them and makes sure only that they are as they were. Folders it looks up each time,
-// like documents that it has not been asked for lately.
+// service and back. The items are those of a folder, asked for in turn: once the service knows them
+// it makes sure only that they are as they were. Packages it looks up each time, like whatever it
+// has not been asked for lately.
 #include <array>
 #include <cstdlib>
 #include <filesystem>
@@ -47,6 +47,13 @@ std::vector<std::string> identifiersIn(sdbus::IProxy& service, std::string_view 
   return identifiers;
 }
 
+std::string identifierAt(sdbus::IProxy& service, const std::string& path) {
+  auto call = service.createMethodCall(bus::providerInterface, "GetItemAtPath");
+  call << dataFromString(path);
+  auto reply = service.callMethod(call);
+  return bus::readItem(reply).itemIdentifier;
+}
+
 void askForNothing(sdbus::IProxy& service) {
   const auto call = service.createMethodCall("org.freedesktop.DBus.Peer", "Ping");
   static_cast<void>(service.callMethod(call));
@@ -64,9 +71,10 @@ void askFor(sdbus::IProxy& service, const std::string& identifier) {
 void runServiceBenchmarks(const Scale& scale) {
   if (!scale.includesAny({itemRow, lookUpRow})) return;
   const BenchHome home(BenchHome::Where::memory);
-  static_cast<void>(home.makeFolder("folder", 200));
+  const std::string folder = home.makeFolder("folder", 200);
+  const std::string packages = home.makeFolder("packages", 0);
   for (int i = 0; i < 50; ++i)
-    std::filesystem::create_directory(home.documents() + "/folder " + std::to_string(i));
+    std::filesystem::create_directory(packages + "/" + std::to_string(i) + ".package");
   const PrivateBus bus;
   if (!bus.isThere()) return;
   printHeading("a service on a bus of its own, median of " + std::to_string(scale.rounds) +
@@ -75,14 +83,9 @@ void runServiceBenchmarks(const Scale& scale) {
   require(serving.hear() == "ready", "the service starts");
   const auto connection = sdbus::createSessionBusConnection();
   const auto service = sdbus::createProxy(*connection, bus::serviceName, bus::objectPath);
-  const auto folders = identifiersIn(*service, VesselRootContainerItemIdentifier);
-  require(folders.size() == 51, "all folders are listed");
-  std::vector<std::string> files;
-  for (const std::string& folder : folders) {
-    for (std::string& file : identifiersIn(*service, folder))
-      files.push_back(std::move(file));
-  }
-  require(files.size() == 200, "all items are listed");
+  const auto files = identifiersIn(*service, identifierAt(*service, folder));
+  const auto lookedUp = identifiersIn(*service, identifierAt(*service, packages));
+  require(files.size() == 200 && lookedUp.size() == 50, "all items are listed");
   const auto secondsToAskFor = [&](const std::vector<std::string>& identifiers) {
     return secondsOf([&] {
       for (std::size_t i = 0; i < callsPerRound; ++i)
@@ -98,7 +101,7 @@ void runServiceBenchmarks(const Scale& scale) {
     }));
     lookUp.reference.push_back(item.reference.back());
     item.ours.push_back(secondsToAskFor(files));
-    lookUp.ours.push_back(secondsToAskFor(folders));
+    lookUp.ours.push_back(secondsToAskFor(lookedUp));
   }
   print(item);
   print(lookUp);

@@ -35,7 +35,8 @@ Result<ItemRecord> RecentItems::item(std::string_view identifier) {
   std::optional<FileStamp> stamp;
   if (before && before->isSettled() && former->record.path == record.path) {
     const auto after = stampOf(record.path);
-    if (after && after->isSameAs(*before)) stamp = before;
+    const bool isPackage = before->file.kind == FileKind::folder && !record.childItemCount;
+    if (after && after->isSameAs(*before) && !isPackage) stamp = before;
   }
   keep(identifier, std::make_shared<const Known>(Known{record, std::move(stamp), commits}));
   return record;

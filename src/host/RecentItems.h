@@ -20,9 +20,9 @@ class VolumeIndex;
 
 /// Items as they were when they were looked up last, for whoever asks for them again and again: a
 /// record is handed out as long as the kernel has the very same file at its place and the index has
-/// written nothing since. So it is never older than a look at the disk would be. Documents of the
-/// document storage only, for what else an item tells may hang on more than its own file. Any
-/// thread may call it.
+/// written nothing since. So it is never older than a look at the disk would be. Documents and
+/// plain folders of the document storage only, for what is told of other items may hang on more
+/// than their own file. Any thread may call it.
 class RecentItems {
  public:
   RecentItems(const ItemLookup& lookup, VolumeIndex& index, std::string storage)

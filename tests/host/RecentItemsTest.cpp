@@ -35,6 +35,7 @@ void writeThroughMap(const std::string& path) {
 class RecentItemsTest : public ::testing::Test {
  protected:
   void SetUp() override {
+    home.makeFolder("folder/notes.quill");
     home.makeFolder("folder/inner");
     home.makeFolder("other/inner");
     home.writeFile("folder/inner/letter.txt", "text");
@@ -125,12 +126,18 @@ TEST_F(RecentItemsTest, AttributesAreSeen) {
   EXPECT_TRUE(documents->itemAtOnce(identifier)->favoriteRank.has_value());
 }
 
-// An application may come to own what lies in its folder, and a folder's size is not its own.
-TEST_F(RecentItemsTest, OnlyDocumentsOfTheStorageAreRemembered) {
-  const auto folder = documents->itemAtPath(home.at("folder"))->itemIdentifier;
+TEST_F(RecentItemsTest, AFolderIsRememberedAndAPackageIsNot) {
+  const auto package = documents->itemAtPath(home.at("folder/notes.quill"))->itemIdentifier;
+  identifier = documents->itemAtPath(home.at("folder/inner"))->itemIdentifier;
+  ASSERT_TRUE(becomesKnown());
+  home.writeFile("folder/inner/third.txt");
+  const auto told = documents->itemAtOnce(identifier);
+  EXPECT_TRUE(!told || told->childItemCount == 3);
+  EXPECT_EQ(documents->item(identifier)->childItemCount, 3);
+  // It is older than the folder, and so has been settled for as long.
   for (int i = 0; i < 3; ++i)
-    ASSERT_TRUE(documents->item(folder));
-  EXPECT_FALSE(documents->itemAtOnce(folder));
+    ASSERT_TRUE(documents->item(package));
+  EXPECT_FALSE(documents->itemAtOnce(package));
 }
 
 }  // namespace

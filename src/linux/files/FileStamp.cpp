@@ -47,7 +47,8 @@ std::optional<FileStamp> stampOf(const std::string& path) {
   const auto folderStatus = statusAt(folder.get(), "");
   if (!folderStatus || !folderStatus->hasBirthTime) return {};
   const auto file = statusAt(folder.get(), place.name);
-  if (!file || file->kind != FileKind::regular || !file->hasBirthTime) return {};
+  if (!file || !file->hasBirthTime) return {};
+  if (file->kind != FileKind::regular && file->kind != FileKind::folder) return {};
   return FileStamp{*folderStatus, *file, mayWrite(folder.get(), place.name)};
 }
 

@@ -8,10 +8,10 @@
 
 namespace mirabel {
 
-/// What tells the state of a regular file, and of the place where it lies, from every other: its
-/// contents, its attributes and its name have changed when the stamp has. Taken before and after
-/// something was read of the file, equal, and settled, it says that what was read holds for as long
-/// as the same stamp is found at that path.
+/// What tells the state of a regular file or a folder, and of the place where it lies, from every
+/// other: where its contents (of a folder: the names in it), its attributes or its name have
+/// changed, the stamp has. Taken before and after something was read of the file, equal, and
+/// settled, it says that what was read holds for as long as the same stamp is found at that path.
 struct FileStamp {
   ObjectStatus folder;
   ObjectStatus file;
@@ -22,9 +22,9 @@ struct FileStamp {
   [[nodiscard]] bool isSettled() const;
 };
 
-/// The stamp of the file at an absolute path, without waiting for a disk or a network. Nothing for
-/// what is no regular file; where the way there is not in the kernel's memory or leads over a
-/// symbolic link; and where the file system keeps no birth times.
+/// The stamp of what lies at an absolute path, without waiting for a disk or a network. Nothing for
+/// what is no regular file and no folder; where the way there is not in the kernel's memory or
+/// leads over a symbolic link; and where the file system keeps no birth times.
 [[nodiscard]] std::optional<FileStamp> stampOf(const std::string& path);
 
 }  // namespace mirabel
