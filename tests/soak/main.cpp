@@ -1,23 +1,19 @@
 // A service under the load of a thousand programs, for as long as it is asked to: answers must stay
-// correct, and its memory and descriptors return to where they were once all have left.
-//
-// usage: service_soak [SECONDS [CLIENTS]]     10 seconds, 1,000 clients
+// correct, and its memory and descriptors return to where they were once all have left. They come
+// and leave in four rounds, so that what grows with each call shows as a row that goes on growing.
+#include <CLI/CLI.hpp>
 #include <algorithm>
-#include <atomic>
 #include <chrono>
 #include <cstdio>
-#include <cstdlib>
-#include <filesystem>
-#include <fstream>
-#include <mutex>
+#include <limits>
 #include <sys/resource.h>
-#include <thread>
 
 #include "host/bus/BusItems.h"
 #include "host/bus/BusNames.h"
 #include "platform/VesselManager.h"
+#include "soak/Footprint.h"
 #include "soak/ServedHome.h"
-#include "soak/SoakClient.h"
+#include "soak/Soak.h"
 #include "support/TempHome.h"
 
 namespace mirabel::testing {
@@ -27,25 +23,8 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t folders = 20;
 constexpr std::size_t filesInEach = 300;
-constexpr std::size_t threads = 8;
-constexpr std::size_t mostOpenListings = 16;
-
-/// What the service holds.
-struct Footprint {
-  std::size_t residentKiB = 0;
-  std::size_t descriptors = 0;
-};
-
-Footprint footprintOf(pid_t process) {
-  Footprint footprint;
-  const std::string folder = "/proc/" + std::to_string(process);
-  std::ifstream status(folder + "/status");
-  for (std::string line; std::getline(status, line);)
-    if (line.starts_with("VmRSS:")) footprint.residentKiB = std::stoul(line.substr(6));
-  for ([[maybe_unused]] const auto& entry : std::filesystem::directory_iterator(folder + "/fd"))
-    ++footprint.descriptors;
-  return footprint;
-}
+constexpr std::size_t rounds = 4;
+constexpr std::size_t anyNumber = std::numeric_limits<std::size_t>::max();
 
 void fill(const TempHome& home) {
   for (std::size_t folder = 0; folder < folders; ++folder) {
@@ -90,76 +69,20 @@ SoakTruth learn(sdbus::IProxy& service) {
   return truth;
 }
 
-/// One run.
-class Soak {
- public:
-  Soak(const SoakTruth& truth, const TempHome& home, Clock::time_point end, std::size_t clients)
-      : truth_(truth), home_(home), end_(end), clients_(clients) {}
-
-  void run() {
-    std::vector<std::jthread> running;
-    for (std::size_t i = 0; i < threads; ++i)
-      running.emplace_back([this, i] { drive(static_cast<unsigned>(i)); });
-    running.emplace_back([this] { write(); });
-    running.emplace_back([this] { calls_ += SoakClient::askWithoutReading(truth_, 500); });
-    running.clear();
-  }
-  [[nodiscard]] std::size_t calls() const { return calls_; }
-  [[nodiscard]] std::string failure() {
-    const std::lock_guard lock(mutex_);
-    return failure_;
-  }
-
- private:
-  void drive(unsigned number) {
-    try {
-      std::vector<std::unique_ptr<SoakClient>> mine;
-      for (std::size_t i = number; i < clients_; i += threads)
-        mine.push_back(std::make_unique<SoakClient>(truth_, static_cast<unsigned>(i)));
-      for (std::size_t turn = 0; Clock::now() < end_ && !hasFailed_; ++turn)
-        calls_ += mine[turn % mine.size()]->step();
-    } catch (const SoakFailure& failure) {
-      fail(failure.what);
-    } catch (const sdbus::Error& error) {
-      fail(error.getName() + ": " + error.getMessage());
-    }
-  }
-  void write() {
-    // As fast as the clients ask, so that neither side is all that is measured.
-    for (std::size_t i = 0; Clock::now() < end_ && !hasFailed_; ++i) {
-      while (calls_ < i * 10 && Clock::now() < end_ && !hasFailed_)
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-      home_.writeFile("busy/" + std::to_string(i % 50), std::to_string(i));
-      if (i % 7 == 0) home_.remove("busy/" + std::to_string(i % 50));
-    }
-  }
-  void fail(const std::string& what) {
-    const std::lock_guard lock(mutex_);
-    if (!hasFailed_.exchange(true)) failure_ = what;
-  }
-
-  const SoakTruth& truth_;
-  const TempHome& home_;
-  const Clock::time_point end_;
-  const std::size_t clients_;
-  std::atomic<std::size_t> calls_ = 0;
-  std::atomic<bool> hasFailed_ = false;
-  std::mutex mutex_;
-  std::string failure_;
+struct Wanted {
+  std::size_t seconds = 10;
+  std::size_t clients = 1000;
+  std::size_t calls = 0;  ///< 0: as many as there is time for
 };
 
-/// Waits until the service has noticed that all have left: its descriptors are what they were.
-Footprint settled(pid_t process, const Footprint& before) {
-  const auto end = Clock::now() + std::chrono::seconds(30);
-  Footprint now = footprintOf(process);
-  while (now.descriptors > before.descriptors + mostOpenListings && Clock::now() < end) {
-    std::this_thread::yield();
-    now = footprintOf(process);
-  }
-  return now;
+void print(const char* what, std::size_t calls, const Footprint& footprint) {
+  std::printf("%s: %zu calls, resident %zu KiB, %zu descriptors\n", what, calls,
+              footprint.residentKiB, footprint.descriptors);
+  std::fflush(stdout);
 }
 
-int soak(std::chrono::seconds duration, std::size_t clients) {
+/// Why it did not go well; empty where it did.
+std::string soak(const Wanted& wanted) {
   const TempHome home;
   fill(home);
   const ServedHome served(home.path());
@@ -167,27 +90,32 @@ int soak(std::chrono::seconds duration, std::size_t clients) {
   const auto service = sdbus::createProxy(*connection, bus::serviceName, bus::objectPath);
   const SoakTruth truth = learn(*service);
   // What a service that has been used once holds on to is not counted.
-  Soak first(truth, home, Clock::now() + std::chrono::seconds(2), clients);
+  Soak first(truth, home, {Clock::now() + std::chrono::seconds(2), anyNumber, wanted.clients});
   first.run();
+  if (const std::string failure = first.failure(); !failure.empty()) return failure;
   const Footprint before = settled(served.process(), footprintOf(served.process()));
-  Soak main(truth, home, Clock::now() + duration, clients);
-  main.run();
-  const Footprint after = settled(served.process(), before);
-  std::printf(
-      "%zu clients, %zu calls in %lld s; resident %zu KiB before and %zu KiB after, "
-      "descriptors %zu and %zu\n",
-      clients, main.calls(), static_cast<long long>(duration.count()), before.residentKiB,
-      after.residentKiB, before.descriptors, after.descriptors);
-  if (const std::string failure = first.failure() + main.failure(); !failure.empty()) {
-    std::fprintf(stderr, "soak: %s\n", failure.c_str());
-    return 1;
+  print("before", first.calls(), before);
+  const auto start = Clock::now();
+  std::size_t calls = 0;
+  Footprint after;
+  for (std::size_t round = 1; round <= rounds; ++round) {
+    const auto end = start + std::chrono::milliseconds(wanted.seconds * 1000 * round / rounds);
+    const std::size_t callsUpToHere = wanted.calls * round / rounds;
+    Soak soak(truth, home,
+              {wanted.calls == 0 ? end : start + std::chrono::seconds(wanted.seconds),
+               wanted.calls == 0 ? anyNumber : callsUpToHere - std::min(calls, callsUpToHere),
+               wanted.clients});
+    soak.run();
+    calls += soak.calls();
+    if (const std::string failure = soak.failure(); !failure.empty()) return failure;
+    after = settled(served.process(), before);
+    print("all have left", calls, after);
   }
-  // An allocator keeps some of what it was given back, and a bounded number of listings that were
-  // left in the middle stay open.
-  const bool hasGrown = after.residentKiB > before.residentKiB * 5 / 4 + 8192 ||
-                        after.descriptors > before.descriptors + mostOpenListings;
-  if (hasGrown) std::fprintf(stderr, "soak: the service holds more than before\n");
-  return hasGrown ? 1 : 0;
+  const std::chrono::duration<double> took = Clock::now() - start;
+  std::printf("%zu clients, %zu calls in %.0f s\n", wanted.clients, calls, took.count());
+  if (calls < wanted.calls) return "the calls were not made in time";
+  if (!isAsBefore(after, before)) return "the service holds more than before";
+  return {};
 }
 
 }  // namespace
@@ -199,16 +127,24 @@ int main(int count, char** arguments) {
     files.rlim_cur = files.rlim_max;
     ::setrlimit(RLIMIT_NOFILE, &files);
   }
-  const long seconds = count > 1 ? std::strtol(arguments[1], nullptr, 10) : 10;
-  const long clients = count > 2 ? std::strtol(arguments[2], nullptr, 10) : 1000;
-  if (seconds < 1 || clients < 1) {
-    std::fprintf(stderr, "usage: service_soak [SECONDS [CLIENTS]]\n");
-    return 2;
-  }
+  mirabel::testing::Wanted wanted;
+  CLI::App program("A service under the load of many programs.");
+  program.add_option("seconds", wanted.seconds, "how long; with --calls, at most")
+      ->check(CLI::PositiveNumber)
+      ->capture_default_str();
+  program.add_option("--clients", wanted.clients, "how many programs")
+      ->check(CLI::PositiveNumber)
+      ->capture_default_str();
+  program
+      .add_option("--calls", wanted.calls, "end when so many were made, fail where they were not")
+      ->check(CLI::PositiveNumber);
+  CLI11_PARSE(program, count, arguments);
   try {
-    return mirabel::testing::soak(std::chrono::seconds(seconds), static_cast<std::size_t>(clients));
+    const std::string failure = mirabel::testing::soak(wanted);
+    if (failure.empty()) return 0;
+    std::fprintf(stderr, "soak: %s\n", failure.c_str());
   } catch (const std::exception& error) {
     std::fprintf(stderr, "soak: %s\n", error.what());
-    return 1;
   }
+  return 1;
 }
