@@ -5,6 +5,7 @@
 
 #include "host/bus/BusItems.h"
 #include "host/bus/BusNames.h"
+#include "host/bus/BusOptions.h"
 
 namespace mirabel::testing {
 namespace {

@@ -2,6 +2,7 @@
 
 #include "host/bus/BusCall.h"
 #include "host/bus/BusNames.h"
+#include "host/bus/BusStatus.h"
 
 namespace mirabel::bus {
 namespace {

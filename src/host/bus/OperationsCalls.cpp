@@ -3,6 +3,7 @@
 
 #include "host/bus/BusCall.h"
 #include "host/bus/BusNames.h"
+#include "host/bus/BusOptions.h"
 #include "host/bus/StagedImport.h"
 #include "mirabel/TagData.h"
 

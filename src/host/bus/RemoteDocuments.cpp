@@ -8,6 +8,8 @@
 #include "host/bus/BusErrors.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/BusNames.h"
+#include "host/bus/BusOptions.h"
+#include "host/bus/BusStatus.h"
 #include "host/bus/BusText.h"
 #include "host/bus/RemoteWatches.h"
 #include "platform/VesselManager.h"

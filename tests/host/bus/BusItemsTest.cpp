@@ -7,6 +7,8 @@
 
 #include "host/bus/BusClient.h"
 #include "host/bus/BusItems.h"
+#include "host/bus/BusOptions.h"
+#include "host/bus/BusStatus.h"
 #include "host/bus/PrivateBus.h"
 #include "mirabel/TagData.h"
 
