@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <sdbus-c++/sdbus-c++.h>
+#include <stop_token>
 #include <string_view>
 
 #include "host/bus/BusItems.h"
@@ -87,8 +88,10 @@ using Recall = std::function<std::shared_ptr<const ItemRecord>(std::string_view 
 using Signaller = std::function<void(const std::string& caller, const std::string& container)>;
 
 [[nodiscard]] std::vector<BusMethod> providerMethods(Signaller signaller, Recall recall);
-/// `stagingFolder`: where what comes as a descriptor is kept until it is imported.
-[[nodiscard]] std::vector<BusMethod> operationsMethods(const std::string& stagingFolder);
+/// `stagingFolder`: where what comes as a descriptor is kept until it is imported. `stopping`: when
+/// what is being copied there is given up.
+[[nodiscard]] std::vector<BusMethod> operationsMethods(const std::string& stagingFolder,
+                                                       const std::stop_token& stopping);
 [[nodiscard]] std::vector<BusMethod> managerMethods();
 
 }  // namespace mirabel::bus

@@ -1,5 +1,6 @@
 #include "host/bus/BusConnection.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <cstdint>
@@ -120,21 +121,21 @@ bool BusConnection::findOwnerOtherThan(const std::string& former) {
 }
 
 sdbus::MethodReply BusConnection::send(const char* interface, const char* method,
-                                       const Write& write) {
+                                       const Write& write, Patience patience) {
   const std::string former = ownerName();
   try {
-    return sendToOwner(interface, method, write);
+    return sendToOwner(interface, method, write, patience);
   } catch (const sdbus::Error& error) {
     // It never arrived. That another service is there may not have been heard of yet.
     const bool isNobody = error.getName() == "org.freedesktop.DBus.Error.ServiceUnknown" ||
                           error.getName() == "org.freedesktop.DBus.Error.NameHasNoOwner";
     if (!isNobody || !findOwnerOtherThan(former)) throw;
   }
-  return sendToOwner(interface, method, write);
+  return sendToOwner(interface, method, write, patience);
 }
 
 sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char* method,
-                                              const Write& write) {
+                                              const Write& write, Patience patience) {
   sdbus::IProxy& service = owner();
   auto message = service.createMethodCall(interface, method);
   if (write) write(message);
@@ -156,9 +157,13 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
         answer->isThere.set_value();
       },
       withoutTimeout);
+  const auto start = std::chrono::steady_clock::now();
   // Where the bus itself goes away, nobody answers any more.
-  while (isThere.wait_for(betweenLooks) != std::future_status::ready) {
+  while (isThere.wait_for(patience ? std::min(betweenLooks, *patience) : betweenLooks) !=
+         std::future_status::ready) {
     if (isLost_) throw sdbus::Error("org.freedesktop.DBus.Error.Disconnected", "the bus has gone");
+    if (patience && std::chrono::steady_clock::now() - start >= *patience)
+      throw sdbus::Error("org.freedesktop.DBus.Error.Timeout", "there is no answer");
   }
   if (answer->error) throw *answer->error;
   return std::move(answer->reply);

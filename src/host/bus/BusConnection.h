@@ -1,9 +1,11 @@
 #pragma once
 
 #include <atomic>
+#include <chrono>
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <sdbus-c++/sdbus-c++.h>
 #include <semaphore>
 #include <string>
@@ -29,14 +31,18 @@ class BusConnection {
   using Write = std::function<void(sdbus::Message& call)>;
   using Handler = std::function<void(sdbus::Message* reply, const Error& error)>;
 
-  /// Calls a method and waits for the answer, however long that takes. `read` makes the result of
-  /// it. Errors: see `errorFromBus`.
+  /// How long an answer is waited for.
+  using Patience = std::optional<std::chrono::milliseconds>;
+  static constexpr Patience unlimited = std::nullopt;
+
+  /// Calls a method and waits for the answer, however long that takes unless its patience is
+  /// limited. `read` makes the result of it. Errors: see `errorFromBus`.
   template <class Read>
   [[nodiscard]] auto call(const char* interface, const char* method, const Write& write,
-                          Read&& read)
+                          Read&& read, Patience patience = unlimited)
       -> Result<std::remove_cvref_t<decltype(read(std::declval<sdbus::Message&>()))>> {
     try {
-      auto reply = send(interface, method, write);
+      auto reply = send(interface, method, write, patience);
       return read(reply);
     } catch (const sdbus::Error& error) {
       return fail(errorFromBus(error));
@@ -61,10 +67,10 @@ class BusConnection {
   class Pending;
 
   [[nodiscard]] sdbus::MethodReply send(const char* interface, const char* method,
-                                        const Write& write);
+                                        const Write& write, Patience patience);
 
   [[nodiscard]] sdbus::MethodReply sendToOwner(const char* interface, const char* method,
-                                               const Write& write);
+                                               const Write& write, Patience patience);
   /// Who has the service's name; empty: nobody.
   void setOwner(const std::string& uniqueName);
   /// Asks the bus who has the name now; whether that is somebody else than `former`.

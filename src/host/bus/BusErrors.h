@@ -1,6 +1,8 @@
 #pragma once
 
+#include <exception>
 #include <sdbus-c++/Error.h>
+#include <utility>
 
 #include "mirabel/Error.h"
 
@@ -14,5 +16,20 @@ namespace mirabel::bus {
 /// The way back: domain and code, and the message as the explanation. POSIX ENOTCONN where the
 /// service has left the bus or does not answer, EACCES where the bus or the service refuses.
 [[nodiscard]] Error errorFromBus(const sdbus::Error& error);
+
+/// A handler for a connection: the library answers errors of its own kind, and has no other
+/// exception come to an end; there is C in between. So these become such an error.
+template <class Handler>
+[[nodiscard]] auto guarded(Handler handler) {
+  return [handler = std::move(handler)](auto&&... arguments) {
+    try {
+      return handler(std::forward<decltype(arguments)>(arguments)...);
+    } catch (const sdbus::Error&) {
+      throw;
+    } catch (const std::exception& exception) {
+      throw sdbus::Error("org.freedesktop.DBus.Error.Failed", exception.what());
+    }
+  };
+}
 
 }  // namespace mirabel::bus

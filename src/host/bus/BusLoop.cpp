@@ -1,6 +1,8 @@
 #include "host/bus/BusLoop.h"
 
+#include <exception>
 #include <sdbus-c++/sdbus-c++.h>
+#include <string>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -11,8 +13,8 @@ BusLoop::BusLoop(sdbus::IConnection& connection, std::function<void()> lost)
     : connection_(connection), thread_([&connection, lost = std::move(lost)] {
         try {
           connection.enterEventLoop();
-        } catch (const sdbus::Error& error) {
-          logError("can't go on with the bus; " + error.getMessage());
+        } catch (const std::exception& error) {
+          logError(std::string("can't go on with the bus; ") + error.what());
           lost();
         }
       }) {}

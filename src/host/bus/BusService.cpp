@@ -2,7 +2,10 @@
 
 #include <atomic>
 #include <cerrno>
+#include <exception>
 #include <sdbus-c++/sdbus-c++.h>
+#include <stop_token>
+#include <string_view>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -27,6 +30,8 @@ constexpr std::size_t operationThreads = 4;
 // Fewer than run at a time, so that nobody's wait for all that somebody else has asked for.
 constexpr std::size_t operationsOfACaller = 2;
 constexpr std::size_t mostWaiting = 4096;
+// Each holds a descriptor, of which the whole service has a limited number.
+constexpr std::size_t mostFilesWaiting = 128;
 
 constexpr const char* leavingMatch =
     "type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
@@ -46,9 +51,13 @@ class BusService::Impl {
     object_ = sdbus::createObject(*connection_, objectPath);
     addMethods();
     leaving_ = connection_->addMatch(leavingMatch, [this](sdbus::Message& message) {
-      std::string name;
-      message >> name;
-      if (name.starts_with(':')) callerLeft(name);
+      try {
+        std::string name;
+        message >> name;
+        if (name.starts_with(':')) callerLeft(name);
+      } catch (const std::exception& exception) {
+        logError(std::string("can't let go of a client; ") + exception.what());
+      }
     });
     connection_->requestName(serviceName);
     loop_ = std::make_unique<BusLoop>(*connection_, std::move(lost));
@@ -56,6 +65,7 @@ class BusService::Impl {
 
   void stop() {
     if (hasStopped_.exchange(true)) return;
+    stopping_.request_stop();
     try {
       connection_->releaseName(serviceName);
     } catch (const sdbus::Error& error) {
@@ -76,8 +86,9 @@ class BusService::Impl {
     const auto recall = [this](std::string_view identifier) {
       return documents_.itemAtOnce(identifier);
     };
-    for (auto methods : {providerMethods(signaller, recall), operationsMethods(stagingFolder_),
-                         managerMethods()}) {
+    for (auto methods :
+         {providerMethods(signaller, recall),
+          operationsMethods(stagingFolder_, stopping_.get_token()), managerMethods()}) {
       for (BusMethod& method : methods)
         add(std::move(method));
     }
@@ -92,7 +103,10 @@ class BusService::Impl {
   }
 
   void add(BusMethod method) {
-    const auto answer = [this, lane = method.lane, answer = std::move(method.answer),
+    const auto holds = std::string_view(method.inputSignature).find('h') == std::string_view::npos
+                           ? CallLane::Holds::memory
+                           : CallLane::Holds::file;
+    const auto answer = [this, holds, lane = method.lane, answer = std::move(method.answer),
                          atOnce = std::move(method.answerAtOnce)](sdbus::MethodCall message) {
       const std::string name = message.getSender();
       const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
@@ -101,13 +115,13 @@ class BusService::Impl {
         call->keepTurn(std::move(turn));
         answer(call);
       };
-      if (laneOf(lane).submit(name, run)) return;
+      if (laneOf(lane).submit(name, run, holds)) return;
       if (hasStopped_) return call->fail(Error::posix(ECANCELED, "the service is about to end"));
       call->fail(sdbus::Error("org.freedesktop.DBus.Error.LimitsExceeded",
                               "too many calls of this client wait for their answers"));
     };
     object_->registerMethod(method.interface, method.name, method.inputSignature, method.inputNames,
-                            method.outputSignature, method.outputNames, answer);
+                            method.outputSignature, method.outputNames, guarded(answer));
   }
 
   CallLane& laneOf(Lane lane) {
@@ -151,9 +165,10 @@ class BusService::Impl {
   std::unique_ptr<sdbus::IConnection> connection_;
   std::unique_ptr<sdbus::IObject> object_;
   sdbus::Slot leaving_;
-  CallLane lookups_{{lookupThreads, 1, mostWaiting}};
-  CallLane enumerations_{{enumerationThreads, 1, mostWaiting}};
-  CallLane operations_{{operationThreads, operationsOfACaller, mostWaiting}};
+  std::stop_source stopping_;
+  CallLane lookups_{{lookupThreads, 1, mostWaiting, mostFilesWaiting}};
+  CallLane enumerations_{{enumerationThreads, 1, mostWaiting, mostFilesWaiting}};
+  CallLane operations_{{operationThreads, operationsOfACaller, mostWaiting, mostFilesWaiting}};
   std::atomic<bool> hasStopped_ = false;
   std::unique_ptr<BusLoop> loop_;
 };

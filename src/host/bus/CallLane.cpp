@@ -13,7 +13,7 @@ CallLane::CallLane(Limits limits) : limits_(limits) {
 }
 
 void CallLane::end() {
-  std::vector<std::deque<Call>> dropped;  // let go of without the lock
+  std::vector<std::deque<Submitted>> dropped;  // let go of without the lock
   {
     const std::lock_guard lock(mutex_);
     mustEnd_ = true;
@@ -28,12 +28,14 @@ void CallLane::end() {
     dropped.push_back(std::exchange(waiting.calls, {}));
 }
 
-bool CallLane::submit(const std::string& caller, Call call) {
+bool CallLane::submit(const std::string& caller, Call call, Holds holds) {
   const std::lock_guard lock(mutex_);
   if (mustEnd_) return false;
   Waiting& waiting = waiting_[caller];
   if (waiting.calls.size() >= limits_.mostWaiting) return false;
-  waiting.calls.push_back(std::move(call));
+  if (holds == Holds::file && waiting.files >= limits_.mostFilesWaiting) return false;
+  waiting.calls.push_back({std::move(call), holds});
+  if (holds == Holds::file) ++waiting.files;
   queueIfItCanRun(caller, waiting);
   return true;
 }
@@ -48,11 +50,12 @@ void CallLane::queueIfItCanRun(const std::string& caller, Waiting& waiting) {
 }
 
 void CallLane::forget(const std::string& caller) {
-  std::deque<Call> dropped;  // let go of without the lock
+  std::deque<Submitted> dropped;  // let go of without the lock
   const std::lock_guard lock(mutex_);
   const auto found = waiting_.find(caller);
   if (found == waiting_.end()) return;
   dropped.swap(found->second.calls);
+  found->second.files = 0;
   if (found->second.running == 0 && !found->second.isInTurn) waiting_.erase(found);
 }
 
@@ -80,8 +83,9 @@ void CallLane::run() {
       if (found->second.running == 0) waiting_.erase(found);
       continue;
     }
-    Call call = std::move(found->second.calls.front());
+    auto [call, holds] = std::move(found->second.calls.front());
     found->second.calls.pop_front();
+    if (holds == Holds::file) --found->second.files;
     ++found->second.running;
     queueIfItCanRun(caller, found->second);
     lock.unlock();

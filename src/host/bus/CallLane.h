@@ -19,8 +19,9 @@ class CallLane {
  public:
   struct Limits {
     std::size_t threads;
-    std::size_t mostRunning;  ///< calls of one caller at a time
-    std::size_t mostWaiting;  ///< calls that a caller may have waiting
+    std::size_t mostRunning;       ///< calls of one caller at a time
+    std::size_t mostWaiting;       ///< calls that a caller may have waiting
+    std::size_t mostFilesWaiting;  ///< those among them that hold a file open meanwhile
   };
   explicit CallLane(Limits limits);
   ~CallLane() { end(); }
@@ -34,14 +35,21 @@ class CallLane {
   /// A call runs for as long as somebody keeps its turn, which may be longer than it takes itself.
   /// No turn may outlive the lane.
   using Call = std::function<void(std::shared_ptr<void> turn)>;
+  /// What a call holds while it waits.
+  enum class Holds { memory, file };
   /// False, and nothing is run, where the caller has too many waiting, or the lane has ended.
-  [[nodiscard]] bool submit(const std::string& caller, Call call);
+  [[nodiscard]] bool submit(const std::string& caller, Call call, Holds holds = Holds::memory);
   /// Drops what of that caller waits.
   void forget(const std::string& caller);
 
  private:
+  struct Submitted {
+    Call call;
+    Holds holds;
+  };
   struct Waiting {
-    std::deque<Call> calls;
+    std::deque<Submitted> calls;
+    std::size_t files = 0;  ///< how many of the calls hold one
     std::size_t running = 0;
     bool isInTurn = false;  ///< whether it stands among the turns
   };

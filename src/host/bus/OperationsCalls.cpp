@@ -74,8 +74,8 @@ void reparent(Documents& documents, const CallPointer& call) {
   if (options) documents.reparent(item, parent, nameOption(*options, "name"), answering(call));
 }
 
-void importDocument(Documents& documents, const CallPointer& call,
-                    const std::string& stagingFolder) {
+void importDocument(Documents& documents, const CallPointer& call, const std::string& stagingFolder,
+                    const std::stop_token& stopping) {
   const auto file = call->argument<sdbus::UnixFd>();
   auto text = call->argument<std::string>();
   const auto parent = call->argument<std::string>();
@@ -83,7 +83,7 @@ void importDocument(Documents& documents, const CallPointer& call,
   if (!name) return;
   // Before anything is copied for somebody who has no place to put it.
   if (auto place = documents.item(parent); !place) return call->fail(place.error());
-  auto staged = StagedImport::of(file.get(), *name, stagingFolder);
+  auto staged = StagedImport::of(file.get(), *name, stagingFolder, stopping);
   if (!staged) return call->fail(staged.error());
   const auto kept = std::make_shared<StagedImport>(*std::move(staged));
   documents.importDocument(kept->path(), parent, [call, kept](const Documents::ItemResult& result) {
@@ -163,7 +163,8 @@ void clearFavoriteRank(Documents& documents, const CallPointer& call) {
 
 }  // namespace
 
-std::vector<BusMethod> operationsMethods(const std::string& stagingFolder) {
+std::vector<BusMethod> operationsMethods(const std::string& stagingFolder,
+                                         const std::stop_token& stopping) {
   constexpr const char* of = operationsInterface;
   constexpr const char* item = "a{sv}";
   constexpr Lane lane = Lane::operations;
@@ -175,8 +176,8 @@ std::vector<BusMethod> operationsMethods(const std::string& stagingFolder) {
        item,
        {"item"},
        lane,
-       onDocuments([stagingFolder](Documents& documents, const CallPointer& call) {
-         importDocument(documents, call, stagingFolder);
+       onDocuments([stagingFolder, stopping](Documents& documents, const CallPointer& call) {
+         importDocument(documents, call, stagingFolder, stopping);
        })},
       {of, "ImportPath", "ays", {"path", "parent"}, item, {"item"}, lane, importPath},
       {of,

@@ -118,15 +118,17 @@ void beginWithoutItem(BusConnection& connection, const char* interface, const ch
 
 }  // namespace
 
-std::unique_ptr<RemoteDocuments> RemoteDocuments::connect(const HomePlaces& places) {
+std::unique_ptr<RemoteDocuments> RemoteDocuments::connect(const HomePlaces& places,
+                                                          std::chrono::milliseconds patience) {
   auto connection = BusConnection::open();
   if (!connection) return nullptr;
-  const auto served = connection->call(managerInterface, "GetHome", {}, [](sdbus::Message& reply) {
+  const auto readPlaces = [](sdbus::Message& reply) {
     HomePlaces answer;
     answer.home = stringView(readBytes(reply));
     answer.stateFolder = stringView(readBytes(reply));
     return answer;
-  });
+  };
+  const auto served = connection->call(managerInterface, "GetHome", {}, readPlaces, patience);
   if (!served || *served != places) return nullptr;
   return std::unique_ptr<RemoteDocuments>(new RemoteDocuments(std::move(connection), places));
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -18,8 +19,13 @@ class RemoteWatches;
 /// started anew; containers are asked for anew with each question, so that they do too.
 class RemoteDocuments final : public Documents {
  public:
-  /// Null where the service does not run, or runs for another home or with another state.
-  [[nodiscard]] static std::unique_ptr<RemoteDocuments> connect(const HomePlaces& places);
+  /// How long the first answer is waited for: it comes from memory, so that whoever has the name
+  /// and lets that pass answers nothing else either.
+  static constexpr std::chrono::milliseconds firstPatience{10'000};
+  /// Null where the service does not run or does not answer, or runs for another home or with
+  /// another state.
+  [[nodiscard]] static std::unique_ptr<RemoteDocuments> connect(
+      const HomePlaces& places, std::chrono::milliseconds patience = firstPatience);
   /// Whether there is a session bus that a service could be on.
   [[nodiscard]] static bool hasBus();
   ~RemoteDocuments() override;

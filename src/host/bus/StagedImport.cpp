@@ -18,10 +18,11 @@ namespace fs = std::filesystem;
 
 constexpr std::size_t longestName = 255;
 constexpr std::size_t pieceSize = 1 << 20;
+// Between two of these it is seen whether to go on.
+constexpr std::size_t kernelPieceSize = 1 << 24;
+constexpr mode_t permissions = 0777;
 
-Result<void> requireReadableFile(int file) {
-  struct stat status {};
-  if (::fstat(file, &status) != 0) return fail(Error::posix(errno));
+Result<void> requireReadableFile(int file, const struct stat& status) {
   if (S_ISDIR(status.st_mode)) return fail(Error::posix(EISDIR));
   if (!S_ISREG(status.st_mode)) return fail(Error::posix(ENOTSUP));
   const int flags = ::fcntl(file, F_GETFL);
@@ -50,10 +51,10 @@ Result<void> writeAll(int to, const char* bytes, std::size_t count) {
 }
 
 // The kernel copies by itself where both files are on one volume, and shares blocks where it can.
-Result<void> copyAll(int from, int to) {
+Result<void> copyAll(int from, int to, const std::stop_token& stopping) {
   off_t position = 0;
-  while (true) {
-    const ssize_t count = ::copy_file_range(from, &position, to, nullptr, std::size_t{1} << 26, 0);
+  while (!stopping.stop_requested()) {
+    const ssize_t count = ::copy_file_range(from, &position, to, nullptr, kernelPieceSize, 0);
     if (count == 0) break;
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) break;
@@ -61,6 +62,7 @@ Result<void> copyAll(int from, int to) {
   // It also says nothing of files that the kernel makes up as they are read.
   std::string piece(pieceSize, '\0');
   while (true) {
+    if (stopping.stop_requested()) return fail(Error::posix(ECANCELED));
     const ssize_t count = ::pread(from, piece.data(), piece.size(), position);
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return fail(Error::posix(errno));
@@ -71,11 +73,22 @@ Result<void> copyAll(int from, int to) {
   }
 }
 
+// What can be read has to stay readable for whoever imports it. A file without a name, as programs
+// make them in memory, has all permissions that there are.
+Result<void> copyPermissions(const struct stat& from, int to) {
+  if (from.st_nlink == 0) return {};
+  if (::fchmod(to, (from.st_mode & permissions) | S_IRUSR) != 0) return fail(Error::posix(errno));
+  return {};
+}
+
 }  // namespace
 
 Result<StagedImport> StagedImport::of(int file, const std::string& name,
-                                      const std::string& stagingFolder) {
-  if (auto readable = requireReadableFile(file); !readable) return fail(readable.error());
+                                      const std::string& stagingFolder,
+                                      const std::stop_token& stopping) {
+  struct stat status {};
+  if (::fstat(file, &status) != 0) return fail(Error::posix(errno));
+  if (auto readable = requireReadableFile(file, status); !readable) return fail(readable.error());
   if (auto named = requireName(name); !named) return fail(named.error());
   if (::mkdir(stagingFolder.c_str(), 0700) != 0 && errno != EEXIST)
     return fail(Error::posix(errno));
@@ -87,7 +100,8 @@ Result<StagedImport> StagedImport::of(int file, const std::string& name,
   const UniqueFd copy(
       ::open(staged.path_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
   if (!copy) return fail(Error::posix(errno));
-  if (auto copied = copyAll(file, copy.get()); !copied) return fail(copied.error());
+  if (auto copied = copyAll(file, copy.get(), stopping); !copied) return fail(copied.error());
+  if (auto set = copyPermissions(status, copy.get()); !set) return fail(set.error());
   return staged;
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <stop_token>
 #include <string>
 #include <utility>
 
@@ -12,11 +13,13 @@ namespace mirabel::bus {
 /// copy goes with this; what a crash leaves is cleared when the service starts.
 class StagedImport {
  public:
-  /// `file` is left open, with its position where it was. POSIX errors: EBADF where it is not open
-  /// for reading, EISDIR, ENOTSUP for what is no regular file; EINVAL and ENAMETOOLONG for the
-  /// name; those of writing.
+  /// `file` is left open, with its position where it was. The copy has its permissions; that of a
+  /// file without a name, which nobody chose any for, is the user's alone. POSIX errors: EBADF
+  /// where it is not open for reading, EISDIR, ENOTSUP for what is no regular file; EINVAL and
+  /// ENAMETOOLONG for the name; ECANCELED once it is to stop; those of writing.
   [[nodiscard]] static Result<StagedImport> of(int file, const std::string& name,
-                                               const std::string& stagingFolder);
+                                               const std::string& stagingFolder,
+                                               const std::stop_token& stopping);
   StagedImport(StagedImport&& other) noexcept : folder_(std::exchange(other.folder_, {})) {
     path_.swap(other.path_);
   }
