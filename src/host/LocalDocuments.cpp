@@ -6,6 +6,7 @@
 #include "host/ItemRecords.h"
 #include "host/LocalContainer.h"
 #include "host/ProviderStatus.h"
+#include "linux/volume/VolumeIndex.h"
 
 namespace mirabel {
 namespace {
@@ -31,6 +32,12 @@ LocalDocuments::LocalDocuments(std::unique_ptr<HostedProvider> provider)
       recent_(lookup_, provider_->linuxPlatform().index(),
               provider_->platform().manager.documentStorageURL().path()),
       searching_(*provider_) {}
+
+void LocalDocuments::releaseMemory() {
+  provider_->searchableItems().releaseMemory();
+  // The last, for it has the allocator give back what all of them freed.
+  provider_->linuxPlatform().index().releaseMemory();
+}
 
 Documents::ItemResult LocalDocuments::item(std::string_view identifier) {
   return recent_.item(identifier);

@@ -27,6 +27,9 @@ class LocalDocuments final : public Documents {
   [[nodiscard]] const ItemLookup& lookup() const { return lookup_; }
   /// Keeps the search index in step from now on, in the background.
   void keepSearching() { searching_.follow(watches()); }
+  /// Gives back what is kept in memory to answer sooner, and what was freed: for times when nobody
+  /// asks.
+  void releaseMemory();
 
   /// The item, if that can be told without waiting for anything, or else null.
   [[nodiscard]] std::shared_ptr<const ItemRecord> itemAtOnce(std::string_view identifier) {

@@ -24,4 +24,9 @@ Result<void> SearchableItems::deleteDomains(const std::vector<std::string>& doma
   return (*opened)->deleteDomains(domains);
 }
 
+void SearchableItems::releaseMemory() {
+  const std::lock_guard lock(mutex_);
+  if (index_) index_->releaseMemory();
+}
+
 }  // namespace mirabel

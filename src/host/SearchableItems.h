@@ -22,6 +22,8 @@ class SearchableItems {
   [[nodiscard]] Result<SearchIndex*> index();
   /// Takes out what belongs to these applications. Where there is no index yet, none is made.
   [[nodiscard]] Result<void> deleteDomains(const std::vector<std::string>& domains);
+  /// Gives back what is kept in memory to answer sooner.
+  void releaseMemory();
 
  private:
   std::string stateFolder_;

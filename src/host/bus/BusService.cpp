@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <cerrno>
+#include <chrono>
 #include <exception>
 #include <sdbus-c++/sdbus-c++.h>
 #include <stop_token>
@@ -9,6 +10,7 @@
 #include <utility>
 
 #include "foundation/Log.h"
+#include "host/bus/AfterUse.h"
 #include "host/bus/BusCall.h"
 #include "host/bus/BusErrors.h"
 #include "host/bus/BusLoop.h"
@@ -33,6 +35,11 @@ constexpr std::size_t mostWaiting = 4096;
 // Each holds a descriptor, of which the whole service has a limited number.
 constexpr std::size_t mostFilesWaiting = 128;
 
+// A burst of calls leaves freed memory in the allocator and pages of the databases in their caches.
+// Short, so that it is a burst and not the day that memory is kept for; what was given back costs a
+// few milliseconds to have again.
+constexpr AfterUse::Times givingBack{std::chrono::seconds(2), std::chrono::seconds(60)};
+
 constexpr const char* leavingMatch =
     "type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
     "interface='org.freedesktop.DBus',member='NameOwnerChanged',arg2=''";
@@ -44,6 +51,7 @@ class BusService::Impl {
   Impl(LocalDocuments& documents, std::function<void()> lost)
       : documents_(documents),
         callers_(documents),
+        memory_(givingBack, [&documents] { documents.releaseMemory(); }),
         stagingFolder_(documents.provider().linuxPlatform().index().stateFolder().path() +
                        "/imports"),
         connection_(sdbus::createSessionBusConnection()) {
@@ -74,6 +82,7 @@ class BusService::Impl {
     for (CallLane* lane : {&lookups_, &enumerations_, &operations_})
       lane->end();
     callers_.leaveAll();
+    memory_.end();
   }
 
   ~Impl() { stop(); }
@@ -108,6 +117,7 @@ class BusService::Impl {
                            : CallLane::Holds::file;
     const auto answer = [this, holds, lane = method.lane, answer = std::move(method.answer),
                          atOnce = std::move(method.answerAtOnce)](sdbus::MethodCall message) {
+      memory_.used();
       const std::string name = message.getSender();
       const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
       if (atOnce && atOnce(*call)) return;
@@ -140,6 +150,7 @@ class BusService::Impl {
   void callerLeft(const std::string& name) {
     const auto caller = callers_.take(name);
     if (!caller) return;
+    memory_.used();
     for (CallLane* lane : {&lookups_, &enumerations_, &operations_})
       lane->forget(name);
     // Not here, where the bus is driven: a signal that is being sent would wait for this.
@@ -161,6 +172,7 @@ class BusService::Impl {
 
   LocalDocuments& documents_;
   Callers callers_;
+  AfterUse memory_;
   std::string stagingFolder_;
   std::unique_ptr<sdbus::IConnection> connection_;
   std::unique_ptr<sdbus::IObject> object_;

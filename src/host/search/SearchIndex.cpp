@@ -197,4 +197,9 @@ Result<std::vector<std::string>> SearchIndex::favorites() {
   return read<std::vector<std::string>>([this] { return run_->favorites(); });
 }
 
+void SearchIndex::releaseMemory() {
+  const std::lock_guard lock(mutex_);
+  if (store_) store_->database().releaseMemory();
+}
+
 }  // namespace mirabel

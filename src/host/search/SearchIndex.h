@@ -86,6 +86,9 @@ class SearchIndex {
   /// By rank, the lowest first, without what is in the trash.
   [[nodiscard]] Result<std::vector<std::string>> favorites();
 
+  /// Gives back what it keeps in memory to answer sooner.
+  void releaseMemory();
+
  private:
   explicit SearchIndex(SearchFiles files);
   [[nodiscard]] Result<void> openStore();

@@ -226,6 +226,11 @@ class StoredVolumeIndex final : public VolumeIndex {
   }
 
   std::uint64_t commits() const override { return commits_; }
+  void releaseMemory() override {
+    const std::scoped_lock lock(mutex_);
+    state_->releaseMemory();
+  }
+
   UUID historyUUID() const override { return state_->history(); }
   const StateFolder& stateFolder() const override { return state_->folder(); }
 

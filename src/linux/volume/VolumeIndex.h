@@ -122,6 +122,9 @@ class VolumeIndex {
 
   /// How often something was written to it. Waits for nobody.
   [[nodiscard]] virtual std::uint64_t commits() const = 0;
+  /// Gives back what it keeps in memory to answer sooner, and has the allocator give back what the
+  /// whole process has freed.
+  virtual void releaseMemory() = 0;
 
   /// What is remembered of objects by file ID.
   [[nodiscard]] virtual KeptAttributes& keptAttributes() = 0;

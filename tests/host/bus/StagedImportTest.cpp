@@ -6,7 +6,7 @@
 #include <sys/stat.h>
 
 #include "host/bus/StagedImport.h"
-#include "linux/kernel/UniqueFd.h"
+#include "mirabel/UniqueFd.h"
 #include "support/TempHome.h"
 
 namespace mirabel::testing {
