@@ -1,5 +1,6 @@
 #include "soak/Footprint.h"
 
+#include <algorithm>
 #include <chrono>
 #include <filesystem>
 #include <fstream>
@@ -7,6 +8,12 @@
 #include <thread>
 
 namespace mirabel::testing {
+namespace {
+
+// More than the service waits before it gives memory back.
+constexpr std::chrono::seconds untilSettled{5};
+
+}  // namespace
 
 Footprint footprintOf(pid_t process) {
   Footprint footprint;
@@ -24,15 +31,18 @@ bool isAsBefore(const Footprint& now, const Footprint& before) {
          now.descriptors <= before.descriptors + mostOpenListings;
 }
 
-Footprint settled(pid_t process, const Footprint& before) {
+Footprint settled(pid_t process) {
   using Clock = std::chrono::steady_clock;
-  const auto end = Clock::now() + std::chrono::seconds(30);
-  Footprint now = footprintOf(process);
-  while (!isAsBefore(now, before) && Clock::now() < end) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(50));
-    now = footprintOf(process);
+  Footprint least = footprintOf(process);
+  for (auto since = Clock::now(); Clock::now() < since + untilSettled;) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    const Footprint now = footprintOf(process);
+    if (now.residentKiB >= least.residentKiB && now.descriptors >= least.descriptors) continue;
+    least = {std::min(now.residentKiB, least.residentKiB),
+             std::min(now.descriptors, least.descriptors)};
+    since = Clock::now();
   }
-  return now;
+  return least;
 }
 
 }  // namespace mirabel::testing
