@@ -1,147 +1,15 @@
 #include "cli/CommandLine.h"
 
 #include <CLI/CLI.hpp>
-#include <algorithm>
 #include <memory>
 
-#include "cli/Commands.h"
-#include "cli/HostCommandLine.h"
-#include "cli/IconCommand.h"
-#include "cli/ItemCommandLine.h"
+#include "cli/ArgumentParser.h"
 #include "foundation/Log.h"
 #include "foundation/StandardErrorSink.h"
 #include "linux/log/JournalSink.h"
 
 namespace mirabel {
 namespace {
-
-constexpr const char* purpose =
-    "Gives every file and folder of a person's documents an identity that lasts: through\n"
-    "renames, moves, atomic saves and restarts.";
-constexpr const char* itemHelp =
-    "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has\n"
-    "no / in it is an identifier: did=N for a document, fid=N for a folder, #bundle for the\n"
-    "documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
-const std::string containerHelp =
-    "ITEM is the word root, a folder's identifier or path, workingset for everything, or alldirs\n"
-    "for every folder.\n\n";
-constexpr const char* watchHelp =
-    "It goes on until it is interrupted, and then tells the anchor to go on from. Without\n"
-    "the service it holds the volume as long as it runs: other commands wait for that, and then\n"
-    "say that it is busy.\n\n";
-constexpr const char* bundleHelp =
-    "BUNDLE is the name of the application's desktop entry without .desktop, org.example.Draw.\n\n";
-constexpr const char* pathHelp =
-    "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
-constexpr const char* exitCodeHelp =
-    "Exit codes: 0 done, 1 failed, 2 usage, 3 no such item, 4 start over, 5 not permitted,\n"
-    "6 name taken, 7 busy.";
-const std::string globalHelp = "Global options: see mirabel --help.";
-constexpr double longestTimeout = 86'400;
-
-/// Everything that the command line may say.
-struct Arguments {
-  GlobalOptions global;
-  double timeoutSeconds = 30;
-  std::string path;
-  std::string item;
-  ListOptions list;
-  ChangesOptions changes;
-  WatchOptions watch;
-  std::string container = "root";
-  std::string bundle;
-  IconOptions icon;
-  ItemArguments items;
-  HostArguments host;
-  bool showVersion = false;
-};
-
-void addGlobalOptions(CLI::App& app, Arguments& arguments) {
-  app.add_option("--home", arguments.global.home,
-                 "Work on the documents of this home, not of $HOME")
-      ->type_name("DIR");
-  app.add_flag("--json", arguments.global.json, "Print JSON Lines, for programs");
-  app.add_flag("--embedded", arguments.global.embedded,
-               "Run the provider in this process, whether or not a service runs");
-  app.add_flag("--verbose", arguments.global.verbose, "Write the log to standard error");
-  app.add_option("--timeout", arguments.timeoutSeconds,
-                 "Seconds to wait for another process that is using the volume (30)")
-      ->type_name("SECONDS");
-  app.add_flag("--version", arguments.showVersion, "Print the version");
-}
-
-CLI::App* addCommand(CLI::App& app, const char* name, const char* description,
-                     const std::string& argumentHelp) {
-  CLI::App* command = app.add_subcommand(name, description);
-  command->footer(argumentHelp + globalHelp);
-  return command;
-}
-
-void addItem(CLI::App& command, std::string& item) {
-  command.add_option("ITEM", item, "root, an identifier or a path")->required()->type_name("");
-}
-
-// The library's own check for positive numbers names their upper end in 300 digits.
-std::string isPageCount(const std::string& text) {
-  const bool isCount = text.find_first_not_of("0123456789") == std::string::npos &&
-                       text.find_first_not_of('0') != std::string::npos;
-  return isCount ? "" : "takes a number from 1";
-}
-
-void addAppCommands(CLI::App& app, Arguments& arguments) {
-  addCommand(app, "apps", "List the app libraries: the applications that show their documents", "");
-  auto* container =
-      addCommand(app, "container", "Print where the documents of an application lie", bundleHelp);
-  container->add_option("BUNDLE", arguments.bundle, "The identifier of the application")
-      ->required()
-      ->type_name("");
-  auto* icon = addCommand(app, "icon", "Write the icon of an app library to a PNG file", itemHelp);
-  addItem(*icon, arguments.icon.item);
-  icon->add_option("-o,--output", arguments.icon.file, "The file that it goes to; it is replaced")
-      ->required()
-      ->type_name("FILE");
-  icon->add_option("--size", arguments.icon.size, "Its width and height in pixels (256)")
-      ->type_name("N");
-}
-
-void addCommands(CLI::App& app, Arguments& arguments) {
-  auto* id = addCommand(app, "id", "Print the identifier of what lies at a path", pathHelp);
-  id->add_option("PATH", arguments.path, "What to identify")->required()->type_name("");
-  addItem(*addCommand(app, "path", "Print where an item lies now", itemHelp), arguments.item);
-  addItem(*addCommand(app, "info", "Print everything that is known of an item", itemHelp),
-          arguments.item);
-  auto* list = addCommand(app, "ls", "List a folder, 200 items a page", itemHelp);
-  list->add_option("ITEM", arguments.list.item, "What to list (root)")->type_name("");
-  list->add_option("--page", arguments.list.page, "Go on at this page of an earlier listing")
-      ->type_name("PAGE");
-  list->add_option("--pages", arguments.list.pages, "Stop after so many pages (all)")
-      ->type_name("N")
-      ->check(isPageCount);
-  auto* anchor = addCommand(app, "anchor", "Print the anchor of now, to ask for changes from there",
-                            containerHelp);
-  anchor->add_option("ITEM", arguments.container, "root, workingset, alldirs or a folder (root)")
-      ->type_name("");
-  auto* changes = addCommand(app, "changes", "Print what changed since an anchor", containerHelp);
-  changes->add_option("--since", arguments.changes.since, "An anchor that was printed before")
-      ->required()
-      ->type_name("ANCHOR");
-  changes
-      ->add_option("ITEM", arguments.changes.item, "root, workingset, alldirs or a folder (root)")
-      ->type_name("");
-  auto* watch = addCommand(app, "watch", "Print changes as they come", containerHelp + watchHelp);
-  watch->add_option("ITEM", arguments.watch.item, "root, workingset, alldirs or a folder (root)")
-      ->type_name("");
-  watch
-      ->add_option("--since", arguments.watch.since,
-                   "First print what changed since an anchor that was printed before")
-      ->type_name("ANCHOR");
-  addItemCommands(app, arguments.items, itemHelp + globalHelp);
-  addAppCommands(app, arguments);
-  addHostCommands(app, arguments.host, globalHelp);
-  addCommand(app, "status", "Say how changes are followed, and what the history holds", "");
-  addCommand(app, "doctor", "Say what of this machine is in the way, and how to mend it", "");
-  addCommand(app, "demo", "A guided tour in a temporary home", "");
-}
 
 ExitCode dispatch(const CLI::App& app, Program& program, const Arguments& arguments) {
   if (app.got_subcommand("id")) return runId(program, arguments.path);
@@ -171,56 +39,15 @@ void setUpLog(bool verbose) {
   }
 }
 
-// One line, with exit code 2; the parser's own codes start at 100.
-int wrongUsage(const CLI::App& app, const std::vector<std::string>& arguments, std::string message,
-               Streams streams) {
-  const auto commands = app.get_subcommands();
-  const std::string command = commands.empty() ? "" : commands.front()->get_name() + " ";
-  message += "; see mirabel " + command + "--help";
-  // Where parsing failed, options that it did not come to are not set.
-  const auto end = std::find(arguments.begin(), arguments.end(), "--");
-  const bool asJSON = std::find(arguments.begin(), end, "--json") != end;
-  constexpr auto code = static_cast<int>(ExitCode::usage);
-  reportFailure(streams.err, asJSON, "usage", code, message);
-  return code;
-}
-
 }  // namespace
 
 int runCommandLine(const std::vector<std::string>& arguments, Streams streams) {
-  CLI::App app(purpose, "mirabel");
-  Arguments parsed;
-  // Before the commands are added, for they inherit it: global options may follow the command.
-  app.fallthrough();
-  addGlobalOptions(app, parsed);
-  addCommands(app, parsed);
-  app.footer(std::string(itemHelp) + exitCodeHelp);
-  app.require_subcommand(0, 1);
-  try {
-    // The parser takes its arguments from the back.
-    app.parse(std::vector<std::string>(arguments.rbegin(), arguments.rend()));
-  } catch (const CLI::ParseError& error) {
-    // Help was asked for; it is that of the command, if one was named.
-    if (error.get_exit_code() == 0) return app.exit(error, streams.out, streams.err);
-    return wrongUsage(app, arguments, error.what(), streams);
-  }
-  if (parsed.showVersion) {
-    streams.out << "mirabel " MIRABEL_VERSION "\n";
-    return 0;
-  }
-  if (app.get_subcommands().empty()) {
-    streams.err << app.help();
-    return static_cast<int>(ExitCode::usage);
-  }
-  // Written so that what is no number is refused too.
-  if (!(parsed.timeoutSeconds >= 0 && parsed.timeoutSeconds <= longestTimeout)) {
-    return wrongUsage(app, arguments, "--timeout takes 0 to 86400 seconds", streams);
-  }
-  parsed.global.timeout =
-      std::chrono::milliseconds(static_cast<long>(parsed.timeoutSeconds * 1000));
+  ArgumentParser parser;
+  if (const auto code = parser.parse(arguments, streams)) return *code;
+  const Arguments& parsed = parser.arguments();
   setUpLog(parsed.global.verbose);
   Program program(parsed.global, streams);
-  return static_cast<int>(dispatch(app, program, parsed));
+  return static_cast<int>(dispatch(parser.app(), program, parsed));
 }
 
 }  // namespace mirabel

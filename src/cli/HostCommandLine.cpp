@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 
 #include "cli/Completion.h"
+#include "cli/TextOptions.h"
 
 namespace mirabel {
 namespace {
@@ -36,14 +37,13 @@ void addLimit(CLI::App& command, std::uint32_t& limit, const char* help) {
 void addSearch(CLI::App& app, SearchOptions& options, const std::string& footer) {
   CLI::App& search =
       add(app, "search", "Find documents by name, tag, type and date", searchHelp + footer);
-  search.add_option("WORDS", options.words, "Parts of names or tags")->type_name("");
-  search.add_option("--tag", options.tags, "Only what has this tag; may be given again")
+  addTexts(search, "WORDS", options.words, "Parts of names or tags")->type_name("");
+  addTexts(search, "--tag", options.tags, "Only what has this tag; may be given again")
       ->type_name("LABEL");
-  search.add_option("--type", options.type, "Only this type, or family: image/png, image/*")
+  addText(search, "--type", options.type, "Only this type, or family: image/png, image/*")
       ->type_name("TYPE");
-  search.add_option("--since", options.since, "Only what was modified since")
-      ->type_name("DATE|AGE");
-  search.add_option("--before", options.before, "Only what was modified before")
+  addText(search, "--since", options.since, "Only what was modified since")->type_name("DATE|AGE");
+  addText(search, "--before", options.before, "Only what was modified before")
       ->type_name("DATE|AGE");
   search.add_flag("--trashed", options.includesTrashed, "The trash too");
   addLimit(search, options.limit, "At most so many (100)");
@@ -58,9 +58,10 @@ void addHostCommands(CLI::App& app, HostArguments& arguments, const std::string&
   addLimit(add(app, "favorites", "List the favourites by their rank", footer),
            arguments.mostFavorites, "At most so many (1000)");
   add(app, "serve", "Serve the documents to other programs", serveHelp + footer);
-  add(app, "completion", "Print what completes this program's arguments in a shell",
-      completionHelp + footer)
-      .add_option("SHELL", arguments.shell, "bash, zsh or fish")
+  CLI::App& completion =
+      add(app, "completion", "Print what completes this program's arguments in a shell",
+          completionHelp + footer);
+  addText(completion, "SHELL", arguments.shell, "bash, zsh or fish")
       ->required()
       ->type_name("")
       ->check(CLI::IsMember({"bash", "zsh", "fish"}));

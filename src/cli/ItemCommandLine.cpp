@@ -2,6 +2,8 @@
 
 #include <CLI/CLI.hpp>
 
+#include "cli/TextOptions.h"
+
 namespace mirabel {
 namespace {
 
@@ -17,15 +19,13 @@ class Adder {
   }
 
   static void item(CLI::App& command, std::string& item) {
-    command.add_option("ITEM", item, "An identifier or a path")->required()->type_name("");
+    addText(command, "ITEM", item, "An identifier or a path")->required()->type_name("");
   }
   static void items(CLI::App& command, std::vector<std::string>& items) {
-    command.add_option("ITEM", items, "Identifiers or paths")->required()->type_name("");
+    addTexts(command, "ITEM", items, "Identifiers or paths")->required()->type_name("");
   }
   static void parent(CLI::App& command, std::string& parent) {
-    command.add_option("--in", parent, "The folder that it goes into")
-        ->required()
-        ->type_name("ITEM");
+    addText(command, "--in", parent, "The folder that it goes into")->required()->type_name("ITEM");
   }
 
  private:
@@ -35,25 +35,25 @@ class Adder {
 
 void addFileCommands(Adder& add, ItemArguments& arguments) {
   CLI::App& create = add.command("mkdir", "Make a folder");
-  create.add_option("NAME", arguments.create.name, "Its name")->required()->type_name("");
+  addText(create, "NAME", arguments.create.name, "Its name")->required()->type_name("");
   Adder::parent(create, arguments.create.parent);
 
   CLI::App& import = add.command("import", "Copy files or folders from anywhere into a folder");
-  import.add_option("FILE", arguments.import.files, "Paths of what to copy")
+  addTexts(import, "FILE", arguments.import.files, "Paths of what to copy")
       ->required()
       ->type_name("");
   Adder::parent(import, arguments.import.parent);
 
   CLI::App& rename = add.command("rename", "Give an item another name");
   Adder::item(rename, arguments.rename.item);
-  rename.add_option("NAME", arguments.rename.name, "Its new name")->required()->type_name("");
+  addText(rename, "NAME", arguments.rename.name, "Its new name")->required()->type_name("");
 
   CLI::App& move = add.command("mv", "Move an item into another folder");
   Adder::item(move, arguments.move.item);
-  move.add_option("PARENT", arguments.move.parent, "The folder that it goes into")
+  addText(move, "PARENT", arguments.move.parent, "The folder that it goes into")
       ->required()
       ->type_name("");
-  move.add_option("--name", arguments.move.name, "Its name there (the one that it has)")
+  addText(move, "--name", arguments.move.name, "Its name there (the one that it has)")
       ->type_name("NAME");
 
   CLI::App& remove = add.command("rm", "Delete items for good, folders with everything in them");
@@ -66,13 +66,12 @@ void addTrashCommands(Adder& add, ItemArguments& arguments) {
 
   CLI::App& restore = add.command("restore", "Put items in the trash back where they came from");
   Adder::items(restore, arguments.restore.items);
-  restore.add_option("--to", arguments.restore.parent, "Put them into this folder instead")
+  addText(restore, "--to", arguments.restore.parent, "Put them into this folder instead")
       ->type_name("ITEM");
 
   CLI::App& expire = add.command("expire", "Delete for good what has been in the trash for long");
-  expire
-      .add_option("--older-than", arguments.expire.olderThan,
-                  "A day, a moment in RFC 3339 form, or an age: 30d, 12h, 2w, 45m, 90s")
+  addText(expire, "--older-than", arguments.expire.olderThan,
+          "A day, a moment in RFC 3339 form, or an age: 30d, 12h, 2w, 45m, 90s")
       ->required()
       ->type_name("DATE|AGE");
   expire.add_flag("--dry-run", arguments.expire.isDryRun, "Say what would be deleted");
@@ -81,20 +80,20 @@ void addTrashCommands(Adder& add, ItemArguments& arguments) {
 void addMetadataCommands(Adder& add, ItemArguments& arguments) {
   CLI::App& tag = add.command("tag", "Set the tags of an item, or print them");
   Adder::item(tag, arguments.tag.item);
-  auto* labels = tag.add_option("LABEL", arguments.tag.labels, "All the tags that it is to have")
+  auto* labels = addTexts(tag, "LABEL", arguments.tag.labels, "All the tags that it is to have")
                      ->type_name("");
   tag.add_flag("--clear", arguments.tag.clears, "Take all tags away")->excludes(labels);
 
   CLI::App& favorite = add.command("favorite", "Make an item a favourite");
   Adder::item(favorite, arguments.favorite.item);
-  auto* rank = favorite.add_option("RANK", arguments.favorite.rank, "Its rank among them (1)")
-                   ->type_name("");
+  auto* rank =
+      addText(favorite, "RANK", arguments.favorite.rank, "Its rank among them (1)")->type_name("");
   favorite.add_flag("--clear", arguments.favorite.clears, "Make it none any more")->excludes(rank);
 
   CLI::App& used = add.command("used", "Note when an item was used");
   Adder::item(used, arguments.used.item);
   auto* date =
-      used.add_option("DATE", arguments.used.date, "A day, or a moment in RFC 3339 form (now)")
+      addText(used, "DATE", arguments.used.date, "A day, or a moment in RFC 3339 form (now)")
           ->type_name("");
   used.add_flag("--clear", arguments.used.clears, "Forget it")->excludes(date);
 }

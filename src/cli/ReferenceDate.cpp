@@ -43,7 +43,8 @@ std::optional<Date> localMidnight(const std::string& day) {
   midnight.tm_isdst = -1;  // as it is on that day
   midnight.tm_wday = -1;   // stays like this when there is no such time
   const std::time_t seconds = std::mktime(&midnight);
-  if (midnight.tm_wday < 0) return {};
+  // East of Greenwich the first day of the calendar begins before it.
+  if (midnight.tm_wday < 0 || Date{seconds, 0} < Date::earliest) return {};
   return Date{seconds, 0};
 }
 

@@ -48,6 +48,12 @@ TEST(ReferenceDate, ADayBeginsAtLocalMidnightAndAMomentIsExact) {
   EXPECT_EQ(referenceDateFrom("2026-11-21T09:30:00+02:00", now), date("2026-11-21T07:30:00Z"));
 }
 
+TEST(ReferenceDate, TheFirstDayBeginsBeforeTheCalendarInTheEast) {
+  const TimeZone zone("<+14>-14");
+  EXPECT_EQ(referenceDateFrom("0001-01-01", now), std::nullopt);
+  EXPECT_EQ(referenceDateFrom("0001-01-02", now), date("0001-01-01T10:00:00Z"));
+}
+
 TEST(ReferenceDate, EverythingElseIsRefused) {
   for (const char* text : {"",
                            "d",

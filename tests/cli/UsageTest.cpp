@@ -27,6 +27,8 @@ TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
       {"--timeout", "-1", "ls"},
       {"--timeout", "1e9", "ls"},
       {"--home", "/", "ls"},  // said twice
+      {"--home=", "ls"},
+      {"mv", "did=1", "fid=2", "--name="},
       {"doctor", "argument"},
       {"status", "argument"},
       {"apps", "argument"},
@@ -92,6 +94,35 @@ TEST_F(Usage, GlobalOptionsMayFollowTheCommandAndPathsMayLookLikeOptions) {
   EXPECT_THAT(relative.out, HasSubstr("did=")) << relative.err;
   EXPECT_THAT(shell("cd \"$documents\" && \"$mirabel\" --home \"$home\" id ls").out,
               HasSubstr("did="));
+}
+
+TEST_F(Usage, TextsAreTakenLetterForLetter) {
+  const std::vector<std::string> labels = {"[a,b]", "[]", "[[x]]", "{}",
+                                           "%%",    "a]", "\"q\"", "x,y"};
+  home.writeFile("doc");
+  std::vector<std::string> arguments = {"tag", "--json", home.at("doc")};
+  arguments.insert(arguments.end(), labels.begin(), labels.end());
+  EXPECT_EQ(run(arguments).json().at("tags"), labels);
+  EXPECT_EQ(run({"tag", "--json", home.at("doc"), "{}"}).json().at("tags"),
+            std::vector<std::string>{"{}"});
+
+  home.writeFile("a");
+  home.writeFile("b");
+  home.writeFile("[a,b]");
+  EXPECT_EQ(run({"rm", "[a,b]"}).code, 3) << "there is none in the working folder";
+  EXPECT_EQ(shell("cd \"$documents\" && \"$mirabel\" --home \"$home\" rm '[a,b]'").code, 0);
+  EXPECT_THAT(run({"ls"}).out, AllOf(HasSubstr(" a\n"), HasSubstr(" b\n")));
+  EXPECT_THAT(run({"ls"}).out, ::testing::Not(HasSubstr("[a,b]")));
+  expectFailure(run({"mv", "did=1", "root", "--name", ""}), 1, "\"\" is no name");
+}
+
+TEST_F(Usage, AnOptionThatMayBeGivenAgainTakesOneValueEachTime) {
+  for (const char* name : {"report", "letter"}) {
+    home.writeFile(name);
+    ASSERT_EQ(run({"tag", home.at(name), "red", "blue"}).code, 0);
+  }
+  EXPECT_EQ(run({"search", "--json", "--tag", "red", "rep", "--tag", "blue"}).json().at("filename"),
+            "report");
 }
 
 }  // namespace
