@@ -10,6 +10,8 @@ namespace mirabel {
 namespace {
 
 constexpr std::uint64_t currentVersion = 1;
+// Far above what is ever kept, so that bytes which share objects do not unfold without end.
+constexpr PropertyList::Limits positionLimits{.depth = 4, .objects = 64u << 10, .bytes = 1u << 20};
 
 constexpr std::string_view versionKey = "version";
 constexpr std::string_view planKey = "plan";
@@ -66,7 +68,7 @@ Data WalkPosition::encode() const {
 }
 
 std::optional<WalkPosition> WalkPosition::decode(std::span<const std::uint8_t> bytes) {
-  const auto list = PropertyList::decode(bytes);
+  const auto list = PropertyList::decode(bytes, positionLimits);
   if (!list || integerFor(versionKey, *list) != currentVersion) return {};
   const auto plan = integerFor(planKey, *list);
   const auto nextRoot = integerFor(nextRootKey, *list);

@@ -61,6 +61,14 @@ void addDirectories(const KeyFile& index, const char* key, IconTheme& theme) {
   }
 }
 
+IconTheme themeOf(const KeyFile& index) {
+  IconTheme theme;
+  addDirectories(index, "Directories", theme);
+  addDirectories(index, "ScaledDirectories", theme);
+  theme.inherits = index.list(themeGroup, "Inherits", mostInherited);
+  return theme;
+}
+
 }  // namespace
 
 bool IconThemeDirectory::matches(const IconSize& wanted) const {
@@ -96,11 +104,13 @@ std::int64_t IconThemeDirectory::distance(const IconSize& wanted) const {
 Result<IconTheme> IconTheme::read(const std::string& path) {
   const auto index = KeyFile::read(path, largestIndex);
   if (!index) return fail(index.error());
-  IconTheme theme;
-  addDirectories(*index, "Directories", theme);
-  addDirectories(*index, "ScaledDirectories", theme);
-  theme.inherits = index->list(themeGroup, "Inherits", mostInherited);
-  return theme;
+  return themeOf(*index);
+}
+
+Result<IconTheme> IconTheme::parse(std::string_view text) {
+  const auto index = KeyFile::parse(text);
+  if (!index) return fail(index.error());
+  return themeOf(*index);
 }
 
 IconTheme IconTheme::hicolor() {

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "mirabel/Error.h"
@@ -41,6 +42,8 @@ struct IconTheme {
   /// Reads an "index.theme". Directories that are no folders below it (that hold "..", say), have
   /// no size or one beyond all reason are left out. POSIX errors: those of `KeyFile::read`.
   [[nodiscard]] static Result<IconTheme> read(const std::string& path);
+  /// The same for what such a file holds.
+  [[nodiscard]] static Result<IconTheme> parse(std::string_view text);
   /// What "hicolor" has by convention, for folders that lack its index: applications put their
   /// icons there without one.
   [[nodiscard]] static IconTheme hicolor();

@@ -37,8 +37,11 @@ KeyFile& KeyFile::operator=(KeyFile&&) noexcept = default;
 Result<KeyFile> KeyFile::read(const std::string& path, std::size_t limit) {
   const auto bytes = readBoundedFile(path, limit);
   if (!bytes) return fail(bytes.error());
+  return parse(stringView(*bytes));
+}
+
+Result<KeyFile> KeyFile::parse(std::string_view text) {
   auto parsed = std::make_unique<Parsed>();
-  const std::string_view text = stringView(*bytes);
   if (!g_key_file_load_from_data(parsed->file, text.data(), text.size(), G_KEY_FILE_NONE,
                                  nullptr)) {
     return fail(Error::posix(EILSEQ, "it is no file of keys and values"));

@@ -4,6 +4,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "mirabel/Error.h"
@@ -16,6 +17,8 @@ class KeyFile {
  public:
   /// POSIX errors: those of `readBoundedFile`; EILSEQ for what is no file of this kind.
   [[nodiscard]] static Result<KeyFile> read(const std::string& path, std::size_t limit);
+  /// The same for what such a file holds.
+  [[nodiscard]] static Result<KeyFile> parse(std::string_view text);
   ~KeyFile();
   KeyFile(KeyFile&&) noexcept;
   KeyFile& operator=(KeyFile&&) noexcept;

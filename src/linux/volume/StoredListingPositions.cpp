@@ -11,33 +11,6 @@ namespace mirabel {
 namespace {
 
 constexpr const char* fileName = "listings";
-constexpr std::string_view magic = "MRBLIST1";
-constexpr std::size_t digestOffset = 8;
-constexpr std::size_t numberOffset = 16;
-constexpr std::size_t lengthsOffset = 24;
-constexpr std::size_t headerSize = 36;
-
-template <class Integer>
-void put(Data& bytes, std::size_t offset, Integer value) {
-  for (std::size_t i = 0; i < sizeof(Integer); ++i)
-    bytes[offset + i] = static_cast<std::uint8_t>(value >> (8 * i));
-}
-
-template <class Integer>
-Integer get(const Data& bytes, std::size_t offset) {
-  Integer value = 0;
-  for (std::size_t i = 0; i < sizeof(Integer); ++i)
-    value = static_cast<Integer>(value | (Integer{bytes[offset + i]} << (8 * i)));
-  return value;
-}
-
-// FNV-1a: finds out accidents, not attackers.
-std::uint64_t digestOf(const Data& bytes, std::size_t size) {
-  std::uint64_t digest = 0xCBF29CE484222325;
-  for (std::size_t i = numberOffset; i < size; ++i)
-    digest = (digest ^ bytes[i]) * 0x100000001B3;
-  return digest;
-}
 
 Result<void> writeAt(int file, const Data& bytes, std::size_t offset) {
   for (std::size_t done = 0; done < bytes.size();) {
@@ -55,7 +28,7 @@ Result<void> writeAt(int file, const Data& bytes, std::size_t offset) {
 Result<void> StoredListingPositions::keep(std::string_view container, const Data& cursor,
                                           const Data& position) {
   const std::scoped_lock lock(mutex_);
-  if (container.size() + cursor.size() + position.size() > slotSize - headerSize) {
+  if (container.size() + cursor.size() + position.size() > slotSize - ListingSlot::headerSize) {
     return fail(Error::posix(EMSGSIZE));
   }
   load();
@@ -67,7 +40,7 @@ Result<void> StoredListingPositions::keep(std::string_view container, const Data
   slot = {};
   Slot kept{++lastNumber_, std::string(container), cursor, position};
   const auto at = static_cast<std::size_t>(&slot - slots_.data()) * slotSize;
-  if (auto written = writeAt(file_.get(), bytesOf(kept), at); !written) return written;
+  if (auto written = writeAt(file_.get(), kept.encode(), at); !written) return written;
   if (::fdatasync(file_.get()) != 0) return fail(Error::posix(errno, folder_.file(fileName)));
   slot = std::move(kept);
   return {};
@@ -97,7 +70,8 @@ void StoredListingPositions::load() {
     const ssize_t count =
         ::pread(file.get(), bytes.data(), slotSize, static_cast<off_t>(i * slotSize));
     if (count != static_cast<ssize_t>(slotSize)) continue;
-    slots_[i] = slotFrom(bytes);
+    // A free slot where the bytes are none that were written whole.
+    slots_[i] = ListingSlot::decode(bytes).value_or(Slot());
     lastNumber_ = std::max(lastNumber_, slots_[i].number);
   }
   file_ = std::move(file);
@@ -134,36 +108,6 @@ StoredListingPositions::Slot& StoredListingPositions::slotFor(std::string_view c
     if (oldest == nullptr || slot.number < oldest->number) oldest = &slot;
   }
   return *oldest;
-}
-
-Data StoredListingPositions::bytesOf(const Slot& slot) {
-  Data bytes(headerSize);
-  std::ranges::copy(magic, bytes.begin());
-  put(bytes, numberOffset, slot.number);
-  put(bytes, lengthsOffset, static_cast<std::uint32_t>(slot.container.size()));
-  put(bytes, lengthsOffset + 4, static_cast<std::uint32_t>(slot.cursor.size()));
-  put(bytes, lengthsOffset + 8, static_cast<std::uint32_t>(slot.position.size()));
-  bytes.insert(bytes.end(), slot.container.begin(), slot.container.end());
-  bytes.insert(bytes.end(), slot.cursor.begin(), slot.cursor.end());
-  bytes.insert(bytes.end(), slot.position.begin(), slot.position.end());
-  put(bytes, digestOffset, digestOf(bytes, bytes.size()));
-  return bytes;
-}
-
-/// A free slot where the bytes are none that were written whole.
-StoredListingPositions::Slot StoredListingPositions::slotFrom(const Data& bytes) {
-  if (!stringView(bytes).starts_with(magic)) return {};
-  const std::size_t container = get<std::uint32_t>(bytes, lengthsOffset);
-  const std::size_t cursor = get<std::uint32_t>(bytes, lengthsOffset + 4);
-  const std::size_t position = get<std::uint32_t>(bytes, lengthsOffset + 8);
-  const std::size_t size = headerSize + container + cursor + position;
-  if (size > bytes.size() || get<std::uint64_t>(bytes, digestOffset) != digestOf(bytes, size)) {
-    return {};
-  }
-  const std::string_view text = stringView(bytes);
-  return {get<std::uint64_t>(bytes, numberOffset), std::string(text.substr(headerSize, container)),
-          dataFromString(text.substr(headerSize + container, cursor)),
-          dataFromString(text.substr(headerSize + container + cursor, position))};
 }
 
 }  // namespace mirabel

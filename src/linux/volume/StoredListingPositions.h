@@ -8,6 +8,7 @@
 #include <string>
 #include <string_view>
 
+#include "linux/volume/ListingSlot.h"
 #include "linux/volume/StateFolder.h"
 #include "mirabel/UniqueFd.h"
 #include "platform/ListingPositions.h"
@@ -33,17 +34,10 @@ class StoredListingPositions final : public ListingPositions {
   std::optional<Data> find(std::string_view container, const Data& cursor) override;
 
  private:
-  struct Slot {
-    std::uint64_t number = 0;  ///< counts what was kept, from 1; 0: the slot is free
-    std::string container;
-    Data cursor;
-    Data position;
-  };
+  using Slot = ListingSlot;
   void load();
   [[nodiscard]] Result<void> make();
   [[nodiscard]] Slot& slotFor(std::string_view container, const Data& cursor);
-  [[nodiscard]] static Data bytesOf(const Slot& slot);
-  [[nodiscard]] static Slot slotFrom(const Data& bytes);
 
   const StateFolder& folder_;
   std::mutex mutex_;
