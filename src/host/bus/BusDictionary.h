@@ -94,7 +94,10 @@ inline Date readDate(sdbus::Message& message) {
   message.enterStruct("xu");
   message >> date.seconds >> date.nanoseconds;
   message.exitStruct();
-  return date;
+  // Whatever prints or compares dates relies on it.
+  if (date.nanoseconds < 1'000'000'000) return date;
+  throw sdbus::Error("org.freedesktop.DBus.Error.InconsistentMessage",
+                     "the nanoseconds of a date are more than a second");
 }
 
 template <class Value>

@@ -58,9 +58,9 @@ std::string nameOf(const Error& error) {
     return std::string(posixPrefix) + (name != nullptr ? name : "EIO");
   }
   if (error.domain == ErrorDomain::store) {
-    const bool isNegative = error.code < 0;
-    return std::string(storePrefix) + (isNegative ? "_" : "") +
-           std::to_string(isNegative ? -error.code : error.code);
+    std::string digits = std::to_string(error.code);
+    if (digits.starts_with('-')) digits.front() = '_';
+    return std::string(storePrefix) + digits;
   }
   return "Failed";
 }
@@ -73,6 +73,15 @@ std::optional<std::int64_t> posixCode(std::string_view name) {
   return {};
 }
 
+// "_" stands for the sign. 0 for what is no code.
+std::int64_t storeCode(std::string_view text) {
+  std::string digits(text);
+  if (digits.starts_with('_')) digits.front() = '-';
+  std::int64_t code = 0;
+  std::from_chars(digits.data(), digits.data() + digits.size(), code);
+  return code;
+}
+
 Error fromOwnName(std::string_view name) {
   for (const NamedError& candidate : namedErrors)
     if (candidate.name == name) return {candidate.domain, candidate.code, {}};
@@ -80,12 +89,7 @@ Error fromOwnName(std::string_view name) {
     return {ErrorDomain::posix, posixCode(name.substr(posixPrefix.size())).value_or(EIO), {}};
   }
   if (name.starts_with(storePrefix)) {
-    name.remove_prefix(storePrefix.size());
-    const bool isNegative = name.starts_with('_');
-    if (isNegative) name.remove_prefix(1);
-    std::int64_t code = 0;
-    std::from_chars(name.begin(), name.end(), code);
-    return {ErrorDomain::store, isNegative ? -code : code, {}};
+    return {ErrorDomain::store, storeCode(name.substr(storePrefix.size())), {}};
   }
   return Error::posix(EIO);
 }

@@ -4,6 +4,7 @@
 #include "host/bus/BusCall.h"
 #include "host/bus/BusNames.h"
 #include "host/bus/BusOptions.h"
+#include "host/bus/BusQueries.h"
 #include "host/bus/StagedImport.h"
 #include "mirabel/TagData.h"
 
@@ -139,20 +140,9 @@ void setTagData(Documents& documents, const CallPointer& call) {
                        answering(call));
 }
 
-std::optional<Number> numberOf(const sdbus::Variant& variant) {
-  if (variant.containsValueOfType<std::int64_t>()) return Number::of(variant.get<std::int64_t>());
-  if (variant.containsValueOfType<std::uint64_t>()) return Number::of(variant.get<std::uint64_t>());
-  if (variant.containsValueOfType<double>()) return Number::of(variant.get<double>());
-  if (variant.containsValueOfType<std::int32_t>())
-    return Number::of(std::int64_t{variant.get<std::int32_t>()});
-  if (variant.containsValueOfType<std::uint32_t>())
-    return Number::of(std::int64_t{variant.get<std::uint32_t>()});
-  return {};
-}
-
 void setFavoriteRank(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
-  const auto rank = numberOf(call->argument<sdbus::Variant>());
+  const auto rank = numberFrom(call->argument<sdbus::Variant>());
   if (!rank) return invalidArgument(call, "a rank is a number");
   documents.setFavoriteRank(item, rank, answering(call));
 }

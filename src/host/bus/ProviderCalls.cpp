@@ -4,7 +4,7 @@
 #include "host/bus/BusCall.h"
 #include "host/bus/BusNames.h"
 #include "host/bus/BusOptions.h"
-#include "mirabel/SearchQuery.h"
+#include "host/bus/BusQueries.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel::bus {
@@ -13,7 +13,6 @@ namespace {
 using CallPointer = std::shared_ptr<BusCall>;
 
 constexpr std::uint32_t largestIcon = 4096;
-constexpr std::uint32_t mostFound = 10'000;
 
 void getItem(const CallPointer& call) {
   Documents* documents = call->documents();
@@ -142,52 +141,16 @@ void listAppLibraries(const CallPointer& call) {
   if (documents != nullptr) call->reply(documents->appLibraries());
 }
 
-std::optional<Date> dateOption(const Options& options, const std::string& key) {
-  const auto text = textOption(options, key);
-  return text ? Date::fromRFC3339(*text) : std::nullopt;
-}
-
-/// What of the options is wanted and can't be understood.
-std::optional<std::string> misunderstood(const Options& options) {
-  if (auto mistyped = mistypedOption(options, {{"tags", "as"},
-                                               {"type", "s"},
-                                               {"modifiedSince", "s"},
-                                               {"modifiedBefore", "s"},
-                                               {"includesTrashed", "b"},
-                                               {"limit", "u"}}))
-    return mistyped;
-  for (const std::string key : {"modifiedSince", "modifiedBefore"}) {
-    if (options.contains(key) && !dateOption(options, key))
-      return key + " is no date in RFC 3339 form";
-  }
-  return {};
-}
-
-/// `options` are understood.
-SearchQuery queryOf(std::vector<std::string> words, const Options& options) {
-  SearchQuery query;
-  query.words = std::move(words);
-  if (const auto tags = options.find("tags"); tags != options.end())
-    query.tags = tags->second.get<std::vector<std::string>>();
-  query.type = textOption(options, "type");
-  query.modifiedSince = dateOption(options, "modifiedSince");
-  query.modifiedBefore = dateOption(options, "modifiedBefore");
-  if (const auto trashed = options.find("includesTrashed"); trashed != options.end())
-    query.includesTrashed = trashed->second.get<bool>();
-  if (const auto limit = options.find("limit"); limit != options.end())
-    query.limit = std::min(limit->second.get<std::uint32_t>(), mostFound);
-  return query;
-}
-
 void search(const CallPointer& call) {
   Documents* documents = call->documents();
   if (documents == nullptr) return;
   auto words = call->argument<std::vector<std::string>>();
   const auto options = call->argument<Options>();
-  if (const auto what = misunderstood(options)) {
-    return call->fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", *what));
+  const auto query = queryFrom(std::move(words), options);
+  if (!query) {
+    return call->fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", query.error()));
   }
-  call->reply(documents->search(queryOf(std::move(words), options)));
+  call->reply(documents->search(*query));
 }
 
 void getRecent(const CallPointer& call) {

@@ -9,6 +9,7 @@
 #include "host/bus/BusItems.h"
 #include "host/bus/BusNames.h"
 #include "host/bus/BusOptions.h"
+#include "host/bus/BusQueries.h"
 #include "host/bus/BusStatus.h"
 #include "host/bus/BusText.h"
 #include "host/bus/RemoteWatches.h"
@@ -52,13 +53,6 @@ struct NameArgument {
   Options options;
 };
 
-/// What is searched for as text: bytes that are none are looked for like this anyway.
-std::vector<std::string> allShown(std::vector<std::string> texts) {
-  for (std::string& text : texts)
-    text = shown(text);
-  return texts;
-}
-
 /// A container that is asked for with each question.
 class RemoteContainer final : public DocumentContainer {
  public:
@@ -98,13 +92,22 @@ class RemoteContainer final : public DocumentContainer {
   Identifier identifier_;
 };
 
+/// A reply that holds something else than an item: whoever waits for the answer must hear of it.
+Documents::ItemResult itemIn(sdbus::Message& reply) {
+  try {
+    return readItem(reply);
+  } catch (const sdbus::Error& error) {
+    return fail(errorFromBus(error));
+  }
+}
+
 /// Begins an operation that hands back the item.
 void begin(BusConnection& connection, const char* method, const Write& write,
            Documents::ItemHandler handler) {
   connection.callInTurn(operationsInterface, method, write,
                         [handler = std::move(handler)](sdbus::Message* reply, const Error& error) {
                           if (reply == nullptr) return handler(fail(error));
-                          handler(readItem(*reply));
+                          handler(itemIn(*reply));
                         });
 }
 
@@ -306,19 +309,8 @@ Result<std::optional<Data>> RemoteDocuments::icon(const std::string& identifier,
 }
 
 Result<std::vector<ItemRecord>> RemoteDocuments::search(const SearchQuery& query) {
-  Options options;
-  if (!query.tags.empty()) options["tags"] = sdbus::Variant(allShown(query.tags));
-  if (query.type) options["type"] = sdbus::Variant(shown(*query.type));
-  if (query.modifiedSince) {
-    options["modifiedSince"] = sdbus::Variant(query.modifiedSince->rfc3339());
-  }
-  if (query.modifiedBefore) {
-    options["modifiedBefore"] = sdbus::Variant(query.modifiedBefore->rfc3339());
-  }
-  options["includesTrashed"] = sdbus::Variant(query.includesTrashed);
-  options["limit"] = sdbus::Variant(limited(query.limit));
-  return connection_->call(providerInterface, "Search", arguments(allShown(query.words), options),
-                           readItems);
+  return connection_->call(providerInterface, "Search",
+                           arguments(wordsFor(query), optionsFor(query)), readItems);
 }
 
 Result<std::vector<ItemRecord>> RemoteDocuments::recent(std::size_t limit) {

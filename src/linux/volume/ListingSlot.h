@@ -6,7 +6,7 @@
 #include <span>
 #include <string>
 
-#include "foundation/Values.h"
+#include "mirabel/Values.h"
 
 namespace mirabel {
 

@@ -25,7 +25,7 @@ std::vector<Error> allErrors() {
   for (std::int64_t code = 0; code < 4; ++code)
     errors.push_back(Error::local(static_cast<LocalVesselError>(code)));
   errors.push_back(Error::propertyList("it is cut"));
-  for (const std::int64_t code : {1, 11, 266, -5})
+  for (const std::int64_t code : {1L, 11L, 266L, -5L, INT64_MIN, INT64_MAX})
     errors.push_back(Error::store(code, "disk I/O error"));
   return errors;
 }
