@@ -1,28 +1,10 @@
 // Any bytes: no token, or one that is the same after it was written and read again.
 
 #include "Require.h"
-#include "foundation/Log.h"
+#include "SilentLog.h"
 #include "fs/FSChangeToken.h"
 
 using namespace mirabel;
-
-namespace {
-
-class Silence : public LogSink {
- public:
-  void write(LogLevel, std::string_view, std::string_view, std::string_view) override {}
-};
-
-/// The error line of each refused input would cost more than reading it.
-void silenceLog() {
-  static const bool done = [] {
-    Log::shared().setSink(std::make_shared<Silence>(), LogLevel::error);
-    return true;
-  }();
-  static_cast<void>(done);
-}
-
-}  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   silenceLog();
