@@ -12,7 +12,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const std::string text(reinterpret_cast<const char*>(data), size);
   const std::string application = bus::applicationOfSandbox(text);
   if (application.empty()) return 0;
-  require(text.find("[Application]") < text.find(application));
+  require(text.find("[Application]") < text.rfind(application));
   require(application.find('\n') == std::string::npos);
   require(bus::applicationOfSandbox("[Application]\nname=" + application + "\n") == application);
   // Nothing that comes later takes its place.
