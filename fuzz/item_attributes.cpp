@@ -9,7 +9,7 @@
 #include "SilentLog.h"
 #include "items/AttributeNames.h"
 #include "items/LocalItem.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 #include "support/FakeAppLibraries.h"
 #include "support/FakePlatform.h"
 

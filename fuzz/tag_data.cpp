@@ -1,7 +1,7 @@
 // Any bytes: no tag data, or tags that are the same when they are written and read again.
 
 #include "Require.h"
-#include "items/TagData.h"
+#include "mirabel/TagData.h"
 
 using namespace mirabel;
 
