@@ -24,6 +24,9 @@ endif()
 function(mirabel_layer name)
   cmake_parse_arguments(ARG "" "" "SOURCES;LINKS;SYSTEM" ${ARGN})
   add_library(mirabel_${name} STATIC ${ARG_SOURCES})
+  # The shared library is made of the layers, and shows nothing of them but what says so.
+  set_target_properties(mirabel_${name} PROPERTIES POSITION_INDEPENDENT_CODE ON
+                        CXX_VISIBILITY_PRESET hidden VISIBILITY_INLINES_HIDDEN ON)
   target_link_libraries(mirabel_${name} PUBLIC mirabel_settings Threads::Threads)
   foreach(link IN LISTS ARG_LINKS)
     target_link_libraries(mirabel_${name} PUBLIC mirabel_${link})

@@ -1,9 +1,6 @@
 """What clients' authors read is what the service answers to."""
 
 import re
-import subprocess
-import sys
-import tempfile
 import unittest
 
 import bus
@@ -28,31 +25,6 @@ class Interface(unittest.TestCase):
                 taken = ", ".join(f"{type} {argument}" for argument, type, direction in arguments
                                   if direction == "in" or kind == "signal")
                 self.assertIn(f"*{name}*" + ("" if kind == "property" else f"({taken})"), page)
-
-    def test_the_program_in_the_documentation_keeps_up_with_a_container(self):
-        try:
-            import gi  # noqa: F401
-        except ImportError:
-            self.skipTest("python3-gi is not installed")
-        text = (bus.SOURCE / "docs/service.md").read_text()
-        program = re.search(r"```python\n(.*?)```", text, re.DOTALL)[1]
-        with bus.PrivateBus() as private, tempfile.NamedTemporaryFile("w", suffix=".py") as file:
-            file.write(program)
-            file.flush()
-            private.serve()
-            client = subprocess.Popen([sys.executable, "-B", file.name], env=private.environment,
-                                      stdout=subprocess.PIPE, text=True)
-            try:
-                self.assertEqual(client.stdout.readline(), "listed: 1 items\n")
-                letter = private.home / "Documents/letter.txt"
-                letter.write_text("Dear")
-                self.assertTrue(any(line == "there: letter.txt\n" for line in client.stdout))
-                letter.unlink()
-                self.assertTrue(any(line == "gone: letter.txt\n" for line in client.stdout))
-            finally:
-                client.terminate()
-                client.wait()
-                client.stdout.close()
 
 
 if __name__ == "__main__":

@@ -41,9 +41,7 @@ class PrivateBus:
         return self
 
     def __exit__(self, *_):
-        if self._service:
-            self._service.terminate()
-            self._service.wait()
+        self.end_service()
         self._daemon.terminate()
         self._daemon.wait()
         self._daemon.stdout.close()
@@ -54,6 +52,12 @@ class PrivateBus:
         self._service = subprocess.Popen([PROGRAM, "--home", str(self.home), "serve"],
                                          env=self.environment, stderr=subprocess.DEVNULL)
         self.run("gdbus", "wait", "--session", "--timeout", "60", NAME)
+
+    def end_service(self):
+        if self._service:
+            self._service.terminate()
+            self._service.wait()
+            self._service = None
 
     def run(self, *command):
         """The output of a command that succeeds."""
