@@ -8,6 +8,7 @@
 #include "cli/ItemJSON.h"
 #include "foundation/Unicode.h"
 #include "host/bus/BusItems.h"
+#include "host/bus/BusStatus.h"
 
 using namespace mirabel;
 
