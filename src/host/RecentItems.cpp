@@ -38,7 +38,7 @@ Result<ItemRecord> RecentItems::item(std::string_view identifier) {
     const bool isPackage = before->file.kind == FileKind::folder && !record.childItemCount;
     if (after && after->isSameAs(*before) && !isPackage) stamp = before;
   }
-  keep(identifier, std::make_shared<const Known>(Known{record, std::move(stamp), commits}));
+  keep(identifier, std::make_shared<const Known>(Known{record, stamp, commits}));
   return record;
 }
 
