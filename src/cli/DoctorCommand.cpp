@@ -1,8 +1,10 @@
 #include <cerrno>
 #include <fcntl.h>
+#include <filesystem>
 #include <map>
 #include <nlohmann/json.hpp>
 #include <ostream>
+#include <system_error>
 #include <vector>
 
 #include "cli/Commands.h"
@@ -94,6 +96,13 @@ Result<FollowStatus> tryWatching(const std::string& folder) {
   return status;
 }
 
+// The kernel has limits of its own for whoever watches.
+std::string remedyForWatching(const Error& error) {
+  if (!error.isPosix(EMFILE)) return "";
+  return "raise \"fs.fanotify.max_user_groups\" and \"fs.inotify.max_user_instances\" with sysctl, "
+         "those of \"user.\" where that is a container's, or end other programs that watch";
+}
+
 // One folder is tried. How many there are is not counted for this: "mirabel status" knows.
 Finding watchingFinding(const std::string& folder) {
   const std::string subject = "watching";
@@ -101,7 +110,8 @@ Finding watchingFinding(const std::string& folder) {
   const auto tried = tryWatching(folder);
   if (!tried) {
     return {subject, Health::limited,
-            "folders can't be watched (" + explanation(tried.error()) + ")" + without, ""};
+            "folders can't be watched (" + explanation(tried.error()) + ")" + without,
+            remedyForWatching(tried.error())};
   }
   std::string limit;
   if (tried->limits.allowed) {
@@ -125,7 +135,28 @@ Finding stateFinding(const Result<void>& opened, const HomeLayout& layout) {
   if (opened) return {subject, Health::good, layout.stateFolder, ""};
   const std::string text = explanation(opened.error());
   if (opened.error().isPosix(EBUSY)) return {subject, Health::limited, text, ""};
+  if (opened.error().isPosix(EROFS)) {
+    return {subject, Health::bad, text,
+            "nothing can be presented until the home can be written to, or XDG_STATE_HOME names a "
+            "folder that can"};
+  }
   return {subject, Health::bad, text, "identities can't be kept until this is mended"};
+}
+
+// The log of the volume's database may grow to 16 MiB before it is moved into it.
+Finding roomFinding(const HomeLayout& layout) {
+  constexpr std::uintmax_t enough = 64 << 20;
+  constexpr std::uintmax_t least = 1 << 20;
+  const std::string subject = "room";
+  std::error_code failure;
+  const auto space = std::filesystem::space(layout.stateFolder, failure);
+  if (failure) return {subject, Health::limited, "can't be told: " + failure.message(), ""};
+  const std::string text = humanSize(space.available) + " where the state is kept";
+  if (space.available >= enough) return {subject, Health::good, text, ""};
+  return {
+      subject, space.available < least ? Health::bad : Health::limited,
+      text + ": what is known is answered; what is new may not be remembered, and then is refused",
+      "make room there"};
 }
 
 std::string plural(std::size_t count, const std::string& one, const std::string& several) {
@@ -208,7 +239,9 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
   findings.push_back(serviceFinding(layout));
   const auto status = statusOf(program);
   findings.push_back(stateFinding(status ? Result<void>() : fail(status.error()), layout));
-  if (status) addApplicationFindings(*status, findings);
+  if (!status) return findings;
+  findings.push_back(roomFinding(layout));
+  addApplicationFindings(*status, findings);
   return findings;
 }
 

@@ -101,9 +101,9 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
     subjects.insert(finding.at("subject"));
     EXPECT_THAT(finding.at("health").get<std::string>(), MatchesRegex("ok|limited|missing"));
   }
-  EXPECT_EQ(subjects, (std::set<std::string>{"home", "documents", "extended attributes",
-                                             "birth times", "file handles", "volume UUID",
-                                             "watching", "service", "state", "app libraries"}));
+  EXPECT_EQ(subjects, (std::set<std::string>{
+                          "home", "documents", "extended attributes", "birth times", "file handles",
+                          "volume UUID", "watching", "service", "state", "room", "app libraries"}));
   home.remove("");
   const Answer missing = run({"doctor"});
   EXPECT_EQ(missing.code, 1);
