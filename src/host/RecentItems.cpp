@@ -8,8 +8,9 @@
 namespace mirabel {
 namespace {
 
-// A megabyte or so. What is asked for again is asked for soon.
+// A few megabytes at most. What is asked for again is asked for soon.
 constexpr std::size_t mostItems = 2048;
+constexpr std::size_t mostTagData = 1024;
 
 }  // namespace
 
@@ -31,9 +32,10 @@ Result<ItemRecord> RecentItems::item(std::string_view identifier) {
   const auto found = lookup_.byIdentifier(identifier);
   if (!found) return fail(found.error());
   ItemRecord record = recordOf(**found);
-  if (record.itemIdentifier != identifier || !hangsOnItsFileOnly(record)) return record;
+  if (record.itemIdentifier != identifier || !isToBeKept(record)) return record;
   std::optional<FileStamp> stamp;
-  if (before && before->isSettled() && former->record.path == record.path) {
+  // Two look-ups agree: what one could not read for a passing reason is not remembered as absent.
+  if (before && before->isSettled() && former->record == record && record.fileID) {
     const auto after = stampOf(record.path);
     const bool isPackage = before->file.kind == FileKind::folder && !record.childItemCount;
     if (after && after->isSameAs(*before) && !isPackage) stamp = before;
@@ -48,10 +50,11 @@ std::shared_ptr<const RecentItems::Known> RecentItems::known(std::string_view id
   return found == items_.end() ? nullptr : found->second;
 }
 
-// Where a trashed item came from, and which application owns it, others decide.
-bool RecentItems::hangsOnItsFileOnly(const ItemRecord& record) const {
+// Where a trashed item came from, and which application owns it, is not the file's to say.
+bool RecentItems::isToBeKept(const ItemRecord& record) const {
   return !record.isTrashed && !record.beaconDomainIdentifier &&
-         !record.appContainerBundleIdentifier && record.path.starts_with(storage_ + "/");
+         !record.appContainerBundleIdentifier && record.path.starts_with(storage_ + "/") &&
+         (!record.tagData || record.tagData->size() <= mostTagData);
 }
 
 void RecentItems::keep(std::string_view identifier, std::shared_ptr<const Known> item) {

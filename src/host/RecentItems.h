@@ -41,7 +41,7 @@ class RecentItems {
     std::uint64_t commits = 0;         ///< of the index, when it was looked up
   };
   [[nodiscard]] std::shared_ptr<const Known> known(std::string_view identifier);
-  [[nodiscard]] bool hangsOnItsFileOnly(const ItemRecord& record) const;
+  [[nodiscard]] bool isToBeKept(const ItemRecord& record) const;
   void keep(std::string_view identifier, std::shared_ptr<const Known> item);
 
   const ItemLookup& lookup_;

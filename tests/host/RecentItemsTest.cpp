@@ -3,6 +3,7 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <future>
 #include <gmock/gmock.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
@@ -102,7 +103,12 @@ TEST_F(RecentItemsTest, NoChangeIsMissed) {
        }},
       {"exchanged for another", [&] { exchange(letter, folder + "/inner/second.txt"); }},
       {"trashed",
-       [&] { documents->trash(identifier, [](const auto& item) { ASSERT_TRUE(item); }); }},
+       [&] {
+         std::promise<bool> isTrashed;
+         documents->trash(identifier,
+                          [&](const auto& item) { isTrashed.set_value(item.has_value()); });
+         ASSERT_TRUE(isTrashed.get_future().get());
+       }},
   };
   for (const auto& change : changes) {
     SCOPED_TRACE(change.what);

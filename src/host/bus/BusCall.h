@@ -59,7 +59,7 @@ class BusCall {
 };
 
 /// Which calls wait for which. Those of a caller in one lane are answered one after the other, in
-/// their order; of operations a few run at a time.
+/// their order, but for what is answered at once; of operations a few run at a time.
 enum class Lane {
   lookups,       ///< short
   enumerations,  ///< listings, changes, watches, searches

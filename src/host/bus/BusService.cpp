@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <chrono>
 #include <exception>
+#include <mutex>
 #include <sdbus-c++/sdbus-c++.h>
 #include <stop_token>
 #include <string_view>
@@ -73,6 +74,8 @@ class BusService::Impl {
 
   void stop() {
     if (hasStopped_.exchange(true)) return;
+    // Waits for what is being answered, which needs the documents.
+    { const std::lock_guard lock(answeringAtOnce_); }
     stopping_.request_stop();
     try {
       connection_->releaseName(serviceName);
@@ -112,6 +115,7 @@ class BusService::Impl {
   }
 
   void add(BusMethod method) {
+    // Descriptors within a variant, or that no argument names, can't be told before it is read.
     const auto holds = std::string_view(method.inputSignature).find('h') == std::string_view::npos
                            ? CallLane::Holds::memory
                            : CallLane::Holds::file;
@@ -120,7 +124,7 @@ class BusService::Impl {
       memory_.used();
       const std::string name = message.getSender();
       const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
-      if (atOnce && atOnce(*call)) return;
+      if (atOnce && answersAtOnce(atOnce, *call)) return;
       const auto run = [call, answer](std::shared_ptr<void> turn) {
         call->keepTurn(std::move(turn));
         answer(call);
@@ -132,6 +136,11 @@ class BusService::Impl {
     };
     object_->registerMethod(method.interface, method.name, method.inputSignature, method.inputNames,
                             method.outputSignature, method.outputNames, guarded(answer));
+  }
+
+  bool answersAtOnce(const std::function<bool(BusCall&)>& atOnce, BusCall& call) {
+    const std::lock_guard lock(answeringAtOnce_);
+    return !hasStopped_ && atOnce(call);
   }
 
   CallLane& laneOf(Lane lane) {
@@ -182,6 +191,7 @@ class BusService::Impl {
   CallLane enumerations_{{enumerationThreads, 1, mostWaiting, mostFilesWaiting}};
   CallLane operations_{{operationThreads, operationsOfACaller, mostWaiting, mostFilesWaiting}};
   std::atomic<bool> hasStopped_ = false;
+  std::mutex answeringAtOnce_;
   std::unique_ptr<BusLoop> loop_;
 };
 

@@ -10,7 +10,8 @@
 namespace mirabel::bus {
 
 /// The service on the session bus: answers the calls of other programs with the documents of this
-/// process. Calls are read on one thread and answered on others, so that none holds up another.
+/// process. Calls are read on one thread. What needs no waiting is answered there, the rest on
+/// other threads, so that none holds up another.
 class BusService {
  public:
   /// Takes the service's name. `documents` outlives the service's calls: until `stop` has returned.

@@ -15,6 +15,9 @@ namespace mirabel {
 struct FileStamp {
   ObjectStatus folder;
   ObjectStatus file;
+  // On which mount each is: one that was put over a place since is not entered.
+  std::uint64_t folderMount = 0;
+  std::uint64_t fileMount = 0;
   bool isWritable = false;  ///< a mount may become read-only without a trace on the file
 
   [[nodiscard]] bool isSameAs(const FileStamp& other) const;
@@ -22,9 +25,10 @@ struct FileStamp {
   [[nodiscard]] bool isSettled() const;
 };
 
-/// The stamp of what lies at an absolute path, without waiting for a disk or a network. Nothing for
-/// what is no regular file and no folder; where the way there is not in the kernel's memory or
-/// leads over a symbolic link; and where the file system keeps no birth times.
+/// The stamp of what lies at an absolute path, without waiting for a disk; only a file system over
+/// a network may ask its server. Nothing for what is no regular file and no folder; where the way
+/// there is not in the kernel's memory or leads over a symbolic link; and where the file system
+/// keeps no birth times, or the kernel does not tell mounts apart.
 [[nodiscard]] std::optional<FileStamp> stampOf(const std::string& path);
 
 }  // namespace mirabel
