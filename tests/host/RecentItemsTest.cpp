@@ -6,6 +6,7 @@
 #include <future>
 #include <gmock/gmock.h>
 #include <sys/mman.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <thread>
@@ -125,6 +126,21 @@ TEST_F(RecentItemsTest, NoChangeIsMissed) {
       EXPECT_TRUE(*asked == *now);
     }
   }
+}
+
+// What lies on another mount is not entered, though it be the same folder.
+TEST_F(RecentItemsTest, AMountOverAFolderFurtherUpHidesTheItem) {
+  ASSERT_TRUE(becomesKnown());
+  const std::string folder = home.at("folder");
+  if (::mount(folder.c_str(), folder.c_str(), nullptr, MS_BIND, nullptr) != 0) {
+    GTEST_SKIP() << "only who may mount sees this";
+  }
+  const bool isTold = documents->itemAtOnce(identifier) != nullptr;
+  const bool isFound = documents->item(identifier).has_value();
+  ASSERT_EQ(::umount2(folder.c_str(), MNT_DETACH), 0);
+  EXPECT_FALSE(isTold);
+  EXPECT_FALSE(isFound);
+  EXPECT_TRUE(becomesKnown());
 }
 
 TEST_F(RecentItemsTest, AttributesAreSeen) {
