@@ -41,6 +41,10 @@ function(mirabel_tests name)
   target_include_directories(${name} PRIVATE ${CMAKE_SOURCE_DIR}/tests)
   target_link_libraries(${name} PRIVATE mirabel_settings ${ARG_LINKS} GTest::gmock GTest::gtest
                                         GTest::gtest_main)
+  if(MIRABEL_SANITIZE)
+    # Half the time to build them; it is in what they test that time is spent when they run.
+    target_compile_options(${name} PRIVATE -O0)
+  endif()
   gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
                        PROPERTIES TIMEOUT 300 LABELS "${ARG_LABELS}")
 endfunction()
