@@ -34,6 +34,13 @@ function(mirabel_layer name)
   target_link_libraries(mirabel_${name} PRIVATE ${ARG_SYSTEM})
 endfunction()
 
+# What the tests run with: under a sanitizer, what is known of other libraries.
+set(mirabel_test_environment "")
+if(MIRABEL_SANITIZE)
+  set(mirabel_test_environment
+      "LSAN_OPTIONS=suppressions=${CMAKE_SOURCE_DIR}/tests/leaks.supp:print_suppressions=0")
+endif()
+
 # One folder of tests/ as one test program, whose cases ctest sees one by one.
 function(mirabel_tests name)
   cmake_parse_arguments(ARG "" "" "SOURCES;LINKS;LABELS" ${ARGN})
@@ -46,5 +53,6 @@ function(mirabel_tests name)
     target_compile_options(${name} PRIVATE -O0)
   endif()
   gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
-                       PROPERTIES TIMEOUT 300 LABELS "${ARG_LABELS}")
+                       PROPERTIES TIMEOUT 300 LABELS "${ARG_LABELS}"
+                                  ENVIRONMENT "${mirabel_test_environment}")
 endfunction()
