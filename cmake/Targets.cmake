@@ -37,7 +37,7 @@ endfunction()
 # What the tests run with: under a sanitizer, what is known of other libraries.
 set(mirabel_test_environment "")
 if(MIRABEL_SANITIZE)
-  set(mirabel_test_environment
+  set(mirabel_test_environment ENVIRONMENT
       "LSAN_OPTIONS=suppressions=${CMAKE_SOURCE_DIR}/tests/leaks.supp:print_suppressions=0")
 endif()
 
@@ -53,6 +53,6 @@ function(mirabel_tests name)
     target_compile_options(${name} PRIVATE -O0)
   endif()
   gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
-                       PROPERTIES TIMEOUT 300 LABELS "${ARG_LABELS}"
-                                  ENVIRONMENT "${mirabel_test_environment}")
+                       PROPERTIES TIMEOUT 300 ${mirabel_test_environment}
+                                  LABELS "${ARG_LABELS}")
 endfunction()
