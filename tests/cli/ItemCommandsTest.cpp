@@ -165,7 +165,8 @@ TEST_F(ItemCommands, ADryRunSaysWhatWouldGoAndLeavesIt) {
   EXPECT_TRUE(exists("folder/doc.txt"));
 }
 
-// As root, on a file system of three megabytes.
+// As root, on a file system of three megabytes. The program itself is larger than it, whatever room
+// the state gives up.
 TEST_F(ItemCommands, OnAFullDiskThingsAreTrashedPutBackAndDeleted) {
   const Answer answer = shell(R"sh(
     mkdir "$home/small" && mount -t tmpfs -o size=3M tmpfs "$home/small" || exit 77
@@ -174,7 +175,7 @@ TEST_F(ItemCommands, OnAFullDiskThingsAreTrashedPutBackAndDeleted) {
     say() { "$mirabel" --home "$home/small" "$@"; }
     say ls > /dev/null
     dd if=/dev/zero of="$home/small/filler" bs=64k 2>/dev/null
-    say import /bin/sh --in "$home/small/Documents/folder" && exit 1
+    say import "$mirabel" --in "$home/small/Documents/folder" && exit 1
     say trash "$home/small/Documents/folder/sub/new" || exit 2
     say restore "$home/small/Documents/.Trash/new" || exit 3
     say rm "$home/small/Documents/folder" || exit 4
