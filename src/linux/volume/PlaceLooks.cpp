@@ -138,7 +138,10 @@ Result<void> PlaceLooks::endUnlinked(const Folder& folder, const std::string& na
   if (status == nullptr) return {};  // a missing name like any other
   auto occupant = context_.store.objectAt(folder.row.fileID, name);
   if (!occupant) return fail(occupant.error());
-  if (!*occupant || (*occupant)->inode == status->inode) return {};
+  if (!*occupant) return {};
+  // Its number alone proves nothing: a file system may give it to the next file at once.
+  const SeenObject seen{folder.descriptor.get(), name, *status};
+  if ((*occupant)->inode == status->inode && compare(**occupant, seen) == Match::same) return {};
   const bool wasIt = std::ranges::any_of(look.unlinked, [&](const std::string& handle) {
     return handle == "?" || (!handle.empty() && handle == (*occupant)->handle);
   });
