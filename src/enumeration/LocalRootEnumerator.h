@@ -13,7 +13,7 @@
 #include "enumeration/LocalFileEnumerator.h"
 #include "foundation/SerialQueue.h"
 #include "fs/FSChangeToken.h"
-#include "fs/FSChangesEnumerator.h"
+#include "fs/RunningReaders.h"
 #include "platform/EnumerationObservers.h"
 
 namespace mirabel {

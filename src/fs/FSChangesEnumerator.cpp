@@ -14,9 +14,8 @@ namespace {
 
 constexpr std::string_view folderType = "inode/directory";
 
-std::vector<URL> rootsOf(const ItemContext& context, const AppLibraryRoots& roots) {
-  std::vector<URL> urls = *roots.rootURLsForAppLibraries();
-  urls.push_back(context.platform.manager.documentStorageURL());
+std::vector<URL> atLeastOne(std::vector<URL> urls) {
+  if (urls.empty()) fatalError("require at least one URL to init a change enumerator");
   return urls;
 }
 
@@ -25,46 +24,6 @@ std::uint64_t aheadOf(const FSChangeToken& token) {
 }
 
 }  // namespace
-
-std::shared_ptr<ChangesEnumeration> FSChangesEnumerations::make(
-    const FSChangeToken& token, const std::string& container, const std::vector<URL>& urls,
-    std::shared_ptr<VesselChangeObserver> observer) {
-  auto enumerator = std::make_shared<FSChangesEnumerator>(
-      context_, events_, roots_, token, container, urls, std::move(observer), running_);
-  const std::lock_guard lock(mutex_);
-  std::erase_if(made_, [](const auto& earlier) { return earlier.expired(); });
-  made_.push_back(enumerator);
-  return enumerator;
-}
-
-FSChangesEnumerations::~FSChangesEnumerations() {
-  for (const auto& made : made_) {
-    const auto enumerator = made.lock();
-    if (enumerator) enumerator->stop();
-  }
-  running_->stop();
-}
-
-void RunningReaders::add(const std::shared_ptr<FSEventReader>& reader) {
-  const std::lock_guard lock(mutex_);
-  std::erase_if(readers_, [](const Running& earlier) { return earlier.reader.expired(); });
-  readers_.push_back({reader, reader->streamQueue()});
-}
-
-void RunningReaders::stop() {
-  std::vector<Running> readers;
-  {
-    const std::lock_guard lock(mutex_);
-    readers.swap(readers_);
-  }
-  for (Running& running : readers) {
-    const auto reader = running.reader.lock();
-    if (!reader) continue;
-    running.queue.sync([&] {
-      if (reader->isRunning()) reader->stop();
-    });
-  }
-}
 
 FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStreams& events,
                                          const AppLibraryRoots& roots, const FSChangeToken& token,
@@ -75,23 +34,14 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
       events_(events),
       currentToken_(token),
       container_(std::move(container)),
-      urls_(std::move(urls)),
+      urls_(atLeastOne(std::move(urls))),
       observer_(std::move(observer)),
       sinceFSEventID_(token.streamEventID),
       startupFSEventID_(events.currentEventID()),
-      containerSight_(urls_, context.platform.resources),
-      everywhereSight_(rootsOf(context, roots), context.platform.resources),
-      look_(context_, everywhereSight_),
-      containerNames_(
-          context_, isFolderContainer() ? std::vector{urls_.front()} : urls_,
-          isFolderContainer() ? LinkNames::Depth::children : LinkNames::Depth::everything,
-          containerSight_),
-      everywhereNames_(context_, rootsOf(context, roots), LinkNames::Depth::everything,
-                       everywhereSight_),
+      shown_(context_, roots, urls_,
+             isFolderContainer() ? LinkNames::Depth::children : LinkNames::Depth::everything),
       running_(std::move(running)),
-      passedEventID_(token.streamEventID) {
-  if (urls_.empty()) fatalError("require at least one URL to init a change enumerator");
-}
+      passedEventID_(token.streamEventID) {}
 
 // The two passes --------------------------------------------------------------------------------
 
@@ -229,7 +179,7 @@ void FSChangesEnumerator::didUpdateItem(FSEventReader& reader,
                                         const std::shared_ptr<LocalItem>& item, const URL& url) {
   const FileSystemEvent& event = *reader.currentEvent();
   if (!accepts(event)) return;
-  const auto shown = itemShown(item);
+  const auto shown = shown_.asShown(item);
   if (!shown) return finishWithError(shown.error());
   if (!*shown) return settle(event);
   forwardUpdate(*shown, url);
@@ -289,7 +239,7 @@ void FSChangesEnumerator::settle(const FileSystemEvent& event) {
 void FSChangesEnumerator::settleIdentifier(const std::string& identifier, bool reportDeletion,
                                            const std::optional<URL>& eventURL) {
   if (isFinished_) return;
-  auto item = itemInSight(identifier);
+  auto item = shown_.ofIdentifier(identifier);
   if (!item) return finishWithError(item.error());
   if (*item) forwardUpdate(*item, eventURL.value_or((*item)->url()));
   const bool isItself = *item && (*item)->itemIdentifier() == identifier;
@@ -304,44 +254,15 @@ void FSChangesEnumerator::settlePackageAround(const URL& url) {
   }
   // The outermost one is shown; what is in it is not.
   for (auto folder = above.rbegin(); folder != above.rend(); ++folder) {
-    if (!isInSight(*folder)) continue;
+    if (!shown_.isInSight(*folder)) continue;
     const URL fresh = URL::fileURL(folder->path());
     const auto values = context_.platform.resources.readValues(fresh);
     if (!values || !values->isPackage) continue;
-    auto item = look_.at(fresh);
+    auto item = shown_.at(fresh);
     if (!item) return finishWithError(item.error());
     if (*item) forwardUpdate(*item, fresh);
     return;
   }
-}
-
-Result<std::shared_ptr<LocalItem>> FSChangesEnumerator::itemInSight(const std::string& identifier) {
-  const auto url = context_.identity.fileURLWithItemIdentifier(identifier);
-  if (!url) return nullptr;
-  const auto place = shownPlace(*url);
-  if (!place) return fail(place.error());
-  if (!*place) return nullptr;
-  return look_.at(**place);
-}
-
-Result<std::shared_ptr<LocalItem>> FSChangesEnumerator::itemShown(
-    const std::shared_ptr<LocalItem>& item) {
-  const auto place = shownPlace(item->url());
-  if (!place) return fail(place.error());
-  if (!*place) return nullptr;
-  return **place == item->url() ? item : look_.at(**place);
-}
-
-Result<std::optional<URL>> FSChangesEnumerator::shownPlace(const URL& url) {
-  if (!containerNames_.hasSeveral(url)) return isInSight(url) ? std::optional(url) : std::nullopt;
-  auto place = containerNames_.shownName(url);
-  if (!place || *place) return place;
-  return everywhereNames_.shownName(url);
-}
-
-bool FSChangesEnumerator::isInSight(const URL& url) const {
-  return (containerSight_.isMonitored(url) && !containerSight_.isHidden(url)) ||
-         (everywhereSight_.isMonitored(url) && !everywhereSight_.isHidden(url));
 }
 
 // Telling ---------------------------------------------------------------------------------------
@@ -367,8 +288,7 @@ std::optional<std::string> FSChangesEnumerator::reasonToIgnore(const LocalItem& 
   if (!isFolderContainer()) return {};
   // Who left the folder is told with its new parent; what lies deeper is another folder's.
   const URL parent = eventURL.properURL().deletingLastPathComponent();
-  const bool wasHere =
-      parent == urls_.front().properURL() || !containerSight_.isMonitored(eventURL);
+  const bool wasHere = parent == urls_.front().properURL() || !shown_.isOfContainer(eventURL);
   if (item.parentItemIdentifier() == container_ || wasHere) return {};
   return "; item is not a directory of " + container_;
 }

@@ -12,9 +12,8 @@
 #include "fs/ChangesEnumeration.h"
 #include "fs/FSChangeToken.h"
 #include "fs/FSEventReader.h"
-#include "fs/HiddenTest.h"
-#include "fs/ItemLook.h"
-#include "fs/LinkNames.h"
+#include "fs/RunningReaders.h"
+#include "fs/ShownItems.h"
 #include "identity/AppLibraryRoots.h"
 
 namespace mirabel {
@@ -24,26 +23,6 @@ struct FSReaderState {
   std::uint64_t eventID = 0;
   std::uint64_t offset = 0;
   std::uint64_t numberOfChanges = 0;
-};
-
-/// The readers of a provider's enumerations, so that whoever takes down what they use can wait for
-/// them: a reader goes through the rest of its batch even when its enumeration has finished, and
-/// an observer that is being told of the finish may be the last to hold one. Any thread may call
-/// it.
-class RunningReaders {
- public:
-  void add(const std::shared_ptr<FSEventReader>& reader);
-  /// Stops those that run; returns when no batch is under way. Not to be called from a reader's
-  /// queue.
-  void stop();
-
- private:
-  struct Running {
-    std::weak_ptr<FSEventReader> reader;
-    SerialQueue queue;
-  };
-  std::mutex mutex_;
-  std::vector<Running> readers_;
 };
 
 /// Tells the changes of one container since an anchor, at most 100 a batch, in two passes over the
@@ -102,15 +81,6 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   void settlePackageAround(const URL& url);
   void forwardUpdate(const std::shared_ptr<LocalItem>& item, const URL& eventURL);
   void forwardDeletion(const std::string& identifier);
-  /// The item if a listing of this container, or of any other, shows it now.
-  [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemInSight(const std::string& identifier);
-  /// The item under the name that it is shown under; null when none is.
-  [[nodiscard]] Result<std::shared_ptr<LocalItem>> itemShown(
-      const std::shared_ptr<LocalItem>& item);
-  [[nodiscard]] bool isInSight(const URL& url) const;
-  /// Where the object at `url` is shown: under its name in this container, or else under the one
-  /// that it has anywhere in sight. Nothing when it is shown nowhere.
-  [[nodiscard]] Result<std::optional<URL>> shownPlace(const URL& url);
   [[nodiscard]] std::optional<std::string> reasonToIgnore(const LocalItem& item,
                                                           const URL& eventURL) const;
   [[nodiscard]] bool isFolderContainer() const;
@@ -129,11 +99,7 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   std::uint64_t startupFSEventID_;
   std::optional<FSReaderState> pathBasedReaderState_;
 
-  HiddenTest containerSight_;
-  HiddenTest everywhereSight_;
-  ItemLook look_;
-  LinkNames containerNames_;
-  LinkNames everywhereNames_;
+  ShownItems shown_;
   std::shared_ptr<RunningReaders> running_;
   std::uint64_t passedEventID_;  ///< the last event that the pass under way is done with
   std::atomic<bool> isFinished_ = false;
@@ -141,29 +107,6 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   // that is updated; null for those that are deleted.
   std::vector<std::string> order_;
   std::map<std::string, std::shared_ptr<LocalItem>> changes_;
-};
-
-/// Makes them for one provider.
-class FSChangesEnumerations final : public ChangesEnumerations {
- public:
-  /// References outlive it and everything that it makes.
-  FSChangesEnumerations(const ItemContext& context, EventStreams& events,
-                        const AppLibraryRoots& roots)
-      : context_(context), events_(events), roots_(roots) {}
-  /// Stops what still runs, and waits for it: what it uses may go afterwards.
-  ~FSChangesEnumerations() override;
-
-  [[nodiscard]] std::shared_ptr<ChangesEnumeration> make(
-      const FSChangeToken& token, const std::string& container, const std::vector<URL>& urls,
-      std::shared_ptr<VesselChangeObserver> observer) override;
-
- private:
-  ItemContext context_;
-  EventStreams& events_;
-  const AppLibraryRoots& roots_;
-  std::shared_ptr<RunningReaders> running_ = std::make_shared<RunningReaders>();
-  std::mutex mutex_;
-  std::vector<std::weak_ptr<FSChangesEnumerator>> made_;  // with mutex_
 };
 
 }  // namespace mirabel

@@ -3,7 +3,7 @@
 #include <memory>
 
 #include "applibrary/MRBAppLibraryManager.h"
-#include "fs/FSChangesEnumerator.h"
+#include "fs/FSChangesEnumerations.h"
 #include "host/HostTrash.h"
 #include "host/SearchableItems.h"
 #include "linux/files/LinuxPlatform.h"

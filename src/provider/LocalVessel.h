@@ -12,7 +12,7 @@
 #include "foundation/DispatchGroup.h"
 #include "foundation/SerialQueue.h"
 #include "foundation/VSPacer.h"
-#include "fs/FSChangesEnumerator.h"
+#include "fs/RunningReaders.h"
 #include "identity/FileObjectURLs.h"
 #include "items/LocalItem.h"
 #include "platform/EnumerationObservers.h"

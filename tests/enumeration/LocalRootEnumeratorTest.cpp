@@ -3,7 +3,7 @@
 
 #include "enumeration/EnumerationFixture.h"
 #include "enumeration/LocalRootEnumerator.h"
-#include "fs/FSChangesEnumerator.h"
+#include "fs/RunningReaders.h"
 
 namespace mirabel::testing {
 namespace {

@@ -7,7 +7,7 @@
 #include <string_view>
 
 #include "applibrary/MRBAppLibraryManager.h"
-#include "fs/FSChangesEnumerator.h"
+#include "fs/FSChangesEnumerations.h"
 #include "provider/LocalVessel.h"
 #include "support/FakeEventStreams.h"
 #include "support/FakeIconService.h"
