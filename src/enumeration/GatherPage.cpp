@@ -10,7 +10,6 @@ namespace mirabel {
 namespace {
 
 constexpr std::string_view trashName = ".Trash";
-constexpr std::string_view folderType = "inode/directory";
 // Handing work to another thread costs as much as a few items.
 constexpr std::size_t pieceSize = 32;
 
@@ -114,7 +113,7 @@ Result<bool> GatherPage::isPassedOver(const URL& url) {
   if (!scope_.isAllDirectories()) return names_.isShownElsewhere(url);
   const auto type =
       ResourceReader(context_.platform.resources).value(ResourceKey::typeIdentifier, url);
-  return type && *type != ResourceValue(std::string(folderType));
+  return type && *type != ResourceValue(std::string(folderTypeIdentifier));
 }
 
 /// Whether the folder that was opened there lies elsewhere by now: its entries have not gone.

@@ -18,6 +18,13 @@ PropertyList PropertyList::ofBytes(std::string_view bytes) {
   return PropertyList(dataFromString(bytes));
 }
 
+std::optional<std::uint64_t> PropertyList::unsignedFor(std::string_view key) const {
+  const PropertyList* entry = find(key);
+  const Number* number = entry == nullptr ? nullptr : entry->as<Number>();
+  if (number == nullptr || std::holds_alternative<double>(number->value)) return {};
+  return number->asUnsigned();
+}
+
 std::optional<std::string> PropertyList::bytes() const {
   if (const auto* text = as<std::string>()) return *text;
   if (const auto* data = as<Data>()) return std::string(stringView(*data));

@@ -40,6 +40,9 @@ class PropertyList {
   }
   /// The dictionary's entry; null when this is no dictionary or has no such key.
   [[nodiscard]] const PropertyList* find(std::string_view key) const;
+  /// That entry where it is an integer of 64 bits without a sign; one that was written as a
+  /// floating value is none, though it be whole.
+  [[nodiscard]] std::optional<std::uint64_t> unsignedFor(std::string_view key) const;
 
   /// A byte string that is mostly text, such as a path: text where it is UTF-8, else data.
   [[nodiscard]] static PropertyList ofBytes(std::string_view bytes);

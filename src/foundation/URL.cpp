@@ -2,6 +2,8 @@
 
 #include <utility>
 
+#include "foundation/AsciiCase.h"
+
 namespace mirabel {
 namespace {
 
@@ -63,7 +65,7 @@ bool consumePrefix(std::string_view& text, std::string_view prefix) {
   if (text.size() < prefix.size()) return false;
   for (std::size_t i = 0; i < prefix.size(); ++i) {
     const char c = text[i];
-    const char lower = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+    const char lower = asciiLower(c);
     if (lower != prefix[i]) return false;
   }
   text.remove_prefix(prefix.size());

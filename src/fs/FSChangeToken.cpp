@@ -16,14 +16,8 @@ Error unusable(std::string_view key) {
   return Error::propertyList("no usable value for the key \"" + std::string(key) + "\"");
 }
 
-/// An integer only: a floating value, though it be whole, was not written by this system.
 Result<std::uint64_t> integerFor(std::string_view key, const PropertyList& list) {
-  const PropertyList* entry = list.find(key);
-  const Number* number = entry == nullptr ? nullptr : entry->as<Number>();
-  if (number == nullptr || std::holds_alternative<double>(number->value)) {
-    return fail(unusable(key));
-  }
-  const auto value = number->asUnsigned();
+  const auto value = list.unsignedFor(key);
   if (!value) return fail(unusable(key));
   return *value;
 }

@@ -12,8 +12,6 @@
 namespace mirabel {
 namespace {
 
-constexpr std::string_view folderType = "inode/directory";
-
 std::vector<URL> atLeastOne(std::vector<URL> urls) {
   if (urls.empty()) fatalError("require at least one URL to init a change enumerator");
   return urls;
@@ -281,8 +279,7 @@ std::optional<std::string> FSChangesEnumerator::reasonToIgnore(const LocalItem& 
   if (!isFolderContainer() && identifier.starts_with('#')) {
     return "; app library are not indexed";
   }
-  if (container_ == VesselAllDirectoriesContainerItemIdentifier &&
-      item.typeIdentifier() != folderType) {
+  if (container_ == VesselAllDirectoriesContainerItemIdentifier && !item.vs_isContainer()) {
     return "; item is not a directory";
   }
   if (!isFolderContainer()) return {};

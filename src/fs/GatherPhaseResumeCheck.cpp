@@ -10,8 +10,6 @@ namespace {
 
 using Case = FSEventReaderGatherPhaseResumeStatus::Case;
 
-constexpr std::string_view folderType = "inode/directory";
-
 /// The reader's delegate for the time of the check. Written on the reader's queue and read by the
 /// caller, who may do so while the rest of a batch is still coming in.
 class FSEventChecker final : public FSEventReaderDelegate {
@@ -30,7 +28,7 @@ class FSEventChecker final : public FSEventReaderDelegate {
                      const URL& url) override {
     reader.streamQueue().assertOnQueue();
     if (item->url().properURL() == url.properURL()) return;
-    note(item->typeIdentifier() == folderType);
+    note(item->vs_isContainer());
   }
 
   void didDeleteItem(FSEventReader& reader, const std::string& identifier,

@@ -13,7 +13,7 @@ constexpr std::uint64_t currentVersion = 1;
 // Far above what is ever kept, so that bytes which share objects do not unfold without end.
 constexpr PropertyList::Limits positionLimits{.depth = 4, .objects = 64u << 10, .bytes = 1u << 20};
 
-constexpr std::string_view versionKey = "version";
+constexpr std::string_view positionVersionKey = "version";
 constexpr std::string_view planKey = "plan";
 constexpr std::string_view nextRootKey = "nextRoot";
 constexpr std::string_view foldersKey = "folders";
@@ -22,13 +22,6 @@ constexpr std::string_view nameKey = "name";
 constexpr std::string_view fileIDKey = "fileID";
 constexpr std::string_view positionKey = "position";
 
-std::optional<std::uint64_t> integerFor(std::string_view key, const PropertyList& list) {
-  const PropertyList* entry = list.find(key);
-  const Number* number = entry == nullptr ? nullptr : entry->as<Number>();
-  if (number == nullptr || std::holds_alternative<double>(number->value)) return {};
-  return number->asUnsigned();
-}
-
 std::optional<std::string> bytesFor(std::string_view key, const PropertyList& list) {
   const PropertyList* entry = list.find(key);
   return entry == nullptr ? std::nullopt : entry->bytes();
@@ -36,8 +29,8 @@ std::optional<std::string> bytesFor(std::string_view key, const PropertyList& li
 
 std::optional<WalkPosition::Folder> folderFrom(const PropertyList& list) {
   auto name = bytesFor(nameKey, list);
-  const auto fileID = integerFor(fileIDKey, list);
-  const auto position = integerFor(positionKey, list);
+  const auto fileID = list.unsignedFor(fileIDKey);
+  const auto position = list.unsignedFor(positionKey);
   if (!name || !fileID || !position) return {};
   return WalkPosition::Folder{*std::move(name), *fileID, *position};
 }
@@ -54,7 +47,7 @@ PropertyList listOf(const WalkPosition::Folder& folder) {
 
 Data WalkPosition::encode() const {
   PropertyList::Dictionary dictionary;
-  dictionary.emplace_back(versionKey, Number::of(currentVersion));
+  dictionary.emplace_back(positionVersionKey, Number::of(currentVersion));
   dictionary.emplace_back(planKey, Number::of(plan));
   dictionary.emplace_back(nextRootKey, Number::of(nextRoot));
   PropertyList::Array list;
@@ -69,9 +62,9 @@ Data WalkPosition::encode() const {
 
 std::optional<WalkPosition> WalkPosition::decode(std::span<const std::uint8_t> bytes) {
   const auto list = PropertyList::decode(bytes, positionLimits);
-  if (!list || integerFor(versionKey, *list) != currentVersion) return {};
-  const auto plan = integerFor(planKey, *list);
-  const auto nextRoot = integerFor(nextRootKey, *list);
+  if (!list || list->unsignedFor(positionVersionKey) != currentVersion) return {};
+  const auto plan = list->unsignedFor(planKey);
+  const auto nextRoot = list->unsignedFor(nextRootKey);
   const PropertyList* folders = list->find(foldersKey);
   const auto* array = folders == nullptr ? nullptr : folders->as<PropertyList::Array>();
   if (!plan || !nextRoot || array == nullptr) return {};

@@ -4,6 +4,8 @@
 #include <string_view>
 #include <system_error>
 
+#include "foundation/AsciiCase.h"
+
 namespace mirabel {
 namespace {
 
@@ -26,7 +28,7 @@ std::string posixMeaning(int code) {
       break;
   }
   std::string text = std::generic_category().message(code);
-  if (text[0] >= 'A' && text[0] <= 'Z') text[0] = static_cast<char>(text[0] - 'A' + 'a');
+  text[0] = asciiLower(text[0]);
   return text;
 }
 

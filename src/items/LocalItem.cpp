@@ -13,7 +13,6 @@
 namespace mirabel {
 namespace {
 
-constexpr std::string_view folderType = "inode/directory";
 /// Documents of these two suites are folders whose size is worth the walk.
 constexpr std::string_view sizedPackageTypes[] = {"com.norvane.quillsuite",
                                                   "com.norvane.lumenbeat"};
@@ -139,7 +138,7 @@ void LocalItem::buildContent() {
 
 std::optional<Number> LocalItem::computedSize(bool isPackage) const {
   if (!isPackage) {
-    if (typeIdentifier_ == folderType) return {};
+    if (typeIdentifier_ == folderTypeIdentifier) return {};
     return ResourceReader(context_.platform.resources).number(ResourceKey::fileSize, fileURL_);
   }
   for (const std::string_view type : sizedPackageTypes) {
@@ -176,7 +175,7 @@ void LocalItem::buildStatus() {
   const auto status = context_.platform.objects.status(fileURL_);
   if (status) {
     fileID_ = status->fileID;
-    if (typeIdentifier_ == folderType) {
+    if (typeIdentifier_ == folderTypeIdentifier) {
       if (status->linkCount < 2) fatalError("the link count of a folder is below 2");
       childItemCount_ = static_cast<std::uint16_t>(status->linkCount - 2);
     }
@@ -205,7 +204,7 @@ void LocalItem::buildOwner(ItemOverrides& overrides) {
 }
 
 bool LocalItem::vs_isContainer() const {
-  return typeIdentifier_ == folderType;
+  return typeIdentifier_ == folderTypeIdentifier;
 }
 
 const std::optional<URL>& LocalItem::putBackURL() const {

@@ -15,6 +15,9 @@
 
 namespace mirabel {
 
+/// The type of a folder that is no package.
+inline constexpr std::string_view folderTypeIdentifier = "inode/directory";
+
 /// What building an item needs; references that outlive every item.
 struct ItemContext {
   const Platform& platform;

@@ -10,7 +10,7 @@ namespace {
 
 using ::testing::ElementsAre;
 
-const Error startOver = Error::syncAnchorExpired();
+const Error expired = Error::syncAnchorExpired();
 
 /// Listings whose pages are asked for in different processes.
 class ResumedListing : public EnumerationTest {
@@ -76,20 +76,20 @@ TEST_F(ResumedListing, StartsOverWhereSomethingLiesElsewhere) {
   EXPECT_FALSE(resumedAfter([] {}));
   EXPECT_FALSE(resumedAfter([&] { rename("b/c/d/0", "e/new"); }));
   // With and without an event that tells of it.
-  EXPECT_EQ(resumedAfter([&] { rename("b/c", "b/x"); }), startOver);
-  EXPECT_EQ(resumedAfter([&] { fake.volume.rename(fake.path("b"), fake.path("x")); }), startOver);
+  EXPECT_EQ(resumedAfter([&] { rename("b/c", "b/x"); }), expired);
+  EXPECT_EQ(resumedAfter([&] { fake.volume.rename(fake.path("b"), fake.path("x")); }), expired);
   EXPECT_EQ(resumedAfter([&] {
               fake.volume.rename(fake.path("b/c/d"), fake.path("d"));
               fake.volume.makeFolder(fake.path("b/c/d"));
             }),
-            startOver);
-  EXPECT_EQ(resumedAfter([&] { rename("e", "b/e"); }), startOver);
+            expired);
+  EXPECT_EQ(resumedAfter([&] { rename("e", "b/e"); }), expired);
   EXPECT_EQ(resumedAfter([&] {
               const std::uint64_t fileID = fake.volume.at(fake.path("a/1")).fileID;
               fake.volume.remove(fake.path("a/1"));
               events.append(fake.path("a/1"), fileID);
             }),
-            startOver);
+            expired);
 }
 
 TEST_F(ResumedListing, OfOtherFoldersStartsOver) {
@@ -99,7 +99,7 @@ TEST_F(ResumedListing, OfOtherFoldersStartsOver) {
   forgetWalks();
   const auto listing = LocalFileEnumerator::create(
       services, workingSet, {fake.url(), URL::fileURL("/apps/draw/Documents")});
-  EXPECT_EQ(list(*listing, *first.next).error, startOver);
+  EXPECT_EQ(list(*listing, *first.next).error, expired);
 }
 
 TEST_F(ResumedListing, GoesOnByItsOffsetWithoutAUsablePosition) {
@@ -147,7 +147,7 @@ TEST_F(ResumedListing, OfPositionsThatLeadNowhereNeverLeavesTheTree) {
     distort(at);
     fake.positions.kept[{workingSet, *first.next}] = at.encode();
     forgetWalks();
-    EXPECT_EQ(list(*listing, *first.next).error, startOver);
+    EXPECT_EQ(list(*listing, *first.next).error, expired);
   }
 }
 

@@ -46,8 +46,8 @@ TEST(FSChangeTokenTest, BytesAreADictionaryOfTheFields) {
 
 TEST(FSChangeTokenTest, AnythingElseIsNoToken) {
   std::vector<Data> unusable = {{}, {1, 2, 3}, dataFromString("bplist00")};
-  const auto add = [&](PropertyList::Value root) {
-    unusable.push_back(PropertyList(std::move(root)).encode().value());
+  const auto add = [&](PropertyList::Value value) {
+    unusable.push_back(PropertyList(std::move(value)).encode().value());
   };
   add(PropertyList::Array{});
   for (std::size_t i = 0; i < dictionary().size(); ++i) {

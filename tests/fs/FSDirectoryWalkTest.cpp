@@ -12,7 +12,7 @@ namespace {
 
 using ::testing::ElementsAre;
 
-constexpr std::uint64_t noLimit = 1'000'000;
+constexpr std::uint64_t noEnd = 1'000'000;
 
 class FSDirectoryWalkTest : public ::testing::Test {
  protected:
@@ -29,13 +29,13 @@ class FSDirectoryWalkTest : public ::testing::Test {
   }
   FSDirectoryWalk walk() { return walk({{fake.url()}, true}); }
   /// The next entries, relative to the documents.
-  std::vector<std::string> take(FSDirectoryWalk& walk, std::uint64_t limit = noLimit) {
+  std::vector<std::string> take(FSDirectoryWalk& walk, std::uint64_t limit = noEnd) {
     std::vector<std::string> seen;
     const auto counted = walk.next(limit, [&](const URL& url) -> Result<void> {
       seen.push_back(url.path().substr(fake.path("").size() + 1));
       return {};
     });
-    EXPECT_EQ(counted.value_or(noLimit), seen.size());
+    EXPECT_EQ(counted.value_or(noEnd), seen.size());
     return seen;
   }
 
@@ -125,7 +125,7 @@ TEST_F(FSDirectoryWalkTest, FoldersThatCannotBeOpenedAreLeftOutWhereThatIsWanted
 
   fake.faults.fail(Op::openDirectory, exhausted, 3);
   FSDirectoryWalk failing = walk(plan);
-  EXPECT_EQ(failing.next(noLimit, [](const URL&) { return Result<void>{}; }).error(), exhausted);
+  EXPECT_EQ(failing.next(noEnd, [](const URL&) { return Result<void>{}; }).error(), exhausted);
 }
 
 }  // namespace

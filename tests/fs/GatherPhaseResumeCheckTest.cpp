@@ -10,7 +10,7 @@
 namespace mirabel::testing {
 namespace {
 
-using Case = FSEventReaderGatherPhaseResumeStatus::Case;
+using Verdict = FSEventReaderGatherPhaseResumeStatus::Case;
 
 class GatherPhaseResumeCheckTest : public ::testing::Test {
  protected:
@@ -35,13 +35,13 @@ class GatherPhaseResumeCheckTest : public ::testing::Test {
 };
 
 TEST_F(GatherPhaseResumeCheckTest, ChangesAndMovesLetTheListingGoOn) {
-  EXPECT_EQ(check().status.status, Case::canResume);
+  EXPECT_EQ(check().status.status, Verdict::canResume);
   EXPECT_EQ(check().lastProcessedFSEventID, 1U);
   events.append(fake.path("file"), fileID);
   events.append(fake.path("folder"), folderID);
   events.append(fake.path(".hidden"));
   auto result = check();
-  EXPECT_EQ(result.status.status, Case::canResume);
+  EXPECT_EQ(result.status.status, Verdict::canResume);
   EXPECT_EQ(result.lastProcessedFSEventID, 4U);
   EXPECT_FALSE(result.hasNameLeft || result.hasFolderMoved);
 
@@ -49,7 +49,7 @@ TEST_F(GatherPhaseResumeCheckTest, ChangesAndMovesLetTheListingGoOn) {
   events.append(fake.path("file"), fileID);
   events.append(fake.path("folder/file"), fileID);
   result = check();
-  EXPECT_EQ(result.status.status, Case::canResume);
+  EXPECT_EQ(result.status.status, Verdict::canResume);
   EXPECT_TRUE(result.hasNameLeft);
   EXPECT_FALSE(result.hasFolderMoved);
 
@@ -64,13 +64,13 @@ TEST_F(GatherPhaseResumeCheckTest, DeletionNamesTheItemAndItsPath) {
   events.append(fake.path("gone"), 4712);
   const auto result = check();
   EXPECT_EQ(result.status,
-            (FSEventReaderGatherPhaseResumeStatus{Case::deletionOccurred,
+            (FSEventReaderGatherPhaseResumeStatus{Verdict::deletionOccurred,
                                                   "[fid=4712, path:'" + fake.path("gone") + "']"}));
 }
 
 TEST_F(GatherPhaseResumeCheckTest, GapInTheHistoryIsFoundOut) {
   using namespace eventflag;
-  const Case gap = Case::cantReplayHistoricalFSEvents;
+  const Verdict gap = Verdict::cantReplayHistoricalFSEvents;
   EXPECT_EQ(check(2).status.status, gap);  // an ID that was never given out
   for (const std::uint32_t flags : {userDropped, kernelDropped, eventIDsWrapped}) {
     const std::uint64_t since = events.currentEventID();
@@ -78,7 +78,7 @@ TEST_F(GatherPhaseResumeCheckTest, GapInTheHistoryIsFoundOut) {
     EXPECT_EQ(check(since).status.status, gap) << flags;
   }
   const std::uint64_t since = events.currentEventID();
-  EXPECT_EQ(check(since).status.status, Case::canResume);
+  EXPECT_EQ(check(since).status.status, Verdict::canResume);
   events.append(fake.path("file"), fileID);
   events.prune(since + 1);
   EXPECT_EQ(check(since).status.status, gap);
@@ -86,7 +86,7 @@ TEST_F(GatherPhaseResumeCheckTest, GapInTheHistoryIsFoundOut) {
 
 TEST_F(GatherPhaseResumeCheckTest, StreamThatCannotBeHadIsNotWaitedFor) {
   events.failCreation(Error::posix(EMFILE));
-  EXPECT_EQ(check().status.status, Case::cantReplayHistoricalFSEvents);
+  EXPECT_EQ(check().status.status, Verdict::cantReplayHistoricalFSEvents);
 }
 
 TEST_F(GatherPhaseResumeCheckTest, HistoryOfManyBatchesIsReadToItsEnd) {
@@ -94,7 +94,7 @@ TEST_F(GatherPhaseResumeCheckTest, HistoryOfManyBatchesIsReadToItsEnd) {
     events.append(fake.path("file"), fileID);
   events.append(fake.path("gone"), 4712);
   events.setBatchSize(3);
-  EXPECT_EQ(check().status.status, Case::deletionOccurred);
+  EXPECT_EQ(check().status.status, Verdict::deletionOccurred);
   EXPECT_EQ(check(22).lastProcessedFSEventID, 22U);
 }
 

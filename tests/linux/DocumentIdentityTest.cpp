@@ -10,7 +10,7 @@ namespace mirabel {
 namespace {
 
 // Ways in which a document "doc.txt" changes while nobody looks, and where it is then.
-class DocumentIdentity : public VolumeFixture, public testing::WithParamInterface<int> {
+class DocumentIdentity : public VolumeFixture, public ::testing::WithParamInterface<int> {
  protected:
   void saveOver(const char* temporary) const {
     write(temporary, "new");
@@ -175,7 +175,7 @@ TEST_P(DocumentIdentity, LastsThroughEveryWayOfSavingAndMoving) {
   }
 }
 
-INSTANTIATE_TEST_SUITE_P(FirstLook, DocumentIdentity, testing::Range(0, 4));
+INSTANTIATE_TEST_SUITE_P(FirstLook, DocumentIdentity, ::testing::Range(0, 4));
 
 }  // namespace
 }  // namespace mirabel

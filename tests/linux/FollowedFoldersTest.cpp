@@ -19,7 +19,7 @@ constexpr std::uint64_t noLater = std::numeric_limits<std::uint64_t>::max();
 
 /// Folders of applications beside the document storage, with every way of hearing of changes.
 class FollowedFoldersTest : public VolumeFixture,
-                            public testing::WithParamInterface<std::optional<WatcherKind>> {
+                            public ::testing::WithParamInterface<std::optional<WatcherKind>> {
  protected:
   void SetUp() override {
     if (GetParam()) makeWatcher_ = [] { return makeWatcher(*GetParam()); };
@@ -190,8 +190,8 @@ TEST_P(FollowedFoldersTest, ALinkInThePlaceOfOneLeadsNowhere) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Watching, FollowedFoldersTest,
-                         testing::Values(std::nullopt, WatcherKind::folderMarks,
-                                         WatcherKind::inotify));
+                         ::testing::Values(std::nullopt, WatcherKind::folderMarks,
+                                           WatcherKind::inotify));
 
 }  // namespace
 }  // namespace mirabel

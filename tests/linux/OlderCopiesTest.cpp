@@ -120,7 +120,7 @@ struct Return {
   bool goesOn = false;               // nothing that was told is missing
 };
 
-class OlderCopiesPutBack : public OlderCopies, public testing::WithParamInterface<Return> {};
+class OlderCopiesPutBack : public OlderCopies, public ::testing::WithParamInterface<Return> {};
 
 TEST_P(OlderCopiesPutBack, AreFoundOutHoweverFarTheHistoryGoesOn) {
   work(GetParam().isLong);
@@ -133,17 +133,17 @@ TEST_P(OlderCopiesPutBack, AreFoundOutHoweverFarTheHistoryGoesOn) {
 
 INSTANTIATE_TEST_SUITE_P(
     Each, OlderCopiesPutBack,
-    testing::Values(Return{"Nothing", {}, {}, false, true},
-                    Return{"NothingAfterLongWork", {}, {}, true, true},
-                    Return{"DatabaseAndLog", {"volume.db", "volume.db-wal"}, {}},
-                    Return{"Database", {"volume.db"}, {}, false, true},
-                    Return{"DatabaseWithoutLog", {"volume.db"}, {"volume.db-wal"}},
-                    Return{"Log", {"volume.db-wal"}, {}}, Return{"NoLog", {}, {"volume.db-wal"}},
-                    Return{"Witness", {"witness"}, {"volume.db-wal"}},
-                    Return{"LongDatabaseAndLog", {"volume.db", "volume.db-wal"}, {}, true},
-                    Return{"LongDatabase", {"volume.db"}, {}, true},
-                    Return{"LongLog", {"volume.db-wal"}, {}, true},
-                    Return{"LongNoLog", {}, {"volume.db-wal"}, true}),
+    ::testing::Values(Return{"Nothing", {}, {}, false, true},
+                      Return{"NothingAfterLongWork", {}, {}, true, true},
+                      Return{"DatabaseAndLog", {"volume.db", "volume.db-wal"}, {}},
+                      Return{"Database", {"volume.db"}, {}, false, true},
+                      Return{"DatabaseWithoutLog", {"volume.db"}, {"volume.db-wal"}},
+                      Return{"Log", {"volume.db-wal"}, {}}, Return{"NoLog", {}, {"volume.db-wal"}},
+                      Return{"Witness", {"witness"}, {"volume.db-wal"}},
+                      Return{"LongDatabaseAndLog", {"volume.db", "volume.db-wal"}, {}, true},
+                      Return{"LongDatabase", {"volume.db"}, {}, true},
+                      Return{"LongLog", {"volume.db-wal"}, {}, true},
+                      Return{"LongNoLog", {}, {"volume.db-wal"}, true}),
     [](const auto& test) { return test.param.name; });
 
 // Witness and all, as from a backup: only that it is a copy gives it away.

@@ -116,7 +116,7 @@ TEST_F(ReconcilerTest, AnUnchangedTreeMakesNoEvents) {
 // A container that showed a file under a name, or will, learns of it only from a record of a place
 // in it: so each name that came or went, or whose turn may have come, is named.
 class HardLinksTest : public ReconcilerTest,
-                      public testing::WithParamInterface<std::optional<WatcherKind>> {
+                      public ::testing::WithParamInterface<std::optional<WatcherKind>> {
  protected:
   void SetUp() override {
     if (!GetParam()) return;
@@ -219,8 +219,8 @@ TEST_P(HardLinksTest, NamesAreToldThatCameOrWent) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Watching, HardLinksTest,
-                         testing::Values(std::nullopt, WatcherKind::folderMarks,
-                                         WatcherKind::inotify));
+                         ::testing::Values(std::nullopt, WatcherKind::folderMarks,
+                                           WatcherKind::inotify));
 
 TEST_F(ReconcilerTest, AWholeTreeThatIsDeletedOrMovedOutIsToldThingByThing) {
   makeFolder("keep");
@@ -249,9 +249,9 @@ TEST_F(ReconcilerTest, AWholeTreeThatIsDeletedOrMovedOutIsToldThingByThing) {
 
 // Random changes, watched and not, restarts and anchors in between: a client that applies the
 // events holds what a fresh look shows.
-class RandomChanges
+class RandomReconciling
     : public ReconcilerTest,
-      public testing::WithParamInterface<std::tuple<std::optional<WatcherKind>, int>> {
+      public ::testing::WithParamInterface<std::tuple<std::optional<WatcherKind>, int>> {
  protected:
   void SetUp() override {
     kind_ = std::get<0>(GetParam());
@@ -352,7 +352,7 @@ class RandomChanges
   std::mt19937 random_;
 };
 
-TEST_P(RandomChanges, AreToldSoThatAClientHoldsWhatIsThere) {
+TEST_P(RandomReconciling, AreToldSoThatAClientHoldsWhatIsThere) {
   const char* given = std::getenv("MIRABEL_TEST_SEED");
   const unsigned seed =
       given != nullptr ? static_cast<unsigned>(std::stoul(given)) : std::random_device{}();
@@ -372,18 +372,18 @@ TEST_P(RandomChanges, AreToldSoThatAClientHoldsWhatIsThere) {
     if (pick(2) == 0) close();
     catchUp(replicas, since);
     expectEqual(replicas, everything());
-    if (testing::Test::HasFailure()) return;
+    if (::testing::Test::HasFailure()) return;
     since = anchor();
   }
   ASSERT_TRUE(index().reconcile());
   EXPECT_EQ(index().status().lastEventID, since) << "what was followed, a comparison confirms";
 }
 
-INSTANTIATE_TEST_SUITE_P(Sequences, RandomChanges,
-                         testing::Combine(testing::Values(std::nullopt, WatcherKind::folderMarks,
-                                                          WatcherKind::inotify,
-                                                          WatcherKind::fileSystemMark),
-                                          testing::Range(0, 25)));
+INSTANTIATE_TEST_SUITE_P(
+    Sequences, RandomReconciling,
+    ::testing::Combine(::testing::Values(std::nullopt, WatcherKind::folderMarks,
+                                         WatcherKind::inotify, WatcherKind::fileSystemMark),
+                       ::testing::Range(0, 25)));
 
 }  // namespace
 }  // namespace mirabel

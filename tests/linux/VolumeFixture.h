@@ -16,7 +16,7 @@ namespace mirabel {
 /// A folder "Documents" on real disk, a state folder beside it, and the index over both. Folders
 /// named "*.package" are packages. Lies below $MIRABEL_TEST_DIR where that is set, and is removed
 /// at the end.
-class VolumeFixture : public testing::Test {
+class VolumeFixture : public ::testing::Test {
  protected:
   /// Bursts of files are made in memory unless a file system was named: some disks need a minute to
   /// be rid of them.

@@ -72,7 +72,7 @@ struct Damage {
   void (*make)(const std::string& database);
 };
 
-class DamagedState : public VolumeStateTest, public testing::WithParamInterface<Damage> {};
+class DamagedState : public VolumeStateTest, public ::testing::WithParamInterface<Damage> {};
 
 // Whatever happened to the database, nothing that comes after gets an identity of before.
 TEST_P(DamagedState, NewIdentitiesAreNotMixedWithOld) {
@@ -117,7 +117,7 @@ void overwrite(const std::string& file, std::streamoff offset, std::string_view 
 
 INSTANTIATE_TEST_SUITE_P(
     Each, DamagedState,
-    testing::Values(
+    ::testing::Values(
         Damage{"Header", [](const std::string& db) { overwrite(db, 0, "not a database"); }},
         Damage{"Page",
                [](const std::string& db) { overwrite(db, 4096, std::string(900, '\xee')); }},

@@ -17,7 +17,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-constexpr std::string_view root = VesselRootContainerItemIdentifier;
+constexpr std::string_view rootContainer = VesselRootContainerItemIdentifier;
 constexpr std::string_view workingSet = VesselWorkingSetContainerItemIdentifier;
 
 class ApplicationsTest : public HostedFixture {
@@ -63,7 +63,8 @@ TEST_F(ApplicationsTest, AreRefreshedAtTheStart) {
                   "auto notify changes on VesselWorkingSetContainerItemIdentifier at startup",
                   "notify changes on VesselRootContainerItemIdentifier",
                   "notify changes on VesselWorkingSetContainerItemIdentifier"));
-  EXPECT_THAT(first.signals, ::testing::UnorderedElementsAre(workingSet, root, workingSet));
+  EXPECT_THAT(first.signals,
+              ::testing::UnorderedElementsAre(workingSet, rootContainer, workingSet));
   ASSERT_THAT(events.libraries(), SizeIs(1));
   EXPECT_EQ(events.libraries().front().label, "Draw");
 }
@@ -74,11 +75,11 @@ TEST_F(ApplicationsTest, ThatComeOrGoAreToldOf) {
   seen();
   install("org.example.write", "Write");
   notify(notification::applicationRegistered);
-  EXPECT_THAT(seen().signals, ElementsAre(root, workingSet));
+  EXPECT_THAT(seen().signals, ElementsAre(rootContainer, workingSet));
   EXPECT_THAT(events.libraries(), SizeIs(2));
   fake.applications.installed.erase(fake.applications.installed.begin());
   notify(notification::applicationUnregistered);
-  EXPECT_THAT(seen().signals, ElementsAre(root, workingSet));
+  EXPECT_THAT(seen().signals, ElementsAre(rootContainer, workingSet));
   EXPECT_THAT(fake.signals.deletedDomains, ElementsAre(ElementsAre("org.example.draw")));
 
   // What is as it was writes and signals nothing, but for another display name, which is no other

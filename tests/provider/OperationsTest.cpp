@@ -17,7 +17,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::StartsWith;
 
-const std::string root(VesselRootContainerItemIdentifier);
+const std::string rootItem(VesselRootContainerItemIdentifier);
 
 class OperationsTest : public ProviderFixture {
  protected:
@@ -109,10 +109,10 @@ TEST_F(OperationsTest, WhatTheHostsURLHasCachedIsNotBelieved) {
 
 TEST_F(OperationsTest, NothingIsWrittenIntoTheRoot) {
   const std::function<void()> refused[] = {
-      [&] { vessel->importDocumentAtURL(fake.url("a.txt"), root, item()); },
-      [&] { vessel->createDirectoryWithName("made", root, item()); },
-      [&] { vessel->reparentItemWithIdentifier(file, root, {}, item()); },
-      [&] { vessel->reparentItemWithIdentifier("fid=4711", root, "b", item()); },
+      [&] { vessel->importDocumentAtURL(fake.url("a.txt"), rootItem, item()); },
+      [&] { vessel->createDirectoryWithName("made", rootItem, item()); },
+      [&] { vessel->reparentItemWithIdentifier(file, rootItem, {}, item()); },
+      [&] { vessel->reparentItemWithIdentifier("fid=4711", rootItem, "b", item()); },
   };
   for (const auto& start : refused) {
     clear();

@@ -15,10 +15,6 @@ std::vector<std::string> allShown(std::vector<std::string> texts) {
   return texts;
 }
 
-std::uint32_t limited(std::size_t limit) {
-  return static_cast<std::uint32_t>(std::min<std::size_t>(limit, UINT32_MAX));
-}
-
 std::optional<Date> dateOption(const Options& options, const std::string& key) {
   const auto text = textOption(options, key);
   return text ? Date::fromRFC3339(*text) : std::nullopt;
@@ -40,6 +36,10 @@ std::optional<std::string> misunderstood(const Options& options) {
 }
 
 }  // namespace
+
+std::uint32_t limited(std::size_t limit) {
+  return static_cast<std::uint32_t>(std::min<std::size_t>(limit, UINT32_MAX));
+}
 
 std::vector<std::string> wordsFor(const SearchQuery& query) {
   return allShown(query.words);

@@ -16,6 +16,9 @@ namespace mirabel::bus {
 [[nodiscard]] std::vector<std::string> wordsFor(const SearchQuery& query);
 [[nodiscard]] Options optionsFor(const SearchQuery& query);
 
+/// A limit as it goes over the bus.
+[[nodiscard]] std::uint32_t limited(std::size_t limit);
+
 /// At most so many are found, whatever the limit that is asked for.
 inline constexpr std::uint32_t mostFound = 10'000;
 /// The way back; or what of the options is wanted and can't be understood, for the caller.

@@ -38,10 +38,6 @@ Write arguments(const Arguments&... values) {
   return [values...](sdbus::Message& call) { (call << ... << values); };
 }
 
-std::uint32_t limited(std::size_t limit) {
-  return static_cast<std::uint32_t>(std::min<std::size_t>(limit, UINT32_MAX));
-}
-
 /// A name for arguments "sa{sv}" at the end of others: as text, or as bytes in the options.
 struct NameArgument {
   explicit NameArgument(const std::string& name) {

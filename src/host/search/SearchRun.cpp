@@ -29,17 +29,6 @@ constexpr const char* favoriteItems =
     " ORDER BY favorite, name, identifier";
 static_assert(searchTrashed == 2);
 
-struct Candidate {
-  Match match = Match::wholeWord;
-  std::int64_t modified = 0;
-  std::string identifier;
-  /// The best first; of those the newest, and else by identifier, so that the order is one.
-  friend bool operator<(const Candidate& a, const Candidate& b) {
-    return std::tie(a.match, b.modified, a.identifier) <
-           std::tie(b.match, a.modified, b.identifier);
-  }
-};
-
 SearchRowView viewOf(const Statement& row) {
   SearchRowView view{row.blob(2), row.blob(3), row.blob(4), {}, row.blob(6), false};
   if (!row.isNull(5)) view.modified = row.integer(5);
@@ -96,6 +85,17 @@ class SearchRun::Candidates {
   }
 
  private:
+  struct Candidate {
+    Match match = Match::wholeWord;
+    std::int64_t modified = 0;
+    std::string identifier;
+    /// The best first; of those the newest, and else by identifier, so that the order is one.
+    friend bool operator<(const Candidate& a, const Candidate& b) {
+      return std::tie(a.match, b.modified, a.identifier) <
+             std::tie(b.match, a.modified, b.identifier);
+    }
+  };
+
   static constexpr std::size_t largest = std::numeric_limits<std::size_t>::max();
 
   void keepBest(std::size_t count) {

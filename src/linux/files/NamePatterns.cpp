@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <fstream>
 
+#include "foundation/AsciiCase.h"
+
 namespace mirabel {
 namespace {
 
@@ -10,13 +12,9 @@ namespace {
 // a few names too many for special and never one too few.
 constexpr std::string_view wildcards = "*?[\\";
 
-char lowered(char c) {
-  return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-}
-
 std::string loweredText(std::string_view text) {
   std::string result(text);
-  std::ranges::transform(result, result.begin(), lowered);
+  std::ranges::transform(result, result.begin(), asciiLower);
   return result;
 }
 
@@ -26,7 +24,7 @@ bool hasWildcard(std::string_view text) {
 
 bool beginsLowered(std::string_view name, std::string_view beginning) {
   return name.size() >= beginning.size() &&
-         std::ranges::equal(name.substr(0, beginning.size()), beginning, {}, lowered);
+         std::ranges::equal(name.substr(0, beginning.size()), beginning, {}, asciiLower);
 }
 
 bool endsLowered(std::string_view name, std::string_view ending) {
@@ -40,7 +38,7 @@ bool isLetter(char c) {
 
 bool containsLowered(std::string_view name, std::string_view part) {
   if (part.empty() || isLetter(part[0])) {
-    return !std::ranges::search(name, part, {}, lowered).empty();
+    return !std::ranges::search(name, part, {}, asciiLower).empty();
   }
   // What starts with a dot, as most do, is found by its dots.
   for (std::size_t at = name.find(part[0]); at != name.npos; at = name.find(part[0], at + 1)) {

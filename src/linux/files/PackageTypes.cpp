@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <array>
 
+#include "foundation/AsciiCase.h"
+
 namespace mirabel {
 namespace {
 
@@ -20,12 +22,8 @@ constexpr std::array<PackageSuffix, 6> packageSuffixes{{
     {"package", "com.norvane.package"},
 }};
 
-constexpr char lowered(char c) {
-  return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-}
-
 bool equalsLowered(std::string_view text, std::string_view lowerCase) {
-  return std::ranges::equal(text, lowerCase, {}, lowered);
+  return std::ranges::equal(text, lowerCase, {}, asciiLower);
 }
 
 }  // namespace

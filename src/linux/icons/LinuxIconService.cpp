@@ -14,19 +14,20 @@ namespace mirabel {
 namespace {
 
 constexpr std::size_t largestFile = 8u << 20;
-constexpr std::uint32_t mostPixels = 4096;
-constexpr double largestScale = 16;
+constexpr std::uint32_t mostPixelsAsked = 4096;
+constexpr double largestScaleAsked = 16;
 
 /// The size that themes know the box by.
 IconSize sizeFor(const IconVariant& variant) {
-  const double scale =
-      std::isfinite(variant.scale) ? std::clamp(std::ceil(variant.scale), 1.0, largestScale) : 1;
+  const double scale = std::isfinite(variant.scale)
+                           ? std::clamp(std::ceil(variant.scale), 1.0, largestScaleAsked)
+                           : 1;
   const double points = std::min(variant.pixelsWide, variant.pixelsHigh) / scale;
   return {std::max(1, static_cast<int>(std::lround(points))), static_cast<int>(scale)};
 }
 
 bool isIconBox(const IconVariant& variant) {
-  const auto isSide = [](std::uint32_t pixels) { return pixels > 0 && pixels <= mostPixels; };
+  const auto isSide = [](std::uint32_t pixels) { return pixels > 0 && pixels <= mostPixelsAsked; };
   return isSide(variant.pixelsWide) && isSide(variant.pixelsHigh);
 }
 

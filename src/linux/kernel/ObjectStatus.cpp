@@ -21,8 +21,6 @@
 namespace mirabel {
 namespace {
 
-constexpr std::int64_t nanosecondsPerSecond = 1'000'000'000;
-
 std::int64_t nanoseconds(const statx_timestamp& stamp) {
   std::int64_t result = 0;
   if (__builtin_mul_overflow(stamp.tv_sec, nanosecondsPerSecond, &result) ||

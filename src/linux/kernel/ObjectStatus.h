@@ -12,6 +12,8 @@
 
 namespace mirabel {
 
+inline constexpr std::int64_t nanosecondsPerSecond = 1'000'000'000;
+
 /// What one statx tells of an object. Times are nanoseconds since 1970 in UTC where they are used
 /// to tell objects apart, so that comparing them is one comparison; far dates saturate.
 struct ObjectStatus {

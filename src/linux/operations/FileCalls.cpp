@@ -18,7 +18,6 @@ namespace mirabel {
 namespace {
 
 constexpr int openFlags = O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
-constexpr std::int64_t second = 1'000'000'000;
 
 bool isKept(std::string_view attribute) {
   return attribute.starts_with(userAttributePrefix) || attribute.starts_with("system.posix_acl_");
@@ -119,10 +118,10 @@ Result<void> FileCalls::setMode(int file, mode_t mode) const {
 Result<void> FileCalls::setTime(int folder, const std::string& name,
                                 std::int64_t modificationTime) const {
   if (auto checked = check("set time"); !checked) return checked;
-  timespec time{modificationTime / second, modificationTime % second};
+  timespec time{modificationTime / nanosecondsPerSecond, modificationTime % nanosecondsPerSecond};
   if (time.tv_nsec < 0) {
     time.tv_sec -= 1;
-    time.tv_nsec += second;
+    time.tv_nsec += nanosecondsPerSecond;
   }
   const timespec times[] = {{0, UTIME_OMIT}, time};
   if (name.empty()) return answer(::futimens(folder, times));

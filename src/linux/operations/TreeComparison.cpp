@@ -9,11 +9,10 @@
 namespace mirabel {
 namespace {
 
-constexpr std::int64_t second = 1'000'000'000;
-
 /// Some file systems keep times to 100 nanoseconds, 10 milliseconds or whole seconds only.
 bool isSameTime(std::int64_t time, std::int64_t copied) {
-  constexpr std::int64_t steps[] = {1, 100, 1000, 10'000'000, second, 2 * second};
+  constexpr std::int64_t steps[] = {
+      1, 100, 1000, 10'000'000, nanosecondsPerSecond, 2 * nanosecondsPerSecond};
   return std::ranges::any_of(steps, [&](std::int64_t step) {
     return copied % step == 0 && time >= copied && time - copied < step;
   });

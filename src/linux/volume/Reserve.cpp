@@ -11,7 +11,7 @@
 namespace mirabel {
 namespace {
 
-constexpr const char* fileName = "reserve";
+constexpr const char* reserveFile = "reserve";
 // The write-ahead log and the files that are replaced take some pages each.
 constexpr off_t size = 512 << 10;
 constexpr std::uint64_t fewestFree = 4 * size;
@@ -26,17 +26,17 @@ bool isForWantOfRoom(const Error& error) {
 void Reserve::make() const {
   struct stat status {};
   const int folder = folder_.descriptor();
-  if (::fstatat(folder, fileName, &status, AT_SYMLINK_NOFOLLOW) == 0) return;
+  if (::fstatat(folder, reserveFile, &status, AT_SYMLINK_NOFOLLOW) == 0) return;
   // What was given up on a disk that is nearly full stays free for what comes next.
   struct statvfs disk {};
   if (::fstatvfs(folder, &disk) != 0 || disk.f_bavail * disk.f_frsize < fewestFree) return;
-  const UniqueFd file(::openat(folder, fileName, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+  const UniqueFd file(::openat(folder, reserveFile, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
   // Half of it would be there next time, and taken for all of it.
-  if (file && ::posix_fallocate(file.get(), 0, size) != 0) ::unlinkat(folder, fileName, 0);
+  if (file && ::posix_fallocate(file.get(), 0, size) != 0) ::unlinkat(folder, reserveFile, 0);
 }
 
 bool Reserve::releaseAfter(const Error& failure) const {
-  return isForWantOfRoom(failure) && ::unlinkat(folder_.descriptor(), fileName, 0) == 0;
+  return isForWantOfRoom(failure) && ::unlinkat(folder_.descriptor(), reserveFile, 0) == 0;
 }
 
 }  // namespace mirabel

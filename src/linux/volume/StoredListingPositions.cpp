@@ -10,7 +10,7 @@
 namespace mirabel {
 namespace {
 
-constexpr const char* fileName = "listings";
+constexpr const char* listingsFile = "listings";
 
 Result<void> writeAt(int file, const Data& bytes, std::size_t offset) {
   for (std::size_t done = 0; done < bytes.size();) {
@@ -41,7 +41,7 @@ Result<void> StoredListingPositions::keep(std::string_view container, const Data
   Slot kept{++lastNumber_, std::string(container), cursor, position};
   const auto at = static_cast<std::size_t>(&slot - slots_.data()) * slotSize;
   if (auto written = writeAt(file_.get(), kept.encode(), at); !written) return written;
-  if (::fdatasync(file_.get()) != 0) return fail(Error::posix(errno, folder_.file(fileName)));
+  if (::fdatasync(file_.get()) != 0) return fail(Error::posix(errno, folder_.file(listingsFile)));
   slot = std::move(kept);
   return {};
 }
@@ -59,7 +59,7 @@ std::optional<Data> StoredListingPositions::find(std::string_view container, con
 /// A file that is not there, or not of this size, holds nothing and is made anew when it is needed.
 void StoredListingPositions::load() {
   if (std::exchange(isLoaded_, true)) return;
-  UniqueFd file(::openat(folder_.descriptor(), fileName, O_RDWR | O_NOFOLLOW | O_CLOEXEC));
+  UniqueFd file(::openat(folder_.descriptor(), listingsFile, O_RDWR | O_NOFOLLOW | O_CLOEXEC));
   struct stat status {};
   if (!file || ::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode) ||
       status.st_size != static_cast<off_t>(slotCount * slotSize)) {
@@ -79,11 +79,11 @@ void StoredListingPositions::load() {
 
 /// Filled with zeros, so that writing a slot changes no more than its bytes.
 Result<void> StoredListingPositions::make() {
-  const auto failure = [&] { return fail(Error::posix(errno, folder_.file(fileName))); };
+  const auto failure = [&] { return fail(Error::posix(errno, folder_.file(listingsFile))); };
   const int directory = folder_.descriptor();
-  if (::unlinkat(directory, fileName, 0) != 0 && errno != ENOENT) return failure();
+  if (::unlinkat(directory, listingsFile, 0) != 0 && errno != ENOENT) return failure();
   UniqueFd file(
-      ::openat(directory, fileName, O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
+      ::openat(directory, listingsFile, O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
   if (!file) return failure();
   if (auto written = writeAt(file.get(), Data(slotCount * slotSize), 0); !written) return written;
   if (::fsync(file.get()) != 0 || ::fsync(directory) != 0) return failure();

@@ -35,7 +35,7 @@ Result<UUID> uuidFromFileSystemID(int folder) {
 }
 
 // A folder that may be searched but not read still tells its file system's ID.
-Result<UniqueFd> openFolder(const std::string& path) {
+Result<UniqueFd> openSearchable(const std::string& path) {
   auto opened = openLongPath(AT_FDCWD, path, O_RDONLY | O_DIRECTORY);
   if (!opened) opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
   return opened;
@@ -55,13 +55,13 @@ std::optional<UUID> uuidFromKernel(int folder) {
 }  // namespace
 
 std::optional<UUID> kernelVolumeUUID(const std::string& folder) {
-  auto opened = openFolder(folder);
+  auto opened = openSearchable(folder);
   if (!opened) return std::nullopt;
   return uuidFromKernel(opened->get());
 }
 
 Result<UUID> volumeUUID(const std::string& folder) {
-  auto opened = openFolder(folder);
+  auto opened = openSearchable(folder);
   if (!opened) return fail(opened.error());
   if (auto uuid = uuidFromKernel(opened->get())) return *uuid;
   return uuidFromFileSystemID(opened->get());

@@ -15,12 +15,12 @@
 namespace mirabel {
 namespace {
 
-constexpr std::string_view magic = "MRBWITN2";
+constexpr std::string_view witnessMagic = "MRBWITN2";
 constexpr std::size_t historyOffset = 8;
 constexpr std::size_t handleOffset = 56;
 constexpr std::size_t birthTimeOffset = 64;
 constexpr std::size_t notesOffset = 72;
-constexpr std::size_t digestOffset = 88;
+constexpr std::size_t witnessDigestOffset = 88;
 
 void put(std::span<unsigned char> bytes, std::size_t offset, std::uint64_t value) {
   for (std::size_t i = 0; i < 8; ++i) {
@@ -62,8 +62,8 @@ std::optional<Witness> Witness::read(const StateFolder& folder) {
   Witness witness;
   Bytes& bytes = witness.bytes_;
   if (::pread(file.get(), bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size()) ||
-      std::memcmp(bytes.data(), magic.data(), magic.size()) != 0 ||
-      get(bytes, digestOffset) != digestOf(std::span(bytes).first(digestOffset))) {
+      std::memcmp(bytes.data(), witnessMagic.data(), witnessMagic.size()) != 0 ||
+      get(bytes, witnessDigestOffset) != digestOf(std::span(bytes).first(witnessDigestOffset))) {
     return std::nullopt;
   }
   if (differ(get(bytes, handleOffset), handleOf(file.get())) ||
@@ -88,7 +88,7 @@ Result<void> Witness::write(const StateFolder& folder) {
   UniqueFd file(::openat(directory, "witness.new", O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
   if (!file) return fail(Error::posix(errno, folder.file("witness")));
   Bytes bytes{};
-  std::memcpy(bytes.data(), magic.data(), magic.size());
+  std::memcpy(bytes.data(), witnessMagic.data(), witnessMagic.size());
   std::memcpy(bytes.data() + historyOffset, history.bytes.data(), 16);
   put(bytes, 24, documentLimit);
   put(bytes, 32, fileLimit);
@@ -123,7 +123,7 @@ Result<void> Witness::note() {
 void Witness::putNotes(Bytes& bytes) const {
   put(bytes, notesOffset, foldings);
   put(bytes, notesOffset + 8, commits);
-  put(bytes, digestOffset, digestOf(std::span(bytes).first(digestOffset)));
+  put(bytes, witnessDigestOffset, digestOf(std::span(bytes).first(witnessDigestOffset)));
 }
 
 }  // namespace mirabel

@@ -12,10 +12,10 @@
 namespace mirabel {
 namespace {
 
-constexpr std::size_t bufferSize = 1u << 18;
-constexpr std::uint32_t everything = IN_CREATE | IN_DELETE | IN_MOVED_FROM | IN_MOVED_TO |
-                                     IN_MODIFY | IN_ATTRIB | IN_CLOSE_WRITE | IN_DELETE_SELF |
-                                     IN_ONLYDIR;
+constexpr std::size_t readSize = 1u << 18;
+constexpr std::uint32_t anyChange = IN_CREATE | IN_DELETE | IN_MOVED_FROM | IN_MOVED_TO |
+                                    IN_MODIFY | IN_ATTRIB | IN_CLOSE_WRITE | IN_DELETE_SELF |
+                                    IN_ONLYDIR;
 
 }  // namespace
 
@@ -27,12 +27,12 @@ Result<std::unique_ptr<FolderWatcher>> InotifyWatcher::create() {
 
 InotifyWatcher::InotifyWatcher(UniqueFd instance)
     : instance_(std::move(instance)),
-      buffer_(std::make_unique_for_overwrite<std::byte[]>(bufferSize)) {}
+      buffer_(std::make_unique_for_overwrite<std::byte[]>(readSize)) {}
 
 Result<void> InotifyWatcher::watch(int folder, std::uint64_t id) {
   // The only way to name an open folder to this interface.
   const std::string path = "/proc/self/fd/" + std::to_string(folder);
-  const int watch = ::inotify_add_watch(instance_.get(), path.c_str(), everything);
+  const int watch = ::inotify_add_watch(instance_.get(), path.c_str(), anyChange);
   if (watch < 0) return fail(Error::posix(errno));
   if (const auto known = watches_.find(id); known != watches_.end() && known->second != watch) {
     end(id);
@@ -76,7 +76,7 @@ Result<FolderWatcher::Drained> InotifyWatcher::drain(LookList& looks) {
   int queued = 0;
   if (::ioctl(instance_.get(), FIONREAD, &queued) != 0) return fail(Error::posix(errno));
   while (queued > 0) {
-    const ssize_t count = ::read(instance_.get(), buffer_.get(), bufferSize);
+    const ssize_t count = ::read(instance_.get(), buffer_.get(), readSize);
     if (count < 0 && errno == EINTR) continue;
     if (count < 0 && errno == EAGAIN) break;
     if (count < 0) return fail(Error::posix(errno));

@@ -14,7 +14,7 @@ using ::testing::Not;
 using ::testing::UnorderedElementsAre;
 using json = nlohmann::json;
 
-const std::string root(VesselRootContainerItemIdentifier);
+const std::string top(VesselRootContainerItemIdentifier);
 
 bool succeeds(const std::string& command) {
   return std::system((command + " >/dev/null 2>&1").c_str()) == 0;
@@ -70,7 +70,7 @@ TEST_F(Clients, InPythonListFollowReadAndImport) {
             "listed ['folder', 'letter.txt']\n"
             "size 9 path True date True\n"
             "signalled ['" +
-                root +
+                top +
                 "']\n"
                 "changed ['new.txt']\n"
                 "read Dear Aunt\n"
@@ -83,20 +83,20 @@ TEST_F(Clients, InPythonListFollowReadAndImport) {
 
 TEST_F(Clients, OfSystemdListAndAskForChangesAndSeeSignals) {
   if (!succeeds("command -v busctl")) GTEST_SKIP() << "there is no busctl";
-  EXPECT_THAT(namesOf(busctl({"ListItems", "say", root, "0"}).at(0)),
+  EXPECT_THAT(namesOf(busctl({"ListItems", "say", top, "0"}).at(0)),
               UnorderedElementsAre("letter.txt", "folder"));
-  std::vector<std::string> since = {"EnumerateChanges", "say", root};
-  const json anchor = busctl({"GetCurrentSyncAnchor", "s", root}).at(0);
+  std::vector<std::string> since = {"EnumerateChanges", "say", top};
+  const json anchor = busctl({"GetCurrentSyncAnchor", "s", top}).at(0);
   since.push_back(std::to_string(anchor.size()));
   for (const json& byte : anchor)
     since.push_back(std::to_string(byte.get<int>()));
   // A watch is one of its connection, and that of a call ends with it. Signals come to the one that
   // watches, and to those that are shown everything.
-  busctl({"Watch", "s", root});
+  busctl({"Watch", "s", top});
   Running monitor({"busctl", "--user", "--json=short", "monitor", bus::serviceName});
   ASSERT_THAT(monitor.errors().line(), HasSubstr("Monitoring"));
   BusClient watching;
-  ASSERT_EQ(watching.provider("Watch", root).error, "");
+  ASSERT_EQ(watching.provider("Watch", top).error, "");
   home.writeFile("new.txt", "new");
   json message = json::object();
   while (message.value("member", "") != "EnumeratorSignaled") {
@@ -104,20 +104,20 @@ TEST_F(Clients, OfSystemdListAndAskForChangesAndSeeSignals) {
     ASSERT_NE(line, "");
     message = json::parse(line);
   }
-  EXPECT_EQ(message.at("payload").at("data").at(0), root);
+  EXPECT_EQ(message.at("payload").at("data").at(0), top);
   EXPECT_EQ(message.at("interface"), bus::providerInterface);
   EXPECT_THAT(namesOf(busctl(since).at(0)), UnorderedElementsAre("new.txt"));
 }
 
 TEST_F(Clients, OfGLibListAndAskForChangesAndAreToldTheMethods) {
   if (!succeeds("command -v gdbus")) GTEST_SKIP() << "there is no gdbus";
-  EXPECT_THAT(gdbus("ListItems", {root, "[]"}), HasSubstr("'filename': <'letter.txt'>"));
+  EXPECT_THAT(gdbus("ListItems", {top, "[]"}), HasSubstr("'filename': <'letter.txt'>"));
   // "([byte 0x62, …],)"
-  const std::string printed = gdbus("GetCurrentSyncAnchor", {root});
+  const std::string printed = gdbus("GetCurrentSyncAnchor", {top});
   const std::string anchor = printed.substr(1, printed.rfind(']'));
-  EXPECT_EQ(gdbus("Watch", {root}), "()\n");
+  EXPECT_EQ(gdbus("Watch", {top}), "()\n");
   home.writeFile("new.txt", "new");
-  const std::string changes = gdbus("EnumerateChanges", {root, anchor});
+  const std::string changes = gdbus("EnumerateChanges", {top, anchor});
   EXPECT_THAT(changes, HasSubstr("'filename': <'new.txt'>"));
   EXPECT_THAT(changes, Not(HasSubstr("letter.txt")));
   EXPECT_THAT(changes, HasSubstr("], false)\n"));

@@ -17,7 +17,7 @@ namespace fs = std::filesystem;
 using Words = std::vector<std::string>;
 
 const std::string longName(255, 'n');
-const std::string bytes = "caf\xe9";
+const std::string noUTF8 = "caf\xe9";
 const std::string lines = "two\nlines\t\033[31m";
 const std::string noCharacter = "\xef\xb7\xa5";  // UTF-8, but no text for the bus
 const std::string notUTF8 = "\xff\xfe";
@@ -32,7 +32,7 @@ void prepare(const TempHome& home) {
   for (const char* folder : {"folder", "target", "many"})
     home.makeFolder(folder);
   writeFile(home, "letter.txt", "Dear Aunt", 1);
-  writeFile(home, bytes, "bytes", 2);
+  writeFile(home, noUTF8, "bytes", 2);
   writeFile(home, lines, "lines", 3);
   writeFile(home, longName, "long", 4);
   writeFile(home, "folder/inside.txt", "in it", 5);
@@ -42,7 +42,7 @@ void prepare(const TempHome& home) {
   home.makeFifo("fifo");
   fs::create_directory(home.path() + "/outside");
   std::ofstream(home.path() + "/outside/new.txt") << "new";
-  std::ofstream(home.path() + "/outside/" + bytes) << "bytes from outside";
+  std::ofstream(home.path() + "/outside/" + noUTF8) << "bytes from outside";
   const InstalledApps apps(home);
   apps.install("org.example.Draw", "Draw");
   apps.write("org.example.Draw", "sketch.txt", "a line");
@@ -137,7 +137,7 @@ const Words commands[] = {
     // Lookups, of everything that can be named.
     {"info", "@/letter.txt"},
     {"info", "@/folder"},
-    {"info", "@/" + bytes},
+    {"info", "@/" + noUTF8},
     {"info", "@/" + lines},
     {"info", "@/" + longName},
     {"info", "@/link"},
@@ -157,7 +157,7 @@ const Words commands[] = {
     {"info", "@/" + longName + "n"},
     {"info", "~/outside"},
     {"info", "~/.var/app/org.example.Draw/Documents/sketch.txt"},
-    {"id", "@/" + bytes},
+    {"id", "@/" + noUTF8},
     {"path", "$"},
     {"id", "@/folder"},
     {"path", "$"},
@@ -201,7 +201,7 @@ const Words commands[] = {
     // What changes the disk.
     {"mkdir", "new", "--in", "root"},
     {"mkdir", "new", "--in", "root"},
-    {"mkdir", bytes, "--in", "@/folder"},
+    {"mkdir", noUTF8, "--in", "@/folder"},
     {"mkdir", lines, "--in", "@/folder"},
     {"mkdir", noCharacter, "--in", "@/folder"},
     {"rename", "@/folder/" + noCharacter, noCharacter + "2"},
@@ -216,7 +216,7 @@ const Words commands[] = {
     {"mkdir", "nowhere", "--in", "did=99999"},
     {"mkdir", "in an app", "--in", "#org.example.Draw"},
     {"mkdir", "hidden", "--in", "#org.example.Plain"},
-    {"import", "~/outside/new.txt", "~/outside/" + bytes, "~/missing", "--in", "@/folder"},
+    {"import", "~/outside/new.txt", "~/outside/" + noUTF8, "~/missing", "--in", "@/folder"},
     {"import", "~/outside/new.txt", "--in", "@/folder"},
     {"import", "~/outside", "--in", "root"},
     {"import", "@/fifo", "--in", "@/folder"},
@@ -225,19 +225,19 @@ const Words commands[] = {
     {"import", "~/outside/new.txt", "--in", "@/missing"},
     {"changes", "--since", "$", "workingset"},
     {"rename", "@/letter.txt", "note.txt"},
-    {"rename", "@/note.txt", bytes},
+    {"rename", "@/note.txt", noUTF8},
     {"rename", "@/note.txt", "note.txt"},
     {"rename", "@/note.txt", "x/y"},
     {"rename", "@/note.txt", longName + "n"},
-    {"rename", "@/note.txt", bytes + bytes},
-    {"rename", "@/" + bytes + bytes, "note.txt"},
+    {"rename", "@/note.txt", noUTF8 + noUTF8},
+    {"rename", "@/" + noUTF8 + noUTF8, "note.txt"},
     {"rename", "root", "other"},
     {"rename", "#org.example.Draw", "other"},
     {"rename", "@/missing", "other"},
     {"mv", "@/note.txt", "@/folder"},
     {"mv", "@/folder/note.txt", "root", "--name", "new"},
-    {"mv", "@/folder/note.txt", "root", "--name", bytes + "2"},
-    {"mv", "@/" + bytes + "2", "@/target", "--name", "note.txt"},
+    {"mv", "@/folder/note.txt", "root", "--name", noUTF8 + "2"},
+    {"mv", "@/" + noUTF8 + "2", "@/target", "--name", "note.txt"},
     {"mv", "@/target/note.txt", "@/missing"},
     {"mv", "@/target/note.txt", "@/link"},
     {"mv", "@/target", "@/target"},
@@ -252,10 +252,10 @@ const Words commands[] = {
     {"tag", "@/target", ""},
     {"tag", "@/missing", "Red"},
     {"tag", "root", "Red"},
-    {"tag", "@/" + bytes, "Blue"},
-    {"tag", "@/" + bytes, "--clear"},
+    {"tag", "@/" + noUTF8, "Blue"},
+    {"tag", "@/" + noUTF8, "--clear"},
     {"favorite", "@/target/note.txt", "2"},
-    {"favorite", "@/" + bytes, "-1"},
+    {"favorite", "@/" + noUTF8, "-1"},
     {"favorite", "@/" + lines, "18446744073709551615"},
     {"favorite", "@/folder", "0.1"},
     {"favorite", "@/target", "nan"},
@@ -266,14 +266,14 @@ const Words commands[] = {
     {"favorites", "--limit", "2"},
     {"favorite", "@/folder", "--clear"},
     {"used", "@/target/note.txt", "2001-02-03T04:05:06.789Z"},
-    {"used", "@/" + bytes, "1969-12-31T23:59:59.000000001Z"},
+    {"used", "@/" + noUTF8, "1969-12-31T23:59:59.000000001Z"},
     {"used", "@/" + lines, "2001-02-03"},
     {"used", "@/target", "yesterday"},
     {"used", "@/missing", "2001-02-03"},
     {"used", "root", "2001-02-03"},
     {"info", "@/target/note.txt"},
-    {"info", "@/" + bytes},
-    {"used", "@/" + bytes, "--clear"},
+    {"info", "@/" + noUTF8},
+    {"used", "@/" + noUTF8, "--clear"},
     // Searches.
     {"search", "note"},
     {"search", "CAF"},
@@ -289,7 +289,7 @@ const Words commands[] = {
     {"search", " "},
     {"recent", "--limit", "2"},
     // The trash.
-    {"trash", "@/target/note.txt", "@/" + bytes, "@/missing", "@/many"},
+    {"trash", "@/target/note.txt", "@/" + noUTF8, "@/missing", "@/many"},
     {"trash", "root"},
     {"trash", "#org.example.Draw"},
     {"search", "note", "--trashed"},
@@ -298,8 +298,8 @@ const Words commands[] = {
     {"restore", "@/.Trash/note.txt"},
     {"restore", "@/target/note.txt"},
     {"restore", "@/.Trash/many", "--to", "@/folder"},
-    {"restore", "@/.Trash/" + bytes, "--to", "@/link"},
-    {"restore", "@/.Trash/" + bytes, "--to", "did=99999"},
+    {"restore", "@/.Trash/" + noUTF8, "--to", "@/link"},
+    {"restore", "@/.Trash/" + noUTF8, "--to", "did=99999"},
     {"expire", "--older-than", "30d", "--dry-run"},
     {"expire", "--older-than", "2100-01-01", "--dry-run"},
     {"expire", "--older-than", "2100-01-01"},
@@ -364,7 +364,7 @@ TEST_F(ServedHome, IsFoundUnderEachOfItsNamesAndAnotherIsNot) {
 }
 
 TEST_F(ServedHome, MayHaveANameOfBytesAndStillGetsItsErrors) {
-  const std::string path = home.path() + "/" + bytes;
+  const std::string path = home.path() + "/" + noUTF8;
   fs::create_directories(path + "/Documents");
   service = std::make_unique<Running>(Words{MIRABEL_PROGRAM, "--home", path, "serve"});
   ASSERT_THAT(service->errors().line(), ::testing::StartsWith("mirabel: serving "));

@@ -19,8 +19,8 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::UnorderedElementsAre;
 
-const std::string one = "org.example.One";
-const std::string two = "org.example.Two";
+const std::string itself = "org.example.One";
+const std::string another = "org.example.Two";
 const std::string infoOfOne = "[Application]\nname=org.example.One\n";
 const std::string accessDenied = "org.freedesktop.DBus.Error.AccessDenied";
 const std::string noAccess = "com.norvane.Vessel1.Error.POSIX.EACCES";
@@ -44,13 +44,13 @@ class Sandboxed : public ServiceFixture {
     if (IsSkipped()) return;
     if (!inSandbox("", [](BusClient&) {})) GTEST_SKIP() << "no root of its own can be had";
     home.writeFile("private doc", "secret");
-    for (const std::string& bundle : {one, two}) {
+    for (const std::string& bundle : {itself, another}) {
       apps.install(bundle, bundle.substr(12));
       apps.write(bundle, "doc of " + bundle.substr(12), "text");
     }
     fs::create_directory(at("folder"));
     for (const char* name : {"stays", "leaves", "goes"})
-      apps.write(one, std::string("folder/") + name, name);
+      apps.write(itself, std::string("folder/") + name, name);
     serve();
     outside = std::make_unique<BusClient>();
     for (const std::string& path : {home.at("private doc"), at("doc of One")})
@@ -61,7 +61,7 @@ class Sandboxed : public ServiceFixture {
           "");
   }
 
-  std::string at(const std::string& name) const { return apps.documents(one) + "/" + name; }
+  std::string at(const std::string& name) const { return apps.documents(itself) + "/" + name; }
   void inOne(const std::function<void(BusClient& client)>& body) const {
     EXPECT_TRUE(inSandbox(infoOfOne, body));
   }
@@ -75,13 +75,13 @@ TEST_F(Sandboxed, CallersSeeTheirOwnLibraryWithoutPlaces) {
   const std::string folder = outside->idOf(at("folder"));
   inOne([&](BusClient& client) {
     EXPECT_THAT(namesOf(client.items(client.provider("ListAppLibraries"))), ElementsAre("One"));
-    EXPECT_THAT(namesOf(client.items(client.provider("ListItems", "#" + one, nothing))),
+    EXPECT_THAT(namesOf(client.items(client.provider("ListItems", "#" + itself, nothing))),
                 UnorderedElementsAre("doc of One", "folder"));
     EXPECT_THAT(namesOf(client.items(client.provider("ListItems", folder, nothing))),
                 UnorderedElementsAre("stays", "leaves", "goes"));
-    for (const std::string& item : {document, "#" + one})
+    for (const std::string& item : {document, "#" + itself})
       namesOf({client.item(client.provider("GetItem", item))});
-    namesOf({client.item(client.provider("GetDefaultContainer", one))});
+    namesOf({client.item(client.provider("GetDefaultContainer", itself))});
     const BusOptions options;
     const std::vector<std::string> words{"doc"};
     EXPECT_THAT(namesOf(client.items(client.provider("Search", words, options))),
@@ -108,7 +108,7 @@ TEST_F(Sandboxed, CallersAreRefusedWhatIsMadeOfSeveralFoldersAndTheManager) {
     }
     const Data bytes = dataFromString(path);
     EXPECT_EQ(client.provider("GetItemAtPath", bytes).error, accessDenied);
-    EXPECT_EQ(client.operations("ImportPath", bytes, "#" + one).error, accessDenied);
+    EXPECT_EQ(client.operations("ImportPath", bytes, "#" + itself).error, accessDenied);
     const std::string date = "2100-01-01T00:00:00Z";
     for (const char* method : {"GetStatus", "GetHome", "GetProgress"})
       EXPECT_EQ(client.call(bus::managerInterface, method).error, accessDenied) << method;
@@ -119,8 +119,8 @@ TEST_F(Sandboxed, CallersAreRefusedWhatIsMadeOfSeveralFoldersAndTheManager) {
 
 TEST_F(Sandboxed, CallersCannotTellWhatIsSomebodyElsesFromWhatIsNotThere) {
   const std::string own = outside->idOf(at("doc of One"));
-  const std::vector<std::string> others = {outside->idOf(home.at("private doc")), "#" + two,
-                                           outside->idOf(apps.documents(two) + "/doc of Two"),
+  const std::vector<std::string> others = {outside->idOf(home.at("private doc")), "#" + another,
+                                           outside->idOf(apps.documents(another) + "/doc of Two"),
                                            std::string(VesselRootContainerItemIdentifier)};
   inOne([&](BusClient& client) {
     const BusOptions options;
@@ -133,7 +133,7 @@ TEST_F(Sandboxed, CallersCannotTellWhatIsSomebodyElsesFromWhatIsNotThere) {
         [&](auto& id) { return client.provider("OpenItem", id, std::string("r")); },
         [&](auto& id) { return client.provider("GetIcon", id, std::uint32_t{16}); },
         [&](auto& id) { return client.operations("Rename", id, name, options); },
-        [&](auto& id) { return client.operations("Reparent", id, "#" + one, options); },
+        [&](auto& id) { return client.operations("Reparent", id, "#" + itself, options); },
         [&](auto& id) { return client.operations("Reparent", own, id, options); },
         [&](auto& id) { return client.operations("CreateDirectory", name, id, options); },
         [&](auto& id) { return client.operations("ImportDocument", handed, name, id, options); },
@@ -158,11 +158,11 @@ TEST_F(Sandboxed, CallersCannotTellWhatIsSomebodyElsesFromWhatIsNotThere) {
       }
     }
     const auto missing = client.provider("GetDefaultContainer", std::string("org.example.None"));
-    const auto other = client.provider("GetDefaultContainer", two);
+    const auto other = client.provider("GetDefaultContainer", another);
     EXPECT_EQ(other.error, missing.error);
     EXPECT_EQ(other.message, missing.message);
   });
-  EXPECT_TRUE(fs::exists(home.at("private doc")) && fs::exists(apps.documents(two)));
+  EXPECT_TRUE(fs::exists(home.at("private doc")) && fs::exists(apps.documents(another)));
 }
 
 TEST_F(Sandboxed, CallersAreToldThatWhatLeftTheirFolderIsGone) {
@@ -193,7 +193,7 @@ TEST_F(Sandboxed, CallersImportWhatTheyCouldReadAndNothingElse) {
   inOne([&](BusClient& client) {
     const BusOptions options;
     const auto import = [&](const UniqueFd& from, const std::string& name) {
-      return client.operations("ImportDocument", sdbus::UnixFd(from.get()), name, "#" + one,
+      return client.operations("ImportDocument", sdbus::UnixFd(from.get()), name, "#" + itself,
                                options);
     };
     EXPECT_EQ(import(place, "place").error, "com.norvane.Vessel1.Error.POSIX.EBADF");
@@ -203,7 +203,7 @@ TEST_F(Sandboxed, CallersImportWhatTheyCouldReadAndNothingElse) {
       EXPECT_EQ(import(reading, name).error, "com.norvane.Vessel1.Error.POSIX.EINVAL") << name;
     const ItemRecord item = client.item(import(reading, "imported"));
     EXPECT_THAT(namesOf({item}), ElementsAre("imported"));
-    EXPECT_EQ(item.parentItemIdentifier, "#" + one);
+    EXPECT_EQ(item.parentItemIdentifier, "#" + itself);
   });
   std::string content;
   std::ifstream(at("imported")) >> content;
@@ -226,9 +226,10 @@ TEST_F(Sandboxed, CallersDoNotComeOutThroughLinksAndNames) {
               "com.norvane.Vessel1.Error.POSIX.ENOTDIR");
     for (const std::string name : {"../up", "/etc/up", "..", "folder link/in"}) {
       EXPECT_NE(client.operations("Rename", document, name, options).error, "") << name;
-      EXPECT_NE(client.operations("CreateDirectory", name, "#" + one, options).error, "") << name;
+      EXPECT_NE(client.operations("CreateDirectory", name, "#" + itself, options).error, "")
+          << name;
       const BusOptions named{{"name", sdbus::Variant(name)}};
-      EXPECT_NE(client.operations("Reparent", document, "#" + one, named).error, "") << name;
+      EXPECT_NE(client.operations("Reparent", document, "#" + itself, named).error, "") << name;
     }
     EXPECT_NE(client.operations("CreateDirectory", std::string("in"), folderLink, options).error,
               "");
@@ -242,7 +243,7 @@ TEST_F(Sandboxed, CallersOfNoKnownApplicationSeeNothing) {
   for (const char* info : {"[Instance]\nname=org.example.One\n", "[Application]\n", " "}) {
     EXPECT_TRUE(inSandbox(info, [&](BusClient& client) {
       EXPECT_THAT(client.items(client.provider("ListAppLibraries")), IsEmpty());
-      EXPECT_EQ(client.provider("GetItem", "#" + one).error, noSuchItem);
+      EXPECT_EQ(client.provider("GetItem", "#" + itself).error, noSuchItem);
       EXPECT_EQ(client.provider("GetDefaultContainer", std::string()).error, noSuchItem);
       const std::vector<std::string> words{"doc"};
       EXPECT_THAT(client.items(client.provider("Search", words, BusOptions())), IsEmpty());
@@ -250,7 +251,7 @@ TEST_F(Sandboxed, CallersOfNoKnownApplicationSeeNothing) {
   }
   // A root of its own alone is no sandbox.
   EXPECT_TRUE(inSandbox("", [&](BusClient& client) {
-    EXPECT_EQ(client.item(client.provider("GetItem", "#" + two)).path, apps.documents(two));
+    EXPECT_EQ(client.item(client.provider("GetItem", "#" + another)).path, apps.documents(another));
   }));
 }
 

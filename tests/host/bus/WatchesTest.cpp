@@ -11,7 +11,7 @@ namespace {
 namespace fs = std::filesystem;
 using ::testing::IsEmpty;
 
-const std::string root(VesselRootContainerItemIdentifier);
+const std::string rootItem(VesselRootContainerItemIdentifier);
 const std::string workingSet(VesselWorkingSetContainerItemIdentifier);
 
 class Watches : public ServiceFixture {
@@ -59,12 +59,12 @@ TEST_F(Watches, WakeThoseWhoseContainerHasChangesAndNobodyElse) {
   const std::string b = ofB.idOf(home.at("b"));
   watch(ofA, a);
   watch(ofB, b);
-  watch(ofRoot, root);
+  watch(ofRoot, rootItem);
   watch(ofWorkingSet, workingSet);
   home.writeFile("a/doc");
   EXPECT_EQ(ofA.signal(), a);
   // The folder itself has another count and date, which the root hands out.
-  EXPECT_EQ(ofRoot.signal(), root);
+  EXPECT_EQ(ofRoot.signal(), rootItem);
   EXPECT_EQ(ofWorkingSet.signal(), workingSet);
   EXPECT_THAT(takeSignals(ofB), IsEmpty());
   // What is written into the document is nothing of the root's.
@@ -101,10 +101,10 @@ TEST_F(Watches, OfOneFolderAreAllWokenAndEndOneByOne) {
 
 TEST_F(Watches, SeeAnApplicationThatIsInstalled) {
   BusClient client;
-  watch(client, root);
+  watch(client, rootItem);
   const InstalledApps apps(home);
   apps.install("org.example.Draw", "Draw");
-  EXPECT_EQ(client.signal(), root);
+  EXPECT_EQ(client.signal(), rootItem);
   static_cast<void>(takeSignals(client));
   EXPECT_EQ(BusClient::item(client.provider("GetItem", std::string("#org.example.Draw"))).filename,
             "Draw");
@@ -156,7 +156,7 @@ TEST_F(Watches, AreNotMoreThanAClientMayHave) {
   watch(client, client.idOf(home.at("256")));
   // Another client is not in its way.
   BusClient other;
-  watch(other, root);
+  watch(other, rootItem);
 }
 
 }  // namespace

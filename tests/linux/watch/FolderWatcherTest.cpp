@@ -18,7 +18,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-class FolderWatcherTest : public testing::TestWithParam<WatcherKind> {
+class FolderWatcherTest : public ::testing::TestWithParam<WatcherKind> {
  protected:
   void SetUp() override {
     const char* given = std::getenv("MIRABEL_TEST_DIR");
@@ -173,8 +173,8 @@ TEST_P(FolderWatcherTest, RefusesWhatIsNoFolder) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Watchers, FolderWatcherTest,
-                         testing::Values(WatcherKind::folderMarks, WatcherKind::inotify,
-                                         WatcherKind::fileSystemMark),
+                         ::testing::Values(WatcherKind::folderMarks, WatcherKind::inotify,
+                                           WatcherKind::fileSystemMark),
                          [](const auto& instance) {
                            switch (instance.param) {
                              case WatcherKind::folderMarks:
