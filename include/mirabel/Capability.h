@@ -4,7 +4,8 @@
 
 namespace mirabel {
 
-/// What the host may do with an item; the host's bit values.
+/// What a program may do with an item, as bits. Those of what the user may not write, and of the
+/// root, are reading alone.
 enum Capability : std::uint64_t {
   capabilityReading = 1,  ///< and enumerating the contents
   capabilityWriting = 2,  ///< and adding sub-items

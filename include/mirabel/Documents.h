@@ -39,15 +39,20 @@ struct ItemChanges {
 class MIRABEL_EXPORT DocumentContainer {
  public:
   virtual ~DocumentContainer() = default;
-  /// The page that a cursor stands for; `VesselInitialPageSortedByName` begins. Errors:
-  /// `syncAnchorExpired` for a cursor that can't be used any more; the listing starts over.
+  /// The page that a cursor stands for; `VesselInitialPageSortedByName` begins. A cursor is good in
+  /// other processes and after a crash, until something that lies there is deleted or the app
+  /// libraries change. Errors:
+  /// `syncAnchorExpired` for a cursor that can't be used any more: list again from the beginning;
+  /// `VesselErrorCode::noSuchItem` for a container that is gone.
   [[nodiscard]] virtual Result<ItemPage> items(const Data& page) = 0;
-  /// A batch of what has changed since the anchor. Errors: `syncAnchorExpired` for one that can't
-  /// be used any more; the container has to be listed again.
+  /// A batch of what has changed since the anchor, 100 things at most. An anchor is good in other
+  /// processes and after a crash. Errors: `syncAnchorExpired` for one that can't be used any more:
+  /// take a new anchor and list again; `VesselErrorCode::noSuchItem` for a container that is gone.
   [[nodiscard]] virtual Result<ItemChanges> changes(const Data& anchor) = 0;
   /// The moment of now in its history. Who keeps a copy asks for it before listing, so that what
-  /// happens during the listing is told afterwards. Error:
-  /// `LocalVesselError::unableToGetDeviceUUID`.
+  /// happens during the listing is told afterwards. The first time in a process it costs a look at
+  /// each file. Errors: `LocalVesselError::unableToGetDeviceUUID`; `VesselErrorCode::noSuchItem`
+  /// for a container that is gone.
   [[nodiscard]] virtual Result<Data> currentSyncAnchor() = 0;
 };
 
@@ -67,8 +72,8 @@ struct Progress {
 
 /// What lies in a trash folder and was trashed before a date.
 struct TrashedItem {
-  std::optional<std::string> itemIdentifier;
-  std::string path;
+  std::optional<std::string> itemIdentifier;  ///< absent for what is no item
+  std::string path;                           ///< absolute
   Date trashDate;
 };
 
@@ -96,7 +101,13 @@ struct ApplicationContainer {
 /// call it. Its containers and watches have to go before it does.
 ///
 /// Containers are named by an item's identifier or by one of the constants in mirabel/Containers.h.
-/// Where the service does not answer (any more), the error is POSIX ENOTCONN.
+/// Paths are absolute, and bytes. Where the service does not answer (any more), the error is POSIX
+/// ENOTCONN; an operation that ends with it may have been done. No call through the service is
+/// given up for time.
+///
+/// Handlers and watches are called on threads of the library, where the answers of the service
+/// arrive too. They must not call anything here but the end of a watch: what they would wait for
+/// may never come.
 class MIRABEL_EXPORT Documents {
  public:
   using ItemResult = Result<ItemRecord>;
@@ -105,8 +116,10 @@ class MIRABEL_EXPORT Documents {
 
   virtual ~Documents() = default;
 
-  // Lookups. Errors: `VesselErrorCode::noSuchItem`; `LocalVesselError::itemNotFound` for what is
-  // there and not shown, with the reason; POSIX and file errors for a path that leads nowhere.
+  // Lookups. What is met for the first time is given an identifier, which is on disk when it is
+  // answered. Errors: `VesselErrorCode::noSuchItem`; `LocalVesselError::itemNotFound` for what is
+  // there and not shown, with the reason; `FileErrorCode::noSuchFile` and POSIX errors for a path
+  // that leads nowhere.
 
   [[nodiscard]] virtual ItemResult item(std::string_view identifier) = 0;
   /// What lies at an absolute path, its links but for the last component resolved.
@@ -114,22 +127,25 @@ class MIRABEL_EXPORT Documents {
   /// Errors: those of a lookup; POSIX ENOTDIR for what is no folder.
   [[nodiscard]] virtual Result<std::unique_ptr<DocumentContainer>> container(
       std::string_view identifier) = 0;
-  /// Calls `changed`, on a thread of its own, whenever something has happened in the container
-  /// since the watch began, once for several changes that come together. It must not wait for the
-  /// watch to end. After a time without the service it is called too. Errors: those of `container`.
+  /// Calls `changed`, on a thread of the library, whenever something has happened in the container
+  /// since the watch began, once for several changes that come together, and now and then for none.
+  /// When the service leaves and when it is back it is called too. Errors: those of `container`;
+  /// POSIX ENOBUFS for more than 256 through the service.
   [[nodiscard]] virtual Result<std::unique_ptr<ContainerWatch>> watch(
       std::string_view identifier, std::function<void()> changed) = 0;
 
   enum class Access { reading, readingAndWriting };
-  /// The file itself, open. Errors: those of a lookup; POSIX EISDIR for a folder, ENOTSUP for
-  /// anything else that is no regular file, EACCES.
+  /// The file itself, open; it stays open when the item is moved or deleted. Errors: those of a
+  /// lookup; POSIX EISDIR for a folder, ENOTSUP for anything else that is no regular file, EACCES,
+  /// EBUSY for one that is being replaced all the time.
   [[nodiscard]] virtual Result<UniqueFd> openFile(std::string_view identifier, Access access) = 0;
 
   // Operations. Handlers are called exactly once, on any thread, perhaps before the call returns,
-  // with the item as it is then; they must not wait for another operation. On success the change is
-  // on disk; after a crash it is done or undone, never half. Errors: `VesselErrorCode::noSuchItem`
-  // for an identifier that leads nowhere; `VesselErrorCode::collision`, or where what is in the way
-  // is no item `FileErrorCode::fileExists`, for a name that is taken, for nothing is ever replaced;
+  // with the item as it is then. On success the change is on disk; after a crash it is done or
+  // undone, never half. Of a file with several hard links one name is changed, and the others stay.
+  // Errors: `VesselErrorCode::noSuchItem` for an identifier that leads nowhere;
+  // `VesselErrorCode::collision`, or where what is in the way is no item
+  // `FileErrorCode::fileExists`, for a name that is taken, for nothing is ever replaced;
   // `FileErrorCode::writeNotPermitted` for a place in the root container itself; POSIX EINVAL for
   // a name that none can have, and other POSIX errors. Where the change was made and its item can't
   // be built, the error is the lookup's, and the change stays.
@@ -151,33 +167,37 @@ class MIRABEL_EXPORT Documents {
   /// Moves it to the trash of its documents, under a name made from its own where that is taken.
   /// Where it came from is on disk first. Errors of `ErrorDomain::store` too.
   virtual void trash(const std::string& identifier, ItemHandler handler) = 0;
-  /// Moves it out of the trash: into the parent if one is given, or else back to where it came from
-  /// under the name that it had, or one made from it where that is taken. Error: invalid parameter
-  /// `itemIdentifier` for what is not in the trash, or has no place to go.
+  /// Moves it out of the trash, under the name that it had or one made from it where that is taken:
+  /// into the parent, if one is given that is there and not in the trash itself; or else back to
+  /// where it came from; or else, where that is gone and it lies in an app library, into that.
+  /// Error: invalid parameter `itemIdentifier` for what is not in the trash, or has no place to go.
   virtual void restore(const std::string& identifier, const std::optional<std::string>& parent,
                        ItemHandler handler) = 0;
 
   // What the user says of a file; nothing given takes it away. It lies in an extended attribute of
-  // the file, which stays as it was after an error.
+  // the file, which stays as it was after an error: POSIX ENOTSUP where the file system has none,
+  // ENOSPC where there is no room for it, EACCES and EPERM.
 
   virtual void setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,
                                ItemHandler handler) = 0;
-  /// In the encoding of mirabel/TagData.h; anything else counts as no tags.
+  /// In the encoding of mirabel/TagData.h; anything else counts as no tags. The labels are kept,
+  /// colours are not. Where the labels have more than 64 KiB, the tags are taken away.
   virtual void setTagData(const std::string& identifier, const std::optional<Data>& tagData,
                           ItemHandler handler) = 0;
   virtual void setFavoriteRank(const std::string& identifier, const std::optional<Number>& rank,
                                ItemHandler handler) = 0;
 
-  // The trash.
+  // The trash: that of the documents and those of the app libraries.
 
+  /// What `removeItemsTrashedBefore` would delete.
   [[nodiscard]] virtual Result<TrashFindings> itemsTrashedBefore(const Date& date) = 0;
   /// Deletes for good what was trashed before the date. What has no date, because another program
   /// put it there, gets the one of now, and so goes one period later. The trash is walked before
-  /// the call returns; not to be called from a handler. What can't be deleted stays for the next
-  /// time, and is no error.
+  /// the call returns. What can't be deleted stays for the next time, and is no error.
   virtual void removeItemsTrashedBefore(const Date& date, ErrorHandler handler) = 0;
 
-  /// How far the operations of the process have come that holds the documents.
+  /// How far the operations of the process have come that holds the documents; zeros where the
+  /// service does not answer.
   [[nodiscard]] virtual Progress progress() = 0;
 
   // Applications.
@@ -188,21 +208,25 @@ class MIRABEL_EXPORT Documents {
   /// `LocalVesselError::itemNotFound`, with the reason.
   [[nodiscard]] virtual Result<ApplicationContainer> applicationContainer(
       const std::string& bundle) = 0;
-  /// A PNG file of at most `side` pixels each way; nothing for what has no picture.
+  /// A PNG file of at most `side` pixels each way, 1 to 4096; nothing for what is no app library.
+  /// Errors: `VesselErrorCode::noSuchItem` for one of no application, POSIX errors for an icon that
+  /// is not there or can't be drawn.
   [[nodiscard]] virtual Result<std::optional<Data>> icon(const std::string& identifier,
                                                          std::uint32_t side) = 0;
 
   // The search index, in step with the disk as of the call, in which it may have to be fed first.
   // Errors: `ErrorDomain::store`, POSIX.
 
+  /// The best matches come first, and of those as good the newest.
   [[nodiscard]] virtual Result<std::vector<ItemRecord>> search(const SearchQuery& query) = 0;
   /// The documents that were used or changed last, the last first.
   [[nodiscard]] virtual Result<std::vector<ItemRecord>> recent(std::size_t limit) = 0;
-  /// In the order of their ranks, `limit` at most.
+  /// What has a rank, the lowest first, `limit` at most.
   [[nodiscard]] virtual Result<std::vector<ItemRecord>> favorites(std::size_t limit) = 0;
 
-  /// Error: that the index can't be brought in step with the disk.
+  /// How changes are followed. Brings the index in step first. Error: that it can't be.
   [[nodiscard]] virtual Result<StatusReport> status() = 0;
+  /// Whose documents these are.
   [[nodiscard]] virtual HomePlaces places() = 0;
 };
 

@@ -22,7 +22,7 @@ enum class ErrorDomain {
   vessel,        ///< errors that the host acts on, see `VesselErrorCode`
   localVessel,   ///< Mirabel's own, see `LocalVesselError`
   propertyList,  ///< bytes that are no property list or archive of ours
-  store,         ///< the volume's database
+  store,         ///< the volume's database or the search index; code is SQLite's
 };
 
 /// Codes of `ErrorDomain::file`.
@@ -40,17 +40,17 @@ enum class VesselErrorCode : std::int64_t {
   invalidParameter = -1010,   ///< `errorkey::parameter` and `errorkey::value`
 };
 
-/// Codes of `ErrorDomain::localVessel`, in the order that hosts know.
+/// Codes of `ErrorDomain::localVessel`.
 enum class LocalVesselError : std::int64_t {
-  invalidItemIdentifier = 0,
-  invalidItemURL = 1,
-  itemNotFound = 2,
-  unableToGetDeviceUUID = 3,
+  invalidItemIdentifier = 0,  ///< not of a form that identifiers have
+  invalidItemURL = 1,         ///< a place that is none
+  itemNotFound = 2,           ///< it is there, and not shown
+  unableToGetDeviceUUID = 3,  ///< the volume can't be told from others
 };
 
-/// Keys of `Error::userInfo`.
+/// Keys of `Error::userInfo`. An error that comes from the service has none of these.
 namespace errorkey {
-inline constexpr std::string_view collidingURL = "collidingURL";
+inline constexpr std::string_view collidingURL = "collidingURL";    ///< path of what has the name
 inline constexpr std::string_view collidingItem = "collidingItem";  ///< its identifier
 inline constexpr std::string_view itemIdentifier = "itemIdentifier";
 inline constexpr std::string_view parameter = "parameter";

@@ -15,23 +15,26 @@ struct ItemRecord {
   /// Of the thing, wherever it is moved: "did=N" a document, "fid=N" a folder, "#BUNDLE" the
   /// documents of an application, or one of mirabel/Containers.h.
   std::string itemIdentifier;
-  std::string parentItemIdentifier;
-  std::string filename;
+  std::string parentItemIdentifier;      ///< of the folder that it lies in
+  std::string filename;                  ///< of an app library, the application's name
   std::string typeIdentifier;            ///< a MIME type; "inode/directory" for a folder
   std::optional<Number> documentSize{};  ///< bytes
   std::optional<Date> creationDate{};
   std::optional<Date> contentModificationDate{};
-  std::optional<std::uint16_t> childItemCount{};  ///< of a folder: its entries, at most 65,535
-  std::uint64_t capabilities = 0;                 ///< bits of `Capability`
+  /// Of a folder: its entries, hidden ones among them; 65,533 stands for that many and more.
+  std::optional<std::uint16_t> childItemCount{};
+  std::uint64_t capabilities = 0;  ///< bits of `Capability`
   bool isTrashed = false;
   std::optional<Date> lastUsedDate{};
-  std::optional<Data> tagData{};  ///< see mirabel/TagData.h
-  std::optional<Number> favoriteRank{};
-  std::optional<std::uint64_t> fileID{};
-  std::optional<std::uint64_t> docID{};
+  std::optional<Data> tagData{};          ///< see mirabel/TagData.h
+  std::optional<Number> favoriteRank{};   ///< the lowest comes first
+  std::optional<std::uint64_t> fileID{};  ///< of the object; another one after a save by renaming
+  std::optional<std::uint64_t> docID{};   ///< the N of "did=N"
   std::optional<std::string> beaconDomainIdentifier{};        ///< its domain in the search index
   std::optional<std::string> appContainerBundleIdentifier{};  ///< the application that owns it
-  std::optional<std::string> putBackPath{};                   ///< of what is in the trash
+  /// Of what is in the trash of an app library: the absolute path that it came from. Where a
+  /// document was trashed from is kept elsewhere, and found when it is restored.
+  std::optional<std::string> putBackPath{};
   /// Where it lies, absolute; empty for a program that may not know.
   std::string path{};
 

@@ -23,8 +23,10 @@ struct SearchQuery {
   std::optional<Date> modifiedSince{};
   std::optional<Date> modifiedBefore{};
   bool includesTrashed = false;
-  /// Only what lies in the documents of this application: its bundle identifier.
+  /// Only what lies in the documents of this application: its bundle identifier. Counts for nothing
+  /// where the service answers.
   std::optional<std::string> domain{};
+  /// At most so many, the best matches; where the service answers, never more than 10,000.
   std::size_t limit = 100;
 };
 

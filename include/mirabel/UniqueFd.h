@@ -5,7 +5,7 @@
 
 namespace mirabel {
 
-/// Owns a file descriptor.
+/// Owns a file descriptor, and closes it.
 class UniqueFd {
  public:
   UniqueFd() = default;
@@ -17,9 +17,11 @@ class UniqueFd {
   }
   ~UniqueFd() { reset(); }
 
+  /// Stays owned; -1 where there is none.
   [[nodiscard]] int get() const { return fd_; }
   [[nodiscard]] bool isOpen() const { return fd_ >= 0; }
   explicit operator bool() const { return isOpen(); }
+  /// Hands it over: the caller closes it.
   [[nodiscard]] int release() { return std::exchange(fd_, -1); }
   void reset(int fd = -1) {
     if (fd_ >= 0) ::close(fd_);
