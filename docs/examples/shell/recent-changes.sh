@@ -15,10 +15,12 @@ keep() {
 }
 
 list_everything() {
-  # The anchor comes first, so that what happens during the listing is told by the next call.
-  anchor=$(mirabel --json anchor workingset | jq -r .anchor)
-  mirabel --json ls workingset | jq -r '.items[] | "there " + .path'
-  keep "$anchor"
+  # The anchor comes first, so that what happens during the listing is told by the next call. Each
+  # answer is taken whole before it is read: in a pipe its failure would go unnoticed.
+  anchor=$(mirabel --json anchor workingset)
+  items=$(mirabel --json ls workingset)
+  printf '%s\n' "$items" | jq -r '.items[] | "there " + .path'
+  keep "$(printf '%s\n' "$anchor" | jq -r .anchor)"
 }
 
 if [ ! -e "$file" ]; then
