@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "foundation/Log.h"
+#include "foundation/LookFailure.h"
 #include "foundation/SplitWork.h"
 #include "platform/VesselManager.h"
 
@@ -58,7 +59,7 @@ std::unique_ptr<FSDirectoryWalk> GatherPage::makeWalk() const {
   plan.recursively = scope_.isRecursive();
   plan.directoryEnumerationOptionsFor = optionsFor;
   if (scope_.isRecursive()) {
-    plan.leavesOut = [](const URL&, const Error& error) { return meansOutOfReach(error); };
+    plan.leavesOut = [](const URL&, const Error& error) { return saysOutOfReach(error); };
   }
   // Known from before they are opened, so that a folder that is moved meanwhile is found out.
   const ResourceReader reader(context_.platform.resources);

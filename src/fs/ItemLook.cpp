@@ -1,17 +1,11 @@
 #include "fs/ItemLook.h"
 
-#include <algorithm>
 #include <cerrno>
 
+#include "foundation/LookFailure.h"
 #include "items/LocalAppLibraryItem.h"
 
 namespace mirabel {
-
-bool meansOutOfReach(const Error& error) {
-  if (error.is(FileErrorCode::noSuchFile)) return true;
-  constexpr int outOfReach[] = {ENOENT, ENOTDIR, ELOOP, EXDEV, EACCES, EPERM};
-  return std::ranges::any_of(outOfReach, [&](int value) { return error.isPosix(value); });
-}
 
 ItemLook::ItemLook(const ItemContext& context, const HiddenTest& hiddenTest)
     : context_(context), hiddenTest_(hiddenTest) {}
@@ -32,7 +26,7 @@ std::shared_ptr<LocalItem> ItemLook::appLibraryAt(const URL& url) const {
 Result<std::shared_ptr<LocalItem>> ItemLook::again(const URL& url) const {
   const URL fresh = URL::fileURL(url.path());
   const auto values = context_.platform.resources.readValues(fresh);
-  if (!values && meansOutOfReach(values.error())) return nullptr;
+  if (!values && saysOutOfReach(values.error())) return nullptr;
   if (!values) return fail(values.error());
   if (auto item = LocalItem::create(context_, fresh)) return item;
   // What is hidden may be no item for good reason; what left the monitored folders is not ours.

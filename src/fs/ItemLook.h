@@ -35,9 +35,4 @@ class ItemLook {
   const HiddenTest& hiddenTest_;
 };
 
-/// Whether the error of a look or of opening a folder says that the place is not, or no longer,
-/// one that is shown: gone, replaced by something else on the way, closed to this user, or
-/// behind the mount point of another file system.
-[[nodiscard]] bool meansOutOfReach(const Error& error);
-
 }  // namespace mirabel

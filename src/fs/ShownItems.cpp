@@ -24,9 +24,10 @@ ShownItems::ShownItems(const ItemContext& context, const AppLibraryRoots& roots,
                        everywhereSight_) {}
 
 Result<std::shared_ptr<LocalItem>> ShownItems::ofIdentifier(const std::string& identifier) {
-  const auto url = context_.identity.fileURLWithItemIdentifier(identifier);
-  if (!url) return nullptr;
-  const auto place = placeOf(*url);
+  const auto url = context_.identity.findItem(identifier);
+  if (!url) return fail(url.error());
+  if (!*url) return nullptr;
+  const auto place = placeOf(**url);
   if (!place) return fail(place.error());
   if (!*place) return nullptr;
   return look_.at(**place);

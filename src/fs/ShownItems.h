@@ -24,7 +24,8 @@ class ShownItems {
              const std::vector<URL>& folders, LinkNames::Depth depth);
 
   /// The item if a listing of the container, or of any other, shows it; null when none does.
-  /// Errors: those of `ItemLook::at` and `FileObjects::pathsOfFileID`, as with all of these.
+  /// Errors: those of `FileObjectURLs::findItem`, `ItemLook::at` and `FileObjects::pathsOfFileID`,
+  /// as with all of these.
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> ofIdentifier(const std::string& identifier);
   /// The item under the name that it is shown under; null when it is shown nowhere.
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> asShown(const std::shared_ptr<LocalItem>& item);

@@ -31,6 +31,7 @@ class HostedProvider {
   [[nodiscard]] MRBAppLibraryManager& libraries() const { return *libraries_; }
   [[nodiscard]] const Platform& platform() const { return platform_->platform(); }
   [[nodiscard]] const LinuxPlatform& linuxPlatform() const { return *platform_; }
+  [[nodiscard]] const FileObjectURLs& identity() const { return *identity_; }
   [[nodiscard]] SearchableItems& searchableItems() { return *searchable_; }
   /// Keeps up with applications that are installed and removed, from the first look at them on.
   void watchApplications() { platform_->watchApplications(); }

@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <system_error>
 
+#include "foundation/LookFailure.h"
 #include "linux/apps/LinuxApplicationRegistry.h"
 
 namespace mirabel {
@@ -66,10 +67,23 @@ Result<std::shared_ptr<LocalItem>> ItemLookup::byIdentifier(std::string_view ide
       return fail(withDetail(Error::local(LocalVesselError::itemNotFound), *std::move(reason)));
     }
   }
+  if (!item) return byIdentifierAgain(identifier);
+  return fail(Error::nonExistentItem(identifier));
+}
+
+Result<std::shared_ptr<LocalItem>> ItemLookup::byIdentifierAgain(
+    std::string_view identifier) const {
+  const auto url = provider_.identity().findItem(identifier);
+  if (!url) return fail(url.error());
+  if (!*url) return fail(Error::nonExistentItem(identifier));
+  const auto values = provider_.platform().resources.readValues(**url);
   const bool isRoot = identifier == VesselRootContainerItemIdentifier;
-  if (isRoot && !provider_.platform().resources.readValues(URL::fileURL(storage()))) {
+  if (!values && isRoot && saysAbsent(values.error())) {
     return fail(Error::posix(ENOENT, "the document storage \"" + storage() + "\""));
   }
+  if (!values && (isRoot || !saysOutOfReach(values.error()))) return fail(values.error());
+  auto item = provider_.vessel().itemForIdentifier(identifier);
+  if (item && isShown(**item)) return item;
   return fail(Error::nonExistentItem(identifier));
 }
 

@@ -19,7 +19,8 @@ class ItemLookup {
   explicit ItemLookup(const HostedProvider& provider) : provider_(provider) {}
 
   /// Errors: the host's no-such-item error; `LocalVesselError::itemNotFound`, with the reason, for
-  /// an application whose documents are not shown; POSIX ENOENT for a root that is not there.
+  /// an application whose documents are not shown; POSIX ENOENT for a root that is not there. POSIX
+  /// and store errors where it is not known whether there is such an item.
   [[nodiscard]] Result<std::shared_ptr<LocalItem>> byIdentifier(std::string_view identifier) const;
   /// What lies at an absolute path whose links are resolved but for the last component; that may
   /// be a link to the document storage or to an app library. Errors: POSIX and file errors for a
@@ -33,6 +34,9 @@ class ItemLookup {
   [[nodiscard]] bool isLibrary(const URL& url) const;
 
  private:
+  /// Looks again for what was not found: the first look does not say why.
+  [[nodiscard]] Result<std::shared_ptr<LocalItem>> byIdentifierAgain(
+      std::string_view identifier) const;
   [[nodiscard]] bool isWithinLibrary(const URL& url) const;
   [[nodiscard]] bool isShown(const LocalItem& item) const;
   [[nodiscard]] std::string withoutLinkToRoot(const std::string& path) const;

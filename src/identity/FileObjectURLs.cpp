@@ -228,6 +228,28 @@ std::optional<URL> FileObjectURLs::fileURLWithItemIdentifier(std::string_view id
   return _fileURLWithFileIdentifier(*fileID, device);
 }
 
+Result<std::optional<URL>> FileObjectURLs::findItem(std::string_view identifier) const {
+  if (auto url = fileURLWithItemIdentifier(identifier)) return url;
+  auto found = findAgain(identifier);
+  if (!found && found.error().isPosix(ENOENT)) return std::nullopt;
+  return found;
+}
+
+/// The operations above say no more than that they found nothing: asked for the reason.
+Result<std::optional<URL>> FileObjectURLs::findAgain(std::string_view identifier) const {
+  const bool isDocument = identifier.starts_with("did=");
+  if (!isDocument && !identifier.starts_with("fid=")) return std::nullopt;
+  const auto device = deviceIDWithError(platform_.manager.documentStorageURL());
+  if (!device) return fail(device.error());
+  const std::int64_t number = decimalPrefix(identifier.substr(4));
+  const auto fileID = isDocument ? platform_.documents.fileIDOfDocument(*device, number)
+                                 : Result<std::uint64_t>(static_cast<std::uint64_t>(number));
+  if (!fileID) return fail(fileID.error());
+  auto path = platform_.objects.pathOfFileID(*device, *fileID);
+  if (!path) return fail(path.error());
+  return URL::fileURL(*path);
+}
+
 std::optional<URL> FileObjectURLs::fileURLWithFileIdentifier(std::uint64_t fileID) const {
   const DeviceID device = documentStorageDevice();
   if (device == 0) return {};

@@ -37,6 +37,10 @@ class FileObjectURLs {
   /// The URL is made anew, with an empty resource cache. Blocks for up to 5 ms while the volume
   /// asks for patience.
   [[nodiscard]] std::optional<URL> fileURLWithItemIdentifier(std::string_view identifier) const;
+  /// The same, and why there is none: nothing when the volume says that no object has the
+  /// identifier, or it is of no form that identifiers have; POSIX and store errors when nothing is
+  /// known.
+  [[nodiscard]] Result<std::optional<URL>> findItem(std::string_view identifier) const;
   [[nodiscard]] std::optional<URL> fileURLWithFileIdentifier(std::uint64_t fileID) const;
   [[nodiscard]] std::optional<URL> _fileURLWithFileIdentifier(std::uint64_t fileID,
                                                               DeviceID device) const;
@@ -49,6 +53,7 @@ class FileObjectURLs {
   [[nodiscard]] std::optional<std::string> identifierFromDisk(const URL& url, bool isPackage) const;
   [[nodiscard]] std::optional<std::string> documentIdentifier(const URL& url, FileObject& object,
                                                               std::uint32_t assigned) const;
+  [[nodiscard]] Result<std::optional<URL>> findAgain(std::string_view identifier) const;
   /// 0, with an error line, when there is none.
   [[nodiscard]] DeviceID documentStorageDevice() const;
   [[nodiscard]] std::optional<std::uint64_t> fileIDOfDocument(DeviceID device,

@@ -18,11 +18,15 @@ Result<UniqueFd> openStep(int directory, const char* path, int flags, unsigned l
     const long fd = ::syscall(SYS_openat2, directory, path, &how, sizeof(how));
     if (fd >= 0) return UniqueFd(static_cast<int>(fd));
     if ((errno == EAGAIN && attempt < 64) || errno == EINTR) continue;
-    return fail(Error::posix(errno));
+    return fail(kernelError(errno));
   }
 }
 
 }  // namespace
+
+Error kernelError(int errnoValue) {
+  return Error::posix(errnoValue == ESTALE ? EREMOTEIO : errnoValue);
+}
 
 SplitPath splitPath(const std::string& path) {
   const std::size_t slash = path.rfind('/');

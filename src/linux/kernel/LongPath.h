@@ -18,6 +18,11 @@ inline constexpr std::size_t longPathThreshold = PATH_MAX;
 inline constexpr unsigned long long resolveBeneath =
     RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
 
+/// The error for an errno of the kernel's. Its ESTALE, of a server that has forgotten a handle,
+/// says nothing of what is there, and becomes EREMOTEIO: here ESTALE says that a name changed
+/// hands.
+[[nodiscard]] Error kernelError(int errnoValue);
+
 /// The parent of an absolute path, and its last component; "/" and "" for the root.
 struct SplitPath {
   std::string parent;

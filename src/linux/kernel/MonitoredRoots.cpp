@@ -7,6 +7,7 @@
 #include <mutex>
 #include <utility>
 
+#include "foundation/LookFailure.h"
 #include "linux/kernel/ObjectStatus.h"
 
 namespace mirabel {
@@ -34,11 +35,6 @@ Result<UniqueFd> openBelow(int root, std::uint64_t device, const std::string& re
   if (!status) return fail(status.error());
   if (status->device != device) return fail(Error::posix(EXDEV));
   return opened;
-}
-
-bool isAbsence(const Error& error) {
-  return error.isPosix(ENOENT) || error.isPosix(ENOTDIR) || error.isPosix(ELOOP) ||
-         error.isPosix(EACCES);
 }
 
 }  // namespace
@@ -121,9 +117,8 @@ MonitoredRoots::Changes MonitoredRoots::refresh() {
 bool MonitoredRoots::refresh(Root& root) {
   const auto resolve = root.isKeptOpen ? 0 : withoutLinks;
   auto opened = openLongPath(AT_FDCWD, root.path, O_PATH | O_DIRECTORY, resolve);
-  if (!opened && !isAbsence(opened.error())) return false;
   const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
-  if (!status && !root.isThere) return false;
+  if (!status && (!root.isThere || !saysOutOfReach(status.error()))) return false;
   if (status && root.isThere && status->inode == root.inode && status->device == root.device) {
     return false;
   }

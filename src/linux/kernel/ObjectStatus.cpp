@@ -1,15 +1,18 @@
 #include "linux/kernel/ObjectStatus.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <fcntl.h>
+#include <iterator>
 #include <limits>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 #include <sys/utsname.h>
 #include <time.h>
+#include <utility>
 
 #include "linux/kernel/LongPath.h"
 
@@ -63,12 +66,35 @@ std::int64_t coarseNow() {
   return now.tv_sec * nanosecondsPerSecond + now.tv_nsec;
 }
 
+// The kernel itself knows, without asking the file system that is mounted there.
+bool isMountPoint(int directory, const char* name) {
+  const SplitPath place = splitPath(name);
+  if (place.name.empty()) return false;
+  UniqueFd parent;
+  if (!place.parent.empty()) {
+    auto opened = openLongPath(directory, place.parent, O_PATH | O_DIRECTORY);
+    if (!opened) return false;
+    parent = std::move(*opened);
+  }
+  const int folder = parent ? parent.get() : directory;
+  const auto entry = openLongPath(folder, place.name, O_PATH, RESOLVE_NO_XDEV);
+  return !entry && entry.error().isPosix(EXDEV);
+}
+
+Error lookError(int directory, const char* name, int value) {
+  // What a mount answers whose server or device has gone.
+  constexpr int dead[] = {ENOTCONN, ESTALE, EIO, EHOSTDOWN, ETIMEDOUT, ENODEV};
+  const bool mayBeDead = std::ranges::find(dead, value) != std::end(dead);
+  if (mayBeDead && isMountPoint(directory, name)) return Error::posix(EXDEV);
+  return kernelError(value);
+}
+
 Result<ObjectStatus> look(int directory, const char* name, int links = AT_SYMLINK_NOFOLLOW) {
   const std::int64_t now = coarseNow();
   struct statx buffer;
   const int flags = links | AT_NO_AUTOMOUNT | (*name == '\0' ? AT_EMPTY_PATH : 0);
   if (::statx(directory, name, flags, STATX_BASIC_STATS | STATX_BTIME, &buffer) != 0) {
-    return fail(Error::posix(errno));
+    return fail(lookError(directory, name, errno));
   }
   ObjectStatus status = statusFrom(buffer);
   status.seenAt = now;

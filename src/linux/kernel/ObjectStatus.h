@@ -34,7 +34,8 @@ struct ObjectStatus {
 };
 
 /// Looks at `name` in the folder `directory`; an empty name looks at the descriptor itself. A
-/// final symbolic link is not followed, nothing is opened, no automount is set off. POSIX errors.
+/// final symbolic link is not followed, nothing is opened, no automount is set off. POSIX errors;
+/// EXDEV for a mount that is dead, which can't be entered any more than another.
 [[nodiscard]] Result<ObjectStatus> statusAt(int directory, const std::string& name);
 /// The same for an absolute path of any length, also beyond PATH_MAX.
 [[nodiscard]] Result<ObjectStatus> statusOf(const std::string& path);

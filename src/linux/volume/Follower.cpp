@@ -133,7 +133,7 @@ Result<bool> Follower::drain() {
   return true;
 }
 
-std::optional<std::vector<RecentPlace>> Follower::placesOf(std::uint64_t inode) {
+Result<std::optional<std::vector<RecentPlace>>> Follower::placesOf(std::uint64_t inode) {
   if (!isInStep_) return std::nullopt;
   auto isSound = drain();
   if (!isSound || !*isSound) {
@@ -142,7 +142,9 @@ std::optional<std::vector<RecentPlace>> Follower::placesOf(std::uint64_t inode) 
     isInStep_ = false;
     return std::nullopt;
   }
-  return recent_.placesOf(inode);
+  auto places = recent_.placesOf(inode);
+  if (!places) return fail(places.error());
+  return std::move(*places);
 }
 
 Result<void> Follower::addArrived() {

@@ -58,7 +58,8 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] std::shared_ptr<FolderWatcher> watcher() const { return watcher_; }
   [[nodiscard]] FollowStatus status() const;
 
-  [[nodiscard]] std::optional<std::vector<RecentPlace>> placesOf(std::uint64_t inode) override;
+  [[nodiscard]] Result<std::optional<std::vector<RecentPlace>>> placesOf(
+      std::uint64_t inode) override;
 
  private:
   enum class Outcome { inStep, lost };

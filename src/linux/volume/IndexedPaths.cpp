@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "foundation/LookFailure.h"
 #include "linux/volume/DiskEntry.h"
 #include "linux/volume/ObjectMatcher.h"
 
@@ -70,9 +71,13 @@ Result<std::optional<std::string>> IndexedPaths::standingPath(const ObjectRow& r
   auto path = pathOf(location);
   if (!path || !*path) return path;
   const auto look = lookAt(roots_, **path);
-  const bool stands = look && look->seen.status.inode == row.inode &&
-                      fileSystemOf(look->seen, device_) == row.fileSystem &&
-                      compare(row, look->seen) == Match::same;
+  if (!look && saysOutOfReach(look.error())) return std::nullopt;
+  if (!look) return fail(look.error());
+  if (look->seen.status.inode != row.inode) return std::nullopt;
+  const auto fileSystem = fileSystemOf(look->seen, device_);
+  if (!fileSystem && saysOutOfReach(fileSystem.error())) return std::nullopt;
+  if (!fileSystem) return fail(fileSystem.error());
+  const bool stands = *fileSystem == row.fileSystem && compare(row, look->seen) == Match::same;
   if (!stands) return std::nullopt;
   return path;
 }

@@ -12,7 +12,7 @@
 namespace mirabel {
 
 /// The paths of places in the index, and whether the disk agrees. Used under the lock of the index.
-/// Errors: `ErrorDomain::store`.
+/// Errors: `ErrorDomain::store`, and of a look at the disk the passing ones, see `LookFailure`.
 class IndexedPaths {
  public:
   /// References outlive it. `device` is the number of the volume's own file system.

@@ -7,10 +7,15 @@
 #include <utility>
 #include <vector>
 
+#include "foundation/LookFailure.h"
 #include "foundation/SplitWork.h"
 #include "linux/volume/DiskEntry.h"
 
 namespace mirabel {
+
+bool isDisturbance(const Error& error) {
+  return error.isPosix(ESTALE) || saysOutOfReach(error);
+}
 
 Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecorder& recorder,
                  const MonitoredRoots& roots, std::uint64_t device, PackageNames isPackageName)
@@ -191,7 +196,7 @@ Result<void> Learner::placeEntry(const Folder& folder, Sighting& sighting, Unset
     // Since it was seen, others may have looked later and told the index more: what is placed now
     // must be what is there now.
     auto status = statusAt(folder.descriptor, sighting.name);
-    if (!status) return {};
+    if (!status) return saysOutOfReach(status.error()) ? Result<void>() : fail(status.error());
     sighting.status = *status;
     sighting.isPackage = status->kind == FileKind::folder && isPackageName_(sighting.name);
   }

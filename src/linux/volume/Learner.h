@@ -17,6 +17,10 @@
 
 namespace mirabel {
 
+/// Whether an error says that what was looked at is not there, not ours, or changed hands meanwhile
+/// (ESTALE). After any other one nothing is known.
+[[nodiscard]] bool isDisturbance(const Error& error);
+
 /// Takes what was seen on disk, name by name or a folder's worth at a time, into the index, and
 /// answers the identities. Used under the lock of the index, inside one of its transactions.
 class Learner final : private FolderIdentities {

@@ -2,6 +2,7 @@
 #include <utility>
 #include <vector>
 
+#include "foundation/LookFailure.h"
 #include "linux/volume/DiskEntry.h"
 #include "linux/volume/Learner.h"
 
@@ -46,10 +47,10 @@ Result<void> Learner::learnAt(const Location& location) {
   if (!path) return fail(path.error());
   if (!*path) return {};
   const auto look = lookAt(roots_, **path);
-  if (!look) return {};
+  if (!look) return saysOutOfReach(look.error()) ? Result<void>() : fail(look.error());
   const std::string name = splitPath(**path).name;
   auto learned = learnPath(**path, look->seen.status, isPackageName_(name));
-  if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
+  if (!learned && !isDisturbance(learned.error())) return fail(learned.error());
   return {};
 }
 
@@ -60,8 +61,10 @@ Result<std::optional<std::string>> Learner::search(ObjectRow row) {
     if (!path) return fail(path.error());
     if (*path) hint = splitPath(**path).parent;
   }
-  const auto found =
+  const auto answer =
       finder_.find(row, hint.value_or(roots_.firstPath()), [] { return std::vector<ObjectRow>(); });
+  if (!answer) return fail(answer.error());
+  const auto& found = *answer;
   if (!found) {
     if (!row.location) return std::nullopt;
     if (auto left = leave(std::move(row)); !left) return fail(left.error());

@@ -32,8 +32,11 @@ class ObjectFinder {
 
   /// Looks where names have changed of late, where that is known; else in the folder at
   /// `folderPath` first, then everywhere.
-  [[nodiscard]] std::optional<Found> find(const ObjectRow& row, const std::string& folderPath,
-                                          const Others& others);
+  /// Errors: `ErrorDomain::store`, and the passing ones of a look, see `LookFailure`: then nothing
+  /// is known of where it is.
+  [[nodiscard]] Result<std::optional<Found>> find(const ObjectRow& row,
+                                                  const std::string& folderPath,
+                                                  const Others& others);
   void forget() { answers_.clear(); }
   /// Whether it is known where names have changed of late.
   [[nodiscard]] bool isFollowing() const { return recent_ != nullptr && recent_->isInStep(); }
@@ -41,10 +44,14 @@ class ObjectFinder {
   void setRecentPlaces(RecentPlaces* places) { recent_ = places; }
 
  private:
-  [[nodiscard]] bool isObject(const ObjectRow& row, const Candidate& candidate,
-                              const PreciseLook& look) const;
-  [[nodiscard]] std::optional<Found> findAmong(const ObjectRow& row,
-                                               const std::vector<RecentPlace>& places) const;
+  [[nodiscard]] Result<std::optional<Found>> lookAt(const ObjectRow& row,
+                                                    const Candidate& candidate) const;
+  [[nodiscard]] Result<bool> isObject(const ObjectRow& row, const Candidate& candidate,
+                                      const PreciseLook& look) const;
+  [[nodiscard]] Result<std::optional<Found>> findAmong(
+      const ObjectRow& row, const std::vector<RecentPlace>& places) const;
+  [[nodiscard]] Result<void> search(const ObjectRow& row, const std::string& folderPath,
+                                    const Others& others);
 
   const MonitoredRoots& roots_;
   std::uint64_t device_;

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cctype>
+#include <cerrno>
 #include <cstring>
 #include <fcntl.h>
 #include <sys/vfs.h>
@@ -50,6 +51,13 @@ Match compareHandles(const ObjectRow& row, const ObjectStatus& status, std::stri
   return status.changeTime < row.changeTime ? Match::different : Match::same;
 }
 
+Result<UniqueFd> openObject(int directory, const std::string& name) {
+  UniqueFd object(
+      ::openat(directory, name.empty() ? "." : name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+  if (!object) return fail(kernelError(errno));
+  return object;
+}
+
 }  // namespace
 
 Match compare(const ObjectRow& row, const SeenObject& seen) {
@@ -64,22 +72,21 @@ Match compare(const ObjectRow& row, const PreciseLook& look) {
   return compareHandles(row, look.status, look.handle);
 }
 
-std::optional<PreciseLook> lookPrecisely(int directory, const std::string& name) {
-  UniqueFd object(
-      ::openat(directory, name.empty() ? "." : name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
-  if (!object) return std::nullopt;
-  auto status = statusAt(object.get(), "");
-  if (!status) return std::nullopt;
-  return PreciseLook{*status, handleAt(object.get(), "").value_or("")};
+Result<PreciseLook> lookPrecisely(int directory, const std::string& name) {
+  const auto object = openObject(directory, name);
+  if (!object) return fail(object.error());
+  auto status = statusAt(object->get(), "");
+  if (!status) return fail(status.error());
+  return PreciseLook{*status, handleAt(object->get(), "").value_or("")};
 }
 
-std::uint64_t fileSystemOf(const SeenObject& seen, std::uint64_t volume) {
+Result<std::uint64_t> fileSystemOf(const SeenObject& seen, std::uint64_t volume) {
   if (seen.status.device == volume) return 0;
-  const UniqueFd object(::openat(seen.directory, seen.name.empty() ? "." : seen.name.c_str(),
-                                 O_PATH | O_NOFOLLOW | O_CLOEXEC));
+  const auto object = openObject(seen.directory, seen.name);
+  if (!object) return fail(object.error());
   struct statfs info;
   std::uint64_t id = 0;
-  if (object && ::fstatfs(object.get(), &info) == 0) {
+  if (::fstatfs(object->get(), &info) == 0) {
     static_assert(sizeof(info.f_fsid) == sizeof(id));
     std::memcpy(&id, &info.f_fsid, sizeof(id));
   }

@@ -25,15 +25,16 @@ enum class Match { same, different };
 
 /// The file system of what is seen as rows note it: 0 for the volume itself, whose device number
 /// is `volume`; else the kernel's own ID of what is mounted there, which outlasts device numbers.
-[[nodiscard]] std::uint64_t fileSystemOf(const SeenObject& seen, std::uint64_t volume);
+/// POSIX errors.
+[[nodiscard]] Result<std::uint64_t> fileSystemOf(const SeenObject& seen, std::uint64_t volume);
 
 /// Looks again through a descriptor of the object itself, so that status and handle are surely
-/// those of one object. Nothing when it has gone.
+/// those of one object. POSIX errors.
 struct PreciseLook {
   ObjectStatus status;
   std::string handle;  ///< empty where the file system has none
 };
-[[nodiscard]] std::optional<PreciseLook> lookPrecisely(int directory, const std::string& name);
+[[nodiscard]] Result<PreciseLook> lookPrecisely(int directory, const std::string& name);
 [[nodiscard]] Match compare(const ObjectRow& row, const PreciseLook& look);
 
 /// Copies the times and the size into the row, and decides whether its change time is settled.

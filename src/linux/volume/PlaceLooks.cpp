@@ -5,15 +5,12 @@
 #include <fcntl.h>
 #include <utility>
 
+#include "foundation/LookFailure.h"
 #include "linux/volume/DiskEntry.h"
 #include "linux/volume/ObjectMatcher.h"
 
 namespace mirabel {
 namespace {
-
-bool isOutOfReach(const Error& error) {
-  return error.isPosix(ENOENT) || error.isPosix(EACCES) || error.isPosix(ENOTDIR);
-}
 
 bool hasEntryChange(const LookList::Names& names) {
   return std::ranges::any_of(names, [](const auto& name) { return name.second.entryChanged; });
@@ -61,10 +58,7 @@ Result<PlaceLooks::Presence> PlaceLooks::open(std::uint64_t id, Folder& folder) 
   auto opened = context_.roots.open(folder.path, O_PATH | O_DIRECTORY);
   // Whoever closed a folder above has left a record of that.
   if (!opened && opened.error().isPosix(EACCES)) return Presence::gone;
-  if (!opened && isOutOfReach(opened.error())) return Presence::moved;
-  if (!opened && (opened.error().isPosix(ELOOP) || opened.error().isPosix(EXDEV))) {
-    return Presence::moved;
-  }
+  if (!opened && saysOutOfReach(opened.error())) return Presence::moved;
   if (!opened) return fail(opened.error());
   auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
@@ -89,8 +83,7 @@ Result<PlaceLooks::Presence> PlaceLooks::lookInFolder(FolderWatcher& watcher, st
   auto seen = sightings(folder, names);
   if (!seen) return fail(seen.error());
   auto learned = context_.learner.learn(folder.path, folder.descriptor.get(), id, *seen);
-  if (!learned && isOutOfReach(learned.error())) return Presence::moved;
-  if (!learned && learned.error().isPosix(ESTALE)) return Presence::moved;
+  if (!learned && isDisturbance(learned.error())) return Presence::moved;
   if (!learned) return fail(learned.error());
   for (const Sighting& sighting : *seen) {
     if (sighting.fileID == 0) {
@@ -111,7 +104,7 @@ Result<std::vector<Sighting>> PlaceLooks::sightings(const Folder& folder, const 
   for (const auto& [name, look] : names) {
     if (name.empty()) continue;
     auto status = statusAt(folder.descriptor.get(), name);
-    if (!status && !isOutOfReach(status.error())) return fail(status.error());
+    if (!status && !saysOutOfReach(status.error())) return fail(status.error());
     if (!look.unlinked.empty()) {
       auto ended = endUnlinked(folder, name, look, status ? &*status : nullptr);
       if (!ended) return fail(ended.error());
@@ -182,10 +175,11 @@ Result<bool> PlaceLooks::lookAtObject(const ObjectRow& row) {
   if (!*path) return true;
   if (row.location->folder == 0) return lookAtRoot(**path);
   const auto look = lookAt(context_.roots, **path);
+  if (!look && !saysOutOfReach(look.error())) return fail(look.error());
   if (!look || look->seen.status.inode != row.inode) return false;
   const bool isPackage = context_.isPackageName(row.location->name);
   auto learned = context_.learner.learnPath(**path, look->seen.status, isPackage);
-  if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
+  if (!learned && !isDisturbance(learned.error())) return fail(learned.error());
   return learned.has_value();
 }
 
@@ -194,7 +188,7 @@ Result<bool> PlaceLooks::lookAtRoot(const std::string& path) {
   if (path == context_.roots.firstPath()) return true;
   auto id = context_.learner.rootID(path);
   // What has become of a root that is not there is found when roots are looked at.
-  if (!id && !isOutOfReach(id.error())) return fail(id.error());
+  if (!id && !saysOutOfReach(id.error())) return fail(id.error());
   return true;
 }
 

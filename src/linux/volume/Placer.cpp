@@ -5,6 +5,8 @@
 #include <fcntl.h>
 #include <utility>
 
+#include "foundation/LookFailure.h"
+
 namespace mirabel {
 namespace {
 
@@ -21,6 +23,10 @@ class Moving {
  private:
   std::vector<std::uint64_t>& all_;
 };
+
+Error wentAwayOr(const Error& error) {
+  return saysOutOfReach(error) ? Error::posix(ESTALE) : error;
+}
 
 }  // namespace
 
@@ -39,11 +45,12 @@ Placer::Placer(IdentityStore& store, IdentifierAllocator& allocator, ChangeRecor
       isPackageName_(std::move(isPackageName)) {}
 
 Result<Slot> Placer::slotOf(const SeenObject& seen) {
-  const std::uint64_t fileSystem = fileSystemOf(seen, device_);
-  auto row = fileSystem == 0 ? store_.objectByInode(seen.status.inode)
-                             : store_.foreignObject(fileSystem, seen.status.inode);
+  const auto fileSystem = fileSystemOf(seen, device_);
+  if (!fileSystem) return fail(wentAwayOr(fileSystem.error()));
+  auto row = *fileSystem == 0 ? store_.objectByInode(seen.status.inode)
+                              : store_.foreignObject(*fileSystem, seen.status.inode);
   if (!row) return fail(row.error());
-  return Slot{fileSystem, std::move(*row)};
+  return Slot{*fileSystem, std::move(*row)};
 }
 
 Result<ObjectRow> Placer::place(Arrival arrival) {
@@ -60,7 +67,7 @@ Result<ObjectRow> Placer::place(Arrival arrival) {
   // It looks like a new object with a used number. Status and handle were read one after the
   // other, so the name may have changed hands in between: look again at one object for sure.
   const auto look = lookPrecisely(arrival.seen.directory, arrival.seen.name);
-  if (!look) return fail(Error::posix(ESTALE));
+  if (!look) return fail(wentAwayOr(look.error()));
   arrival.seen.status = look->status;
   arrival.kind = objectKind(look->status.kind, isPackageName_(arrival.location.name));
   slot = slotOf(arrival.seen);
@@ -205,10 +212,14 @@ Result<void> Placer::noteArrival(const ObjectRow& row, const std::optional<Locat
 
 Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& found) {
   auto folder = roots_.open(found.folderPath, O_PATH | O_DIRECTORY);
-  if (!folder) return row;
-  auto id = folders_.folderID(found.folderPath, folder->get());
   // The way there is changing right now: whoever looks next finds out.
-  if (!id && id.error().domain == ErrorDomain::posix) return row;
+  const auto isChanging = [](const Error& error) {
+    return error.isPosix(ESTALE) || saysOutOfReach(error);
+  };
+  if (!folder && isChanging(folder.error())) return row;
+  if (!folder) return fail(folder.error());
+  auto id = folders_.folderID(found.folderPath, folder->get());
+  if (!id && isChanging(id.error())) return row;
   if (!id) return fail(id.error());
   // Learning the way there may have moved the row itself.
   auto current = store_.objectInSlot(row.slot);

@@ -123,7 +123,9 @@ Placer::Inheritance Placer::settleOccupant(const Arrival& arrival, ObjectRow occ
   occupant.location.reset();
   if (auto detached = store_.put(occupant); !detached) return fail(detached.error());
   if (depth_ > deepestChain) return std::nullopt;
-  const auto found = finder_.find(occupant, arrival.folderPath, others_);
+  const auto answer = finder_.find(occupant, arrival.folderPath, others_);
+  if (!answer) return fail(answer.error());
+  const auto& found = *answer;
   const bool isInSameFolder = found && found->folderPath == arrival.folderPath;
   // Whoever arrives was seen there a moment ago: names are changing hands faster than they are
   // read, and the next look will tell.

@@ -19,14 +19,15 @@ class RecentNames {
   /// Adds the names that came or left.
   void add(const LookList& looks);
   void clear();
-  [[nodiscard]] std::vector<RecentPlace> placesOf(std::uint64_t inode);
+  /// See `RecentPlaces::placesOf`.
+  [[nodiscard]] Result<std::vector<RecentPlace>> placesOf(std::uint64_t inode);
 
  private:
   struct Name {
     std::uint64_t folder;
     std::string name;
   };
-  void lookAt(const Name& name);
+  [[nodiscard]] Result<void> lookAt(const Name& name);
 
   const IndexContext& context_;
   std::vector<Name> unseen_;  // not looked at yet

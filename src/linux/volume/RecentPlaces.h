@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "mirabel/Error.h"
+
 namespace mirabel {
 
 /// A name under which an object may have turned up.
@@ -22,7 +24,9 @@ class RecentPlaces {
   [[nodiscard]] virtual bool isInStep() const = 0;
   /// Names that stand, or stood a moment ago, for an object with that inode number. Nothing when
   /// not everything is watched, and only a look everywhere will tell.
-  [[nodiscard]] virtual std::optional<std::vector<RecentPlace>> placesOf(std::uint64_t inode) = 0;
+  /// Errors: `ErrorDomain::store`, and the passing ones of a look, see `LookFailure`.
+  [[nodiscard]] virtual Result<std::optional<std::vector<RecentPlace>>> placesOf(
+      std::uint64_t inode) = 0;
 };
 
 }  // namespace mirabel

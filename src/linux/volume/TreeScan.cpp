@@ -5,22 +5,21 @@
 #include <optional>
 #include <utility>
 
+#include "foundation/LookFailure.h"
 #include "linux/kernel/RawDirectory.h"
 #include "linux/volume/ObjectMatcher.h"
 
 namespace mirabel {
 namespace {
 
-// What was to be read has gone, or another folder has come to its path, since it was seen.
-bool isDisturbance(const Error& error) {
-  return error.isPosix(ESTALE) || error.isPosix(ENOENT) || error.isPosix(ENOTDIR) ||
-         error.isPosix(ELOOP);
+// Not to be read by this user, or a volume of its own.
+bool isClosedToUs(const Error& error) {
+  return lookFailure(error) == LookFailure::closed;
 }
 
-// Not to be read by this user, or a volume of its own. Anything else, such as too many open files,
-// must not look like an empty folder.
-bool isClosedToUs(const Error& error) {
-  return error.isPosix(EACCES) || error.isPosix(EPERM) || error.isPosix(EXDEV);
+// What was to be read has gone, or another folder has come to its path, since it was seen.
+bool wasReplaced(const Error& error) {
+  return error.isPosix(ESTALE) || saysAbsent(error);
 }
 
 }  // namespace
@@ -39,14 +38,12 @@ Result<void> TreeScan::addRoots() {
 Result<void> TreeScan::addRoot(const std::string& path) {
   auto folder = context_.roots.open(path, O_PATH | O_DIRECTORY);
   // One that is not there holds nothing.
-  if (!folder && (isDisturbance(folder.error()) || isClosedToUs(folder.error()))) {
-    return missing_.add(0, path);
-  }
+  if (!folder && isDisturbance(folder.error())) return missing_.add(0, path);
   if (!folder) return fail(folder.error());
   // Nobody above it is read who would see what has become of itself.
   const bool isItem = path != context_.roots.firstPath();
   auto id = isItem ? context_.learner.rootID(path) : context_.learner.folderID(path, folder->get());
-  if (!id && isDisturbance(id.error())) return missing_.add(0, path);
+  if (!id && wasReplaced(id.error())) return missing_.add(0, path);
   if (!id) return fail(id.error());
   add(path, *id, Depth::everything);
   return {};
@@ -81,7 +78,7 @@ Result<void> TreeScan::readBatch(const Pause& pause) {
     // It was watched from before it was read: what came since is told.
     if (read_.contains(folder.id)) continue;
     auto done = read(folder);
-    if (!done && isDisturbance(done.error())) {
+    if (!done && wasReplaced(done.error())) {
       disturbed_.push_back(folder.id);
       continue;
     }
@@ -191,6 +188,8 @@ Result<void> TreeScan::findMissing(const Folder& folder) {
   std::unordered_set<std::string> names;
   auto opened = context_.roots.open(folder.path, O_RDONLY | O_DIRECTORY);
   const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
+  // Too many open files, for one, must not look like an empty folder.
+  if (!status && !isDisturbance(status.error())) return fail(status.error());
   if (status && status->device == context_.device) {
     // Another folder by now: what it does not hold is not missing.
     auto id = context_.learner.folderID(folder.path, opened->get());

@@ -20,15 +20,17 @@ struct Candidate {
 };
 
 /// Told of each candidate; answers whether it was the object, which is then no longer looked for.
-using CandidateVisitor = std::function<bool(const Candidate&)>;
+using CandidateVisitor = std::function<Result<bool>(const Candidate&)>;
 
 /// Looks through one folder, or through everything below the roots, for entries with the inode
 /// numbers in `wanted`; those found are taken out of it. Costs a reading of directories, not a
 /// look at each file. Unreadable folders and other file systems are passed over. Ends early when
-/// nothing is wanted any more.
-void searchFolder(const MonitoredRoots& roots, const std::string& folderPath,
-                  std::set<std::uint64_t>& wanted, const CandidateVisitor& visitor);
-void searchRoots(const MonitoredRoots& roots, std::set<std::uint64_t>& wanted,
-                 const CandidateVisitor& visitor);
+/// nothing is wanted any more. Errors: the visitor's, and the passing ones of a look, see
+/// `LookFailure`.
+[[nodiscard]] Result<void> searchFolder(const MonitoredRoots& roots, const std::string& folderPath,
+                                        std::set<std::uint64_t>& wanted,
+                                        const CandidateVisitor& visitor);
+[[nodiscard]] Result<void> searchRoots(const MonitoredRoots& roots, std::set<std::uint64_t>& wanted,
+                                       const CandidateVisitor& visitor);
 
 }  // namespace mirabel

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "foundation/Log.h"
+#include "foundation/LookFailure.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/volume/FollowThread.h"
 #include "linux/volume/Follower.h"
@@ -92,11 +93,12 @@ class StoredVolumeIndex final : public VolumeIndex {
       for (const std::string& path : paths) {
         const std::string plain = plainPath(path);
         const auto status = statusOf(plain);
-        if (!status) continue;
+        if (!status && saysOutOfReach(status.error())) continue;
+        if (!status) return fail(status.error());
         const bool isPackage =
             status->kind == FileKind::folder && isPackageName_(splitPath(plain).name);
         auto learned = learner_.learnPath(plain, *status, isPackage);
-        if (!learned && learned.error().domain == ErrorDomain::store) return fail(learned.error());
+        if (!learned && !isDisturbance(learned.error())) return fail(learned.error());
       }
       return {};
     });

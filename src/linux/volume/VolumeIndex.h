@@ -77,11 +77,12 @@ class VolumeIndex {
   [[nodiscard]] virtual Result<Sighting> learnPath(const std::string& path,
                                                    const ObjectStatus& status, bool isPackage) = 0;
 
-  /// Several of these in one transaction; what can't be looked at is left out. Errors of
-  /// `ErrorDomain::store`.
+  /// Several of these in one transaction; what is not there, or not ours, is left out. POSIX
+  /// errors; `ErrorDomain::store`.
   [[nodiscard]] virtual Result<void> learnPaths(std::span<const std::string> paths) = 0;
 
-  /// Checked against the disk; looks further when the object is not where it was. ENOENT.
+  /// Checked against the disk; looks further when the object is not where it was. ENOENT when there
+  /// is none; after another error nothing is known, as with all of these.
   [[nodiscard]] virtual Result<std::string> pathOfFileID(std::uint64_t fileID) = 0;
   /// Every name of the object that the index has and the disk agrees to; where there is none it
   /// looks further, for one. Empty when that finds nothing.

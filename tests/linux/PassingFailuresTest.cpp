@@ -1,0 +1,162 @@
+// A look that fails for the moment tells nothing: neither is what was looked at gone, nor are its
+// changes forgotten.
+#include <cerrno>
+#include <filesystem>
+#include <map>
+#include <set>
+#include <string>
+#include <sys/resource.h>
+
+#include "linux/FailingLooks.h"
+#include "linux/VolumeFixture.h"
+
+namespace mirabel {
+namespace {
+
+struct Following {
+  const char* name;
+  bool isWatched;
+};
+
+class PassingFailuresTest : public VolumeFixture, public ::testing::WithParamInterface<Following> {
+ protected:
+  PassingFailuresTest() : VolumeFixture(Where::inMemory) {}
+
+  void SetUp() override {
+    if (GetParam().isWatched) makeWatcher_ = [] { return makeWatcher(); };
+    makeFolder("a/b");
+    makeFolder("c");
+    for (const char* name : names_)
+      write(name);
+    anchor();
+    for (const char* name : names_)
+      files_[name] = file(name);
+  }
+
+  std::uint64_t anchor() { return index().currentEventID().value(); }
+
+  ::testing::AssertionResult isAtOrUnknown(const Result<std::string>& found, const char* name) {
+    if (!found && !found.error().isPosix(ENOENT)) return ::testing::AssertionSuccess();
+    if (found && *found == path(name)) return ::testing::AssertionSuccess();
+    return ::testing::AssertionFailure() << name << " is " << found.value_or("gone");
+  }
+
+  /// What events since then name, with whether it is there.
+  std::map<std::string, bool> told(std::uint64_t since) {
+    std::map<std::string, bool> paths;
+    const auto records = index().events(since, 10'000'000);
+    for (const JournalRecord& record : records.value()) {
+      if (record.isDocument) continue;
+      const std::string name = record.path.substr(documents_.size() + 1);
+      paths[name] = std::filesystem::exists(path(name));
+    }
+    return paths;
+  }
+
+  const std::vector<const char*> names_{"a/f", "a/b/deep", "c/g", "c/h"};
+  std::map<std::string, std::uint64_t> files_;
+};
+
+TEST_P(PassingFailuresTest, NothingIsTakenForGoneThatCouldNotBeLookedAt) {
+  for (const int failure : {EIO, ENOMEM, ENOTCONN, ESTALE}) {
+    for (const char* name : names_) {
+      const std::uint64_t since = anchor();
+      for (int n = 1;; ++n) {
+        const FailingNthLook failing(n, failure, 1000);
+        const auto found = index().pathOfFileID(files_[name]);
+        EXPECT_TRUE(isAtOrUnknown(found, name)) << n;
+        if (!failing.wasMet()) break;
+      }
+      EXPECT_EQ(told(since), (std::map<std::string, bool>())) << name << " " << failure;
+    }
+  }
+}
+
+TEST_P(PassingFailuresTest, NorWhileItIsSearchedFor) {
+  for (int n = 1;; ++n) {
+    rename("a/f", "c/moved");
+    rename("a/b", "c/b");
+    bool wasMet = false;
+    {
+      const FailingNthLook failing(n, EIO);
+      for (const auto& [id, place] :
+           {std::pair{files_["a/f"], "c/moved"}, std::pair{files_["a/b/deep"], "c/b/deep"}}) {
+        const auto found = index().pathOfFileID(id);
+        EXPECT_TRUE(isAtOrUnknown(found, place)) << n;
+      }
+      wasMet = failing.wasMet();
+    }
+    EXPECT_EQ(findFile(files_["a/f"]), "c/moved") << n;
+    EXPECT_EQ(findFile(files_["a/b/deep"]), "c/b/deep") << n;
+    rename("c/moved", "a/f");
+    rename("c/b", "a/b");
+    anchor();
+    if (!wasMet) break;
+  }
+}
+
+TEST_P(PassingFailuresTest, ACatchUpThatFailsIsMadeUpForByTheNext) {
+  for (int n = 1;; ++n) {
+    const std::uint64_t since = anchor();
+    rename("a/f", "c/moved");
+    write("c/g", std::string(static_cast<std::size_t>(n), 'g'));
+    remove("c/h");
+    makeFolder("d");
+    rename("a/b", "d/b");
+    bool wasMet = false;
+    {
+      const FailingNthLook failing(n, EIO);
+      static_cast<void>(index().currentEventID());
+      wasMet = failing.wasMet();
+    }
+    anchor();
+    const std::map<std::string, bool> events = told(since);
+    for (const auto& [name, isThere] : std::map<std::string, bool>{
+             {"a/f", false}, {"c/moved", true}, {"c/g", true}, {"c/h", false}, {"d/b", true}}) {
+      ASSERT_TRUE(events.contains(name)) << n << ": " << name;
+      EXPECT_EQ(events.at(name), isThere) << n << ": " << name;
+    }
+    EXPECT_FALSE(events.contains("d/b/deep") && !events.at("d/b/deep")) << n;
+    EXPECT_EQ(file("c/moved"), files_["a/f"]) << n;
+    EXPECT_EQ(file("d/b/deep"), files_["a/b/deep"]) << n;
+    EXPECT_EQ(file("c/g"), files_["c/g"]) << n;
+    rename("c/moved", "a/f");
+    rename("d/b", "a/b");
+    remove("d");
+    write("c/h");
+    if (!wasMet) break;
+  }
+}
+
+TEST_P(PassingFailuresTest, TooManyOpenFilesIsNoDeletion) {
+  const std::uint64_t since = anchor();
+  rlimit before{};
+  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
+  for (rlim_t most = 3; most < 40; ++most) {
+    rlimit few = before;
+    few.rlim_cur = most;
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &few), 0);
+    const auto found = index().pathOfFileID(files_["a/b/deep"]);
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+    EXPECT_TRUE(isAtOrUnknown(found, "a/b/deep")) << most;
+  }
+  anchor();
+  EXPECT_EQ(told(since), (std::map<std::string, bool>()));
+}
+
+TEST(LookFailures, OfADeadMountSayThatItIsOneAndOthersStayWhatTheyAre) {
+  for (const int failure : {ENOTCONN, ESTALE, EIO, EHOSTDOWN, ETIMEDOUT, ENODEV}) {
+    const FailingLooks failing([failure](int, const char*) { return failure; });
+    EXPECT_TRUE(statusOf("/proc").error().isPosix(EXDEV)) << failure;
+    EXPECT_TRUE(statusOf("/proc/self").error().isPosix(failure == ESTALE ? EREMOTEIO : failure));
+  }
+  const FailingLooks failing([](int, const char*) { return ENOENT; });
+  EXPECT_TRUE(statusOf("/proc").error().isPosix(ENOENT));
+}
+
+INSTANTIATE_TEST_SUITE_P(, PassingFailuresTest,
+                         ::testing::Values(Following{"Watched", true}, Following{"Asked", false}),
+                         [](const auto& test) { return test.param.name; });
+
+}  // namespace
+}  // namespace mirabel
