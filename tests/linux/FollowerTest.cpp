@@ -130,6 +130,36 @@ TEST_P(FollowerTest, AnUnlinkedDocumentEndsThoughTheNextOneGetsItsNumber) {
   if (!wasGivenAgain) GTEST_SKIP() << "this file system gives no number twice in a row";
 }
 
+TEST_P(FollowerTest, ADocumentGoesIntoAFolderThatIsNewWithItsIdentity) {
+  makeFolder("f");
+  for (const char* name : {"f/first", "f/second"})
+    write(name);
+  for (int round = 0; round < 20; ++round) {
+    anchor();
+    const std::uint32_t first = document("f/first");
+    const std::uint32_t second = document("f/second");
+    const std::string folder = "f/new" + std::to_string(round);
+    // One while nobody looks, and one while the new folder of the first is read.
+    bool isLate = false;
+    faults_->afterWatch = [&] {
+      if (std::exchange(isLate, true)) return;
+      makeFolder(folder + "/late");
+      rename("f/second", folder + "/late/moved");
+      write("f/second", "other");
+    };
+    makeFolder(folder + "/deep");
+    rename("f/first", folder + "/deep/moved");
+    write("f/first", "other");
+    write("f/second", "changed");
+    anchor();
+    faults_->afterWatch = nullptr;
+    EXPECT_EQ(document(folder + "/deep/moved"), first) << round;
+    EXPECT_NE(document("f/first"), first) << round;
+    EXPECT_EQ(document(folder + "/late/moved"), second) << round;
+    EXPECT_NE(document("f/second"), second) << round;
+  }
+}
+
 TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadIsTakenIn) {
   constexpr int folders = 60;
   const auto folder = [](int number) { return "d" + std::to_string(number % folders); };

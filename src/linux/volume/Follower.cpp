@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <iterator>
 #include <string>
 #include <utility>
 
@@ -19,6 +20,20 @@ constexpr std::chrono::minutes watchAgainAfter{1};
 
 Result<void> noPause() {
   return {};
+}
+
+// The names under which folders came or left.
+LookList::Folders takeFolders(LookList::Folders& looks) {
+  LookList::Folders taken;
+  for (auto& [folder, names] : looks) {
+    for (auto name = names.begin(); name != names.end();) {
+      const auto next = std::next(name);
+      if (name->second.isOfFolder && !name->first.empty())
+        taken[folder].insert(names.extract(name));
+      name = next;
+    }
+  }
+  return taken;
 }
 
 }  // namespace
@@ -100,6 +115,16 @@ Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
 
 Result<void> Follower::followRound(const Transaction& transaction, const Pause& pause,
                                    LookList::Folders looks) {
+  // Folders that came first: what was moved into them has not ended, whatever has its name now.
+  LookList::Folders ofFolders = takeFolders(looks);
+  if (!ofFolders.empty()) {
+    if (auto done = lookAndScan(transaction, pause, std::move(ofFolders)); !done) return done;
+  }
+  return lookAndScan(transaction, pause, std::move(looks));
+}
+
+Result<void> Follower::lookAndScan(const Transaction& transaction, const Pause& pause,
+                                   LookList::Folders looks) {
   auto later = places_.look(transaction, pause, *watcher_, std::move(looks));
   if (!later) return fail(later.error());
   later_.merge(std::move(*later));
@@ -142,6 +167,10 @@ Result<std::optional<std::vector<RecentPlace>>> Follower::placesOf(std::uint64_t
     isInStep_ = false;
     return std::nullopt;
   }
+  // What is in a folder that nobody watched yet has come there unheard.
+  auto hasUnwatched = scan_.isEmpty() ? recent_.hasUnwatchedFolder(*watcher_) : true;
+  if (!hasUnwatched) return fail(hasUnwatched.error());
+  if (*hasUnwatched) return std::nullopt;
   auto places = recent_.placesOf(inode);
   if (!places) return fail(places.error());
   return std::move(*places);

@@ -66,6 +66,8 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] Result<Outcome> follow(const Transaction& transaction);
   [[nodiscard]] Result<void> followRound(const Transaction& transaction, const Pause& pause,
                                          LookList::Folders looks);
+  [[nodiscard]] Result<void> lookAndScan(const Transaction& transaction, const Pause& pause,
+                                         LookList::Folders looks);
   [[nodiscard]] Result<void> settle(const Transaction& transaction);
   [[nodiscard]] Result<bool> drain();
   [[nodiscard]] Result<void> drainMeanwhile();

@@ -21,19 +21,24 @@ Result<std::optional<std::string>> pathOf(const IndexContext& context, std::uint
 void RecentNames::add(const LookList& looks) {
   for (const auto& [folder, names] : looks.folders()) {
     for (const auto& [name, look] : names) {
-      if (look.entryChanged && !name.empty()) unseen_.push_back({folder, name});
+      if (!look.entryChanged || name.empty()) continue;
+      unseen_.push_back({folder, name});
+      if (look.isOfFolder) folders_.push_back({folder, name});
     }
   }
 }
 
 void RecentNames::clear() {
   unseen_.clear();
+  folders_.clear();
   byInode_.clear();
 }
 
 Result<std::vector<RecentPlace>> RecentNames::placesOf(std::uint64_t inode) {
   for (; !unseen_.empty(); unseen_.pop_back()) {
-    if (auto looked = lookAt(unseen_.back()); !looked) return fail(looked.error());
+    const auto status = statusOf(unseen_.back());
+    if (!status) return fail(status.error());
+    if (*status) byInode_.emplace((*status)->inode, unseen_.back());
   }
   std::vector<RecentPlace> places;
   const auto [begin, end] = byInode_.equal_range(inode);
@@ -45,15 +50,29 @@ Result<std::vector<RecentPlace>> RecentNames::placesOf(std::uint64_t inode) {
   return places;
 }
 
-Result<void> RecentNames::lookAt(const Name& name) {
+Result<bool> RecentNames::hasUnwatchedFolder(const FolderWatcher& watcher) {
+  for (; !folders_.empty(); folders_.pop_back()) {
+    const auto status = statusOf(folders_.back());
+    if (!status) return fail(status.error());
+    const bool mayBeNew =
+        *status && (*status)->kind == FileKind::folder && (*status)->device == context_.device;
+    if (!mayBeNew) continue;
+    const auto row = context_.store.objectByInode((*status)->inode);
+    if (!row) return fail(row.error());
+    if (!*row || !watcher.isWatched((*row)->fileID)) return true;
+  }
+  return false;
+}
+
+Result<std::optional<ObjectStatus>> RecentNames::statusOf(const Name& name) const {
   const auto path = pathOf(context_, name.folder);
   if (!path) return fail(path.error());
-  if (!*path) return {};
+  if (!*path) return std::nullopt;
   auto folder = context_.roots.open(**path, O_PATH | O_DIRECTORY);
   const auto status = folder ? statusAt(folder->get(), name.name) : fail(folder.error());
-  if (!status) return saysOutOfReach(status.error()) ? Result<void>() : fail(status.error());
-  byInode_.emplace(status->inode, name);
-  return {};
+  if (status) return *status;
+  if (saysOutOfReach(status.error())) return std::nullopt;
+  return fail(status.error());
 }
 
 }  // namespace mirabel

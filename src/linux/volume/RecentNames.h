@@ -1,12 +1,15 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <unordered_map>
 #include <vector>
 
+#include "linux/kernel/ObjectStatus.h"
 #include "linux/volume/IndexContext.h"
 #include "linux/volume/RecentPlaces.h"
+#include "linux/watch/FolderWatcher.h"
 #include "linux/watch/LookList.h"
 
 namespace mirabel {
@@ -19,6 +22,9 @@ class RecentNames {
   /// Adds the names that came or left.
   void add(const LookList& looks);
   void clear();
+  /// Whether one of the names stands for a folder that `watcher` does not watch: nobody hears of
+  /// what comes into it.
+  [[nodiscard]] Result<bool> hasUnwatchedFolder(const FolderWatcher& watcher);
   /// See `RecentPlaces::placesOf`.
   [[nodiscard]] Result<std::vector<RecentPlace>> placesOf(std::uint64_t inode);
 
@@ -27,10 +33,12 @@ class RecentNames {
     std::uint64_t folder;
     std::string name;
   };
-  [[nodiscard]] Result<void> lookAt(const Name& name);
+  /// Nothing for one that is not there.
+  [[nodiscard]] Result<std::optional<ObjectStatus>> statusOf(const Name& name) const;
 
   const IndexContext& context_;
-  std::vector<Name> unseen_;  // not looked at yet
+  std::vector<Name> unseen_;   // not looked at yet
+  std::vector<Name> folders_;  // of folders that came and may not be watched yet
   std::unordered_multimap<std::uint64_t, Name> byInode_;
 };
 

@@ -16,7 +16,8 @@ struct RecentPlace {
 };
 
 /// Where names have changed since the index was last in step with the disk: while everything is
-/// watched, an object that has left its place is at one of these, or has left the roots.
+/// watched, folders that came since among it, an object that has left its place is at one of these,
+/// or has left the roots.
 class RecentPlaces {
  public:
   virtual ~RecentPlaces() = default;

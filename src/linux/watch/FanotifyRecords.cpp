@@ -108,6 +108,7 @@ bool addLooks(const FanotifyRecord& record, const WatchedFolder& watched, LookLi
     if (!folder) continue;
     Look& look = looks.at(*folder, place->name == "." ? std::string_view() : place->name);
     if ((record.mask & entryBits) != 0) look.entryChanged = true;
+    if ((record.mask & entryBits) != 0 && (record.mask & FAN_ONDIR) != 0) look.isOfFolder = true;
     if ((record.mask & contentBits) != 0) look.contentChanged = true;
     if ((record.mask & (FAN_CREATE | FAN_DELETE | contentBits)) != 0) note(record.target, look);
     if ((record.mask & FAN_DELETE) != 0) look.unlinked.emplace_back(record.target);

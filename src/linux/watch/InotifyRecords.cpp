@@ -31,6 +31,7 @@ bool addLook(const InotifyRecord& record, std::optional<std::uint64_t> folder, L
   // records only when nothing else has happened to the name yet.
   if ((record.mask & IN_DELETE) != 0 && !look.entryChanged) look.unlinked.emplace_back("?");
   if ((record.mask & entryBits) != 0) look.entryChanged = true;
+  if ((record.mask & entryBits) != 0 && (record.mask & IN_ISDIR) != 0) look.isOfFolder = true;
   if ((record.mask & contentBits) != 0) look.contentChanged = true;
   return true;
 }

@@ -15,6 +15,7 @@ namespace mirabel {
 struct Look {
   bool entryChanged = false;    ///< the name came, left, or stands for something else
   bool contentChanged = false;  ///< what it stands for was written to, or its attributes were
+  bool isOfFolder = false;      ///< what came or left was a folder, at least once
   /// Handles of the objects that were linked, unlinked or written to under this name, where the
   /// kernel says so: they may have other names, which show that too.
   std::vector<std::string> objects;
@@ -40,6 +41,7 @@ class LookList {
         Look& known = folders_[folder][name];
         known.entryChanged |= look.entryChanged;
         known.contentChanged |= look.contentChanged;
+        known.isOfFolder |= look.isOfFolder;
         known.objects.insert(known.objects.end(), look.objects.begin(), look.objects.end());
         known.unlinked.insert(known.unlinked.end(), look.unlinked.begin(), look.unlinked.end());
       }
