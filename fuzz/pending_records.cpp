@@ -11,7 +11,7 @@ using namespace mirabel;
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   const std::span list(data, size);
-  Data file = dataFromString("MRBPEND1");
+  Data file = dataFromString("MRBPEND2");
   for (std::uint64_t digest = digestOf(list), i = 0; i < sizeof digest; ++i)
     file.push_back(static_cast<std::uint8_t>(digest >> (8 * i)));
   file.insert(file.end(), list.begin(), list.end());

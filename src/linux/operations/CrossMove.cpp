@@ -27,9 +27,9 @@ Result<void> CrossMove::run(const ItemPlace& item, const OpenFolder& folder,
     removeTemporary(context_, folder, *copy);
     return done;
   }
-  // From here on the hidden item is nothing but something to be removed.
-  context_.pending.end(*record);
-  removeTemporary(context_, item.folder, record->hiddenSource);
+  // From here on the hidden item is nothing but something to be removed. Where that can't be noted,
+  // the next start does it: what is half removed would look like something to be kept.
+  if (context_.pending.end(*record)) removeTemporary(context_, item.folder, record->hiddenSource);
   return {};
 }
 
@@ -48,7 +48,7 @@ Result<void> CrossMove::mayBeTakenAway(const ItemPlace& item) const {
 
 Result<PendingMove> CrossMove::recordOf(const ItemPlace& item, const OpenFolder& folder,
                                         const std::string& name, const std::string& copy) const {
-  auto made = context_.calls.status(folder.descriptor.get(), copy);
+  auto made = pendingCopyAt(context_, folder.descriptor.get(), copy);
   if (!made) return fail(made.error());
   auto hidden = context_.pending.temporaryName(item.folder.path);
   if (!hidden) return fail(hidden.error());
@@ -56,7 +56,7 @@ Result<PendingMove> CrossMove::recordOf(const ItemPlace& item, const OpenFolder&
   auto to = context_.pending.folderAt(folder.path);
   if (!from || !to) return fail(from ? to.error() : from.error());
   return PendingMove{*std::move(from), item.name, *std::move(hidden),
-                     *std::move(to),   name,      made->inode};
+                     *std::move(to),   name,      *std::move(made)};
 }
 
 /// After a failure the item has its name, and the copy has none.
@@ -67,7 +67,7 @@ Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder
   const int to = folder.descriptor.get();
   auto done = calls.rename(from, item.name, from, record.hiddenSource);
   if (!done) {
-    context_.pending.end(record);
+    static_cast<void>(context_.pending.end(record));
     return done;
   }
   done = compare(item, folder, copy, record);
@@ -81,7 +81,7 @@ Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder
   }
   if (done) return {};
   if (giveNameBack(context_, item.folder, record.hiddenSource, item.name)) {
-    context_.pending.end(record);
+    static_cast<void>(context_.pending.end(record));
   } else {
     logError("\"" + item.folder.url(item.name).path() +
              "\" has a hidden name until the next start");

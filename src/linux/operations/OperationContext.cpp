@@ -48,6 +48,14 @@ NameOf kindOfName(const OperationContext& context, const ObjectStatus& status,
   return isPlainFolder ? NameOf::plainFolder : NameOf::file;
 }
 
+Result<PendingCopy> pendingCopyAt(const OperationContext& context, int folder,
+                                  const std::string& name) {
+  const auto status = context.calls.status(folder, name);
+  if (!status) return fail(status.error());
+  return PendingCopy{status->inode, handleAt(folder, name).value_or(""),
+                     static_cast<std::uint64_t>(status->birthTime)};
+}
+
 bool giveNameBack(const OperationContext& context, const OpenFolder& folder,
                   const std::string& hidden, const std::string& name) {
   constexpr std::uint64_t mostTried = 100;

@@ -58,6 +58,10 @@ enum class Unreadable { passedOver, refused };
 [[nodiscard]] NameOf kindOfName(const OperationContext& context, const ObjectStatus& status,
                                 std::string_view name);
 
+/// What the copy at (`folder`, `name`) is to be known by.
+[[nodiscard]] Result<PendingCopy> pendingCopyAt(const OperationContext& context, int folder,
+                                                const std::string& name);
+
 /// Gives what has a hidden name its own, or one made from it where that is taken.
 [[nodiscard]] bool giveNameBack(const OperationContext& context, const OpenFolder& folder,
                                 const std::string& hidden, const std::string& name);

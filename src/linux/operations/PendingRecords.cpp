@@ -10,7 +10,7 @@ namespace mirabel {
 namespace {
 
 // What is half right could have something removed that should not be.
-constexpr std::string_view magic = "MRBPEND1";
+constexpr std::string_view magic = "MRBPEND2";
 
 // Each record is an array of fields in the order of its struct, a folder being two of them. Both
 // directions walk the same list of fields.
@@ -72,7 +72,7 @@ void walk(Fields& fields, auto& record) requires requires {
 
 template <class Fields>
 void walk(Fields& fields, auto& record) requires requires {
-  record.copyInode;
+  record.copy;
 }
 {
   walkFolder(fields, record.sourceFolder);
@@ -80,7 +80,9 @@ void walk(Fields& fields, auto& record) requires requires {
   fields.field(record.hiddenSource);
   walkFolder(fields, record.folder);
   fields.field(record.name);
-  fields.field(record.copyInode);
+  fields.field(record.copy.inode);
+  fields.field(record.copy.handle);
+  fields.field(record.copy.birthTime);
 }
 
 template <class Fields>

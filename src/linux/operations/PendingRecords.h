@@ -27,6 +27,15 @@ struct PendingRemovals {
   friend bool operator==(const PendingRemovals&, const PendingRemovals&) = default;
 };
 
+/// What a copy is known by when it is met again: nothing else ever has all of these.
+struct PendingCopy {
+  std::uint64_t inode = 0;
+  std::string handle;           ///< empty where the file system has none
+  std::uint64_t birthTime = 0;  ///< nanoseconds since 1970; 0 where the file system has none
+
+  friend bool operator==(const PendingCopy&, const PendingCopy&) = default;
+};
+
 /// An item on its way from one file system to another. It gets a hidden name, then its copy gets
 /// the name that it is to have, and then the item is removed.
 struct PendingMove {
@@ -35,7 +44,7 @@ struct PendingMove {
   std::string hiddenSource;
   PendingFolder folder;
   std::string name;
-  std::uint64_t copyInode = 0;
+  PendingCopy copy;
 
   friend bool operator==(const PendingMove&, const PendingMove&) = default;
 };

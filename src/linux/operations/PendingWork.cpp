@@ -89,13 +89,15 @@ PendingRecords PendingWork::load() {
   return before_;
 }
 
-void PendingWork::settle(PendingRecords remaining) {
+Result<void> PendingWork::settle(PendingRecords remaining) {
   const std::scoped_lock lock(mutex_);
-  if (remaining == before_) return;
+  if (remaining == before_) return {};
   before_ = std::move(remaining);
-  if (auto written = write(); !written) {
+  auto written = write();
+  if (!written) {
     logError("can't note what operations left behind; " + written.error().description());
   }
+  return written;
 }
 
 std::string PendingWork::nextName(std::string_view prefix) {
@@ -139,11 +141,12 @@ Result<void> PendingWork::begin(const PendingMove& move) {
   return written;
 }
 
-void PendingWork::end(const PendingMove& move) {
+Result<void> PendingWork::end(const PendingMove& move) {
   const std::scoped_lock lock(mutex_);
   std::erase(records_.moves, move);
-  // Found once more by the next start, it is seen to be done.
-  static_cast<void>(write());
+  auto written = write();
+  if (!written) records_.moves.push_back(move);
+  return written;
 }
 
 Result<void> PendingWork::begin(const PendingRename& rename) {
@@ -157,6 +160,7 @@ Result<void> PendingWork::begin(const PendingRename& rename) {
 void PendingWork::end(const PendingRename& rename) {
   const std::scoped_lock lock(mutex_);
   std::erase(records_.renames, rename);
+  // Found once more by the next start, it is seen to be done.
   static_cast<void>(write());
 }
 

@@ -26,8 +26,8 @@ class PendingWork {
   /// Reads what processes before this one left; to be called first. A file that is damaged is set
   /// aside as "pending.damaged"; where it can't be read, no work is begun that would replace it.
   [[nodiscard]] PendingRecords load();
-  /// What of that is still to be done, by a later start.
-  void settle(PendingRecords remaining);
+  /// What of that is still to be done, by a later start. The error is logged.
+  [[nodiscard]] Result<void> settle(PendingRecords remaining);
 
   /// A hidden name in the folder at `path` for something that is to be removed if it is ever found.
   [[nodiscard]] Result<std::string> temporaryName(const std::string& path);
@@ -36,7 +36,8 @@ class PendingWork {
   [[nodiscard]] Result<PendingFolder> folderAt(const std::string& path);
 
   [[nodiscard]] Result<void> begin(const PendingMove& move);
-  void end(const PendingMove& move);
+  /// After an error the move is still on record.
+  [[nodiscard]] Result<void> end(const PendingMove& move);
   [[nodiscard]] Result<void> begin(const PendingRename& rename);
   void end(const PendingRename& rename);
 

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "foundation/Log.h"
+#include "linux/operations/TreeComparison.h"
 
 namespace mirabel {
 namespace {
@@ -28,13 +29,14 @@ class OperationRecovery {
       if (finish(rename) == Outcome::notYet) remaining.renames.push_back(rename);
     }
     remaining.removals = found.removals;
-    context_.pending.settle(remaining);
-    // What a move still needs lies among what would be removed.
-    if (!remaining.moves.empty()) return;
+    const auto noted = context_.pending.settle(remaining);
+    // What a move still needs lies among what would be removed; and where that it is done is not
+    // noted, the next start must find whole what it looks at once more.
+    if (!noted || !remaining.moves.empty()) return;
     std::erase_if(remaining.removals, [this](const PendingRemovals& removals) {
       return finish(removals) == Outcome::done;
     });
-    context_.pending.settle(std::move(remaining));
+    static_cast<void>(context_.pending.settle(std::move(remaining)));
   }
 
  private:
@@ -53,8 +55,11 @@ class OperationRecovery {
     return error.isPosix(ENOENT) ? Outcome::done : Outcome::notYet;
   }
 
-  bool isThere(const OpenFolder& folder, const std::string& name) {
-    return calls_.status(folder.descriptor.get(), name).has_value();
+  /// The error is that it can't be told.
+  Result<bool> isThere(const OpenFolder& folder, const std::string& name) {
+    const auto status = calls_.status(folder.descriptor.get(), name);
+    if (!status && !status.error().isPosix(ENOENT)) return fail(status.error());
+    return status.has_value();
   }
 
   Outcome finish(const PendingRemovals& removals) {
@@ -77,27 +82,39 @@ class OperationRecovery {
   Outcome finish(const PendingRename& rename) {
     auto folder = open(rename.folder);
     if (!folder) return outcomeOf(folder.error());
-    if (!isThere(*folder, rename.hidden)) return Outcome::done;
+    const auto isHidden = isThere(*folder, rename.hidden);
+    if (!isHidden) return Outcome::notYet;
+    if (!*isHidden) return Outcome::done;
     const int descriptor = folder->descriptor.get();
     if (calls_.rename(descriptor, rename.hidden, descriptor, rename.to)) return Outcome::done;
     return givenBack(*folder, rename.hidden, rename.from);
   }
 
-  /// The copy gets its name only when it is known to be like the item: where it has it, the item is
-  /// but something to be removed. Where that is not certain, the item stays.
+  /// The copy gets its name only when it is known to be like the item: where it has it and still
+  /// is, the item is but something to be removed. Where it is not, both stay.
   Outcome finish(const PendingMove& move) {
     auto source = open(move.sourceFolder);
     if (!source) return outcomeOf(source.error());
-    if (!isThere(*source, move.hiddenSource)) return Outcome::done;
-    auto target = open(move.folder);
-    if (!target && !target.error().isPosix(ENOENT) && !target.error().isPosix(ENODEV))
-      return Outcome::notYet;
-    if (target) {
-      const auto copy = calls_.status(target->descriptor.get(), move.name);
-      if (!copy && !copy.error().isPosix(ENOENT)) return Outcome::notYet;
-      if (copy && copy->inode == move.copyInode) return Outcome::done;
-    }
+    const auto isHidden = isThere(*source, move.hiddenSource);
+    if (!isHidden) return Outcome::notYet;
+    if (!*isHidden) return Outcome::done;
+    const auto replaced = isReplaced(*source, move);
+    if (!replaced) return Outcome::notYet;
+    if (*replaced) return Outcome::done;
     return givenBack(*source, move.hiddenSource, move.sourceName);
+  }
+
+  /// Whether the copy has its name, and nobody has changed it or the item since they were compared.
+  Result<bool> isReplaced(const OpenFolder& source, const PendingMove& move) {
+    auto target = open(move.folder);
+    if (!target && (target.error().isPosix(ENOENT) || target.error().isPosix(ENODEV))) return false;
+    if (!target) return fail(target.error());
+    const int folder = target->descriptor.get();
+    const auto named = pendingCopyAt(context_, folder, move.name);
+    if (!named && named.error().isPosix(ENOENT)) return false;
+    if (!named) return fail(named.error());
+    if (*named != move.copy) return false;
+    return looksAlike(calls_, source.descriptor.get(), move.hiddenSource, folder, move.name);
   }
 
   Outcome givenBack(const OpenFolder& folder, const std::string& hidden, const std::string& name) {

@@ -2,10 +2,14 @@
 #include <csignal>
 #include <filesystem>
 #include <fstream>
+#include <regex>
+#include <set>
+#include <sstream>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "linux/operations/OperationsFixture.h"
+#include "linux/operations/PendingRecords.h"
 
 namespace mirabel::testing {
 namespace {
@@ -105,6 +109,43 @@ class InterruptedOperations : public OperationsTest, public ::testing::WithParam
     return calls >= number;
   }
 
+  /// A start whose `number`th call fails; whether it came that far.
+  bool recoverWithFailure(int number) {
+    int calls = 0;
+    setCheck([=, &calls](std::string_view) { return ++calls == number ? EIO : 0; });
+    static_cast<void>(opened());
+    close();
+    setCheck({});
+    return calls >= number;
+  }
+
+  /// Runs it in a process that is killed before the `number`th call; 0 where it did not come so
+  /// far.
+  int kill(int number) {
+    makeTree();
+    close();
+    return inProcess(
+        [=, this] { return interrupt(number, [] { return ::raise(SIGKILL); }) ? 1 : 0; });
+  }
+
+  /// Which names there are; the hidden ones without what differs from run to run.
+  std::string state() const {
+    std::set<std::string> names;
+    for (const auto& entry : fs::recursive_directory_iterator(home.documents()))
+      names.insert(std::regex_replace(entry.path().native(), std::regex("mirabel-[^-]*-"), "-"));
+    return ::testing::PrintToString(names);
+  }
+
+  bool hasPendingMove() const {
+    for (const auto& entry : fs::recursive_directory_iterator(home.stateFolder())) {
+      if (entry.path().filename() != "pending") continue;
+      std::ostringstream file;
+      file << std::ifstream(entry.path(), std::ios::binary).rdbuf();
+      return !PendingRecords::decode(dataFromString(file.str())).value().moves.empty();
+    }
+    return false;
+  }
+
   void expectWhole(int number) {
     const Tree now = tree();
     EXPECT_TRUE(now == before_ || now == after_)
@@ -142,15 +183,28 @@ TEST_P(InterruptedOperations, LeaveItemsWholeWhicheverSystemCallFails) {
 
 TEST_P(InterruptedOperations, LeaveItemsWholeWhereverTheProcessIsKilled) {
   for (int number = 1;; ++number) {
-    makeTree();
-    close();
-    const int code =
-        inProcess([=, this] { return interrupt(number, [] { return ::raise(SIGKILL); }) ? 1 : 0; });
+    const int code = kill(number);
     if (code == 0) break;
     ASSERT_EQ(code, -1);
     expectNothingLeft(number);
     ASSERT_LT(number, 1000);
   }
+}
+
+/// What a start can't tell is not guessed, and done by the next one. Each state that a killed move
+/// can leave is tried, for there something is hidden that is nowhere else.
+using InterruptedMoves = InterruptedOperations;
+TEST_P(InterruptedMoves, LeaveItemsWholeWhicheverCallOfTheNextStartFails) {
+  std::set<std::string> tried;
+  for (int number = 1; kill(number) != 0; ++number) {
+    if (!hasPendingMove() || !tried.insert(state()).second) continue;
+    for (int failing = 1; recoverWithFailure(failing); ++failing) {
+      SCOPED_TRACE("recovery's call " + std::to_string(failing));
+      expectNothingLeft(number);
+      kill(number);
+    }
+  }
+  EXPECT_EQ(tried.size(), 3);
 }
 
 INSTANTIATE_TEST_SUITE_P(Each, InterruptedOperations,
@@ -159,6 +213,9 @@ INSTANTIATE_TEST_SUITE_P(Each, InterruptedOperations,
                                            Case{"DeleteTree"}, Case{"Trash"},
                                            Case{"MoveFileAcross", true},
                                            Case{"MoveTreeAcross", true}),
+                         [](const auto& instance) { return std::string(instance.param.name); });
+
+INSTANTIATE_TEST_SUITE_P(Each, InterruptedMoves, ::testing::Values(Case{"MoveFileAcross", true}),
                          [](const auto& instance) { return std::string(instance.param.name); });
 
 }  // namespace

@@ -8,7 +8,12 @@ namespace {
 PendingRecords sample() {
   PendingRecords records;
   records.removals.push_back({{"/home/me/Documents/\xFF", 7}, ".mirabel-1-"});
-  records.moves.push_back({{"/a", 1}, "doc", ".mirabel-1-2", {"/b", (1ULL << 62) + 3}, "doc 2", 8});
+  records.moves.push_back({{"/a", 1},
+                           "doc",
+                           ".mirabel-1-2",
+                           {"/b", (1ULL << 62) + 3},
+                           "doc 2",
+                           {8, std::string("\1\0\xFF", 3), 9}});
   records.renames.push_back({{"/a", 1}, "readme", ".mirabel-kept-3", "README"});
   return records;
 }

@@ -1,7 +1,8 @@
+#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
-#include <sys/stat.h>
 
+#include "linux/kernel/ObjectStatus.h"
 #include "linux/operations/OperationsFixture.h"
 #include "linux/operations/PendingRecords.h"
 
@@ -30,10 +31,15 @@ class Recovery : public OperationsTest {
     return {home.at(name), values.value().fileID};
   }
 
-  std::uint64_t inodeOf(std::string_view name) const {
-    struct stat status {};
-    EXPECT_EQ(::stat(home.at(name).c_str(), &status), 0);
-    return status.st_ino;
+  PendingCopy copyAt(std::string_view name) const {
+    const std::string path = home.at(name);
+    const auto status = statusOf(path).value();
+    return {status.inode, handleAt(AT_FDCWD, path).value_or(""),
+            static_cast<std::uint64_t>(status.birthTime)};
+  }
+
+  void setSameTime(std::string_view name, std::string_view other) const {
+    fs::last_write_time(home.at(name), fs::last_write_time(home.at(other)));
   }
 
   void start(const PendingRecords& records) {
@@ -44,9 +50,9 @@ class Recovery : public OperationsTest {
     close();
   }
 
-  PendingRecords moveOf(std::uint64_t copyInode) const {
+  PendingRecords moveOf(PendingCopy copy) const {
     PendingRecords records;
-    records.moves.push_back({from_, "doc", hidden, to_, "doc", copyInode});
+    records.moves.push_back({from_, "doc", hidden, to_, "doc", std::move(copy)});
     records.removals = {{from_, prefix}, {to_, prefix}};
     return records;
   }
@@ -59,12 +65,13 @@ class Recovery : public OperationsTest {
 TEST_F(Recovery, OfAMoveGivesTheItemItsNameBackUnlessItsCopyHasOne) {
   home.writeFile("from/" + hidden, "item");
   home.writeFile("to/" + std::string(prefix) + "2", "copy");
-  start(moveOf(inodeOf("to/" + std::string(prefix) + "2")));
+  start(moveOf(copyAt("to/" + std::string(prefix) + "2")));
   EXPECT_EQ(tree(), (Tree{{"from", "/"}, {"from/doc", "item"}, {"to", "/"}}));
 
   home.rename("from/doc", "from/" + hidden);
   home.writeFile("to/doc", "item");
-  start(moveOf(inodeOf("to/doc")));
+  setSameTime("to/doc", "from/" + hidden);
+  start(moveOf(copyAt("to/doc")));
   EXPECT_EQ(tree(), (Tree{{"from", "/"}, {"to", "/"}, {"to/doc", "item"}}));
   EXPECT_THAT(hiddenNames(), ::testing::IsEmpty());
   EXPECT_FALSE(hasPendingWork());
@@ -75,16 +82,41 @@ TEST_F(Recovery, OfAMoveWhoseCopyIsNotToBeFoundKeepsTheItem) {
   home.writeFile("from/" + hidden, "item");
   home.writeFile("from/doc", "new");
   home.remove("to");
-  start(moveOf(12345));
+  start(moveOf({12345, "", 0}));
   EXPECT_EQ(tree(), (Tree{{"from", "/"}, {"from/doc", "new"}, {"from/doc 2", "item"}}));
 
   // Something else has the name that the copy was to have.
   home.rename("from/doc 2", "from/" + hidden);
   makeFolder("to");
   home.writeFile("to/doc", "somebody's");
-  start(moveOf(inodeOf("to/doc") + 1));
+  start(moveOf(copyAt("from/doc")));
   EXPECT_EQ(tree().at("from/doc 2"), "item");
   EXPECT_EQ(tree().at("to/doc"), "somebody's");
+}
+
+TEST_F(Recovery, OfAMoveKeepsBothUnlessTheCopyIsTheOneThatWasMadeAndStillLikeTheItem) {
+  struct Change {
+    const char* what;
+    std::function<void(PendingCopy& copy)> make;
+  };
+  const Change changes[] = {
+      {"its number was given to another file", [](PendingCopy& copy) { copy.birthTime -= 1; }},
+      {"so it was, and times are not kept", [](PendingCopy& copy) { copy.handle += "x"; }},
+      {"somebody wrote to it", [&](PendingCopy&) { home.writeFile("to/doc", "more"); }},
+  };
+  for (const Change& change : changes) {
+    home.writeFile("from/" + hidden, "item");
+    home.writeFile("to/doc", "item");
+    setSameTime("to/doc", "from/" + hidden);
+    PendingRecords records = moveOf(copyAt("to/doc"));
+    change.make(records.moves.front().copy);
+    start(records);
+    EXPECT_EQ(tree().count("from/doc"), 1) << change.what;
+    EXPECT_EQ(tree().count("to/doc"), 1) << change.what;
+    EXPECT_FALSE(hasPendingWork()) << change.what;
+    home.remove("from/doc");
+    home.remove("to/doc");
+  }
 }
 
 TEST_F(Recovery, FindsItsFoldersWhereTheyAreNow) {
@@ -130,7 +162,7 @@ TEST_F(Recovery, WaitsForARootThatIsNotThere) {
 
 TEST_F(Recovery, RemovesNothingOnTheWordOfADamagedRecord) {
   home.writeFile("from/" + hidden, "x");
-  std::ofstream(state_ + "/pending") << "MRBPEND1 and then something else";
+  std::ofstream(state_ + "/pending") << "MRBPEND2 and then something else";
   static_cast<void>(opened());
   EXPECT_TRUE(fs::exists(home.at("from/" + hidden)));
   EXPECT_TRUE(fs::exists(state_ + "/pending.damaged"));
