@@ -6,9 +6,8 @@ namespace mirabel {
 
 void HostTrash::trash(std::string_view identifier, LocalVessel::ItemHandler completionHandler) {
   const auto item = provider_.lookUpItem(identifier);
-  // Applications' documents carry their own note, and what is in the trash came from elsewhere.
-  const bool isRemembered =
-      item && item->fileID() && !item->isTrashed() && !item->vs_appContainerBundleIdentifier();
+  // What is in the trash came from elsewhere.
+  const bool isRemembered = item && item->fileID() && !item->isTrashed();
   if (!isRemembered)
     return provider_.trashItemWithIdentifier(identifier, std::move(completionHandler));
   const std::uint64_t fileID = *item->fileID();

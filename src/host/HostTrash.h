@@ -9,8 +9,10 @@
 
 namespace mirabel {
 
-/// The trash as a host uses it: the provider's, and where things came from that no application
-/// owns. Any thread may call it; it outlives the completion handlers that it was given.
+/// The trash as a host uses it: the provider's, and where things came from. The provider notes that
+/// on an application's documents once they are moved, and the note stays when they are put back;
+/// what is remembered is that of the last time, and before the move. Any thread may call it; it
+/// outlives the completion handlers that it was given.
 class HostTrash {
  public:
   /// Both outlive it.

@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <set>
+#include <sys/xattr.h>
 
 #include "cli/CommandLineFixture.h"
 #include "cli/InstalledApps.h"
@@ -198,6 +199,17 @@ TEST_F(Apps, HoldItemsThatChangeLikeAnyOther) {
   fs::create_directory_symlink(apps.documents(draw), link);
   EXPECT_EQ(run({"id", link}).out, "#" + draw + "\n");
   EXPECT_EQ(run({"info", link + "/Older/first.txt"}).code, 0);
+}
+
+// Between the move and the notes on it, the process may be killed.
+TEST_F(Apps, HaveTheirDocumentsPutBackThoughNothingIsNotedOnThem) {
+  EXPECT_EQ(run({"mkdir", "Old", "--in", "#" + draw}).code, 0);
+  EXPECT_EQ(run({"mv", inDraw("sketch.txt"), inDraw("Old")}).code, 0);
+  EXPECT_EQ(run({"trash", inDraw("Old/sketch.txt")}).code, 0);
+  for (const char* name : {"user.com.norvane.trash.time#PS", "user.com.norvane.trash.putback#PS"})
+    EXPECT_EQ(::removexattr(inDraw(".Trash/sketch.txt").c_str(), name), 0);
+  EXPECT_EQ(done({"restore", inDraw(".Trash/sketch.txt")}).value("path", ""),
+            inDraw("Old/sketch.txt"));
 }
 
 TEST_F(Apps, ThatAreLeftOutAreSaidWhyOncePerReason) {
