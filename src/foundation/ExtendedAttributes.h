@@ -17,10 +17,10 @@ class URL;
 class AttributeTarget {
  public:
   virtual ~AttributeTarget() = default;
-  /// Creates or replaces; on failure the old value stays. Durable once the file system says so:
-  /// no fsync is made.
+  /// Creates or replaces; on disk when it returns. On failure the old value stays, unless it was
+  /// no more that failed than to have the new one on disk.
   [[nodiscard]] virtual Result<void> set(std::string_view name, const Data& value) = 0;
-  /// POSIX error ENODATA when there is no such attribute.
+  /// POSIX error ENODATA when there is no such attribute. On disk as above.
   [[nodiscard]] virtual Result<void> remove(std::string_view name) = 0;
 };
 

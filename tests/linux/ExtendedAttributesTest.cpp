@@ -1,8 +1,28 @@
 #include <algorithm>
+#include <cerrno>
+#include <functional>
+#include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/xattr.h>
+#include <unistd.h>
 
 #include "linux/FilesFixture.h"
 #include "support/OrdinaryUser.h"
+
+namespace {
+// Of the file that was synchronised last, and what to answer that with.
+ino_t synchronised = 0;
+int syncError = 0;
+}  // namespace
+
+/// The program's own, in front of the system's.
+extern "C" int fsync(int file) {
+  struct stat status {};
+  ::fstat(file, &status);
+  synchronised = status.st_ino;
+  errno = syncError;
+  return syncError == 0 ? static_cast<int>(::syscall(SYS_fsync, file)) : -1;
+}
 
 namespace mirabel::testing {
 namespace {
@@ -50,6 +70,23 @@ TEST_F(ExtendedAttributesOnDisk, ManyNamesAreListedAloneAndTogether) {
   for (const std::string& name : names)
     EXPECT_EQ(url.resources().hasAttribute(name), true);
   EXPECT_EQ(url.resources().hasAttribute("com.norvane.other"), false);
+}
+
+TEST_F(ExtendedAttributesOnDisk, AreSynchronisedWhenTheyAreSetAndRemoved) {
+  struct stat status {};
+  ASSERT_EQ(::stat(home.at("file").c_str(), &status), 0);
+  const auto target = platform().attributes.open(home.url("file")).value();
+  const std::function<Result<void>()> changes[] = {[&] { return target->set(attribute, {1}); },
+                                                   [&] { return target->remove(attribute); }};
+  for (const auto& change : changes) {
+    synchronised = 0;
+    EXPECT_TRUE(change());
+    EXPECT_EQ(synchronised, status.st_ino);
+  }
+  syncError = EIO;
+  const auto set = target->set(attribute, {1});
+  syncError = 0;
+  EXPECT_TRUE(!set && set.error().isPosix(EIO));
 }
 
 TEST_F(ExtendedAttributesOnDisk, AValueThatDoesNotFitLeavesTheOldOne) {

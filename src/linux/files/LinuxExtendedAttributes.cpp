@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <fcntl.h>
 #include <sys/xattr.h>
+#include <unistd.h>
 
 #include "foundation/URL.h"
 #include "linux/kernel/AttributeCalls.h"
@@ -63,14 +64,21 @@ class OpenFile final : public AttributeTarget {
   Result<void> setOnFile(std::string_view name, const Data& value) {
     if (!file_) return fail(file_.error());
     const std::string key = kernelName(name);
-    if (::fsetxattr(file_->get(), key.c_str(), value.data(), value.size(), 0) == 0) return {};
-    return fail(Error::posix(errno));
+    if (::fsetxattr(file_->get(), key.c_str(), value.data(), value.size(), 0) != 0)
+      return fail(Error::posix(errno));
+    return synchronise();
   }
 
   Result<void> removeFromFile(std::string_view name) {
     if (!file_) return fail(file_.error());
-    if (::fremovexattr(file_->get(), kernelName(name).c_str()) == 0) return {};
-    return fail(Error::posix(errno == ENOTSUP ? ENODATA : errno));
+    if (::fremovexattr(file_->get(), kernelName(name).c_str()) != 0)
+      return fail(Error::posix(errno == ENOTSUP ? ENODATA : errno));
+    return synchronise();
+  }
+
+  [[nodiscard]] Result<void> synchronise() const {
+    if (::fsync(file_->get()) != 0) return fail(Error::posix(errno));
+    return {};
   }
 
   Result<void> removeKept(std::string_view name, Result<void> done, bool isAbsent) {
