@@ -65,7 +65,7 @@ Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder
   const FileCalls& calls = context_.calls;
   const int from = item.folder.descriptor.get();
   const int to = folder.descriptor.get();
-  auto done = calls.rename(from, item.name, from, record.hiddenSource);
+  auto done = renameWithin(context_, from, item.name, record.hiddenSource);
   if (!done) {
     static_cast<void>(context_.pending.end(record));
     return done;

@@ -9,29 +9,12 @@
 namespace mirabel {
 namespace {
 
-/// Whether `folder` is the object with that status, or lies below it.
-Result<bool> liesWithin(const FileCalls& calls, int folder, const ObjectStatus& object) {
-  UniqueFd current;
-  for (int descriptor = folder;;) {
-    const auto here = calls.status(descriptor);
-    if (!here) return fail(here.error());
-    if (here->inode == object.inode && here->device == object.device) return true;
-    auto parent = calls.open(descriptor, "..", O_PATH | O_DIRECTORY);
-    if (!parent) return fail(parent.error());
-    const auto above = calls.status(parent->get());
-    if (!above) return fail(above.error());
-    if (above->inode == here->inode && above->device == here->device) return false;
-    current = std::move(*parent);
-    descriptor = current.get();
-  }
-}
-
 Result<void> canBeCopied(const OperationContext& context, const EntryPlace& source,
                          const OpenFolder& folder) {
   const auto status = context.calls.status(source.folder.get(), source.name);
   if (!status) return fail(status.error());
   if (status->kind != FileKind::folder) return {};
-  const auto within = liesWithin(context.calls, folder.descriptor.get(), *status);
+  const auto within = liesWithin(context, folder.descriptor.get(), *status);
   if (!within) return fail(within.error());
   if (*within) return fail(Error::posix(EINVAL, "a folder can't be copied into itself"));
   return {};

@@ -26,7 +26,7 @@ Result<URL> ItemMove::rename(const URL& item, const std::string& newName) const 
   if (!status) return fail(status.error());
   URL renamed = place->folder.url(newName);
   if (newName == place->name) return renamed;
-  auto done = context_.calls.rename(folder, place->name, folder, newName);
+  auto done = renameWithin(context_, folder, place->name, newName);
   if (!done && done.error().isPosix(EEXIST)) {
     // In a folder that takes both spellings for one name, the item itself is in its way. Another
     // name of the same file is a name that is taken.
@@ -47,7 +47,7 @@ Result<URL> ItemMove::respell(const ItemPlace& item, const std::string& newName)
   if (!noted) return fail(noted.error());
   const PendingRename record{*std::move(noted), item.name, context_.pending.hiddenName(), newName};
   if (auto begun = context_.pending.begin(record); !begun) return fail(begun.error());
-  auto done = context_.calls.rename(folder, item.name, folder, record.hidden);
+  auto done = renameWithin(context_, folder, item.name, record.hidden);
   if (done) {
     done = context_.calls.rename(folder, record.hidden, folder, newName);
     // Where that fails too, the next start does it.
@@ -103,10 +103,21 @@ Result<URL> ItemMove::moveUnder(const URL& item, const URL& folder,
 
 Result<void> ItemMove::renameTo(const ItemPlace& item, const OpenFolder& folder,
                                 const std::string& name) const {
-  auto renamed =
-      context_.calls.rename(item.folder.descriptor.get(), item.name, folder.descriptor.get(), name);
-  if (renamed || !renamed.error().isPosix(EXDEV)) return renamed;
-  return CrossMove(context_).run(item, folder, name);
+  const int from = item.folder.descriptor.get();
+  auto renamed = context_.calls.rename(from, item.name, folder.descriptor.get(), name);
+  if (renamed) return renamed;
+  const bool isOther = renamed.error().isPosix(EXDEV);
+  // Not to be copied into itself either.
+  if (isOther || renamed.error().isPosix(EINVAL)) {
+    const auto status = context_.calls.status(from, item.name);
+    if (!status) return fail(status.error());
+    if (status->kind == FileKind::folder) {
+      const auto within = liesWithin(context_, folder.descriptor.get(), *status);
+      if (!within) return fail(within.error());
+      if (*within) return fail(Error::posix(EINVAL, "a folder can't be moved into itself"));
+    }
+  }
+  return isOther ? CrossMove(context_).run(item, folder, name) : renamed;
 }
 
 Result<std::string> ItemMove::bounce(const ItemPlace& item, const OpenFolder& folder,

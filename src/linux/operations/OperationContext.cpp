@@ -13,7 +13,11 @@ Result<ItemPlace> itemPlaceOf(const OperationContext& context, const URL& item) 
   auto place = placeOf(context.roots, item);
   if (!place) return fail(place.error());
   if (place->name.empty()) {
-    return fail(Error::posix(EPERM, "it is not something in the documents that can be changed"));
+    const auto root = context.roots.locate(item.path());
+    const bool isRoot = root && root->relative.empty();
+    return fail(Error::posix(EPERM, isRoot ? "the root itself can't be changed"
+                                           : "it is not something in the documents that can be "
+                                             "changed"));
   }
   return ItemPlace{{std::move(place->folder), std::move(place->folderPath)},
                    std::move(place->name)};
@@ -36,6 +40,30 @@ Result<void> syncFolder(const OperationContext& context, int folder, Unreadable 
   if (!opened && isPassedOver && opened.error().isPosix(EACCES)) return {};
   if (!opened) return fail(opened.error());
   return context.calls.sync(opened->get());
+}
+
+Result<void> renameWithin(const OperationContext& context, int folder, const std::string& from,
+                          const std::string& to) {
+  auto renamed = context.calls.rename(folder, from, folder, to);
+  if (renamed || !renamed.error().isPosix(EXDEV)) return renamed;
+  return fail(Error::posix(ENOTSUP, "it can't be renamed on this kind of file system"));
+}
+
+Result<bool> liesWithin(const OperationContext& context, int folder, const ObjectStatus& object) {
+  const FileCalls& calls = context.calls;
+  UniqueFd current;
+  for (int descriptor = folder;;) {
+    const auto here = calls.status(descriptor);
+    if (!here) return fail(here.error());
+    if (here->inode == object.inode && here->device == object.device) return true;
+    auto parent = calls.open(descriptor, "..", O_PATH | O_DIRECTORY);
+    if (!parent) return fail(parent.error());
+    const auto above = calls.status(parent->get());
+    if (!above) return fail(above.error());
+    if (above->inode == here->inode && above->device == here->device) return false;
+    current = std::move(*parent);
+    descriptor = current.get();
+  }
 }
 
 Error operationError(Error error, const URL& url) {

@@ -51,6 +51,15 @@ enum class Unreadable { passedOver, refused };
 [[nodiscard]] Result<void> syncFolder(const OperationContext& context, int folder,
                                       Unreadable unreadable = Unreadable::passedOver);
 
+/// Gives an entry of a folder another name there. ENOTSUP for a folder on a file system that can't:
+/// one that is put together of several, and would have to copy it.
+[[nodiscard]] Result<void> renameWithin(const OperationContext& context, int folder,
+                                        const std::string& from, const std::string& to);
+
+/// Whether the open folder is the object with that status, or lies below it.
+[[nodiscard]] Result<bool> liesWithin(const OperationContext& context, int folder,
+                                      const ObjectStatus& object);
+
 /// Takes the error of a call for the operation's own: `fileExists` for EEXIST at `url`.
 [[nodiscard]] Error operationError(Error error, const URL& url);
 

@@ -114,6 +114,20 @@ TEST_F(OperationsOnDisk, RootsAndWhatLiesOutsideThemAreNotChanged) {
   EXPECT_TRUE(import(home.path() + "/outside", "sub"));
 }
 
+// As a folder of an overlay's lower layers is, which every rename has to copy.
+TEST_F(OperationsOnDisk, WhatCanNotBeRenamedIsSaidToBeSo) {
+  makeFolder("folder");
+  makeFolder("target");
+  setCheck([](std::string_view call) { return call == "rename" ? EXDEV : 0; });
+  for (const Result<URL>& outcome : {rename("folder", "new"), move("folder", "target")}) {
+    ASSERT_FALSE(outcome);
+    EXPECT_EQ(outcome.error(),
+              Error::posix(ENOTSUP, "it can't be renamed on this kind of file system"));
+  }
+  EXPECT_THAT(hiddenNames(), ::testing::IsEmpty());
+  EXPECT_EQ(tree().size(), 2U);
+}
+
 TEST_F(OperationsOnDisk, ManyOfOneNameFindFreeNamesQuickly) {
   makeFolder("from");
   int looks = 0;
