@@ -1,4 +1,5 @@
 #include <array>
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <malloc.h>
@@ -25,7 +26,8 @@ std::optional<std::chrono::milliseconds> watchdogPeriod() {
   return std::chrono::milliseconds(microseconds / 2000);
 }
 
-/// One run of the service.
+/// One run of the service. It fails where the state has become unusable: its manager starts it
+/// again.
 class Serving {
  public:
   explicit Serving(Program& program) : program_(program) {}
@@ -37,7 +39,8 @@ class Serving {
 
   Program& program_;
   EndSignals signals_;  // before the threads of the documents
-  WakeUp lost_;
+  WakeUp ended_;        // the bus has gone away, or the state is broken
+  std::atomic<bool> isBroken_ = false;
   // What the documents have under way reports to the service, so that they go first.
   std::unique_ptr<bus::BusService> service_;
   std::unique_ptr<LocalDocuments> documents_;
@@ -53,7 +56,9 @@ ExitCode Serving::run() {
   service_->stop();
   documents_.reset();
   service_.reset();
-  return ExitCode::done;
+  if (!isBroken_) return ExitCode::done;
+  return program_.reportFailed(
+      "the disk failed under the volume's state; the next start checks what is there");
 }
 
 /// Watches, listings and the files of calls take descriptors, more than most sessions allow at
@@ -79,10 +84,14 @@ ExitCode Serving::open() {
   options.home = program_.options().home;
   options.timeout = program_.options().timeout;
   options.notice = [this](std::string_view text) { program_.note(text); };
+  options.broken = [this] {
+    isBroken_ = true;
+    ended_.set();
+  };
   auto documents = LocalDocuments::open(std::move(options));
   if (!documents) return program_.report(documents.error(), "can't open the documents");
   documents_ = *std::move(documents);
-  auto service = bus::BusService::start(*documents_, [this] { lost_.set(); });
+  auto service = bus::BusService::start(*documents_, [this] { ended_.set(); });
   if (!service) return program_.report(service.error(), "can't serve the documents");
   service_ = *std::move(service);
   return ExitCode::done;
@@ -92,7 +101,7 @@ void Serving::wait() {
   const auto period = watchdogPeriod();
   while (true) {
     std::array<pollfd, 2> waiting{pollfd{signals_.descriptor(), POLLIN, 0},
-                                  pollfd{lost_.descriptor(), POLLIN, 0}};
+                                  pollfd{ended_.descriptor(), POLLIN, 0}};
     const int timeout = period ? static_cast<int>(period->count()) : -1;
     const int ready = ::poll(waiting.data(), waiting.size(), timeout);
     if (ready > 0) break;

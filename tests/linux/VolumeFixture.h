@@ -60,6 +60,7 @@ class VolumeFixture : public ::testing::Test {
   std::string documents_;
   std::string state_;
   std::vector<std::string> notices_;
+  int timesBroken_ = 0;
   /// What `see` and `list` add to the time of each look, in nanoseconds: as if what they see had
   /// not changed for that long.
   std::int64_t age_ = 0;

@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "linux/FailingWrites.h"
 #include "linux/VolumeFixture.h"
 #include "linux/volume/IdentityStore.h"
 
@@ -179,6 +180,51 @@ TEST_F(VolumeStateTest, AWitnessThatIsOlderOrMissingCostsNoIdentity) {
     close();
     std::filesystem::remove(witness);
   }
+}
+
+TEST_F(VolumeStateTest, AFullDiskOrQuotaPasses) {
+  write("before");
+  see("before");
+  const UUID history = index().historyUUID();
+  const std::string reserve = volumeFolder() + "/reserve";
+  for (const int error : {ENOSPC, EDQUOT}) {
+    const std::string name = "doc" + std::to_string(error);
+    write(name);
+    ASSERT_TRUE(std::filesystem::exists(reserve));
+    {
+      const FailingWrites full(error, reserve);
+      EXPECT_NE(document(name), 0u) << "the reserve was to be given up";
+      EXPECT_FALSE(std::filesystem::exists(reserve));
+    }
+    {
+      const FailingWrites full(error);
+      const auto refused = index().currentEventID();
+      ASSERT_FALSE(refused);
+      EXPECT_TRUE(refused.error().isPosix(error)) << refused.error().description();
+    }
+    EXPECT_TRUE(index().currentEventID());
+    close();
+    index();
+  }
+  EXPECT_EQ(index().historyUUID(), history);
+  EXPECT_EQ(timesBroken_, 0);
+}
+
+TEST_F(VolumeStateTest, AFailingDiskEndsItUntilItIsOpenedAnew) {
+  write("doc");
+  const std::uint32_t document = this->document("doc");
+  const UUID history = index().historyUUID();
+  {
+    const FailingWrites broken(EIO);
+    EXPECT_FALSE(index().currentEventID());
+    EXPECT_EQ(timesBroken_, 1);
+  }
+  EXPECT_FALSE(index().currentEventID());
+  EXPECT_EQ(timesBroken_, 1);
+  close();
+  EXPECT_TRUE(index().currentEventID());
+  EXPECT_EQ(this->document("doc"), document);
+  EXPECT_EQ(index().historyUUID(), history);
 }
 
 TEST_F(VolumeStateTest, ALockThatWasRemovedLetsNobodyIn) {

@@ -85,6 +85,7 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   indexOptions.makeWatcher = std::move(options.makeWatcher);
   indexOptions.timeout = options.timeout;
   indexOptions.notice = std::move(options.notice);
+  indexOptions.broken = std::move(options.broken);
   LinuxApplicationRegistry::Options registry;
   registry.home = layout->home;
   registry.directories = ApplicationDirectories::of(

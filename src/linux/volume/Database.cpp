@@ -22,13 +22,34 @@ constexpr const char* settings =
     "PRAGMA cell_size_check=ON;"
     "PRAGMA wal_autocheckpoint=0;";
 
-// A full disk is an ordinary failure, and told as one. So is another process that has the database
-// although the lock on its folder was free, because somebody removed the lock's file.
-Error lastErrorOf(sqlite3* database) {
+/// Which file was being written to, as `sqlite3_file_control` calls it: transactions write to the
+/// log, checkpoints to the database.
+enum class WrittenFile { log = SQLITE_FCNTL_JOURNAL_POINTER, database = SQLITE_FCNTL_FILE_POINTER };
+
+int lastErrnoOf(sqlite3* database, WrittenFile written) {
+  sqlite3_file* file = nullptr;
+  sqlite3_file_control(database, "main", static_cast<int>(written), &file);
+  if (file == nullptr || file->pMethods == nullptr) return 0;
+  int number = 0;
+  file->pMethods->xFileControl(file, SQLITE_FCNTL_LAST_ERRNO, &number);
+  return number;
+}
+
+// SQLite knows a full disk only, and takes a full quota for an error of the disk. It is one where a
+// sync finds it: what was written before may be lost then.
+int missingRoom(sqlite3* database, int code, WrittenFile written) {
+  if (code == SQLITE_FULL) return ENOSPC;
+  const bool isQuota = code == SQLITE_IOERR_WRITE && lastErrnoOf(database, written) == EDQUOT;
+  return isQuota ? EDQUOT : 0;
+}
+
+// A lack of room is an ordinary failure, and told as one. So is another process that has the
+// database although the lock on its folder was free, because somebody removed the lock's file.
+Error lastErrorOf(sqlite3* database, WrittenFile written = WrittenFile::log) {
   const int code = sqlite3_extended_errcode(database);
-  if (code == SQLITE_FULL) {
+  if (const int missing = missingRoom(database, code, written); missing != 0) {
     const char* path = sqlite3_db_filename(database, nullptr);
-    return Error::posix(ENOSPC, path == nullptr ? "" : path);
+    return Error::posix(missing, path == nullptr ? "" : path);
   }
   if ((code & 0xFF) == SQLITE_BUSY) {
     return Error::posix(EBUSY, "another process is using this volume's state");
@@ -74,7 +95,7 @@ Result<void> Database::checkpoint(Log log) {
   int pages = 0;
   int moved = 0;
   const int code = sqlite3_wal_checkpoint_v2(handle_, nullptr, mode, &pages, &moved);
-  if (code != SQLITE_OK) return fail(lastError());
+  if (code != SQLITE_OK) return fail(lastErrorOf(handle_, WrittenFile::database));
   if (moved < pages) return fail(Error::store(SQLITE_BUSY, "the log is still being read"));
   logPages_ = 0;
   return {};

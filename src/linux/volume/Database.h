@@ -60,7 +60,8 @@ class Statement {
 /// the lock of its owner.
 class Database {
  public:
-  /// Opens or creates. Errors: `ErrorDomain::store` with SQLite's result code.
+  /// Opens or creates. Errors, here and below: POSIX ENOSPC or EDQUOT for want of room, after which
+  /// all is as before; EBUSY; else `ErrorDomain::store` with SQLite's result code.
   [[nodiscard]] static Result<std::unique_ptr<Database>> open(const std::string& path);
   ~Database();
   Database(const Database&) = delete;

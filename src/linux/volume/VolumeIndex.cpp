@@ -361,7 +361,7 @@ Result<std::unique_ptr<VolumeIndex>> openOnce(MonitoredRoots& roots,
   if (!uuid) return fail(uuid.error());
   auto folder = StateFolder::acquire(options.stateFolder, *uuid, options.timeout, options.notice);
   if (!folder) return fail(folder.error());
-  auto state = VolumeState::open(std::move(*folder), options.notice);
+  auto state = VolumeState::open(std::move(*folder), options.notice, options.broken);
   if (!state) return fail(state.error());
   auto index =
       std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);

@@ -58,6 +58,9 @@ class VolumeIndex {
     bool followsInBackground = true;
     /// Told once when it has to wait, and when a damaged database was set aside.
     std::function<void(std::string_view)> notice;
+    /// Told once when the state has become unusable until it is opened anew, see `VolumeState`. Not
+    /// to call the index from.
+    std::function<void()> broken;
   };
 
   /// Opens or makes the index of the volume that holds `volumePath`. Errors: POSIX EBUSY when

@@ -37,8 +37,9 @@ Result<void> check(Database& database, const char* pragma) {
 
 }  // namespace
 
-Result<std::unique_ptr<VolumeState>> VolumeState::open(StateFolder folder, const Notice& notice) {
-  std::unique_ptr<VolumeState> state(new VolumeState(std::move(folder)));
+Result<std::unique_ptr<VolumeState>> VolumeState::open(StateFolder folder, const Notice& notice,
+                                                       Broken broken) {
+  std::unique_ptr<VolumeState> state(new VolumeState(std::move(folder), std::move(broken)));
   if (auto witness = Witness::read(state->folder_)) {
     state->witness_ = std::move(*witness);
     state->hasWitness_ = true;
@@ -160,7 +161,7 @@ Result<void> VolumeState::transaction(const std::function<Result<void>()>& work)
     logDebug("can't roll back; " + undone.error().description());
   }
   store_->folderPaths().clear();
-  if (auto reloaded = journal_->reload(); !reloaded) broken_ = reloaded.error();
+  if (auto reloaded = journal_->reload(); !reloaded) breakOff(reloaded.error());
   return done;
 }
 
@@ -217,11 +218,17 @@ void VolumeState::note() {
 }
 
 void VolumeState::noteFailure(const Error& error) {
-  // A failed sync leaves unknown what is on disk: nothing more is written, the next start checks.
-  if (isInputOutput(error)) broken_ = error;
-  if (!isCorruption(error)) return;
+  // A failed sync leaves unknown what is on disk: nothing more is written, whoever opens it next
+  // checks.
+  if (isCorruption(error)) files_.markAsDamaged();
+  if (isCorruption(error) || isInputOutput(error)) breakOff(error);
+}
+
+void VolumeState::breakOff(const Error& error) {
+  if (broken_) return;
   broken_ = error;
-  files_.markAsDamaged();
+  logError("the volume's state can't be used before it was opened anew; " + error.description());
+  if (isAdopted_ && tellBroken_) tellBroken_();
 }
 
 void VolumeState::closeInOrder() {

@@ -40,9 +40,14 @@ namespace mirabel {
 class VolumeState {
  public:
   using Notice = std::function<void(std::string_view)>;
+  using Broken = std::function<void()>;
 
+  /// `broken` is called once, when an I/O error of the database or damage was met after it was
+  /// opened: every transaction fails from then on, until the state is opened anew, which finds out
+  /// what can be trusted. It is called under the lock of the index.
   [[nodiscard]] static Result<std::unique_ptr<VolumeState>> open(StateFolder folder,
-                                                                 const Notice& notice);
+                                                                 const Notice& notice,
+                                                                 Broken broken = {});
   /// Closes the database in order and notes in the witness how it was left.
   ~VolumeState();
   VolumeState(const VolumeState&) = delete;
@@ -58,13 +63,14 @@ class VolumeState {
   [[nodiscard]] const UUID& history() const { return witness_.history; }
 
   /// Runs `work` in a transaction. What it wrote is on disk when this returns without an error,
-  /// and nothing of it otherwise. After an I/O error of the database every call fails.
+  /// and nothing of it otherwise. A lack of room passes: the next call may succeed.
   [[nodiscard]] Result<void> transaction(const std::function<Result<void>()>& work);
   /// Gives back the memory that longer work has left full. Not inside a transaction.
   void releaseMemory();
 
  private:
-  explicit VolumeState(StateFolder folder) : folder_(std::move(folder)), files_(folder_) {}
+  VolumeState(StateFolder folder, Broken broken)
+      : folder_(std::move(folder)), files_(folder_), tellBroken_(std::move(broken)) {}
 
   /// What the witness says of the database's files before they are opened.
   enum class Trust { asClosed, notClosed, incomplete, damaged };
@@ -79,10 +85,12 @@ class VolumeState {
   [[nodiscard]] bool foldLog(Database::Log log);
   void note();
   void noteFailure(const Error& error);
+  void breakOff(const Error& error);
   void closeInOrder();
 
   StateFolder folder_;
   DatabaseFiles files_;
+  Broken tellBroken_;
   Witness witness_;
   bool hasWitness_ = false;
   std::unique_ptr<Database> database_;
