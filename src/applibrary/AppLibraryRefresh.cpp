@@ -63,11 +63,11 @@ Result<std::vector<BundleProxy>> retrieveAppLibraries(ApplicationRegistry& regis
   return records;
 }
 
-bool refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache,
-                      std::optional<std::vector<BundleProxy>>* latest) {
+Result<bool> refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache,
+                              std::optional<std::vector<BundleProxy>>* latest) {
   const auto cannotRefresh = [](const Error& error) {
     logError("can't refresh app libraries; " + error.description());
-    return false;
+    return fail(error);
   };
   const auto records = retrieveAppLibraries(registry);
   if (!records) return cannotRefresh(records.error());

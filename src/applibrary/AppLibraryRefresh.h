@@ -15,10 +15,11 @@ namespace mirabel {
 [[nodiscard]] Result<std::vector<BundleProxy>> retrieveAppLibraries(ApplicationRegistry& registry);
 
 /// Writes what the registry tells into the main cache where that differs from what the cache
-/// holds, and answers whether it did. A failure of either is logged and leaves file and token.
+/// holds, and answers whether it did. A failure of either is logged, and leaves file and token.
 /// One call at a time in a process; other processes may do the same. `latest`, if given, gets what
 /// the registry told, if it told anything: the cache may hold display names of before.
-bool refreshMainCache(ApplicationRegistry& registry, LocalAppLibraryCache& mainCache,
-                      std::optional<std::vector<BundleProxy>>* latest = nullptr);
+[[nodiscard]] Result<bool> refreshMainCache(
+    ApplicationRegistry& registry, LocalAppLibraryCache& mainCache,
+    std::optional<std::vector<BundleProxy>>* latest = nullptr);
 
 }  // namespace mirabel

@@ -16,15 +16,16 @@ MRBAppLibraryManager::MRBAppLibraryManager(const Platform& platform)
 bool MRBAppLibraryManager::refreshFromRegistry() {
   return inBackground([&] {
     std::optional<std::vector<BundleProxy>> latest;
-    const bool hasChanged = refreshMainCache(platform_.applications, caches_.main, &latest);
-    if (!latest) return hasChanged;
+    const auto refreshed = refreshMainCache(platform_.applications, caches_.main, &latest);
+    isRefreshed_ = refreshed.has_value();
+    if (!latest) return false;
     hasLibraries_ = !latest->empty();
     latestNames_.clear();
     for (BundleProxy& record : *latest) {
       if (!record.dataContainerURL || !record.localizedName) continue;
       latestNames_.emplace(record.dataContainerURL->path(), *std::move(record.localizedName));
     }
-    return hasChanged;
+    return refreshed.value_or(false);
   });
 }
 
@@ -39,8 +40,9 @@ void MRBAppLibraryManager::followLibraries(EventStreams& events) {
                                        ? latest->second
                                        : std::move(record.localizedName).value_or("")});
     }
-    if (auto done = events.followLibraries(libraries, shared_.versionToken()); !done)
-      logError("can't follow the app libraries; " + done.error().description());
+    auto done = events.followLibraries(libraries, shared_.versionToken());
+    isFollowed_ = done.has_value();
+    if (!done) logError("can't follow the app libraries; " + done.error().description());
   });
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <functional>
 #include <map>
 #include <optional>
@@ -32,12 +33,14 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   bool upgradeFromMainCache(VesselChangeObserver* observer = nullptr);
 
   /// Has the history follow the libraries of the shared manager, under the names that the registry
-  /// had for them at the last refresh. A failure is logged; the next call tries again.
+  /// had for them at the last refresh. A failure is logged.
   void followLibraries(EventStreams& events);
+  /// Whether both the last refresh and the last following succeeded, or else it is time to try
+  /// again after a while.
+  [[nodiscard]] bool isInStep() const { return isRefreshed_ && isFollowed_; }
 
   [[nodiscard]] LocalAppLibraryManager& shared() { return shared_; }
   [[nodiscard]] AppLibraryCaches& caches() { return caches_; }
-  [[nodiscard]] const SerialQueue& backgroundQueue() const { return backgroundQueue_; }
 
   [[nodiscard]] List rootURLsForAppLibraries() const override {
     return shared_.rootURLsForAppLibraries();
@@ -56,6 +59,8 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   // What the registry told last; on the background queue.
   bool hasLibraries_ = true;
   std::map<std::string, std::string> latestNames_;  // by path of the container
+  std::atomic<bool> isRefreshed_ = true;
+  std::atomic<bool> isFollowed_ = true;
   SerialQueue backgroundQueue_{"mirabel.app-library.background"};
 };
 

@@ -7,32 +7,64 @@
 #include <utility>
 
 namespace mirabel {
+namespace {
+
+class SteadyClock final : public PacerClock {
+ public:
+  Time now() override { return std::chrono::steady_clock::now(); }
+  void waitUntil(Time time, std::condition_variable& changed,
+                 std::unique_lock<std::mutex>& lock) override {
+    changed.wait_until(lock, time);
+  }
+};
+
+}  // namespace
+
+PacerClock& PacerClock::steady() {
+  static SteadyClock clock;
+  return clock;
+}
 
 struct VSPacer::State {
-  using Clock = std::chrono::steady_clock;
-
-  State(std::string called, SerialQueue target, std::chrono::milliseconds minimum)
-      : name(std::move(called)), queue(std::move(target)), interval(minimum) {}
+  State(std::string called, SerialQueue target, std::chrono::milliseconds minimum, PacerClock& time)
+      : name(std::move(called)), queue(std::move(target)), interval(minimum), clock(time) {}
 
   const std::string name;
   SerialQueue queue;
   const std::chrono::milliseconds interval;
+  PacerClock& clock;
   EventBlock block;
   std::mutex mutex;
   std::condition_variable changed;  // of what follows, with the mutex
   bool isPending = false;
   bool isRunning = false;
   bool isEnding = false;
-  std::optional<Clock::time_point> lastStart;
+  std::optional<PacerClock::Time> lastStart;
+  std::optional<PacerClock::Time> later;  // when a signal comes by itself
   std::thread thread;
+
+  [[nodiscard]] bool isWanted() const { return isPending || (later && clock.now() >= *later); }
+
+  void awaitSignal(std::unique_lock<std::mutex>& lock) {
+    while (!isWanted() && !isEnding) {
+      if (later) {
+        clock.waitUntil(*later, changed, lock);
+      } else {
+        changed.wait(lock);
+      }
+    }
+  }
+
+  void awaitInterval(std::unique_lock<std::mutex>& lock) {
+    while (lastStart && !isEnding && clock.now() < *lastStart + interval)
+      clock.waitUntil(*lastStart + interval, changed, lock);
+  }
 
   void run() {
     std::unique_lock lock(mutex);
     for (;;) {
-      changed.wait(lock, [this] { return isPending || isEnding; });
-      if (lastStart) {
-        changed.wait_until(lock, *lastStart + interval, [this] { return isEnding; });
-      }
+      awaitSignal(lock);
+      awaitInterval(lock);
       if (isEnding) return;
       isRunning = true;
       lock.unlock();
@@ -48,14 +80,17 @@ struct VSPacer::State {
     {
       const std::lock_guard lock(mutex);
       isPending = false;
-      lastStart = Clock::now();
+      later.reset();
+      lastStart = clock.now();
     }
     block();
   }
 };
 
-VSPacer::VSPacer(std::string name, SerialQueue queue, std::chrono::milliseconds minimumFireInterval)
-    : state_(std::make_unique<State>(std::move(name), std::move(queue), minimumFireInterval)) {}
+VSPacer::VSPacer(std::string name, SerialQueue queue, std::chrono::milliseconds minimumFireInterval,
+                 PacerClock& clock)
+    : state_(
+          std::make_unique<State>(std::move(name), std::move(queue), minimumFireInterval, clock)) {}
 
 VSPacer::~VSPacer() {
   {
@@ -81,9 +116,15 @@ void VSPacer::signal() {
   state_->changed.notify_all();
 }
 
+void VSPacer::signalAfter(std::chrono::milliseconds delay) {
+  const std::lock_guard lock(state_->mutex);
+  state_->later = state_->clock.now() + delay;
+  state_->changed.notify_all();
+}
+
 void VSPacer::waitUntilIdle() {
   std::unique_lock lock(state_->mutex);
-  state_->changed.wait(lock, [this] { return !state_->isPending && !state_->isRunning; });
+  state_->changed.wait(lock, [this] { return !state_->isWanted() && !state_->isRunning; });
 }
 
 const std::string& VSPacer::name() const {

@@ -90,6 +90,7 @@ class EventStreams {
   /// Follows these libraries, and no others, as they belong to that version of their list. What
   /// lies in one that comes is told as something that happened there, and so is what lay in one
   /// that goes, as gone. It stays like this in the next process. Saying the same again is cheap.
+  /// What failed is tried again before an event ID is given out.
   [[nodiscard]] virtual Result<void> followLibraries(const std::vector<FollowedLibrary>& libraries,
                                                      std::uint64_t version) = 0;
   /// The event up to which the history told of the libraries of that version: whoever holds what

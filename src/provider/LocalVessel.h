@@ -27,6 +27,7 @@ struct ApplicationServices {
   MRBAppLibraryManager& libraries;
   NotificationCenter& notifications;
   IconService& icons;
+  PacerClock& clock = PacerClock::steady();
 };
 
 /// The principal object that the host calls. Entry points may be called from any thread; lookups

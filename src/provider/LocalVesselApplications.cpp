@@ -11,6 +11,8 @@ namespace mirabel {
 namespace {
 
 constexpr std::chrono::milliseconds minimumFireInterval{500};
+// After a failure that nothing signals the end of: too many open files, no room.
+constexpr std::chrono::seconds beforeNextTry{10};
 
 void signal(VesselManager& manager, std::string_view container) {
   manager.signalEnumeratorForContainerItemIdentifier(container, [](const std::optional<Error>&) {});
@@ -30,8 +32,8 @@ struct LocalVessel::InstalledAppsProxy {
 
 void LocalVessel::startUp() {
   installedAppsProxy_ = std::make_shared<InstalledAppsProxy>();
-  appRefreshPacer_ =
-      std::make_unique<VSPacer>("mirabel.app-refresh.pacer", appRefreshQueue_, minimumFireInterval);
+  appRefreshPacer_ = std::make_unique<VSPacer>("mirabel.app-refresh.pacer", appRefreshQueue_,
+                                               minimumFireInterval, applications_->clock);
   appRefreshPacer_->setEventBlock([this] { refreshAppLibraries(); });
   appRefreshPacer_->resume();
   appRefreshPacer_->signal();
@@ -66,6 +68,7 @@ void LocalVessel::refreshAppLibraries() {
   const bool hasManagerChanged = libraries.upgradeFromMainCache();
   // Before anybody is told to ask: what lies in the libraries is to be told then.
   if (changes_) libraries.followLibraries(changes_->events);
+  if (!libraries.isInStep()) appRefreshPacer_->signalAfter(beforeNextTry);
   if (hasMainCacheChanged) {
     logInfo("notify changes on VesselRootContainerItemIdentifier");
     signal(platform_.manager, VesselRootContainerItemIdentifier);

@@ -13,7 +13,7 @@ using ::testing::ElementsAreArray;
 
 class AppLibraryRefreshTest : public AppLibraryFixture {
  protected:
-  bool refresh() { return refreshMainCache(fake.applications, caches.main); }
+  bool refresh() { return refreshMainCache(fake.applications, caches.main).value_or(false); }
   std::vector<std::string> retrieved() {
     std::vector<std::string> identifiers;
     const auto records = retrieveAppLibraries(fake.applications);
@@ -89,7 +89,7 @@ TEST_F(AppLibraryRefreshTest, UnchangedRegistryWritesNothing) {
     EXPECT_EQ(messages().back(), "[DEBUG] bundle proxies are identical to previous version");
   }
   AppLibraryCaches next(fake.caches);
-  EXPECT_FALSE(refreshMainCache(fake.applications, next.main));
+  EXPECT_FALSE(refreshMainCache(fake.applications, next.main).value());
   EXPECT_EQ(next.main.versionToken(), 1U);
   EXPECT_EQ(fake.faults.calls(Op::cacheReplace), 1U);
   EXPECT_EQ(fake.faults.calls(Op::claimVersion), 1U);

@@ -1,7 +1,9 @@
 // Event streams on real folders, heard of by each kind of watcher.
 #include <filesystem>
 #include <fstream>
+#include <limits>
 
+#include "linux/FailingWrites.h"
 #include "linux/VolumeFixture.h"
 #include "linux/events/LinuxEventStreams.h"
 #include "platform/EventStreamsConformance.h"
@@ -84,6 +86,25 @@ TEST(LinuxEventStreams, WritesToOneFileAreMerged) {
   listener.startForPaths({history.folder()}, since);
   ASSERT_TRUE(listener.waitForFlag(eventflag::historyDone));
   EXPECT_EQ(listener.count(history.folder() + "/f"), 1u);
+}
+
+TEST(LinuxEventStreams, LibrariesThatCouldNotBeFollowedAreBeforeTheNextEventID) {
+  RealHistory history(WatcherKind::folderMarks);
+  const TempHome apps;
+  apps.makeFolder("library");
+  const std::uint64_t before = history.streams().currentEventID();
+  const std::vector<FollowedLibrary> libraries{{apps.url("library"), ""}};
+  {
+    const FailingWrites full(ENOSPC);
+    EXPECT_FALSE(history.streams().followLibraries(libraries, 1));
+    EXPECT_EQ(history.streams().currentEventID(), std::numeric_limits<std::uint64_t>::max());
+  }
+  const std::uint64_t since = history.streams().currentEventID();
+  EXPECT_GE(since, before);
+  history.change(apps.at("library/f"));
+  StreamListener listener(history);
+  listener.startForPaths({apps.at("library")}, since);
+  EXPECT_TRUE(listener.waitForPath(apps.at("library/f")));
 }
 
 }  // namespace

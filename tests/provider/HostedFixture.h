@@ -12,6 +12,7 @@
 #include "support/FakeEventStreams.h"
 #include "support/FakeIconService.h"
 #include "support/FakeNotificationCenter.h"
+#include "support/FakePacerClock.h"
 #include "support/FakePlatform.h"
 #include "support/LogCapture.h"
 
@@ -28,9 +29,9 @@ class HostedFixture : public ::testing::Test {
   }
   /// Makes the provider, and returns when it has seen what is installed.
   void start() {
-    vessel = std::make_unique<LocalVessel>(fake.platform(), libraries, libraries,
-                                           ChangeServices{events, fake.diagnostics, changes},
-                                           ApplicationServices{libraries, notifications, icons});
+    vessel = std::make_unique<LocalVessel>(
+        fake.platform(), libraries, libraries, ChangeServices{events, fake.diagnostics, changes},
+        ApplicationServices{libraries, notifications, icons, time});
     vessel->waitForAppLibraries();
   }
 
@@ -38,6 +39,7 @@ class HostedFixture : public ::testing::Test {
   FakeEventStreams events;
   FakeNotificationCenter notifications;
   FakeIconService icons;
+  FakePacerClock time;  // of the refreshes of the app libraries
   LogCapture log;
   MRBAppLibraryManager libraries{fake.platform()};
   FileObjectURLs identity{fake.platform(), libraries};

@@ -45,7 +45,16 @@ Result<void> LinuxEventStreams::followLibraries(const std::vector<FollowedLibrar
   folders.reserve(libraries.size());
   for (const FollowedLibrary& library : libraries)
     folders.push_back({library.folder.path(), library.label});
-  return index_.follow(folders, version);
+  const std::scoped_lock lock(mutex_);
+  leftOut_ = LeftOut{std::move(folders), version};
+  return followLeftOut();
+}
+
+Result<void> LinuxEventStreams::followLeftOut() {
+  if (!leftOut_) return {};
+  auto done = index_.follow(leftOut_->folders, leftOut_->version);
+  if (done) leftOut_.reset();
+  return done;
 }
 
 std::uint64_t LinuxEventStreams::lastEventIDUnder(std::uint64_t version) {
@@ -53,7 +62,12 @@ std::uint64_t LinuxEventStreams::lastEventIDUnder(std::uint64_t version) {
 }
 
 std::uint64_t LinuxEventStreams::currentEventID() {
-  auto id = index_.currentEventID();
+  // What happens in a library that is not followed has no event: an ID would tell of nothing new.
+  const auto followed = [&] {
+    const std::scoped_lock lock(mutex_);
+    return followLeftOut();
+  }();
+  auto id = followed ? index_.currentEventID() : fail(followed.error());
   if (id) return *id;
   // No history was ever there to give this out: whoever asks for what came after starts over.
   logError("can't read the event history; " + id.error().description());

@@ -1,6 +1,9 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
+#include <mutex>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -33,10 +36,17 @@ class LinuxEventStreams final : public EventStreams {
 
  private:
   [[nodiscard]] StreamServices services() const;
+  [[nodiscard]] Result<void> followLeftOut();
 
   VolumeIndex& index_;
   std::unique_ptr<LiveStreams> live_;
   std::shared_ptr<StreamGate> gate_;
+  struct LeftOut {
+    std::vector<FollowedFolder> folders;
+    std::uint64_t version;
+  };
+  std::mutex mutex_;
+  std::optional<LeftOut> leftOut_;  ///< what could not be followed yet; with mutex_
 };
 
 }  // namespace mirabel
