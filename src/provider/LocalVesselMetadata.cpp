@@ -67,9 +67,13 @@ LocalVessel::ItemResult LocalVessel::storeTagData(const std::optional<Data>& tag
     logError("can't find URL for item; " + missing.description());
     return fail(missing);
   }
-  const auto payload =
-      attributePayload(std::optional(labelsIn(tagData)), keyedarchive::archiveStrings);
-  if (const auto error = writeAttribute(attributename::tags, payload, *url)) {
+  const auto payload = keyedarchive::archiveStrings(labelsIn(tagData));
+  if (!payload) {
+    const Error tooLong = Error::posix(E2BIG, "the labels have more than 64 KiB");
+    logError("can't archive tags; " + payload.error().description());
+    return fail(tooLong);
+  }
+  if (const auto error = writeAttribute(attributename::tags, *payload, *url)) {
     logError("can't set xattr " + std::string(attributename::tags) + "; " + error->description());
     return fail(*error);
   }

@@ -84,10 +84,14 @@ TEST_F(MetadataTest, WhatNoArchiveHoldsRemovesTheAttribute) {
   vessel->setLastUsedDate(date, file, Completions().handler());
   vessel->setLastUsedDate(Date{Date::latest.seconds + 1, 0}, file, done.handler());
   EXPECT_EQ(done.item()->lastUsedDate(), std::nullopt);
-  done.results.clear();
-  vessel->setTagData(encodeTagData({{std::string(100'000, 'x')}}).value(), file, done.handler());
-  EXPECT_EQ(done.item()->tagData(), std::nullopt);
   EXPECT_THAT(attributes(), IsEmpty());
+}
+
+TEST_F(MetadataTest, TooManyLabelsAreRefusedAndTheTagsStay) {
+  vessel->setTagData(encodeTagData({{"work"}}).value(), file, Completions().handler());
+  vessel->setTagData(encodeTagData({{std::string(100'000, 'x')}}).value(), file, done.handler());
+  EXPECT_TRUE(done.error().isPosix(E2BIG));
+  EXPECT_EQ(labels(), std::vector<std::string>{"work"});
 }
 
 struct Setter {
