@@ -38,14 +38,11 @@ TEST_F(EnumeratingChanges, AnchorOfNowStartsAnEnumerationFromThere) {
   const Data anchor = anchorOf(*of).value();
   const FSChangeToken token{0, fake.historyUUID, 1, 0, 0};
   EXPECT_EQ(FSChangeToken::decode(anchor), token);
-  log.clear();
   const auto enumeration = start(of, anchor);
   ASSERT_NE(enumeration, nullptr);
   EXPECT_TRUE(enumeration->hasStarted);
   EXPECT_EQ(enumeration->token, token);
   EXPECT_EQ(enumeration->urls, of->urls());
-  EXPECT_THAT(log.sectionLabels(),
-              ElementsAre("enumerate changes for fid=1 with token " + token.description()));
   EXPECT_EQ(of->runningEnumerations(), 1U);
   EXPECT_THAT(observer->calls, IsEmpty());
   enumeration->observer->finishEnumeratingWithError(Error::posix(EIO));
@@ -53,24 +50,14 @@ TEST_F(EnumeratingChanges, AnchorOfNowStartsAnEnumerationFromThere) {
 
 TEST_F(EnumeratingChanges, UnusableAnchorEndsInAnError) {
   const auto of = enumerator();
-  const auto refused = [&](const Data& anchor) {
-    log.clear();
+  const Data usable = FSChangeToken{0, fake.historyUUID, 0, 0, 0}.encode();
+  fake.faults.fail(Op::historyUUID, Error::posix(EIO), 2, 2);
+  for (const Data& anchor : {dataFromString("junk"), FSChangeToken{}.encode(), usable}) {
     EXPECT_EQ(start(of, anchor), nullptr);
     EXPECT_EQ(of->runningEnumerations(), 0U);
-    return log.messages().back();
-  };
-  EXPECT_EQ(refused(dataFromString("junk")),
-            error("can't create change token from anchor data, resetting"));
-  EXPECT_EQ(refused(FSChangeToken{}.encode()), info("device UUID changed (" + UUID{}.description() +
-                                                    " -> " + fake.historyUUID.description() + ")"));
-  fake.faults.fail(Op::historyUUID, Error::posix(EIO), 1, 2);
-  EXPECT_EQ(refused(FSChangeToken{0, fake.historyUUID, 0, 0, 0}.encode()),
-            error("can't get volume UUID for " + fake.path("")));
+  }
   EXPECT_THAT(observer->calls, ElementsAre("error -1002", "error -1002", "error 3"));
-  log.clear();
   EXPECT_FALSE(anchorOf(*of));
-  EXPECT_THAT(log.messages(),
-              ElementsAre(error("can't get volume UUID for \"" + fake.path("") + "\"")));
 }
 
 TEST_F(EnumeratingChanges, BatchesArePassedOnAndTheFirstFinishReleasesTheEnumeration) {
@@ -98,12 +85,8 @@ TEST_F(EnumeratingChanges, BatchesArePassedOnAndTheFirstFinishReleasesTheEnumera
 TEST_F(EnumeratingChanges, WorkingSetRefreshesFileIDsBeforeTheBatchIsPassedOn) {
   const auto enumeration =
       start(enumerator(workingSet), FSChangeToken{0, fake.historyUUID, 0, 0, 0}.encode());
-  const VesselItems updated = items("a");
-  log.clear();
   fake.faults.fail(Op::permanentStorageForItemAtURL, Error::posix(EIO));
-  enumeration->observer->didUpdateItems(updated);
-  EXPECT_THAT(log.messages(), ElementsAre(debug("updating fileID in palimpsest for " +
-                                                updated.front()->description())));
+  enumeration->observer->didUpdateItems(items("a"));
   EXPECT_EQ(fake.faults.calls(Op::permanentStorageForItemAtURL), 1U);
   enumeration->observer->finishEnumeratingWithError(Error::syncAnchorExpired());
   EXPECT_THAT(observer->calls, ElementsAre("update a", "error -1002"));
