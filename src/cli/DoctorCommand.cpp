@@ -60,7 +60,7 @@ Finding birthTimeFinding(bool has) {
   const std::string subject = "birth times";
   if (has) return {subject, Health::good, "the volume tells when a file was made", ""};
   return {subject, Health::limited, "the volume does not tell when a file was made",
-          "creation dates are absent; nothing else suffers"};
+          "creation dates are absent, and every question about an item takes a look at the disk"};
 }
 
 Finding handleFinding(bool has, bool hasBirthTimes) {

@@ -160,6 +160,21 @@ TEST_P(FollowerTest, ADocumentGoesIntoAFolderThatIsNewWithItsIdentity) {
   }
 }
 
+TEST_P(FollowerTest, AWriteWithinTheSecondOfTheLastIsTold) {
+  write("f", "aa");
+  if (!isCoarseStamp(status("f").changeTime)) GTEST_SKIP() << "times are fine here";
+  anchor();
+  for (int round = 0; round < 5; ++round) {
+    write("f", "bb");
+    age_ = 200'000'000;  // less than the step of the times
+    see("f");
+    const std::uint64_t since = anchor();
+    write("f", "cc");
+    anchor();
+    EXPECT_TRUE(told(since).contains("/f")) << round;
+  }
+}
+
 TEST_P(FollowerTest, WhatChangesWhileFoldersAreReadIsTakenIn) {
   constexpr int folders = 60;
   const auto folder = [](int number) { return "d" + std::to_string(number % folders); };

@@ -17,16 +17,8 @@ constexpr std::string_view tooLarge = "its entry is too large";
 constexpr std::string_view unreadable = "its entry can't be read";
 constexpr std::string_view noEntry = "its entry is no desktop entry";
 
-// Times of files move on with the clock's tick: after a look in the same tick, a file may change
-// again and keep them.
-constexpr std::int64_t longestTick = 20'000'000;
-
 // The entries of both types are looked at in turn, and by more than one thread.
 constexpr std::uint64_t passesKept = 4;
-
-bool isSettled(const ObjectStatus& status) {
-  return status.changeTime < status.seenAt - longestTick;
-}
 
 bool isSame(const ObjectStatus& a, const ObjectStatus& b) {
   return a.inode == b.inode && a.device == b.device && a.size == b.size &&
@@ -104,7 +96,7 @@ bool EntryReader::findKept(const std::string& path, const ObjectStatus& now,
 void EntryReader::keep(const std::string& path, const ObjectStatus& status,
                        const EntryReading& reading) {
   const std::lock_guard lock(mutex_);
-  if (isSettled(status)) {
+  if (isSettled(status.changeTime, status.seenAt)) {
     kept_.insert_or_assign(path, Kept{status, reading, pass_});
   } else {
     kept_.erase(path);

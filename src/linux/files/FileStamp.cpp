@@ -12,12 +12,6 @@
 namespace mirabel {
 namespace {
 
-// Several ticks of the clock that stamps files.
-constexpr std::int64_t settlingTime = 100'000'000;
-// Where files are stamped in whole seconds, or two of them.
-constexpr std::int64_t coarseSettlingTime = 3'000'000'000;
-constexpr std::int64_t coarseStamp = 10'000'000;
-
 bool areOneObject(const ObjectStatus& a, const ObjectStatus& b) {
   return a.inode == b.inode && a.device == b.device && a.birthTime == b.birthTime;
 }
@@ -49,8 +43,7 @@ bool FileStamp::isSameAs(const FileStamp& other) const {
 }
 
 bool FileStamp::isSettled() const {
-  const bool isCoarse = file.changeTime % coarseStamp == 0;
-  return file.changeTime < file.seenAt - (isCoarse ? coarseSettlingTime : settlingTime);
+  return mirabel::isSettled(file.changeTime, file.seenAt);
 }
 
 std::optional<FileStamp> stampOf(const std::string& path) {

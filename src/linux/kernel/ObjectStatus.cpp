@@ -8,9 +8,11 @@
 #include <fcntl.h>
 #include <iterator>
 #include <limits>
+#include <linux/magic.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 #include <sys/utsname.h>
+#include <sys/vfs.h>
 #include <time.h>
 #include <utility>
 
@@ -64,6 +66,14 @@ std::int64_t coarseNow() {
   timespec now{};
   ::clock_gettime(CLOCK_REALTIME_COARSE, &now);
   return now.tv_sec * nanosecondsPerSecond + now.tv_nsec;
+}
+
+bool isKernelBefore(int wantedMajor, int wantedMinor) {
+  utsname system{};
+  int major = 0, minor = 0;
+  if (::uname(&system) != 0) return true;
+  if (std::sscanf(system.release, "%d.%d", &major, &minor) != 2) return true;
+  return major < wantedMajor || (major == wantedMajor && minor < wantedMinor);
 }
 
 // The kernel itself knows, without asking the file system that is mounted there.
@@ -146,15 +156,27 @@ std::optional<std::string> handleAt(int directory, const std::string& name) {
   return result;
 }
 
-bool timesAreCoarse() {
-  static const bool areCoarse = [] {
-    utsname system{};
-    int major = 0, minor = 0;
-    if (::uname(&system) != 0) return true;
-    if (std::sscanf(system.release, "%d.%d", &major, &minor) != 2) return true;
-    return major < 6 || (major == 6 && minor < 13);
-  }();
-  return areCoarse;
+bool isCoarseStamp(std::int64_t time) {
+  constexpr std::int64_t finestCoarse = 10'000'000;
+  return time % finestCoarse == 0;
+}
+
+bool isSettled(std::int64_t changeTime, std::int64_t seenAt) {
+  // Clocks that stamp files step by up to 10 ms; ten steps leave no doubt. FAT steps by two
+  // seconds.
+  constexpr std::int64_t settlingTime = 100'000'000;
+  constexpr std::int64_t coarseSettlingTime = 3 * nanosecondsPerSecond;
+  return changeTime < seenAt - (isCoarseStamp(changeTime) ? coarseSettlingTime : settlingTime);
+}
+
+bool timesAreCoarse(int object) {
+  static const bool kernelIsOld = isKernelBefore(6, 13);
+  if (kernelIsOld) return true;
+  constexpr decltype(statfs::f_type) fine[] = {EXT4_SUPER_MAGIC, XFS_SUPER_MAGIC, BTRFS_SUPER_MAGIC,
+                                               TMPFS_MAGIC};
+  struct statfs info;
+  if (::fstatfs(object, &info) != 0) return true;
+  return std::ranges::find(fine, info.f_type) == std::end(fine);
 }
 
 std::vector<std::uint64_t> inodesIn(std::string_view handle) {

@@ -47,9 +47,15 @@ struct ObjectStatus {
 /// on its file system. Starts with the handle's type. Nothing where the file system has none.
 [[nodiscard]] std::optional<std::string> handleAt(int directory, const std::string& name);
 
-/// Whether two changes of a file within a tick of the clock may leave the same times, also when it
-/// was looked at in between: on kernels before 6.13.
-[[nodiscard]] bool timesAreCoarse();
+/// Whether whatever changes after a look at `seenAt` is sure to get another change time.
+[[nodiscard]] bool isSettled(std::int64_t changeTime, std::int64_t seenAt);
+/// Whether the time is one of a file system that stamps whole seconds, or hundredths of them. Of
+/// another one such a time is rare, and taking it for one costs a little time.
+[[nodiscard]] bool isCoarseStamp(std::int64_t time);
+/// Whether the file system of an open object may leave the same times after two changes within a
+/// tick of the clock, also when the object was looked at in between: all of them on kernels before
+/// 6.13, and most later on.
+[[nodiscard]] bool timesAreCoarse(int object);
 
 /// Numbers in a handle, one of which is the inode number of its object on the file systems there
 /// are: where to look for what has that handle.

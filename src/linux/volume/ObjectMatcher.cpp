@@ -13,13 +13,6 @@
 namespace mirabel {
 namespace {
 
-// Clocks that stamp files step by up to 10 ms; ten steps leave no doubt.
-constexpr std::int64_t settlingTime = 100'000'000;
-
-bool isSettledAt(std::int64_t changeTime, std::int64_t seenAt) {
-  return changeTime < seenAt - settlingTime;
-}
-
 bool isOfKind(ObjectKind kind, FileKind seen) {
   switch (seen) {
     case FileKind::regular:
@@ -97,7 +90,7 @@ void refresh(ObjectRow& row, const ObjectStatus& status) {
   const bool wasSettled = row.isSettled && row.changeTime == status.changeTime;
   row.birthTime = status.birthTime;
   row.changeTime = status.changeTime;
-  row.isSettled = wasSettled || isSettledAt(status.changeTime, status.seenAt);
+  row.isSettled = wasSettled || isSettled(status.changeTime, status.seenAt);
   row.modificationTime = status.modificationTime;
   row.size = status.size;
 }
@@ -107,8 +100,7 @@ bool hasChanged(const ObjectRow& row, const ObjectStatus& status) {
 }
 
 bool isStale(const ObjectRow& row, const ObjectStatus& status) {
-  return hasChanged(row, status) ||
-         (!row.isSettled && isSettledAt(status.changeTime, status.seenAt));
+  return hasChanged(row, status) || (!row.isSettled && isSettled(status.changeTime, status.seenAt));
 }
 
 ObjectKind objectKind(FileKind kind, bool isPackage) {

@@ -163,7 +163,7 @@ Result<void> TreeScan::takeInEntries(const Folder& folder, FolderReading& readin
 Result<std::uint64_t> TreeScan::takeInBatch(const Folder& folder, FolderReading& reading) {
   for (Sighting& sighting : reading.entries) {
     // What was looked at right after a change may have had another one since.
-    sighting.isReported = timesAreCoarse();
+    sighting.isReported = areCoarse || isCoarseStamp(sighting.status.changeTime);
     sighting.isPackage =
         sighting.status.kind == FileKind::folder && context_.isPackageName(sighting.name);
   }
@@ -176,6 +176,7 @@ Result<std::uint64_t> TreeScan::takeInBatch(const Folder& folder, FolderReading&
     ++placed;
     const bool isFolder =
         sighting.status.kind == FileKind::folder && sighting.status.device == context_.device;
+  const bool areCoarse = timesAreCoarse(reading.folder.get());
     if (!isFolder) continue;
     const bool isFollowed = watcher_ != nullptr && watcher_->isWatched(sighting.fileID);
     if (folder.depth == Depth::folder && isFollowed) continue;
