@@ -3,8 +3,12 @@
 #include <cerrno>
 #include <filesystem>
 #include <map>
+#include <memory>
+#include <sched.h>
 #include <set>
 #include <string>
+#include <string_view>
+#include <sys/mount.h>
 #include <sys/resource.h>
 
 #include "linux/FailingLooks.h"
@@ -128,6 +132,45 @@ TEST_P(PassingFailuresTest, ACatchUpThatFailsIsMadeUpForByTheNext) {
   }
 }
 
+TEST_P(PassingFailuresTest, AnErrorNamesWhatCouldNotBeLookedAt) {
+  const FailingLooks failing(
+      [](int, const char* name) { return std::string_view(name) == "h" ? EIO : 0; });
+  const auto compared = index().reconcile();
+  ASSERT_FALSE(compared);
+  EXPECT_NE(compared.error().description().find(path("c/h")), std::string::npos);
+}
+
+TEST_P(PassingFailuresTest, ADeadMountIsUnreadableAndTheRestIsFollowed) {
+  makeFolder("m/server");
+  if (::unshare(CLONE_NEWNS) != 0 ||
+      ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
+      ::mount("none", path("m/server").c_str(), "tmpfs", 0, nullptr) != 0) {
+    GTEST_SKIP() << "may not mount";
+  }
+  std::unique_ptr<const std::string, void (*)(const std::string*)> mounted(
+      new std::string(path("m/server")), [](const std::string* place) {
+        EXPECT_EQ(::umount2(place->c_str(), MNT_DETACH), 0);
+        delete place;
+      });
+  close();  // what is open belongs to the mounts of before
+  const auto unreadable = [this] { return index().status().following.unreadableFolders; };
+  {
+    const FailingLooks failing(
+        [](int, const char* name) { return std::string_view(name) == "server" ? ENOTCONN : 0; });
+    const std::uint64_t since = anchor();
+    write("c/g", "longer");
+    ASSERT_TRUE(index().currentEventID());
+    EXPECT_TRUE(told(since).contains("c/g"));
+    EXPECT_EQ(unreadable(), 1U);
+    ASSERT_TRUE(index().reconcile());
+    EXPECT_EQ(unreadable(), 1U);
+  }
+  mounted.reset();
+  remove("m");
+  anchor();
+  EXPECT_EQ(unreadable(), 0U);
+}
+
 TEST_P(PassingFailuresTest, TooManyOpenFilesIsNoDeletion) {
   const std::uint64_t since = anchor();
   rlimit before{};
@@ -152,6 +195,18 @@ TEST(LookFailures, OfADeadMountSayThatItIsOneAndOthersStayWhatTheyAre) {
   }
   const FailingLooks failing([](int, const char*) { return ENOENT; });
   EXPECT_TRUE(statusOf("/proc").error().isPosix(ENOENT));
+}
+
+TEST(ChangeTimes, AreSettledWhenTheNextChangeMustHaveAnotherOne) {
+  constexpr std::int64_t second = nanosecondsPerSecond;
+  constexpr std::int64_t fine = 7 * second + 123'456'789;
+  EXPECT_FALSE(isSettled(fine, fine));
+  EXPECT_FALSE(isSettled(fine, fine + second / 10));
+  EXPECT_TRUE(isSettled(fine, fine + second / 10 + 1));
+  for (const std::int64_t coarse : {7 * second, 7 * second + 250'000'000}) {
+    EXPECT_FALSE(isSettled(coarse, coarse + 2 * second));
+    EXPECT_TRUE(isSettled(coarse, coarse + 3 * second + 1));
+  }
 }
 
 INSTANTIATE_TEST_SUITE_P(, PassingFailuresTest,

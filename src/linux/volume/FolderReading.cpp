@@ -1,10 +1,10 @@
 #include "linux/volume/FolderReading.h"
 
-#include <atomic>
 #include <cerrno>
 #include <fcntl.h>
 #include <utility>
 
+#include "foundation/LookFailure.h"
 #include "foundation/SplitWork.h"
 #include "linux/volume/IndexContext.h"
 
@@ -44,23 +44,22 @@ Result<FolderReading> beginReading(UniqueFd folder) {
 Result<void> readNext(FolderReading& reading) {
   if (auto named = readNames(reading); !named) return named;
   std::vector<Sighting>& entries = reading.entries;
-  std::vector<char> isThere(entries.size(), 0);
-  std::atomic<int> failure = 0;
+  std::vector<int> failures(entries.size(), 0);
   splitWork(entries.size(), pieceSize, [&](std::size_t begin, std::size_t end) {
     for (std::size_t i = begin; i < end; ++i) {
       auto status = statusAt(reading.folder.get(), entries[i].name);
-      if (!status && !status.error().isPosix(ENOENT) && !status.error().isPosix(EACCES)) {
-        failure = static_cast<int>(status.error().code);
-      }
-      if (!status) continue;
-      isThere[i] = 1;
-      entries[i].status = *status;
+      if (!status) failures[i] = static_cast<int>(status.error().code);
+      if (status) entries[i].status = *status;
     }
   });
-  if (failure != 0) return fail(Error::posix(failure));
   std::size_t kept = 0;
   for (std::size_t i = 0; i < entries.size(); ++i) {
-    if (isThere[i] == 0) continue;
+    if (failures[i] != 0) {
+      const Error error = Error::posix(failures[i], entries[i].name);
+      if (!saysOutOfReach(error)) return fail(error);
+      if (error.isPosix(EXDEV)) ++reading.deadMounts;
+      continue;
+    }
     if (kept != i) entries[kept] = std::move(entries[i]);
     ++kept;
   }

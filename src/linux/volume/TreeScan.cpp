@@ -92,7 +92,7 @@ Result<void> TreeScan::read(const Folder& folder) {
   auto opened = context_.roots.open(folder.path, O_RDONLY | O_DIRECTORY);
   if (!opened && !isClosedToUs(opened.error())) return fail(opened.error());
   if (!opened) {
-    unreadable_.insert(folder.id);
+    unreadable_[folder.id] = 1;
     read_.insert(folder.id);
     return findMissing(folder);
   }
@@ -113,14 +113,29 @@ Result<void> TreeScan::read(const Folder& folder) {
 /// Who is watched is known: whoever meets the folder under its new name reads it.
 Result<void> TreeScan::giveUp(const Folder& folder, const Error& error) {
   if (watcher_ != nullptr) watcher_->forget(folder.id);
-  return fail(error);
+  if (error.domain != ErrorDomain::posix) return fail(error);
+  const auto entry = error.userInfo.find(errorkey::detail);
+  const std::string name = entry == error.userInfo.end() ? "" : "/" + entry->second;
+  return fail(Error::posix(static_cast<int>(error.code), "\"" + folder.path + name + "\""));
+}
+
+std::size_t TreeScan::unreadableFolders() const {
+  std::size_t count = 0;
+  for (const auto& [id, folders] : unreadable_) {
+    const auto row = context_.store.objectByFileID(id);
+    if (!row || !*row || !(*row)->location) continue;
+    const auto path = context_.paths.pathOf(*(*row)->location);
+    if (path && *path) count += folders;
+  }
+  return count;
 }
 
 Result<void> TreeScan::takeIn(const Folder& folder, FolderReading reading) {
   auto done = lookAtItself(folder, reading.status);
   if (done) done = takeInEntries(folder, reading);
   if (!done) return giveUp(folder, done.error());
-  unreadable_.erase(folder.id);
+  if (reading.deadMounts == 0) unreadable_.erase(folder.id);
+  if (reading.deadMounts != 0) unreadable_[folder.id] = reading.deadMounts;
   read_.insert(folder.id);
   return {};
 }
@@ -161,6 +176,7 @@ Result<void> TreeScan::takeInEntries(const Folder& folder, FolderReading& readin
 
 /// Answers how many of them have a place now.
 Result<std::uint64_t> TreeScan::takeInBatch(const Folder& folder, FolderReading& reading) {
+  const bool areCoarse = timesAreCoarse(reading.folder.get());
   for (Sighting& sighting : reading.entries) {
     // What was looked at right after a change may have had another one since.
     sighting.isReported = areCoarse || isCoarseStamp(sighting.status.changeTime);
@@ -176,7 +192,6 @@ Result<std::uint64_t> TreeScan::takeInBatch(const Folder& folder, FolderReading&
     ++placed;
     const bool isFolder =
         sighting.status.kind == FileKind::folder && sighting.status.device == context_.device;
-  const bool areCoarse = timesAreCoarse(reading.folder.get());
     if (!isFolder) continue;
     const bool isFollowed = watcher_ != nullptr && watcher_->isWatched(sighting.fileID);
     if (folder.depth == Depth::folder && isFollowed) continue;

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <unordered_map>
 #include <unordered_set>
 #include <utility>
 #include <vector>
@@ -54,8 +55,8 @@ class TreeScan {
   [[nodiscard]] bool wasDisturbed() const { return !disturbed_.empty(); }
   /// Set when the kernel refused to watch a folder that can be read.
   [[nodiscard]] const std::optional<Error>& watchFailure() const { return watchFailure_; }
-  /// Folders that were met and could not be read when they were looked into last.
-  [[nodiscard]] std::size_t unreadableFolders() const { return unreadable_.size(); }
+  /// How many folders could not be read when they were looked into last, and are still there.
+  [[nodiscard]] std::size_t unreadableFolders() const;
 
  private:
   struct Folder {
@@ -80,7 +81,8 @@ class TreeScan {
   std::unordered_set<std::uint64_t> read_;
   std::size_t entriesRead_ = 0;  // in the transaction under way
   std::vector<std::uint64_t> disturbed_;
-  std::unordered_set<std::uint64_t> unreadable_;
+  // Folders that could not be read, and how many there are in and at each.
+  std::unordered_map<std::uint64_t, std::size_t> unreadable_;
   std::optional<Error> watchFailure_;
 };
 
