@@ -248,6 +248,17 @@ bool Follower::isComparisonDue() const {
 
 Result<void> Follower::scanAll(const Transaction& transaction) {
   const auto began = std::chrono::steady_clock::now();
+  auto compared = compareOnce(transaction);
+  // Also when it failed: whoever waits is not to try again at once.
+  comparedAt_ = std::chrono::steady_clock::now();
+  comparisonTook_ = comparedAt_ - began;
+  if (!compared) return compared;
+  foldersNeeded_ = scan_.foldersRead();
+  // Only now is it known that what is missing did not turn up elsewhere.
+  return settle(transaction);
+}
+
+Result<void> Follower::compareOnce(const Transaction& transaction) {
   hasLost_ = false;
   missing_.clear();
   recent_.clear();
@@ -266,12 +277,7 @@ Result<void> Follower::scanAll(const Transaction& transaction) {
   static_cast<void>(context_.learner.takeArrivedFolders());
   auto added = transaction([&] { return scan_.addRoots(); });
   if (added) added = scanArrived(transaction, [this] { return drainMeanwhile(); });
-  if (!added) return added;
-  foldersNeeded_ = scan_.foldersRead();
-  comparedAt_ = std::chrono::steady_clock::now();
-  comparisonTook_ = comparedAt_ - began;
-  // Only now is it known that what is missing did not turn up elsewhere.
-  return settle(transaction);
+  return added;
 }
 
 void Follower::prepareWatcher() {

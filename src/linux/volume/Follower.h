@@ -77,6 +77,7 @@ class Follower final : public RecentPlaces {
   [[nodiscard]] Result<void> addChangedRoots(const Transaction& transaction);
   [[nodiscard]] Result<void> addByID(std::uint64_t folder);
   [[nodiscard]] Result<void> scanAll(const Transaction& transaction);
+  [[nodiscard]] Result<void> compareOnce(const Transaction& transaction);
   void prepareWatcher();
   void giveUpWatching(const Error& error);
 
