@@ -6,6 +6,7 @@
 
 #include "linux/FailingWrites.h"
 #include "linux/VolumeFixture.h"
+#include "linux/volume/Database.h"
 #include "linux/volume/IdentityStore.h"
 
 namespace mirabel {
@@ -20,6 +21,44 @@ class VolumeStateTest : public VolumeFixture {
   }
   std::string database() const { return volumeFolder() + "/volume.db"; }
 };
+
+TEST_F(VolumeStateTest, WhatIsLongGoneIsForgottenAndItsIdentifiersAreNotGivenAgain) {
+  const auto inDatabase = [this](const char* sql) {
+    close();
+    auto opened = Database::open(database()).value();
+    auto statement = opened->prepare(sql).value();
+    return statement.step().value() ? statement.integer(0) : 0;
+  };
+  const char* const count = "SELECT count(*) FROM objects";
+  makeFolder("folder/inner");
+  write("kept");
+  std::set<std::uint64_t> files{file("folder"), file("folder/inner"), file("kept")};
+  std::set<std::uint32_t> documents{document("kept")};
+  for (const char* name : {"gone", "folder/a", "folder/inner/b"}) {
+    write(name);
+    files.insert(file(name));
+    documents.insert(document(name));
+  }
+  ASSERT_TRUE(index().keptAttributes().set(file("gone"), "name", Data{}));
+  const std::uint64_t kept = file("kept");
+  remove("gone");
+  remove("folder");
+  ASSERT_TRUE(index().reconcile());
+  EXPECT_EQ(inDatabase(count), 7);
+  index();  // notes when they were gone
+  EXPECT_EQ(inDatabase(count), 7);
+  inDatabase("UPDATE objects SET place = 1 WHERE folder IS NULL AND place IS NOT NULL");
+  EXPECT_TRUE(index().keptAttributes().isEmpty());
+  EXPECT_EQ(inDatabase(count), 2);
+  EXPECT_EQ(file("kept"), kept);
+  for (int i = 0; i < 30; ++i) {
+    const std::string name = "new" + std::to_string(i);
+    write(name);
+    EXPECT_TRUE(files.insert(file(name)).second) << i;
+    EXPECT_TRUE(documents.insert(document(name)).second) << i;
+    if (i == 15) close();
+  }
+}
 
 TEST_F(VolumeStateTest, OneProcessOwnsTheVolumeAndOthersAreTold) {
   write("doc");

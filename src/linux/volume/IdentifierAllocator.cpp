@@ -34,7 +34,8 @@ Result<IdentifierAllocator> IdentifierAllocator::open(IdentityStore& store, Witn
   auto file = store.number("next_file_id");
   auto slot = store.number("next_slot");
   auto spent = store.number("inode_numbers_spent");
-  for (const auto* number : {&document, &file, &slot, &spent}) {
+  auto spentBelow = store.number("inode_numbers_spent_below");
+  for (const auto* number : {&document, &file, &slot, &spent, &spentBelow}) {
     if (!*number) return fail(number->error());
   }
   allocator.savedDocument_ = document->value_or(0);
@@ -43,6 +44,7 @@ Result<IdentifierAllocator> IdentifierAllocator::open(IdentityStore& store, Witn
   allocator.nextSlot_ = std::max(upperSlots, allocator.savedSlot_);
   allocator.nextDocument_ = std::max<std::uint64_t>(1, allocator.savedDocument_);
   allocator.nextFile_ = std::max(upperFileIDs, allocator.savedFile_);
+  allocator.spentBelow_ = spentBelow->value_or(0);
   allocator.inodesSpent_ = spent->value_or(0) != 0;
   return allocator;
 }
@@ -94,6 +96,12 @@ Result<void> IdentifierAllocator::spendInodeNumbers() {
   nextDocument_ = std::max(nextDocument_, witness_->documentLimit);
   nextFile_ = std::max(nextFile_, witness_->fileLimit);
   return store_->setNumber("inode_numbers_spent", 1);
+}
+
+Result<void> IdentifierAllocator::spendInodeNumbersBelow(std::uint64_t limit) {
+  if (limit <= spentBelow_) return {};
+  spentBelow_ = limit;
+  return store_->setNumber("inode_numbers_spent_below", limit);
 }
 
 Result<void> IdentifierAllocator::leap() {

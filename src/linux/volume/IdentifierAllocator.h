@@ -27,9 +27,13 @@ class IdentifierAllocator {
   /// Writes the counters into the transaction under way, when they have moved.
   [[nodiscard]] Result<void> save();
 
-  /// Whether inode numbers may no longer serve as file IDs, because it is not known which of
-  /// them did before.
-  [[nodiscard]] bool inodeNumbersAreSpent() const { return inodesSpent_; }
+  /// Whether an inode number of which the index has nothing may not serve as a file ID, because it
+  /// may have done so before.
+  [[nodiscard]] bool isSpent(std::uint64_t inode) const {
+    return inodesSpent_ || inode < spentBelow_;
+  }
+  /// From now on that goes for all inode numbers below `limit`.
+  [[nodiscard]] Result<void> spendInodeNumbersBelow(std::uint64_t limit);
   /// Goes on behind all that the witness knows of, with file IDs of the upper range alone.
   [[nodiscard]] Result<void> spendInodeNumbers();
   /// The same where no witness says what was handed out: far away from all that the database knows
@@ -51,6 +55,7 @@ class IdentifierAllocator {
   std::uint64_t savedDocument_ = 0;
   std::uint64_t savedFile_ = 0;
   std::uint64_t savedSlot_ = 0;
+  std::uint64_t spentBelow_ = 0;
   bool inodesSpent_ = false;
 };
 

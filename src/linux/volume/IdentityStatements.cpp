@@ -33,6 +33,7 @@ CREATE UNIQUE INDEX IF NOT EXISTS objects_file ON objects(file_id) WHERE file_id
 CREATE UNIQUE INDEX IF NOT EXISTS objects_document ON objects(document_id)
   WHERE document_id IS NOT NULL AND document_id <> slot;
 CREATE INDEX IF NOT EXISTS objects_place ON objects(folder, place) WHERE folder IS NOT NULL;
+CREATE INDEX IF NOT EXISTS objects_nowhere ON objects(place) WHERE folder IS NULL;
 CREATE TABLE IF NOT EXISTS links(
   folder INTEGER NOT NULL, name BLOB NOT NULL, slot INTEGER NOT NULL,
   PRIMARY KEY(folder, name)) WITHOUT ROWID;

@@ -258,7 +258,7 @@ Result<ObjectRow> Placer::placeNew(const Arrival& arrival, const Slot& slot, std
   row.handle = std::move(handle);
   refresh(row, arrival.seen.status);
   const bool ownNumber = slot.fileSystem == 0 && row.inode < upperFileIDs;
-  if (ownNumber && !slot.row && !allocator_.inodeNumbersAreSpent()) {
+  if (ownNumber && !slot.row && !allocator_.isSpent(row.inode)) {
     row.fileID = row.inode;
   } else {
     auto next = allocator_.nextFileID();

@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <cerrno>
+#include <chrono>
 #include <fcntl.h>
 #include <mutex>
 #include <utility>
@@ -12,6 +13,7 @@
 #include "linux/volume/FollowThread.h"
 #include "linux/volume/Follower.h"
 #include "linux/volume/Learner.h"
+#include "linux/volume/LongGone.h"
 #include "linux/volume/Reserve.h"
 #include "linux/volume/VolumeState.h"
 #include "linux/volume/VolumeUUID.h"
@@ -46,6 +48,14 @@ class StoredVolumeIndex final : public VolumeIndex {
     if (auto loaded = followed_.load(); !loaded) return loaded;
     roots_.setFurther(followed_.paths());
     return {};
+  }
+
+  Result<void> forgetLongGone() {
+    forgotAt_ = std::chrono::steady_clock::now();
+    return inTransaction([&] {
+      return mirabel::forgetLongGone(state_->database(), state_->store(), state_->allocator(),
+                                     std::chrono::system_clock::now(), Retention{}.age);
+    });
   }
 
   Result<void> loadKeptAttributes() {
@@ -173,6 +183,9 @@ class StoredVolumeIndex final : public VolumeIndex {
       return state_->journal().prune(Retention{});
     });
     if (!begun) return fail(begun.error());
+    if (std::chrono::steady_clock::now() - forgotAt_ > std::chrono::days(1)) {
+      if (auto forgotten = forgetLongGone(); !forgotten) return fail(forgotten.error());
+    }
     if (followsInBackground_ && !thread_) startThread();
     return state_->journal().lastID();
   }
@@ -346,6 +359,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   }};
   std::atomic<std::uint64_t> lastEventID_ = 0;
   std::atomic<std::uint64_t> commits_ = 0;
+  std::chrono::steady_clock::time_point forgotAt_{};
   std::unique_ptr<FollowThread> thread_;
 };
 
@@ -365,7 +379,8 @@ Result<std::unique_ptr<VolumeIndex>> openOnce(MonitoredRoots& roots,
   if (!state) return fail(state.error());
   auto index =
       std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
-  auto loaded = index->loadKeptAttributes();
+  auto loaded = index->forgetLongGone();
+  if (loaded) loaded = index->loadKeptAttributes();
   if (loaded) loaded = index->loadFollowedFolders();
   if (!loaded) return fail(loaded.error());
   return index;
