@@ -61,7 +61,7 @@ TEST_F(IdentityRaces, AFreshTimeStaysUnsettledHoweverLateItIsNoted) {
   ObjectRow row;
   refresh(row, status);
   EXPECT_FALSE(row.isSettled);
-  status.seenAt = status.changeTime + 1'000'000'000;
+  status.seenAt = status.changeTime + 4 * nanosecondsPerSecond;
   EXPECT_TRUE(isStale(row, status));
   refresh(row, status);
   EXPECT_TRUE(row.isSettled);
