@@ -114,7 +114,8 @@ void FSChangesEnumerator::didProcessEvents(FSEventReader&) {}
 bool FSChangesEnumerator::accepts(const FileSystemEvent& event) {
   // Later events are the next anchor's.
   if (isFinished_ || event.id > startupFSEventID_) return false;
-  constexpr std::uint64_t mostPerEvent = 4;
+  // Of a document's ID and of its file's an item and a deletion each, and an item around them.
+  constexpr std::uint64_t mostPerEvent = 5;
   if (order_.size() + mostPerEvent > changesPerBatch) {
     endBatch();
     return false;
