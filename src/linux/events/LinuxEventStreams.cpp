@@ -15,9 +15,12 @@ LinuxEventStreams::LinuxEventStreams(VolumeIndex& index)
       gate_(std::make_shared<StreamGate>()) {}
 
 LinuxEventStreams::~LinuxEventStreams() {
+  {
+    const std::scoped_lock closing(gate_->mutex);
+    gate_->isClosed = true;
+  }
+  // Only now does nobody add to them any more.
   live_.reset();
-  const std::scoped_lock closing(gate_->mutex);
-  gate_->isClosed = true;
 }
 
 StreamServices LinuxEventStreams::services() const {
