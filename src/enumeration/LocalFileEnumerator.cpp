@@ -114,7 +114,9 @@ Result<void> LocalFileEnumerator::gatherPhase(VesselEnumerationObserver& observe
     if (!start) return fail(start.error());
   } else {
     logDebug("start gather phase");
-    start->eventID = services_.changes.events.currentEventID();
+    const auto eventID = services_.changes.events.currentEventID();
+    if (!eventID) return fail(eventID.error());
+    start->eventID = *eventID;
   }
 
   GatherPage page(services_.items, scope_);
@@ -262,8 +264,12 @@ void LocalFileEnumerator::currentSyncAnchor(
     logError("can't get volume UUID for \"" + enumeratedItemURL().path() + "\"");
     return completionHandler(std::nullopt);
   }
-  const std::uint64_t eventID = services_.changes.events.currentEventID();
-  completionHandler(FSChangeToken{0, *uuid, eventID, 0, 0}.encode());
+  const auto eventID = services_.changes.events.currentEventID();
+  if (!eventID) {
+    logError("can't read the event history; " + eventID.error().description());
+    return completionHandler(std::nullopt);
+  }
+  completionHandler(FSChangeToken{0, *uuid, *eventID, 0, 0}.encode());
 }
 
 Result<UUID> LocalFileEnumerator::currentUUID() const {

@@ -35,7 +35,8 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
       urls_(atLeastOne(std::move(urls))),
       observer_(std::move(observer)),
       sinceFSEventID_(token.streamEventID),
-      startupFSEventID_(events.currentEventID()),
+      startup_(events.currentEventID()),
+      startupFSEventID_(startup_.value_or(token.streamEventID)),
       shown_(context_, roots, urls_,
              isFolderContainer() ? LinkNames::Depth::children : LinkNames::Depth::everything),
       running_(std::move(running)),
@@ -48,6 +49,7 @@ void FSChangesEnumerator::start() {
   if (currentToken_.offset != 0 && (currentToken_.offset & offsetMark) == 0) {
     return finishWithError(Error::syncAnchorExpired());
   }
+  if (!startup_) return finishWithError(startup_.error());
   startReader(FSEventReaderMode::pathBased, sinceFSEventID_ + aheadOf(currentToken_));
 }
 

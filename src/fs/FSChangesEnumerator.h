@@ -96,7 +96,8 @@ class FSChangesEnumerator final : public ChangesEnumeration,
   std::shared_ptr<FSEventReader> reader_;  // with mutex_
   std::shared_ptr<VesselChangeObserver> observer_;
   std::uint64_t sinceFSEventID_;
-  std::uint64_t startupFSEventID_;
+  const Result<std::uint64_t> startup_;  ///< up to which event this tells
+  const std::uint64_t startupFSEventID_;
   std::optional<FSReaderState> pathBasedReaderState_;
 
   ShownItems shown_;

@@ -1,5 +1,6 @@
 #include "fs/FSChangesNotifier.h"
 
+#include <limits>
 #include <utility>
 
 #include "foundation/DispatchGroup.h"
@@ -18,9 +19,12 @@ std::shared_ptr<FSChangesNotifier> FSChangesNotifier::create(
     logError("can't get volume UUID for \"" + urls.front().path() + "\"");
     return nullptr;
   }
-  auto reader = FSEventReader::create(context, events, std::move(urls), events.currentEventID(),
-                                      FSEventReaderMode::pathBased, Verbosity::verbose,
-                                      eventScopeOf(container));
+  // From an event that never was, the reader begins by telling that it has lost some.
+  const std::uint64_t since =
+      events.currentEventID().value_or(std::numeric_limits<std::uint64_t>::max());
+  auto reader =
+      FSEventReader::create(context, events, std::move(urls), since, FSEventReaderMode::pathBased,
+                            Verbosity::verbose, eventScopeOf(container));
   return std::shared_ptr<FSChangesNotifier>(
       new FSChangesNotifier(context.platform, diagnostics, std::move(container), std::move(reader),
                             *deviceUUID, options));

@@ -126,7 +126,11 @@ Result<ItemChanges> LocalContainer::changes(const Data& anchor) {
 Result<Data> LocalContainer::currentSyncAnchor() {
   const auto of = enumerator();
   if (!of) return fail(of.error());
-  return currentAnchorOf(**of);
+  auto anchor = currentAnchorOf(**of);
+  if (anchor) return anchor;
+  // An enumerator says no more than that there is none.
+  const auto event = provider_.linuxPlatform().index().currentEventID();
+  return event ? anchor : fail(event.error());
 }
 
 }  // namespace mirabel

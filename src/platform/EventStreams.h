@@ -99,7 +99,8 @@ class EventStreams {
   [[nodiscard]] virtual std::uint64_t lastEventIDUnder(std::uint64_t version) = 0;
 
   /// The latest event ID. Whatever a finished system call changed has an ID at or below it.
-  [[nodiscard]] virtual std::uint64_t currentEventID() = 0;
+  /// POSIX and store errors where that can't be told.
+  [[nodiscard]] virtual Result<std::uint64_t> currentEventID() = 0;
 };
 
 }  // namespace mirabel

@@ -73,11 +73,11 @@ TEST_F(GatherPhaseResumeCheckTest, GapInTheHistoryIsFoundOut) {
   const Verdict gap = Verdict::cantReplayHistoricalFSEvents;
   EXPECT_EQ(check(2).status.status, gap);  // an ID that was never given out
   for (const std::uint32_t flags : {userDropped, kernelDropped, eventIDsWrapped}) {
-    const std::uint64_t since = events.currentEventID();
+    const std::uint64_t since = events.currentEventID().value();
     events.append({0, flags, {}, {}, {}});
     EXPECT_EQ(check(since).status.status, gap) << flags;
   }
-  const std::uint64_t since = events.currentEventID();
+  const std::uint64_t since = events.currentEventID().value();
   EXPECT_EQ(check(since).status.status, Verdict::canResume);
   events.append(fake.path("file"), fileID);
   events.prune(since + 1);

@@ -77,7 +77,7 @@ INSTANTIATE_TEST_SUITE_P(Inotify, EventStreamsConformance,
 // A thousand writes within the latency are one event of one file, told once it is over.
 TEST(LinuxEventStreams, WritesToOneFileAreMerged) {
   RealHistory history(WatcherKind::folderMarks);
-  const std::uint64_t since = history.streams().currentEventID();
+  const std::uint64_t since = history.streams().currentEventID().value();
   for (int i = 0; i < 20; ++i) {
     history.change(history.folder() + "/f");
     static_cast<void>(history.streams().currentEventID());

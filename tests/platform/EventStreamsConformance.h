@@ -117,7 +117,7 @@ class EventStreamsConformance : public ::testing::TestWithParam<HistoryFactory> 
     history_ = GetParam()();
     if (!history_) GTEST_SKIP() << "not for this user";
     // The history begins with the first question.
-    since_ = history_->streams().currentEventID();
+    since_ = history_->streams().currentEventID().value();
   }
   std::string at(const std::string& name) const { return history_->folder() + "/" + name; }
 
@@ -127,7 +127,7 @@ class EventStreamsConformance : public ::testing::TestWithParam<HistoryFactory> 
 
 TEST_P(EventStreamsConformance, HistoryThenItsEndThenWhatComes) {
   history_->change(at("before"));
-  const std::uint64_t last = history_->streams().currentEventID();
+  const std::uint64_t last = history_->streams().currentEventID().value();
   ASSERT_GT(last, since_);
   StreamListener listener(*history_);
   listener.startForPaths({history_->folder()}, since_);
@@ -164,7 +164,7 @@ TEST_P(EventStreamsConformance, OnlyWhatLiesInTheFolderIsTold) {
 
 TEST_P(EventStreamsConformance, DocumentRecordsAreAStreamOfTheirOwn) {
   history_->change(at("document"));
-  const std::uint64_t made = history_->streams().currentEventID();
+  const std::uint64_t made = history_->streams().currentEventID().value();
   history_->save(at("document"));
   StreamListener documents(*history_), paths(*history_);
   documents.startForDocuments(made);
@@ -182,7 +182,7 @@ TEST_P(EventStreamsConformance, DocumentRecordsAreAStreamOfTheirOwn) {
 
 TEST_P(EventStreamsConformance, AnIDThatWasNeverGivenOutIsALoss) {
   StreamListener listener(*history_);
-  listener.startForPaths({history_->folder()}, history_->streams().currentEventID() + 1000);
+  listener.startForPaths({history_->folder()}, history_->streams().currentEventID().value() + 1000);
   ASSERT_TRUE(listener.waitFor([](const auto& events) { return !events.empty(); }));
   EXPECT_NE(listener.events().front().flags & eventflag::kernelDropped, 0u);
 }

@@ -143,9 +143,9 @@ void FakeEventStreams::failFollowing(std::optional<Error> error) {
   state_->followingFailure = std::move(error);
 }
 
-std::uint64_t FakeEventStreams::currentEventID() {
+Result<std::uint64_t> FakeEventStreams::currentEventID() {
   const std::lock_guard lock(state_->mutex);
-  return state_->history.size();
+  return static_cast<std::uint64_t>(state_->history.size());
 }
 
 std::uint64_t FakeEventStreams::append(std::string_view path, std::optional<std::uint64_t> fileID,

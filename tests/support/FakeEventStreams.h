@@ -40,7 +40,7 @@ class FakeEventStreams final : public EventStreams {
   Result<void> followLibraries(const std::vector<FollowedLibrary>& libraries,
                                std::uint64_t version) override;
   std::uint64_t lastEventIDUnder(std::uint64_t version) override;
-  std::uint64_t currentEventID() override;
+  Result<std::uint64_t> currentEventID() override;
 
   /// The libraries that were last said to be followed.
   [[nodiscard]] std::vector<FollowedLibrary> libraries() const;

@@ -1,10 +1,8 @@
 #include "linux/events/LinuxEventStreams.h"
 
 #include <cerrno>
-#include <limits>
 #include <utility>
 
-#include "foundation/Log.h"
 #include "linux/events/JournalStream.h"
 
 namespace mirabel {
@@ -64,17 +62,14 @@ std::uint64_t LinuxEventStreams::lastEventIDUnder(std::uint64_t version) {
   return index_.lastEventUnder(version);
 }
 
-std::uint64_t LinuxEventStreams::currentEventID() {
+Result<std::uint64_t> LinuxEventStreams::currentEventID() {
   // What happens in a library that is not followed has no event: an ID would tell of nothing new.
   const auto followed = [&] {
     const std::scoped_lock lock(mutex_);
     return followLeftOut();
   }();
-  auto id = followed ? index_.currentEventID() : fail(followed.error());
-  if (id) return *id;
-  // No history was ever there to give this out: whoever asks for what came after starts over.
-  logError("can't read the event history; " + id.error().description());
-  return std::numeric_limits<std::uint64_t>::max();
+  if (!followed) return fail(followed.error());
+  return index_.currentEventID();
 }
 
 }  // namespace mirabel

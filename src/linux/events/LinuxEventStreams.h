@@ -32,7 +32,7 @@ class LinuxEventStreams final : public EventStreams {
   [[nodiscard]] Result<void> followLibraries(const std::vector<FollowedLibrary>& libraries,
                                              std::uint64_t version) override;
   [[nodiscard]] std::uint64_t lastEventIDUnder(std::uint64_t version) override;
-  [[nodiscard]] std::uint64_t currentEventID() override;
+  [[nodiscard]] Result<std::uint64_t> currentEventID() override;
 
  private:
   [[nodiscard]] StreamServices services() const;
