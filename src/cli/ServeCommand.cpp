@@ -12,9 +12,9 @@
 
 #include "cli/Commands.h"
 #include "cli/EndSignals.h"
-#include "cli/WakeUp.h"
 #include "host/LocalDocuments.h"
 #include "host/bus/BusService.h"
+#include "linux/kernel/WakeUp.h"
 
 namespace mirabel {
 namespace {
@@ -103,8 +103,8 @@ void Serving::wait() {
     std::array<pollfd, 2> waiting{pollfd{signals_.descriptor(), POLLIN, 0},
                                   pollfd{ended_.descriptor(), POLLIN, 0}};
     const int timeout = period ? static_cast<int>(period->count()) : -1;
-    const int ready = ::poll(waiting.data(), waiting.size(), timeout);
-    if (ready > 0) break;
+    const int ready = ::poll(waiting.data(), waiting.size(), ended_.limited(timeout));
+    if (ready > 0 || ended_.isSet()) break;
     if (ready < 0 && errno != EINTR) break;
     // Where the index does not answer any more, this does not return, and the manager hears
     // nothing.
