@@ -27,15 +27,6 @@ struct EnumeratorOptions {
   [[nodiscard]] constexpr EnumeratorOptions unionWith(EnumeratorOptions o) const {
     return EnumeratorOptions(rawValue | o.rawValue);
   }
-  [[nodiscard]] constexpr EnumeratorOptions intersection(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue & o.rawValue);
-  }
-  [[nodiscard]] constexpr EnumeratorOptions symmetricDifference(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue ^ o.rawValue);
-  }
-  [[nodiscard]] constexpr EnumeratorOptions subtracting(EnumeratorOptions o) const {
-    return EnumeratorOptions(rawValue & ~o.rawValue);
-  }
   friend constexpr bool operator==(EnumeratorOptions, EnumeratorOptions) = default;
 };
 
