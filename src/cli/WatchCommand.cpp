@@ -8,7 +8,7 @@
 #include "cli/Commands.h"
 #include "cli/ContainerArgument.h"
 #include "cli/EndSignals.h"
-#include "cli/WakeUp.h"
+#include "linux/kernel/WakeUp.h"
 
 namespace mirabel {
 namespace {

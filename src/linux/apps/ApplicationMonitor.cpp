@@ -5,7 +5,6 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <string_view>
-#include <sys/eventfd.h>
 #include <utility>
 
 #include "linux/apps/EntryListing.h"
@@ -75,10 +74,7 @@ std::uint64_t timesOfFolders(const ApplicationPlaces& places,
 }
 
 ApplicationMonitor::ApplicationMonitor(Options options, LocalNotificationCenter& center)
-    : options_(std::move(options)),
-      center_(center),
-      watches_(options_.places, options_.bounds),
-      stop_(::eventfd(0, EFD_CLOEXEC)) {
+    : options_(std::move(options)), center_(center), watches_(options_.places, options_.bounds) {
   watches_.arm();
   isComplete_ = watches_.isComplete();
   if (!isComplete_) static_cast<void>(lookAtTimes());
@@ -86,23 +82,23 @@ ApplicationMonitor::ApplicationMonitor(Options options, LocalNotificationCenter&
 }
 
 ApplicationMonitor::~ApplicationMonitor() {
-  const std::uint64_t one = 1;
-  static_cast<void>(!::write(stop_.get(), &one, sizeof(one)));
+  stop_.set();
   thread_.join();
 }
 
 bool ApplicationMonitor::isStopped(milliseconds rest) const {
-  pollfd wait{stop_.get(), POLLIN, 0};
-  return ::poll(&wait, 1, static_cast<int>(rest.count())) > 0;
+  pollfd wait{stop_.descriptor(), POLLIN, 0};
+  ::poll(&wait, 1, stop_.limited(static_cast<int>(rest.count())));
+  return stop_.isSet();
 }
 
 void ApplicationMonitor::run() {
   while (true) {
-    std::array<pollfd, 2> wait{pollfd{stop_.get(), POLLIN, 0},
+    std::array<pollfd, 2> wait{pollfd{stop_.descriptor(), POLLIN, 0},
                                pollfd{watches_.descriptor(), POLLIN, 0}};
     const int longest = isComplete_ ? -1 : static_cast<int>(options_.interval.count());
-    const int ready = ::poll(wait.data(), wait.size(), longest);
-    if (ready > 0 && (wait[0].revents != 0 || isStopped(restBeforeReading))) return;
+    const int ready = ::poll(wait.data(), wait.size(), stop_.limited(longest));
+    if (stop_.isSet() || (ready > 0 && isStopped(restBeforeReading))) return;
     ApplicationWatches::Changes changes;
     if (ready > 0) changes = watches_.drain();
     const bool wasComplete = isComplete_.exchange(watches_.isComplete());

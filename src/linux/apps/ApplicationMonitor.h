@@ -7,7 +7,7 @@
 
 #include "linux/apps/ApplicationWatches.h"
 #include "linux/apps/LocalNotificationCenter.h"
-#include "mirabel/UniqueFd.h"
+#include "linux/kernel/WakeUp.h"
 
 namespace mirabel {
 
@@ -46,7 +46,7 @@ class ApplicationMonitor {
   std::uint64_t times_ = 0;
   std::chrono::steady_clock::time_point lookedAt_;
   std::atomic<bool> isComplete_;
-  UniqueFd stop_;
+  WakeUp stop_;
   std::thread thread_;
 };
 

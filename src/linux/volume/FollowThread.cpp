@@ -1,10 +1,7 @@
 #include "linux/volume/FollowThread.h"
 
 #include <array>
-#include <cstdint>
 #include <poll.h>
-#include <sys/eventfd.h>
-#include <unistd.h>
 #include <utility>
 
 namespace mirabel {
@@ -17,28 +14,27 @@ constexpr int longestWait = 1000;
 
 }  // namespace
 
-FollowThread::FollowThread(Work work)
-    : work_(std::move(work)), stop_(::eventfd(0, EFD_CLOEXEC)), thread_([this] { run(); }) {}
+FollowThread::FollowThread(Work work) : work_(std::move(work)), thread_([this] { run(); }) {}
 
 FollowThread::~FollowThread() {
-  const std::uint64_t one = 1;
-  static_cast<void>(!::write(stop_.get(), &one, sizeof(one)));
+  stop_.set();
   thread_.join();
 }
 
 bool FollowThread::isStopped(int milliseconds) const {
-  pollfd wait{stop_.get(), POLLIN, 0};
-  return ::poll(&wait, 1, milliseconds) > 0;
+  pollfd wait{stop_.descriptor(), POLLIN, 0};
+  ::poll(&wait, 1, stop_.limited(milliseconds));
+  return stop_.isSet();
 }
 
 void FollowThread::run() {
   while (true) {
     // Held while it is waited for: its descriptor must not become another's.
     const auto watcher = work_.watcher();
-    std::array<pollfd, 2> wait{pollfd{stop_.get(), POLLIN, 0},
+    std::array<pollfd, 2> wait{pollfd{stop_.descriptor(), POLLIN, 0},
                                pollfd{watcher ? watcher->descriptor() : -1, POLLIN, 0}};
-    const int ready = ::poll(wait.data(), wait.size(), longestWait);
-    if (wait[0].revents != 0) return;
+    const int ready = ::poll(wait.data(), wait.size(), stop_.limited(longestWait));
+    if (stop_.isSet()) return;
     if (ready > 0 && isStopped(restBeforeReading)) return;
     if (ready > 0 || work_.isDue()) work_.catchUp();
   }

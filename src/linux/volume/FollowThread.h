@@ -4,8 +4,8 @@
 #include <memory>
 #include <thread>
 
+#include "linux/kernel/WakeUp.h"
 #include "linux/watch/FolderWatcher.h"
-#include "mirabel/UniqueFd.h"
 
 namespace mirabel {
 
@@ -32,7 +32,7 @@ class FollowThread {
   [[nodiscard]] bool isStopped(int milliseconds) const;
 
   Work work_;
-  UniqueFd stop_;
+  WakeUp stop_;
   std::thread thread_;
 };
 

@@ -14,6 +14,7 @@
 
 #include "linux/apps/ApplicationMonitor.h"
 #include "linux/apps/ApplicationsHome.h"
+#include "support/NoDescriptors.h"
 
 namespace mirabel::testing {
 namespace {
@@ -128,6 +129,15 @@ TEST_F(ApplicationMonitorTest, WhatIsNoneOfItIsNotPosted) {
   fs::rename(home.path() + "/away/Documents", home.path() + "/away/other");
   home.write(home.user("last.desktop"), entryText());
   EXPECT_EQ(heardUntil(registered), Names{std::string(registered)});
+}
+
+TEST_F(ApplicationMonitorTest, WithoutDescriptorsItTellsLaterAndEnds) {
+  {
+    const NoDescriptors none;
+    start();
+  }
+  home.write(home.user("a.desktop"), entryText());
+  EXPECT_TRUE(hears(registered));
 }
 
 TEST_F(ApplicationMonitorTest, FoldersThatAreNotThereYetAreWaitedFor) {

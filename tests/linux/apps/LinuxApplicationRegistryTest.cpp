@@ -2,12 +2,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <string>
-#include <sys/resource.h>
 #include <utility>
 #include <vector>
 
 #include "linux/apps/ApplicationsHome.h"
 #include "linux/apps/LinuxApplicationRegistry.h"
+#include "support/NoDescriptors.h"
 #include "support/OrdinaryUser.h"
 
 namespace mirabel::testing {
@@ -147,23 +147,6 @@ TEST_F(LinuxApplicationRegistryTest, MissingAndClosedDirectoriesAreEmpty) {
   EXPECT_THAT(identifiersOf(other, ApplicationType::user), ElementsAre("a"));
   EXPECT_THAT(identifiersOf(other, ApplicationType::system), IsEmpty());
 }
-
-/// While it lives, the process can open nothing more.
-class NoDescriptors {
- public:
-  NoDescriptors() {
-    ::getrlimit(RLIMIT_NOFILE, &before_);
-    rlimit none = before_;
-    none.rlim_cur = 0;
-    ::setrlimit(RLIMIT_NOFILE, &none);
-  }
-  ~NoDescriptors() { ::setrlimit(RLIMIT_NOFILE, &before_); }
-  NoDescriptors(const NoDescriptors&) = delete;
-  NoDescriptors& operator=(const NoDescriptors&) = delete;
-
- private:
-  rlimit before_{};
-};
 
 TEST_F(LinuxApplicationRegistryTest, TooManyOpenFilesAreAnErrorAndNotAnEmptyMachine) {
   home.install("a");
