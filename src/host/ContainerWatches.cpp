@@ -12,16 +12,6 @@
 #include "linux/volume/VolumeIndex.h"
 
 namespace mirabel {
-namespace {
-
-using namespace std::chrono_literals;
-
-// How often it is asked whether there are events that no signal has come for: a stream that could
-// not go on reading the history signals nothing any more.
-constexpr auto betweenChecks = 5s;
-
-}  // namespace
-
 /// Somebody who watches.
 class ContainerWatches::Watcher {
  public:
@@ -151,7 +141,8 @@ class ContainerWatches::Entry final : public ContainerWatch {
   std::shared_ptr<Watcher> watcher_;
 };
 
-ContainerWatches::ContainerWatches(HostedProvider& provider) : provider_(provider) {
+ContainerWatches::ContainerWatches(HostedProvider& provider, std::chrono::milliseconds interval)
+    : provider_(provider), interval_(interval) {
   provider_.linuxPlatform().manager().setSignalListener(
       [bell = bell_](std::string_view, const VesselManager::SignalHandler& done) {
         {
@@ -216,7 +207,7 @@ void ContainerWatches::run() {
   std::uint64_t checkedUpTo = 0;
   for (std::unique_lock lock(bell_->mutex); !bell_->mustEnd;) {
     const bool wasSignalled = bell_->rung.wait_for(
-        lock, betweenChecks, [this] { return bell_->isSignalled || bell_->mustEnd; });
+        lock, interval_, [this] { return bell_->isSignalled || bell_->mustEnd; });
     if (bell_->mustEnd) return;
     bell_->isSignalled = false;
     lock.unlock();

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <condition_variable>
 #include <functional>
 #include <map>
@@ -20,8 +21,11 @@ namespace mirabel {
 /// been told is found by asking each watched one. Any thread may call it.
 class ContainerWatches {
  public:
-  /// Takes the provider's signals. The provider outlives this.
-  explicit ContainerWatches(HostedProvider& provider);
+  /// Takes the provider's signals. The provider outlives this. Also without a signal it is asked
+  /// each `interval` whether there are events: a stream that could not go on reading the history
+  /// signals nothing any more.
+  explicit ContainerWatches(HostedProvider& provider,
+                            std::chrono::milliseconds interval = std::chrono::seconds(5));
   /// The watches must have ended.
   ~ContainerWatches();
   ContainerWatches(const ContainerWatches&) = delete;
@@ -56,6 +60,7 @@ class ContainerWatches {
   };
 
   HostedProvider& provider_;
+  const std::chrono::milliseconds interval_;
   std::shared_ptr<Bell> bell_ = std::make_shared<Bell>();
   std::mutex mutex_;  ///< for what follows
   /// Apart by what wakes: an anchor is only as good as the last question for its changes.
