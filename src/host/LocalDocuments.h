@@ -27,6 +27,9 @@ class LocalDocuments final : public Documents {
   [[nodiscard]] const ItemLookup& lookup() const { return lookup_; }
   /// Keeps the search index in step from now on, in the background.
   void keepSearching() { searching_.follow(watches()); }
+  /// Has searches that are under way, and those to come, end with POSIX ECANCELED: for when nobody
+  /// may wait any more for a first look at all files.
+  void stopSearching() { searching_.stop(); }
   /// Gives back what is kept in memory to answer sooner, and what was freed: for times when nobody
   /// asks.
   void releaseMemory();

@@ -1,7 +1,6 @@
 #include "host/Searching.h"
 
 #include <chrono>
-#include <stop_token>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -16,11 +15,12 @@ constexpr std::chrono::seconds beforeNextTry{10};
 }  // namespace
 
 Searching::~Searching() {
+  stop();
   feeding_ = {};
   if (workingSet_) workingSet_->invalidate();
 }
 
-Result<SearchIndex*> Searching::inStep(const std::stop_token& stop) {
+Result<SearchIndex*> Searching::inStep() {
   const auto index = provider_.searchableItems().index();
   if (!index) return fail(index.error());
   {
@@ -33,12 +33,13 @@ Result<SearchIndex*> Searching::inStep(const std::stop_token& stop) {
       workingSet_ = *std::move(made);
     }
   }
-  if (auto fed = feeder_->catchUp(*workingSet_, stop); !fed) return fail(fed.error());
+  if (auto fed = feeder_->catchUp(*workingSet_, stopping_.get_token()); !fed)
+    return fail(fed.error());
   return *index;
 }
 
 void Searching::follow(ContainerWatches& watches) {
-  feeding_ = std::jthread([this, &watches](const std::stop_token& stop) { feed(stop, watches); });
+  feeding_ = std::jthread([this, &watches] { feed(stopping_.get_token(), watches); });
 }
 
 Result<void> Searching::beginWatch(ContainerWatches& watches, const std::function<void()>& changed,
@@ -50,8 +51,8 @@ Result<void> Searching::beginWatch(ContainerWatches& watches, const std::functio
   return {};
 }
 
-Result<void> Searching::feedOnce(const std::stop_token& stop) {
-  const auto index = inStep(stop);
+Result<void> Searching::feedOnce() {
+  const auto index = inStep();
   if (!index) return fail(index.error());
   return {};
 }
@@ -77,7 +78,7 @@ void Searching::feed(const std::stop_token& stop, ContainerWatches& watches) {
       hasChanged = false;
     }
     if (stop.stop_requested()) return;
-    const auto fed = begun ? feedOnce(stop) : begun;
+    const auto fed = begun ? feedOnce() : begun;
     if (fed || stop.stop_requested()) continue;
     logError("can't bring the search index in step; " + fed.error().description());
     std::unique_lock lock(mutex);

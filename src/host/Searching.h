@@ -5,6 +5,7 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <stop_token>
 #include <string>
 #include <thread>
 #include <vector>
@@ -27,6 +28,10 @@ class Searching {
   Searching(const Searching&) = delete;
   Searching& operator=(const Searching&) = delete;
 
+  /// Ends what is under way: the index is no longer brought in step, and whoever waits for that is
+  /// answered with POSIX ECANCELED.
+  void stop() { stopping_.request_stop(); }
+
   /// Keeps the index in step in the background from now on, whether or not it is asked. `watches`
   /// outlives it. To be called once.
   void follow(ContainerWatches& watches);
@@ -38,17 +43,18 @@ class Searching {
   [[nodiscard]] Result<std::vector<std::string>> favorites(std::size_t limit);
 
  private:
-  [[nodiscard]] Result<SearchIndex*> inStep(const std::stop_token& stop = {});
+  [[nodiscard]] Result<SearchIndex*> inStep();
   [[nodiscard]] static Result<void> beginWatch(ContainerWatches& watches,
                                                const std::function<void()>& changed,
                                                std::unique_ptr<ContainerWatch>& watch);
-  [[nodiscard]] Result<void> feedOnce(const std::stop_token& stop);
+  [[nodiscard]] Result<void> feedOnce();
   void feed(const std::stop_token& stop, ContainerWatches& watches);
 
   HostedProvider& provider_;
   std::mutex mutex_;  ///< for what is made once
   std::unique_ptr<SearchFeeder> feeder_;
   std::shared_ptr<VesselEnumerator> workingSet_;
+  std::stop_source stopping_;
   std::jthread feeding_;
 };
 

@@ -77,6 +77,7 @@ class BusService::Impl {
     // Waits for what is being answered, which needs the documents.
     { const std::lock_guard lock(answeringAtOnce_); }
     stopping_.request_stop();
+    documents_.stopSearching();
     try {
       connection_->releaseName(serviceName);
     } catch (const sdbus::Error& error) {

@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
@@ -7,6 +8,7 @@
 
 #include "cli/InstalledApps.h"
 #include "host/HostedProvider.h"
+#include "host/Searching.h"
 #include "host/search/SearchFeeder.h"
 #include "host/search/SearchFixture.h"
 #include "host/search/SearchSchema.h"
@@ -310,6 +312,15 @@ TEST_F(ScriptedFeed, ItStopsWhenItIsAskedTo) {
   set.waiting->didUpdateItems({});
   set.waiting->finishEnumeratingChangesUpToSyncAnchor(anchorOf("late"), false);
   EXPECT_EQ(index->anchor(), anchorOf("c"));
+}
+
+TEST_F(SearchFeederTest, WhoSearchesWaitsNoLongerThanItIsToRun) {
+  home.writeFile("letter.txt");
+  Searching searching(*provider);
+  searching.stop();
+  const auto found = searching.search({.words = {"letter"}});
+  ASSERT_FALSE(found);
+  EXPECT_TRUE(found.error().isPosix(ECANCELED)) << found.error().description();
 }
 
 }  // namespace
