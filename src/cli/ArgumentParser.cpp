@@ -3,7 +3,10 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <chrono>
+#include <memory>
 #include <ostream>
+#include <string_view>
+#include <utility>
 
 #include "cli/TextOptions.h"
 
@@ -26,6 +29,11 @@ constexpr const char* watchHelp =
     "say that it is busy.\n\n";
 constexpr const char* bundleHelp =
     "BUNDLE is the name of the application's desktop entry without .desktop, org.example.Draw.\n\n";
+constexpr const char* libraryHelp =
+    "ITEM is an app library: # and the identifier of the application, as mirabel apps lists\n"
+    "them.\n\n";
+constexpr const char* anchorHelp =
+    "An anchor is a moment in the history of the documents, to ask for what has changed since.\n\n";
 constexpr const char* pathHelp =
     "PATH is relative or absolute. Links on its way are followed, one at its end is not.\n\n";
 constexpr const char* exitCodeHelp =
@@ -46,6 +54,23 @@ void addGlobalOptions(CLI::App& app, Arguments& arguments) {
       ->type_name("SECONDS");
   app.add_flag("--version", arguments.showVersion, "Print the version");
 }
+
+/// Shows the options that have to be given in the usage line too.
+class UsageFormatter final : public CLI::Formatter {
+ public:
+  std::string make_usage(const CLI::App* app, std::string name) const override {
+    std::string usage = CLI::Formatter::make_usage(app, std::move(name));
+    std::string required;
+    for (const CLI::Option* option : app->get_options()) {
+      if (option->get_required() && !option->get_positional())
+        required += " " + option->get_name() + " " + option->get_type_name();
+    }
+    constexpr std::string_view before = "[OPTIONS]";
+    const std::size_t place = usage.find(before);
+    if (place != std::string::npos) usage.insert(place + before.size(), required);
+    return usage;
+  }
+};
 
 CLI::App* addCommand(CLI::App& app, const char* name, const char* description,
                      const std::string& argumentHelp) {
@@ -72,8 +97,11 @@ void addAppCommands(CLI::App& app, Arguments& arguments) {
   addText(*container, "BUNDLE", arguments.bundle, "The identifier of the application")
       ->required()
       ->type_name("");
-  auto* icon = addCommand(app, "icon", "Write the icon of an app library to a PNG file", itemHelp);
-  addItem(*icon, arguments.icon.item);
+  auto* icon =
+      addCommand(app, "icon", "Write the icon of an app library to a PNG file", libraryHelp);
+  addText(*icon, "ITEM", arguments.icon.item, "#bundle, or the path of its documents")
+      ->required()
+      ->type_name("");
   addText(*icon, "-o,--output", arguments.icon.file, "The file that it goes to; it is replaced")
       ->required()
       ->type_name("FILE");
@@ -87,8 +115,9 @@ void addCommands(CLI::App& app, Arguments& arguments) {
   addItem(*addCommand(app, "path", "Print where an item lies now", itemHelp), arguments.item);
   addItem(*addCommand(app, "info", "Print everything that is known of an item", itemHelp),
           arguments.item);
-  auto* list = addCommand(app, "ls", "List a folder, 200 items a page", itemHelp);
-  addText(*list, "ITEM", arguments.list.item, "What to list (root)")->type_name("");
+  auto* list = addCommand(app, "ls", "List a folder, 200 items a page", containerHelp);
+  addText(*list, "ITEM", arguments.list.item, "root, workingset, alldirs or a folder (root)")
+      ->type_name("");
   addText(*list, "--page", arguments.list.page, "Go on at this page of an earlier listing")
       ->type_name("PAGE");
   list->add_option("--pages", arguments.list.pages, "Stop after so many pages (all)")
@@ -110,7 +139,7 @@ void addCommands(CLI::App& app, Arguments& arguments) {
   addText(*watch, "--since", arguments.watch.since,
           "First print what changed since an anchor that was printed before")
       ->type_name("ANCHOR");
-  addItemCommands(app, arguments.items, itemHelp + globalHelp);
+  addItemCommands(app, arguments.items, itemHelp, globalHelp);
   addAppCommands(app, arguments);
   addHostCommands(app, arguments.host, globalHelp);
   addCommand(app, "status", "Say how changes are followed, and what the history holds", "");
@@ -146,9 +175,10 @@ std::optional<std::string> optionWithoutValue(const std::vector<std::string>& ar
 ArgumentParser::ArgumentParser() : app_(std::make_unique<CLI::App>(purpose, "mirabel")) {
   // Before the commands are added, for they inherit it: global options may follow the command.
   app_->fallthrough();
+  app_->formatter(std::make_shared<UsageFormatter>());
   addGlobalOptions(*app_, parsed_);
   addCommands(*app_, parsed_);
-  app_->footer(std::string(itemHelp) + exitCodeHelp);
+  app_->footer(std::string(itemHelp) + anchorHelp + exitCodeHelp);
   app_->require_subcommand(0, 1);
 }
 
@@ -159,7 +189,7 @@ std::optional<int> ArgumentParser::parse(const std::vector<std::string>& argumen
   const Arguments nothing;
   parsed_ = nothing;
   if (const auto option = optionWithoutValue(arguments)) {
-    return wrongUsage(*app_, arguments, *option + " says nothing", streams);
+    return wrongUsage(*app_, arguments, *option + " has no value", streams);
   }
   auto guarded = withGuardedBrackets(arguments);
   // The parser takes its arguments from the back.

@@ -66,7 +66,8 @@ Finding birthTimeFinding(bool has) {
 Finding handleFinding(bool has, bool hasBirthTimes) {
   const std::string subject = "file handles";
   if (has) {
-    return {subject, Health::good, "the volume tells a new file from one that had its number", ""};
+    return {subject, Health::good,
+            "the volume tells a new file from a deleted one with the same inode number", ""};
   }
   return {subject, hasBirthTimes ? Health::limited : Health::bad,
           "the volume gives no file handles: a new file with a used inode number is recognised by "
@@ -140,7 +141,13 @@ Finding stateFinding(const Result<void>& opened, const HomeLayout& layout) {
             "nothing can be presented until the home can be written to, or XDG_STATE_HOME names a "
             "folder that can"};
   }
-  return {subject, Health::bad, text, "identities can't be kept until this is mended"};
+  return {subject, Health::bad, layout.stateFolder + ": " + text,
+          "identities can't be kept until this is mended"};
+}
+
+Finding changesFinding(const Error& error, const HomeLayout& layout) {
+  return {"changes", Health::bad, layout.documents + ": " + explanation(error),
+          "what has changed can't be told until this is mended"};
 }
 
 // The log of the volume's database may grow to 16 MiB before it is moved into it.
@@ -207,12 +214,21 @@ Finding serviceFinding(const HomeLayout& layout) {
           "log in to a session that has one"};
 }
 
-Result<StatusReport> statusOf(const Program& program) {
+Result<std::unique_ptr<Documents>> openedBy(const Program& program) {
   const GlobalOptions& options = program.options();
-  const auto documents = openDocuments({options.home, options.timeout, options.embedded,
-                                        [&](std::string_view text) { program.note(text); }});
-  if (!documents) return fail(documents.error());
-  return (*documents)->status();
+  return openDocuments({options.home, options.timeout, options.embedded,
+                        [&](std::string_view text) { program.note(text); }});
+}
+
+void addStateFindings(const Program& program, const HomeLayout& layout,
+                      std::vector<Finding>& findings) {
+  const auto documents = openedBy(program);
+  findings.push_back(stateFinding(documents ? Result<void>() : fail(documents.error()), layout));
+  if (!documents) return;
+  findings.push_back(roomFinding(layout));
+  const auto status = (*documents)->status();
+  if (!status) return findings.push_back(changesFinding(status.error(), layout));
+  addApplicationFindings(*status, findings);
 }
 
 std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
@@ -237,11 +253,7 @@ std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
     findings.push_back(watchingFinding(*volume));
   }
   findings.push_back(serviceFinding(layout));
-  const auto status = statusOf(program);
-  findings.push_back(stateFinding(status ? Result<void>() : fail(status.error()), layout));
-  if (!status) return findings;
-  findings.push_back(roomFinding(layout));
-  addApplicationFindings(*status, findings);
+  addStateFindings(program, layout, findings);
   return findings;
 }
 

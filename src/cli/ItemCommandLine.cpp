@@ -1,6 +1,7 @@
 #include "cli/ItemCommandLine.h"
 
 #include <CLI/CLI.hpp>
+#include <utility>
 
 #include "cli/TextOptions.h"
 
@@ -10,9 +11,15 @@ namespace {
 /// Adds commands whose help ends alike.
 class Adder {
  public:
-  Adder(CLI::App& app, const std::string& footer) : app_(app), footer_(footer) {}
+  Adder(CLI::App& app, std::string itemHelp, std::string footer)
+      : app_(app), itemHelp_(std::move(itemHelp)), footer_(std::move(footer)) {}
 
   CLI::App& command(const char* name, const char* description) {
+    CLI::App& added = commandWithoutItem(name, description);
+    added.footer(itemHelp_ + footer_);
+    return added;
+  }
+  CLI::App& commandWithoutItem(const char* name, const char* description) {
     CLI::App* added = app_.add_subcommand(name, description);
     added->footer(footer_);
     return *added;
@@ -30,7 +37,8 @@ class Adder {
 
  private:
   CLI::App& app_;
-  const std::string& footer_;
+  std::string itemHelp_;
+  std::string footer_;
 };
 
 void addFileCommands(Adder& add, ItemArguments& arguments) {
@@ -69,7 +77,8 @@ void addTrashCommands(Adder& add, ItemArguments& arguments) {
   addText(restore, "--to", arguments.restore.parent, "Put them into this folder instead")
       ->type_name("ITEM");
 
-  CLI::App& expire = add.command("expire", "Delete for good what has been in the trash for long");
+  CLI::App& expire =
+      add.commandWithoutItem("expire", "Delete for good what has been in the trash for long");
   addText(expire, "--older-than", arguments.expire.olderThan,
           "A day, a moment in RFC 3339 form, or an age: 30d, 12h, 2w, 45m, 90s")
       ->required()
@@ -100,8 +109,9 @@ void addMetadataCommands(Adder& add, ItemArguments& arguments) {
 
 }  // namespace
 
-void addItemCommands(CLI::App& app, ItemArguments& arguments, const std::string& footer) {
-  Adder add(app, footer);
+void addItemCommands(CLI::App& app, ItemArguments& arguments, const std::string& itemHelp,
+                     const std::string& footer) {
+  Adder add(app, itemHelp, footer);
   addFileCommands(add, arguments);
   addTrashCommands(add, arguments);
   addMetadataCommands(add, arguments);

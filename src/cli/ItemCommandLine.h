@@ -27,8 +27,10 @@ struct ItemArguments {
   UsedOptions used;
 };
 
-/// Adds those commands; `arguments` outlives the parser. `footer` is what their help ends with.
-void addItemCommands(CLI::App& app, ItemArguments& arguments, const std::string& footer);
+/// Adds those commands; `arguments` outlives the parser. The help of those that take
+/// an ITEM ends with `itemHelp` and `footer`, and of others with the footer.
+void addItemCommands(CLI::App& app, ItemArguments& arguments, const std::string& itemHelp,
+                     const std::string& footer);
 /// Runs the one that was given, if one of them was.
 [[nodiscard]] std::optional<ExitCode> runItemCommand(const CLI::App& app, Program& program,
                                                      const ItemArguments& arguments);

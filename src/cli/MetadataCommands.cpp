@@ -8,6 +8,7 @@
 #include "cli/ItemJSON.h"
 #include "cli/OperationRun.h"
 #include "cli/Printing.h"
+#include "cli/ReferenceDate.h"
 #include "mirabel/TagData.h"
 
 namespace mirabel {
@@ -56,7 +57,7 @@ ExitCode runTag(Program& program, const TagOptions& options) {
     for (const std::string& label : options.labels)
       tags.push_back({label});
     auto encoded = encodeTagData(tags);
-    if (!encoded) return program.reportUsage("labels are text in UTF-8, 64 KiB in all at most");
+    if (!encoded) return program.reportUsage("the labels have more than 64 KiB");
     tagData = *std::move(encoded);
   }
   return runOnItem(program, options.item, "can't tag " + options.item,
@@ -80,7 +81,7 @@ ExitCode runFavorite(Program& program, const FavoriteOptions& options) {
 ExitCode runUsed(Program& program, const UsedOptions& options) {
   std::optional<Date> date;
   if (!options.clears) {
-    date = options.date ? Date::fromRFC3339(*options.date) : Date::now();
+    date = options.date ? dateFrom(*options.date) : Date::now();
     if (!date) {
       return program.reportUsage("can't use " + *options.date +
                                  "; a date is written like 2026-11-21 or 2026-11-21T09:30:00Z");

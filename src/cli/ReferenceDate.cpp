@@ -50,11 +50,13 @@ std::optional<Date> localMidnight(const std::string& day) {
 
 }  // namespace
 
+std::optional<Date> dateFrom(std::string_view text) {
+  const auto date = Date::fromRFC3339(text);
+  return date && text.size() == dayLength ? localMidnight(std::string(text)) : date;
+}
+
 std::optional<Date> referenceDateFrom(std::string_view text, const Date& now) {
-  if (const auto date = Date::fromRFC3339(text)) {
-    return text.size() == dayLength ? localMidnight(std::string(text)) : date;
-  }
-  return ago(text, now);
+  return Date::fromRFC3339(text) ? dateFrom(text) : ago(text, now);
 }
 
 }  // namespace mirabel

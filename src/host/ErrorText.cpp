@@ -35,7 +35,8 @@ std::string posixMeaning(int code) {
 // These are chosen for their exit code; their details say everything that their names would.
 bool detailIsEnough(std::int64_t code) {
   return code == EBUSY || code == EINVAL || code == ENOTDIR || code == EPERM || code == ENOTCONN ||
-         code == ENOBUFS || code == EADDRINUSE || code == ECANCELED;
+         code == ENOBUFS || code == EADDRINUSE || code == ECANCELED || code == EDEADLK ||
+         code == E2BIG;
 }
 
 std::string posixText(const Error& error) {
@@ -63,7 +64,7 @@ std::string fileText(const Error& error) {
 
 std::string vesselText(const Error& error) {
   if (error.is(VesselErrorCode::syncAnchorExpired)) {
-    return "it is no longer valid; start over, with a new listing or a new anchor";
+    return "the page or anchor is no longer valid; start over, with a new listing or a new anchor";
   }
   if (error.is(VesselErrorCode::noSuchItem)) return "no item has this identifier";
   if (error.is(VesselErrorCode::collision)) {

@@ -42,6 +42,9 @@ TEST(ReferenceDate, AgesCountBackFromNow) {
 TEST(ReferenceDate, ADayBeginsAtLocalMidnightAndAMomentIsExact) {
   const TimeZone zone("EST5EDT,M3.2.0,M11.1.0");
   EXPECT_EQ(referenceDateFrom("2026-11-21", now), date("2026-11-21T05:00:00Z"));
+  EXPECT_EQ(dateFrom("2026-11-21"), date("2026-11-21T05:00:00Z"));
+  EXPECT_EQ(dateFrom("2026-11-21T09:30:00Z"), date("2026-11-21T09:30:00Z"));
+  EXPECT_EQ(dateFrom("30d"), std::nullopt);
   EXPECT_EQ(referenceDateFrom("2026-07-01", now), date("2026-07-01T04:00:00Z"));
   EXPECT_EQ(referenceDateFrom("1969-12-31", now), date("1969-12-31T05:00:00Z"));
   EXPECT_EQ(referenceDateFrom("2026-11-21T09:30:00.5Z", now), date("2026-11-21T09:30:00.5Z"));

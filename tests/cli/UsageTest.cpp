@@ -66,6 +66,19 @@ TEST_F(Usage, HelpAndVersionAreAnswers) {
   EXPECT_THAT(run({"--version"}).out, HasSubstr("mirabel "));
 }
 
+TEST_F(Usage, TheUsageLineHasWhatMustBeGiven) {
+  const std::pair<const char*, const char*> cases[] = {
+      {"mkdir", "mirabel mkdir [OPTIONS] --in ITEM NAME"},
+      {"import", "--in ITEM FILE"},
+      {"changes", "--since ANCHOR"},
+      {"icon", "--output FILE"},
+      {"expire", "--older-than DATE|AGE"}};
+  for (const auto& [command, usage] : cases)
+    EXPECT_THAT(run({command, "--help"}).out, HasSubstr(usage));
+  EXPECT_THAT(run({"expire", "--help"}).out, ::testing::Not(HasSubstr("ITEM")));
+  EXPECT_THAT(run({"ls", "--help"}).out, HasSubstr("workingset"));
+}
+
 TEST_F(Usage, TheManualKnowsEveryOptionAndCommandOfTheHelp) {
   std::ifstream file(MIRABEL_MANUAL);
   const std::string manual(std::istreambuf_iterator<char>(file), {});

@@ -28,7 +28,8 @@ Result<std::string> iconOfDesktopEntry(const std::vector<std::string>& folders,
     if (!entry && entry.error().isPosix(ENOENT)) continue;
     if (!entry) return fail(entry.error());
     auto icon = entry->text(entryGroup, "Icon");
-    if (!icon || icon->empty()) return fail(Error::posix(ENOENT, "the entry names no icon"));
+    if (!icon || icon->empty())
+      return fail(Error::posix(ENOENT, "its desktop entry names no icon"));
     return *std::move(icon);
   }
   return fail(Error::posix(ENOENT, "there is no desktop entry"));
