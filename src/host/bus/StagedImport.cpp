@@ -5,10 +5,14 @@
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
+#include <string_view>
 #include <sys/stat.h>
 #include <system_error>
 #include <unistd.h>
+#include <utility>
 
+#include "linux/kernel/FileReplacement.h"
+#include "linux/operations/ItemNames.h"
 #include "mirabel/UniqueFd.h"
 
 namespace mirabel::bus {
@@ -16,7 +20,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr std::size_t longestName = 255;
 constexpr std::size_t pieceSize = 1 << 20;
 // Between two of these it is seen whether to go on.
 constexpr std::size_t kernelPieceSize = 1 << 24;
@@ -28,25 +31,6 @@ Result<void> requireReadableFile(int file, const struct stat& status) {
   const int flags = ::fcntl(file, F_GETFL);
   const bool isReadable = flags >= 0 && (flags & O_PATH) == 0 && (flags & O_ACCMODE) != O_WRONLY;
   if (!isReadable) return fail(Error::posix(EBADF, "the file is not open for reading"));
-  return {};
-}
-
-Result<void> requireName(const std::string& name) {
-  if (name.empty() || name == "." || name == ".." ||
-      name.find_first_of(std::string_view("/\0", 2)) != std::string::npos)
-    return fail(Error::posix(EINVAL));
-  if (name.size() > longestName) return fail(Error::posix(ENAMETOOLONG));
-  return {};
-}
-
-Result<void> writeAll(int to, const char* bytes, std::size_t count) {
-  while (count > 0) {
-    const ssize_t written = ::write(to, bytes, count);
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) return fail(Error::posix(errno));
-    bytes += written;
-    count -= static_cast<std::size_t>(written);
-  }
   return {};
 }
 
@@ -67,8 +51,8 @@ Result<void> copyAll(int from, int to, const std::stop_token& stopping) {
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return fail(Error::posix(errno));
     if (count == 0) return {};
-    if (auto written = writeAll(to, piece.data(), static_cast<std::size_t>(count)); !written)
-      return written;
+    const std::string_view bytes(piece.data(), static_cast<std::size_t>(count));
+    if (auto written = writeAll(to, bytes); !written) return written;
     position += count;
   }
 }
@@ -89,7 +73,7 @@ Result<StagedImport> StagedImport::of(int file, const std::string& name,
   struct stat status {};
   if (::fstat(file, &status) != 0) return fail(Error::posix(errno));
   if (auto readable = requireReadableFile(file, status); !readable) return fail(readable.error());
-  if (auto named = requireName(name); !named) return fail(named.error());
+  if (auto refusal = whyNoName(name)) return fail(*std::move(refusal));
   if (::mkdir(stagingFolder.c_str(), 0700) != 0 && errno != EEXIST)
     return fail(Error::posix(errno));
   std::string folder = stagingFolder + "/XXXXXX";

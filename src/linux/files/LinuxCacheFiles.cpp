@@ -11,6 +11,7 @@
 #include <system_error>
 #include <unistd.h>
 
+#include "linux/kernel/FileReplacement.h"
 #include "mirabel/UniqueFd.h"
 
 namespace mirabel {
@@ -38,37 +39,6 @@ Result<std::optional<Data>> readAt(int folder, const std::string& name, std::siz
     bytes.insert(bytes.end(), piece.begin(), piece.begin() + count);
     if (bytes.size() > limit) return fail(Error::posix(EFBIG));
   }
-}
-
-Result<void> writeAll(int file, const Data& bytes) {
-  for (std::size_t done = 0; done < bytes.size();) {
-    const ssize_t count = ::write(file, bytes.data() + done, bytes.size() - done);
-    if (count < 0 && errno == EINTR) continue;
-    if (count <= 0) return fail(Error::posix(count < 0 ? errno : EIO));
-    done += static_cast<std::size_t>(count);
-  }
-  return {};
-}
-
-/// The folder must be locked.
-Result<void> replaceAt(int folder, const std::string& name, const Data& bytes) {
-  const std::string temporary = name + ".new";
-  // What is there is left from a crash, or was put there by somebody.
-  ::unlinkat(folder, temporary.c_str(), 0);
-  const UniqueFd file(
-      ::openat(folder, temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
-  if (!file) return fail(Error::posix(errno));
-  auto written = writeAll(file.get(), bytes);
-  if (written && ::fsync(file.get()) != 0) written = fail(Error::posix(errno));
-  if (written && ::renameat(folder, temporary.c_str(), folder, name.c_str()) != 0) {
-    written = fail(Error::posix(errno));
-  }
-  if (!written) {
-    ::unlinkat(folder, temporary.c_str(), 0);
-    return written;
-  }
-  if (::fsync(folder) != 0) return fail(Error::posix(errno));
-  return {};
 }
 
 /// Locked until it is closed. Processes hold it for no longer than one file is written.
@@ -110,7 +80,7 @@ Result<void> LinuxCacheFiles::createDirectory(const URL& folder) {
 Result<void> LinuxCacheFiles::replace(const URL& file, const Data& bytes) {
   const auto folder = lockedFolder(file.deletingLastPathComponent().path());
   if (!folder) return fail(folder.error());
-  return replaceAt(folder->get(), std::string(file.lastPathComponent()), bytes);
+  return replaceFile(folder->get(), std::string(file.lastPathComponent()), bytes);
 }
 
 Result<std::uint64_t> LinuxCacheFiles::claimVersion(std::string_view name, std::uint64_t after) {
@@ -127,7 +97,7 @@ Result<std::uint64_t> LinuxCacheFiles::claimVersion(std::string_view name, std::
   }
   if (greatest == largestVersion) return fail(Error::posix(EOVERFLOW));
   const std::string text = std::to_string(greatest + 1) + "\n";
-  if (auto written = replaceAt(folder->get(), fileName, dataFromString(text)); !written) {
+  if (auto written = replaceFile(folder->get(), fileName, dataFromString(text)); !written) {
     return fail(written.error());
   }
   return greatest + 1;

@@ -11,6 +11,7 @@
 #include <utility>
 
 #include "linux/kernel/AttributeCalls.h"
+#include "linux/kernel/FileReplacement.h"
 
 namespace mirabel {
 namespace {
@@ -30,18 +31,6 @@ bool isUnchanged(const ObjectStatus& before, const ObjectStatus& after) {
 bool cannot(int failure) {
   constexpr int codes[] = {EXDEV, EINVAL, ENOSYS, EOPNOTSUPP, ENOTTY, EPERM, ETXTBSY, EBADF};
   return std::ranges::find(codes, failure) != std::end(codes);
-}
-
-Result<void> writeAll(int file, const char* bytes, std::size_t size, std::int64_t offset) {
-  while (size > 0) {
-    const ssize_t written = ::pwrite(file, bytes, size, offset);
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) return fail(Error::posix(errno));
-    bytes += written;
-    size -= static_cast<std::size_t>(written);
-    offset += written;
-  }
-  return {};
 }
 
 /// The next run of data at or after `from`; an empty one at `end` where there is none.
@@ -145,7 +134,7 @@ Result<void> FileCopy::copyByHand(int source, int copy, std::int64_t from, std::
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return fail(Error::posix(errno));
     if (count == 0) return {};
-    auto written = writeAll(copy, buffer.data(), static_cast<std::size_t>(count), from);
+    auto written = writeAllAt(copy, {buffer.data(), static_cast<std::size_t>(count)}, from);
     if (!written) return written;
     from += count;
     progress_.bytesCopied.fetch_add(static_cast<std::uint64_t>(count), std::memory_order_relaxed);

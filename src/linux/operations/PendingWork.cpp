@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include "foundation/Log.h"
+#include "linux/kernel/FileReplacement.h"
 #include "linux/kernel/LongPath.h"
 #include "platform/FileOperations.h"
 
@@ -15,7 +16,6 @@ namespace {
 
 constexpr const char* fileName = "pending";
 constexpr const char* damagedFileName = "pending.damaged";
-constexpr const char* newFileName = "pending.new";
 // More than that was not written by this program.
 constexpr std::size_t largestFile = 16u << 20;
 
@@ -43,19 +43,6 @@ Result<Data> readFile(int folder) {
     return fail(Error::posix(errno));
   }
   return bytes;
-}
-
-Result<void> replaceFile(int folder, const Data& bytes) {
-  ::unlinkat(folder, newFileName, 0);
-  UniqueFd file(::openat(folder, newFileName, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
-  if (!file) return fail(Error::posix(errno));
-  errno = EIO;
-  if (::write(file.get(), bytes.data(), bytes.size()) != static_cast<ssize_t>(bytes.size()) ||
-      ::fsync(file.get()) != 0 || ::renameat(folder, newFileName, folder, fileName) != 0 ||
-      ::fsync(folder) != 0) {
-    return fail(Error::posix(errno));
-  }
-  return {};
 }
 
 template <class Record>
@@ -197,7 +184,7 @@ Result<void> PendingWork::write() {
   }
   auto bytes = all.encode();
   if (!bytes) return fail(bytes.error());
-  return replaceFile(folder, *bytes);
+  return replaceFile(folder, fileName, *bytes);
 }
 
 }  // namespace mirabel

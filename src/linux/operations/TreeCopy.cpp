@@ -6,7 +6,6 @@
 #include <sys/stat.h>
 
 namespace mirabel {
-namespace {}  // namespace
 
 Result<void> TreeCopy::run(int sourceFolder, const std::string& source, int folder,
                            const std::string& name) {
