@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "mirabel/Containers.h"
@@ -61,6 +62,20 @@ class MIRABEL_EXPORT DocumentContainer {
 class MIRABEL_EXPORT ContainerWatch {
  public:
   virtual ~ContainerWatch() = default;
+};
+
+/// What an operation is to change: an item, at the place where it was looked up. A file with
+/// several hard links is one item that has several names, and the place says which of them is
+/// meant.
+struct ItemTarget {
+  /// Whichever name of it is found.
+  ItemTarget(std::string identifier) : itemIdentifier(std::move(identifier)) {}
+  ItemTarget(const char* identifier) : itemIdentifier(identifier) {}
+  /// The name that the item was handed out with.
+  ItemTarget(const ItemRecord& item) : itemIdentifier(item.itemIdentifier), path(item.path) {}
+
+  std::string itemIdentifier;
+  std::string path{};  ///< absolute; empty for whichever is found
 };
 
 /// How far the operations of a process have come, all of them together since it started.
@@ -142,13 +157,14 @@ class MIRABEL_EXPORT Documents {
 
   // Operations. Handlers are called exactly once, on any thread, perhaps before the call returns,
   // with the item as it is then. On success the change is on disk; after a crash it is done or
-  // undone, never half. Of a file with several hard links one name is changed, and the others stay.
-  // Errors: `VesselErrorCode::noSuchItem` for an identifier that leads nowhere;
-  // `VesselErrorCode::collision`, or where what is in the way is no item
-  // `FileErrorCode::fileExists`, for a name that is taken, for nothing is ever replaced;
-  // `FileErrorCode::writeNotPermitted` for a place in the root container itself; POSIX EINVAL for
-  // a name that none can have, and other POSIX errors. Where the change was made and its item can't
-  // be built, the error is the lookup's, and the change stays.
+  // undone, never half. Of a file with several hard links the name at the target's path is
+  // changed, one of them where it has none, and the others stay.
+  // Errors: `VesselErrorCode::noSuchItem` for an identifier that leads nowhere, and for a document
+  // that is not at the target's path any more; `VesselErrorCode::collision`, or where what is in
+  // the way is no item `FileErrorCode::fileExists`, for a name that is taken, for nothing is ever
+  // replaced; `FileErrorCode::writeNotPermitted` for a place in the root container itself; POSIX
+  // EINVAL for a name that none can have, and other POSIX errors. Where the change was made and its
+  // item can't be built, the error is the lookup's, and the change stays.
 
   /// Copies the file or the whole folder at an absolute path, anywhere, into the parent, with
   /// times, permissions and user attributes.
@@ -156,22 +172,21 @@ class MIRABEL_EXPORT Documents {
                               ItemHandler handler) = 0;
   virtual void createDirectory(const std::string& name, const std::string& parent,
                                ItemHandler handler) = 0;
-  virtual void rename(const std::string& identifier, const std::string& name,
-                      ItemHandler handler) = 0;
+  virtual void rename(const ItemTarget& item, const std::string& name, ItemHandler handler) = 0;
   /// Moves it into another folder, under another name if one is given. Where parent and item are
   /// both unknown, the error names the parent.
-  virtual void reparent(const std::string& identifier, const std::string& parent,
+  virtual void reparent(const ItemTarget& item, const std::string& parent,
                         const std::optional<std::string>& newName, ItemHandler handler) = 0;
   /// Deletes it for good, a folder with everything in it.
-  virtual void remove(const std::string& identifier, ErrorHandler handler) = 0;
+  virtual void remove(const ItemTarget& item, ErrorHandler handler) = 0;
   /// Moves it to the trash of its documents, under a name made from its own where that is taken.
   /// Where it came from is on disk first. Errors of `ErrorDomain::store` too.
-  virtual void trash(const std::string& identifier, ItemHandler handler) = 0;
+  virtual void trash(const ItemTarget& item, ItemHandler handler) = 0;
   /// Moves it out of the trash, under the name that it had or one made from it where that is taken:
   /// into the parent, if one is given that is there and not in the trash itself; or else back to
   /// where it came from; or else, where that is gone and it lies in an app library, into that.
   /// Error: invalid parameter `itemIdentifier` for what is not in the trash, or has no place to go.
-  virtual void restore(const std::string& identifier, const std::optional<std::string>& parent,
+  virtual void restore(const ItemTarget& item, const std::optional<std::string>& parent,
                        ItemHandler handler) = 0;
 
   // What the user says of a file; nothing given takes it away. It lies in an extended attribute of

@@ -9,8 +9,9 @@ namespace mirabel {
 
 ExitCode runMakeFolder(Program& program, const CreateOptions& options) {
   return runOnItem(program, options.parent, "can't make the folder " + options.name,
-                   [&](const std::string& parent, auto done) {
-                     program.documents()->createDirectory(options.name, parent, std::move(done));
+                   [&](const ItemRecord& parent, auto done) {
+                     program.documents()->createDirectory(options.name, parent.itemIdentifier,
+                                                          std::move(done));
                    });
 }
 
@@ -44,7 +45,7 @@ ExitCode runImport(Program& program, const ImportOptions& options) {
 
 ExitCode runRename(Program& program, const RenameOptions& options) {
   return runOnItem(program, options.item, "can't rename " + options.item + " to " + options.name,
-                   [&](const std::string& item, auto done) {
+                   [&](const ItemRecord& item, auto done) {
                      program.documents()->rename(item, options.name, std::move(done));
                    });
 }
@@ -55,7 +56,7 @@ ExitCode runMove(Program& program, const MoveOptions& options) {
   const auto parent = ItemArgument(options.parent).item(*documents);
   if (!parent) return program.report(parent.error(), "can't find " + options.parent);
   return runOnItem(program, options.item, "can't move " + options.item + " to " + options.parent,
-                   [&](const std::string& item, auto done) {
+                   [&](const ItemRecord& item, auto done) {
                      documents->reparent(item, parent->itemIdentifier, options.name,
                                          std::move(done));
                    });

@@ -61,8 +61,8 @@ ExitCode runTag(Program& program, const TagOptions& options) {
     tagData = *std::move(encoded);
   }
   return runOnItem(program, options.item, "can't tag " + options.item,
-                   [&](const std::string& identifier, const auto& done) {
-                     program.documents()->setTagData(identifier, tagData, done);
+                   [&](const ItemRecord& found, const auto& done) {
+                     program.documents()->setTagData(found.itemIdentifier, tagData, done);
                    });
 }
 
@@ -73,8 +73,8 @@ ExitCode runFavorite(Program& program, const FavoriteOptions& options) {
     if (!rank) return program.reportUsage("can't use " + *options.rank + "; a rank is a number");
   }
   return runOnItem(program, options.item, "can't rank " + options.item,
-                   [&](const std::string& identifier, const auto& done) {
-                     program.documents()->setFavoriteRank(identifier, rank, done);
+                   [&](const ItemRecord& found, const auto& done) {
+                     program.documents()->setFavoriteRank(found.itemIdentifier, rank, done);
                    });
 }
 
@@ -88,8 +88,8 @@ ExitCode runUsed(Program& program, const UsedOptions& options) {
     }
   }
   return runOnItem(program, options.item, "can't note when " + options.item + " was used",
-                   [&](const std::string& identifier, const auto& done) {
-                     program.documents()->setLastUsedDate(identifier, date, done);
+                   [&](const ItemRecord& found, const auto& done) {
+                     program.documents()->setLastUsedDate(found.itemIdentifier, date, done);
                    });
 }
 

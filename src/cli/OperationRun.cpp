@@ -90,9 +90,8 @@ ExitCode runOnItem(Program& program, const std::string& item, std::string_view w
   if (documents == nullptr) return program.exitCode();
   const auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
-  const std::string identifier = found->itemIdentifier;
   const auto result = OperationRun(program, *documents).item([&](auto done) {
-    operation(identifier, std::move(done));
+    operation(*found, std::move(done));
   });
   if (!result) return program.report(result.error(), what);
   printOutcome(program, *result);

@@ -37,7 +37,7 @@ class OperationRun {
 /// Finds the item that is named, does something to it and prints what comes of it. `what` says for
 /// a failure what was tried.
 using ItemOperation =
-    std::function<void(const std::string& identifier, Documents::ItemHandler completionHandler)>;
+    std::function<void(const ItemRecord& item, Documents::ItemHandler completionHandler)>;
 [[nodiscard]] ExitCode runOnItem(Program& program, const std::string& item, std::string_view what,
                                  const ItemOperation& operation);
 

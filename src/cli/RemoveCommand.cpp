@@ -73,15 +73,15 @@ ExitCode removeOne(Program& program, const std::string& item, bool isDryRun) {
   const auto found = ItemArgument(item).item(*documents);
   if (!found) return program.report(found.error(), "can't find " + item);
   if (isDryRun) return tellWhatWouldGo(program, *found);
-  const std::string identifier = found->itemIdentifier;
   const auto error = OperationRun(program, *documents).error([&](auto done) {
-    documents->remove(identifier, std::move(done));
+    documents->remove(*found, std::move(done));
   });
   if (error) return program.report(*error, "can't remove " + item);
   if (program.options().json) {
-    program.out() << nlohmann::json{{"deleted", {utf8Lossy(identifier)}}}.dump() << '\n';
+    program.out() << nlohmann::json{{"deleted", {utf8Lossy(found->itemIdentifier)}}}.dump() << '\n';
   } else {
-    program.out() << "removed " << printable(identifier) << "  " << printable(found->path) << '\n';
+    program.out() << "removed " << printable(found->itemIdentifier) << "  "
+                  << printable(found->path) << '\n';
   }
   return ExitCode::done;
 }

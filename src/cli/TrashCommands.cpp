@@ -25,7 +25,7 @@ ExitCode restoreOne(Program& program, const std::string& item,
   const auto found = ItemArgument(item).item(documents);
   if (!found) return program.report(found.error(), "can't find " + item);
   const auto result = OperationRun(program, documents).item([&](auto done) {
-    documents.restore(found->itemIdentifier, parent, std::move(done));
+    documents.restore(*found, parent, std::move(done));
   });
   if (!result) {
     return program.report(explained(result.error(), found->isTrashed), "can't restore " + item);
@@ -39,10 +39,10 @@ ExitCode restoreOne(Program& program, const std::string& item,
 ExitCode runTrash(Program& program, const std::vector<std::string>& items) {
   Outcomes outcomes;
   for (const std::string& item : items) {
-    outcomes.add(runOnItem(program, item, "can't trash " + item,
-                           [&](const std::string& identifier, auto done) {
-                             program.documents()->trash(identifier, std::move(done));
-                           }));
+    outcomes.add(
+        runOnItem(program, item, "can't trash " + item, [&](const ItemRecord& found, auto done) {
+          program.documents()->trash(found, std::move(done));
+        }));
   }
   return outcomes.exitCode();
 }

@@ -20,10 +20,12 @@ class HostTrash {
 
   /// See `LocalVessel::trashItemWithIdentifier`. Where the item came from is on disk before it is
   /// moved; where that can't be, it is not moved. Errors of `ErrorDomain::store` too.
-  void trash(std::string_view identifier, LocalVessel::ItemHandler completionHandler);
+  void trash(std::string_view identifier, const std::optional<URL>& place,
+             LocalVessel::ItemHandler completionHandler);
   /// See `LocalVessel::untrashItemWithIdentifier`; without a parent, an item goes back to the one
   /// that it had, under its own name.
-  void restore(std::string_view identifier, std::optional<std::string> toParentItemIdentifier,
+  void restore(std::string_view identifier, const std::optional<URL>& place,
+               std::optional<std::string> toParentItemIdentifier,
                LocalVessel::ItemHandler completionHandler);
 
  private:

@@ -18,6 +18,11 @@ LocalVessel::ItemHandler recorded(Documents::ItemHandler handler) {
   };
 }
 
+std::optional<URL> placeOf(const ItemTarget& item) {
+  if (item.path.empty()) return {};
+  return URL::fileURL(item.path);
+}
+
 }  // namespace
 
 Result<std::unique_ptr<LocalDocuments>> LocalDocuments::open(LinuxPlatform::Options options) {
@@ -81,28 +86,30 @@ void LocalDocuments::createDirectory(const std::string& name, const std::string&
   provider_->vessel().createDirectoryWithName(name, parent, recorded(std::move(handler)));
 }
 
-void LocalDocuments::rename(const std::string& identifier, const std::string& name,
-                            ItemHandler handler) {
-  provider_->vessel().renameItemWithIdentifier(identifier, name, recorded(std::move(handler)));
+void LocalDocuments::rename(const ItemTarget& item, const std::string& name, ItemHandler handler) {
+  provider_->vessel().renameItemWithIdentifier(item.itemIdentifier, name,
+                                               recorded(std::move(handler)), placeOf(item));
 }
 
-void LocalDocuments::reparent(const std::string& identifier, const std::string& parent,
+void LocalDocuments::reparent(const ItemTarget& item, const std::string& parent,
                               const std::optional<std::string>& newName, ItemHandler handler) {
-  provider_->vessel().reparentItemWithIdentifier(identifier, parent, newName,
-                                                 recorded(std::move(handler)));
+  provider_->vessel().reparentItemWithIdentifier(item.itemIdentifier, parent, newName,
+                                                 recorded(std::move(handler)), placeOf(item));
 }
 
-void LocalDocuments::remove(const std::string& identifier, ErrorHandler handler) {
-  provider_->vessel().deleteItemWithIdentifier(identifier, std::move(handler));
+void LocalDocuments::remove(const ItemTarget& item, ErrorHandler handler) {
+  provider_->vessel().deleteItemWithIdentifier(item.itemIdentifier, std::move(handler),
+                                               placeOf(item));
 }
 
-void LocalDocuments::trash(const std::string& identifier, ItemHandler handler) {
-  provider_->trash().trash(identifier, recorded(std::move(handler)));
+void LocalDocuments::trash(const ItemTarget& item, ItemHandler handler) {
+  provider_->trash().trash(item.itemIdentifier, placeOf(item), recorded(std::move(handler)));
 }
 
-void LocalDocuments::restore(const std::string& identifier,
-                             const std::optional<std::string>& parent, ItemHandler handler) {
-  provider_->trash().restore(identifier, parent, recorded(std::move(handler)));
+void LocalDocuments::restore(const ItemTarget& item, const std::optional<std::string>& parent,
+                             ItemHandler handler) {
+  provider_->trash().restore(item.itemIdentifier, placeOf(item), parent,
+                             recorded(std::move(handler)));
 }
 
 void LocalDocuments::setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,

@@ -20,6 +20,11 @@ URL uncached(const URL& url) {
   return url.isFileURL() ? URL::fileURL(url.path()) : url;
 }
 
+/// Hard links are made of documents only.
+bool mayHaveSeveralNames(std::string_view identifier) {
+  return identifier.starts_with("did=");
+}
+
 }  // namespace
 
 LocalVessel::LocalVessel(const Platform& platform, const AppLibraryRoots& roots,
@@ -48,8 +53,8 @@ std::optional<URL> LocalVessel::URLForItemWithPersistentIdentifier(
 }
 
 std::optional<URL> LocalVessel::_urlForItemWithPersistentIdentifier(
-    std::string_view identifier) const {
-  const Result<URL> url = urlForIdentifier(identifier);
+    std::string_view identifier, const std::optional<URL>& place) const {
+  const Result<URL> url = urlForIdentifier(identifier, place);
   if (url) return *url;
   // 2 says "not found" in the domains that may arrive here, which is nothing unusual.
   logMessage(url.error().code == 2 ? LogLevel::debug : LogLevel::error,
@@ -58,9 +63,10 @@ std::optional<URL> LocalVessel::_urlForItemWithPersistentIdentifier(
   return {};
 }
 
-Result<URL> LocalVessel::urlForIdentifier(std::string_view identifier) const {
+Result<URL> LocalVessel::urlForIdentifier(std::string_view identifier,
+                                          const std::optional<URL>& place) const {
   const LogSection section("fetching URL for " + quoted(identifier));
-  const auto item = lookUpItem(identifier);
+  const auto item = lookUpItem(identifier, place);
   if (!item) return fail(Error::nonExistentItem(identifier));
   logDebug([&] { return "found " + item->url().description(); });
   return item->url();
@@ -148,7 +154,12 @@ void LocalVessel::stopProvidingItemAtURL(const URL&) const {}
 
 void LocalVessel::itemChangedAtURL(const URL&) const {}
 
-std::shared_ptr<LocalItem> LocalVessel::lookUpItem(std::string_view identifier) const {
+std::shared_ptr<LocalItem> LocalVessel::lookUpItem(std::string_view identifier,
+                                                   const std::optional<URL>& place) const {
+  if (place && mayHaveSeveralNames(identifier)) {
+    auto item = LocalItem::create(context_, uncached(*place));
+    return item && item->itemIdentifier() == identifier ? item : nullptr;
+  }
   if (identifier.starts_with('#')) {
     const auto proxy = platform_.applications.proxyForBundleIdentifier(identifier.substr(1));
     return proxy ? LocalAppLibraryItem::create(context_, *proxy) : nullptr;

@@ -64,7 +64,7 @@ class LocalVessel {
   [[nodiscard]] std::optional<URL> URLForItemWithPersistentIdentifier(
       std::string_view identifier) const;
   [[nodiscard]] std::optional<URL> _urlForItemWithPersistentIdentifier(
-      std::string_view identifier) const;
+      std::string_view identifier, const std::optional<URL>& place = {}) const;
   [[nodiscard]] std::optional<std::string> persistentIdentifierForItemAtURL(const URL& url) const;
   [[nodiscard]] std::optional<std::string> _persistentIdentifierForItemAt(const URL& url) const;
   /// Error: `LocalVesselError::invalidItemIdentifier`.
@@ -78,12 +78,14 @@ class LocalVessel {
   [[nodiscard]] Result<std::shared_ptr<VesselEnumerator>> enumeratorForContainerItemIdentifier(
       std::string_view identifier, LiveUpdates liveUpdates = LiveUpdates::wanted);
 
-  // Operations on items. Each answers with the item as it is afterwards, read anew. Errors: the
-  // host's no-such-item error for an identifier that leads nowhere; the host's collision error
-  // for a name that is taken, and the file error `fileExists` where what is in the way is no item;
-  // the file error `writeNotPermitted` for a place in the root container, which holds the app
-  // libraries; else those of `FileOperations`. Where the change was made and its item cannot be
-  // built, the error is the lookup's, and the change stays.
+  // Operations on items. A document that has several hard links has several names; `place` says
+  // which is meant, where that matters. Each answers with the item as it is afterwards, read anew.
+  // Errors: the host's no-such-item error for an identifier that leads nowhere, or a document that
+  // does not lie at the place; the host's collision error for a name that is taken, and the file
+  // error `fileExists` where what is in the way is no item; the file error `writeNotPermitted` for
+  // a place in the root container, which holds the app libraries; else those of `FileOperations`.
+  // Where the change was made and its item cannot be built, the error is the lookup's, and the
+  // change stays.
 
   /// Copies what lies at `source`, anywhere, into the parent.
   void importDocumentAtURL(const URL& source, std::string_view toParentItemIdentifier,
@@ -91,14 +93,16 @@ class LocalVessel {
   void createDirectoryWithName(std::string_view name, std::string_view inParentItemIdentifier,
                                ItemHandler completionHandler);
   void renameItemWithIdentifier(std::string_view identifier, std::string_view toName,
-                                ItemHandler completionHandler);
+                                ItemHandler completionHandler,
+                                const std::optional<URL>& place = {});
   /// Where parent and item are both unknown, the error names the parent.
   void reparentItemWithIdentifier(std::string_view identifier,
                                   std::string_view toParentItemWithIdentifier,
-                                  std::optional<std::string> newName,
-                                  ItemHandler completionHandler);
+                                  std::optional<std::string> newName, ItemHandler completionHandler,
+                                  const std::optional<URL>& place = {});
   /// A folder with everything in it.
-  void deleteItemWithIdentifier(std::string_view identifier, ErrorHandler completionHandler);
+  void deleteItemWithIdentifier(std::string_view identifier, ErrorHandler completionHandler,
+                                const std::optional<URL>& place = {});
   /// The document folder of an application. Error: invalid parameter `bundleIdentifier`.
   void _defaultApplicationContainerForBundleIdentifier(std::string_view bundleIdentifier,
                                                        const ItemHandler& completionHandler) const;
@@ -108,7 +112,8 @@ class LocalVessel {
   /// Moves the item into the trash folder of its documents, and notes on it when that was and,
   /// where it lies in the document folder of an application, where it came from. These notes may
   /// fail unheard. Error: invalid parameter `sourceURL` where no folder "Documents" holds it.
-  void trashItemWithIdentifier(std::string_view identifier, ItemHandler completionHandler);
+  void trashItemWithIdentifier(std::string_view identifier, ItemHandler completionHandler,
+                               const std::optional<URL>& place = {});
   /// Moves the item out of the trash: into the parent, if one is given and is not in the trash
   /// itself; else to where it came from; else to the top of its application's document folder. It
   /// gets `formerName`, or else the name that it had there, or else keeps its own; where that is
@@ -118,7 +123,8 @@ class LocalVessel {
   void untrashItemWithIdentifier(std::string_view identifier,
                                  const std::optional<std::string>& toParentItemIdentifier,
                                  ItemHandler completionHandler,
-                                 std::optional<std::string> formerName = {});
+                                 std::optional<std::string> formerName = {},
+                                 const std::optional<URL>& place = {});
   /// Deletes for good what was trashed before the date. What has no date of its own, because
   /// another program put it there, gets the current one, and so goes one period later. The trash
   /// is walked before the call returns, on the caller's thread, which waits while many deletions
@@ -166,11 +172,13 @@ class LocalVessel {
   void stopProvidingItemAtURL(const URL& url) const;
   void itemChangedAtURL(const URL& url) const;
 
-  /// Lookups that others share. `urlForIdentifier` fails with the host's no-such-item
-  /// error; `lookUpItem` logs nothing of its own. Items refer to this provider and to what was
-  /// passed to it until their `putBackURL` was asked for.
-  [[nodiscard]] Result<URL> urlForIdentifier(std::string_view identifier) const;
-  [[nodiscard]] std::shared_ptr<LocalItem> lookUpItem(std::string_view identifier) const;
+  /// Lookups that others share; a place is as for the operations. `urlForIdentifier` fails with the
+  /// host's no-such-item error; `lookUpItem` logs nothing of its own. Items refer to this provider
+  /// and to what was passed to it until their `putBackURL` was asked for.
+  [[nodiscard]] Result<URL> urlForIdentifier(std::string_view identifier,
+                                             const std::optional<URL>& place = {}) const;
+  [[nodiscard]] std::shared_ptr<LocalItem> lookUpItem(std::string_view identifier,
+                                                      const std::optional<URL>& place = {}) const;
   [[nodiscard]] const ItemContext& itemContext() const { return context_; }
   [[nodiscard]] const Platform& platform() const { return platform_; }
   [[nodiscard]] const FileObjectURLs& identity() const { return identity_; }

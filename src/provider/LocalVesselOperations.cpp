@@ -43,9 +43,10 @@ void LocalVessel::createDirectoryWithName(std::string_view name,
 }
 
 void LocalVessel::renameItemWithIdentifier(std::string_view identifier, std::string_view toName,
-                                           ItemHandler completionHandler) {
+                                           ItemHandler completionHandler,
+                                           const std::optional<URL>& place) {
   const LogSection section("rename item " + quoted(identifier) + " to name " + quoted(toName));
-  const auto item = urlForIdentifier(identifier);
+  const auto item = urlForIdentifier(identifier, place);
   if (!item) return completionHandler(fail(item.error()));
   platform_.operations.vs_renameWithNewName(*item, toName,
                                             completion(std::move(completionHandler)));
@@ -54,22 +55,24 @@ void LocalVessel::renameItemWithIdentifier(std::string_view identifier, std::str
 void LocalVessel::reparentItemWithIdentifier(std::string_view identifier,
                                              std::string_view toParentItemWithIdentifier,
                                              std::optional<std::string> newName,
-                                             ItemHandler completionHandler) {
+                                             ItemHandler completionHandler,
+                                             const std::optional<URL>& place) {
   const LogSection section("move item " + quoted(identifier) + " to parent " +
                            quoted(toParentItemWithIdentifier));
   if (isRoot(toParentItemWithIdentifier)) return completionHandler(writeNotPermitted());
   const auto parent = _urlForItemWithPersistentIdentifier(toParentItemWithIdentifier);
   if (!parent) return completionHandler(fail(Error::nonExistentItem(toParentItemWithIdentifier)));
-  const auto item = _urlForItemWithPersistentIdentifier(identifier);
+  const auto item = _urlForItemWithPersistentIdentifier(identifier, place);
   if (!item) return completionHandler(fail(Error::nonExistentItem(identifier)));
   platform_.operations.vs_reparentUnderFolder(*item, *parent, std::move(newName), Bouncing::refused,
                                               completion(std::move(completionHandler)));
 }
 
 void LocalVessel::deleteItemWithIdentifier(std::string_view identifier,
-                                           ErrorHandler completionHandler) {
+                                           ErrorHandler completionHandler,
+                                           const std::optional<URL>& place) {
   const LogSection section("delete item " + quoted(identifier));
-  const auto item = _urlForItemWithPersistentIdentifier(identifier);
+  const auto item = _urlForItemWithPersistentIdentifier(identifier, place);
   if (!item) return completionHandler(Error::nonExistentItem(identifier));
   deleteItem(*item, std::move(completionHandler));
 }

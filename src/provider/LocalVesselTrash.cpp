@@ -21,9 +21,10 @@ std::optional<std::string> nameBeforeTrash(const LocalItem& item) {
 }  // namespace
 
 void LocalVessel::trashItemWithIdentifier(std::string_view identifier,
-                                          ItemHandler completionHandler) {
+                                          ItemHandler completionHandler,
+                                          const std::optional<URL>& place) {
   const LogSection section("trash item " + quoted(identifier));
-  const auto item = _urlForItemWithPersistentIdentifier(identifier);
+  const auto item = _urlForItemWithPersistentIdentifier(identifier, place);
   if (!item) return completionHandler(fail(Error::nonExistentItem(identifier)));
   const auto trash = trashFolderFor(*item);
   if (!trash) return completionHandler(fail(trash.error()));
@@ -68,10 +69,11 @@ void LocalVessel::setPutBackString(const URL& preTrashURL, const URL& trashedURL
 
 void LocalVessel::untrashItemWithIdentifier(
     std::string_view identifier, const std::optional<std::string>& toParentItemIdentifier,
-    ItemHandler completionHandler, std::optional<std::string> formerName) {
+    ItemHandler completionHandler, std::optional<std::string> formerName,
+    const std::optional<URL>& place) {
   const LogSection section("untrash item " + quoted(identifier));
-  const auto url = _urlForItemWithPersistentIdentifier(identifier);
-  const auto item = url ? lookUpItem(identifier) : nullptr;
+  const auto url = _urlForItemWithPersistentIdentifier(identifier, place);
+  const auto item = url ? lookUpItem(identifier, place) : nullptr;
   if (!item) return completionHandler(fail(Error::nonExistentItem(identifier)));
   const Error unfit = Error::invalidParameter("itemIdentifier", identifier);
   if (!item->isTrashed()) {

@@ -18,7 +18,8 @@ class ItemCommands : public CommandLineFixture {
  protected:
   void SetUp() override {
     home.makeFolder("folder");
-    home.makeFolder("target");
+    for (const char* name : {"target", "a", "b"})
+      home.makeFolder(name);
     home.writeFile("folder/doc.txt", "text");
     std::ofstream(home.path() + "/source.txt") << "imported";
   }
@@ -129,8 +130,8 @@ TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
       {{"rename", "did=999", "name"}, 3, "no item has this identifier"},
       {{"mv", doc, home.at("target")}, 6, "the name is taken by " + taker},
       {{"mv", doc, "root"}, 5, "choose a folder in it"},
-      {{"mv", home.at("folder"), home.at("folder")}, 1, "invalid argument"},
-      {{"rm", "root"}, 5, "not something in the documents that can be changed"},
+      {{"mv", home.at("folder"), home.at("folder")}, 1, "a folder can't be moved into itself"},
+      {{"rm", "root"}, 5, "the root itself can't be changed"},
       {{"restore", doc}, 1, "it is not in the trash"},
       {{"favorite", doc, "many"}, 2, "a rank is a number"},
       {{"used", doc, "yesterday"}, 2, "a date is written like"},
@@ -167,6 +168,41 @@ TEST_F(ItemCommands, ADryRunSaysWhatWouldGoAndLeavesIt) {
 
 // As root, on a file system of three megabytes. The program itself is larger than it, whatever room
 // the state gives up.
+TEST_F(ItemCommands, OfAFileWithSeveralNamesChangeTheOneThatTheyWereGiven) {
+  using Words = std::vector<std::string>;
+  const std::pair<Words, const char*> commands[] = {{{"rm", "@"}, nullptr},
+                                                    {{"rename", "@", "new"}, nullptr},
+                                                    {{"mv", "@", home.at("target")}, "target/"},
+                                                    {{"trash", "@"}, ".Trash/"}};
+  int round = 0;
+  for (const auto& [words, becomes] : commands) {
+    // Whichever of them was seen first, and stands before the other in a listing.
+    for (const bool isOtherKnown : {false, true}) {
+      for (const auto& [folder, otherFolder] : {std::pair("a/", "b/"), {"b/", "a/"}}) {
+        const std::string name = "file" + std::to_string(++round);
+        const std::string given = folder + name;
+        const std::string other = otherFolder + name;
+        home.writeFile(given);
+        fs::create_hard_link(home.at(given), home.at(other));
+        if (isOtherKnown) idOf(other);
+        const std::string identifier = idOf(given);
+        Words command = words;
+        std::ranges::replace(command, "@", home.at(given));
+        std::ranges::replace(command, "new", "new" + name);
+        const std::string place = words[0] == "rename"
+                                      ? folder + command.back()
+                                      : (becomes == nullptr ? folder : becomes) + name;
+        EXPECT_THAT(run(command).out, HasSubstr(identifier + "  " + home.at(place) + "\n"));
+        EXPECT_FALSE(exists(given)) << words[0];
+        EXPECT_TRUE(exists(other)) << words[0];
+        if (words[0] == "trash") {
+          EXPECT_EQ(item({"restore", home.at(place)}).at("path"), home.at(given));
+        }
+      }
+    }
+  }
+}
+
 TEST_F(ItemCommands, OnAFullDiskThingsAreTrashedPutBackAndDeleted) {
   const Answer answer = shell(R"sh(
     mkdir "$home/small" && mount -t tmpfs -o size=3M tmpfs "$home/small" || exit 77

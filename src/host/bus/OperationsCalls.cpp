@@ -54,6 +54,16 @@ std::optional<std::string> nameOf(const CallPointer& call, std::string text) {
   return nameOption(*options, "name").value_or(std::move(text));
 }
 
+constexpr KnownOption pathOption = {"path", "ay"};
+
+/// The item, and which of its names is meant where the options say so.
+ItemTarget targetOf(std::string identifier, const Options& options) {
+  ItemTarget target(std::move(identifier));
+  if (const auto path = options.find("path"); path != options.end())
+    target.path = stringView(path->second.get<Data>());
+  return target;
+}
+
 void createDirectory(Documents& documents, const CallPointer& call) {
   auto text = call->argument<std::string>();
   const auto parent = call->argument<std::string>();
@@ -64,15 +74,19 @@ void createDirectory(Documents& documents, const CallPointer& call) {
 void renameItem(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
   auto text = call->argument<std::string>();
-  const auto name = nameOf(call, std::move(text));
-  if (name) documents.rename(item, *name, answering(call));
+  const auto options = optionsOf(call, {{"name", "s"}, {"nameBytes", "ay"}, pathOption});
+  if (!options) return;
+  const auto name = nameOption(*options, "name").value_or(std::move(text));
+  documents.rename(targetOf(item, *options), name, answering(call));
 }
 
 void reparent(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
   const auto parent = call->argument<std::string>();
-  const auto options = optionsOf(call, {{"name", "s"}, {"nameBytes", "ay"}});
-  if (options) documents.reparent(item, parent, nameOption(*options, "name"), answering(call));
+  const auto options = optionsOf(call, {{"name", "s"}, {"nameBytes", "ay"}, pathOption});
+  if (!options) return;
+  documents.reparent(targetOf(item, *options), parent, nameOption(*options, "name"),
+                     answering(call));
 }
 
 void importDocument(Documents& documents, const CallPointer& call, const std::string& stagingFolder,
@@ -101,17 +115,22 @@ void importPath(const CallPointer& call) {
 }
 
 void deleteItem(Documents& documents, const CallPointer& call) {
-  documents.remove(call->argument<std::string>(), answeringError(call));
+  const auto item = call->argument<std::string>();
+  const auto options = optionsOf(call, {pathOption});
+  if (options) documents.remove(targetOf(item, *options), answeringError(call));
 }
 
 void trash(Documents& documents, const CallPointer& call) {
-  documents.trash(call->argument<std::string>(), answering(call));
+  const auto item = call->argument<std::string>();
+  const auto options = optionsOf(call, {pathOption});
+  if (options) documents.trash(targetOf(item, *options), answering(call));
 }
 
 void restore(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
-  const auto options = optionsOf(call, {{"parent", "s"}});
-  if (options) documents.restore(item, textOption(*options, "parent"), answering(call));
+  const auto options = optionsOf(call, {{"parent", "s"}, pathOption});
+  if (!options) return;
+  documents.restore(targetOf(item, *options), textOption(*options, "parent"), answering(call));
 }
 
 void setLastUsedDate(Documents& documents, const CallPointer& call) {
@@ -194,8 +213,22 @@ std::vector<BusMethod> operationsMethods(const std::string& stagingFolder,
        {"item"},
        lane,
        onDocuments(reparent)},
-      {of, "Delete", "s", {"itemIdentifier"}, "", {}, lane, onDocuments(deleteItem)},
-      {of, "Trash", "s", {"itemIdentifier"}, item, {"item"}, lane, onDocuments(trash)},
+      {of,
+       "Delete",
+       "sa{sv}",
+       {"itemIdentifier", "options"},
+       "",
+       {},
+       lane,
+       onDocuments(deleteItem)},
+      {of,
+       "Trash",
+       "sa{sv}",
+       {"itemIdentifier", "options"},
+       item,
+       {"item"},
+       lane,
+       onDocuments(trash)},
       {of,
        "Restore",
        "sa{sv}",

@@ -49,6 +49,17 @@ struct NameArgument {
   Options options;
 };
 
+/// Which of a document's names is meant.
+void setPlace(Options& options, const ItemTarget& item) {
+  if (!item.path.empty()) options["path"] = sdbus::Variant(dataFromString(item.path));
+}
+
+Options placeOptions(const ItemTarget& item) {
+  Options options;
+  setPlace(options, item);
+  return options;
+}
+
 /// A container that is asked for with each question.
 class RemoteContainer final : public DocumentContainer {
  public:
@@ -198,36 +209,40 @@ void RemoteDocuments::createDirectory(const std::string& name, const std::string
         std::move(handler));
 }
 
-void RemoteDocuments::rename(const std::string& identifier, const std::string& name,
-                             ItemHandler handler) {
-  const NameArgument named(name);
-  begin(*connection_, "Rename", arguments(Identifier(identifier), named.text, named.options),
-        std::move(handler));
+void RemoteDocuments::rename(const ItemTarget& item, const std::string& name, ItemHandler handler) {
+  NameArgument named(name);
+  setPlace(named.options, item);
+  begin(*connection_, "Rename",
+        arguments(Identifier(item.itemIdentifier), named.text, named.options), std::move(handler));
 }
 
-void RemoteDocuments::reparent(const std::string& identifier, const std::string& parent,
+void RemoteDocuments::reparent(const ItemTarget& item, const std::string& parent,
                                const std::optional<std::string>& newName, ItemHandler handler) {
-  Options options;
+  Options options = placeOptions(item);
   if (newName) setNameOption(options, "name", *newName);
-  begin(*connection_, "Reparent", arguments(Identifier(identifier), Identifier(parent), options),
+  begin(*connection_, "Reparent",
+        arguments(Identifier(item.itemIdentifier), Identifier(parent), options),
         std::move(handler));
 }
 
-void RemoteDocuments::remove(const std::string& identifier, ErrorHandler handler) {
-  beginWithoutItem(*connection_, operationsInterface, "Delete", arguments(Identifier(identifier)),
+void RemoteDocuments::remove(const ItemTarget& item, ErrorHandler handler) {
+  beginWithoutItem(*connection_, operationsInterface, "Delete",
+                   arguments(Identifier(item.itemIdentifier), placeOptions(item)),
                    std::move(handler));
 }
 
-void RemoteDocuments::trash(const std::string& identifier, ItemHandler handler) {
-  begin(*connection_, "Trash", arguments(Identifier(identifier)), std::move(handler));
+void RemoteDocuments::trash(const ItemTarget& item, ItemHandler handler) {
+  begin(*connection_, "Trash", arguments(Identifier(item.itemIdentifier), placeOptions(item)),
+        std::move(handler));
 }
 
-void RemoteDocuments::restore(const std::string& identifier,
-                              const std::optional<std::string>& parent, ItemHandler handler) {
+void RemoteDocuments::restore(const ItemTarget& item, const std::optional<std::string>& parent,
+                              ItemHandler handler) {
   if (parent && !isBusText(*parent)) return handler(fail(Error::nonExistentItem(*parent)));
-  Options options;
+  Options options = placeOptions(item);
   if (parent) options["parent"] = sdbus::Variant(*parent);
-  begin(*connection_, "Restore", arguments(Identifier(identifier), options), std::move(handler));
+  begin(*connection_, "Restore", arguments(Identifier(item.itemIdentifier), options),
+        std::move(handler));
 }
 
 void RemoteDocuments::setLastUsedDate(const std::string& identifier,

@@ -154,36 +154,38 @@ void RestrictedDocuments::createDirectory(const std::string& name, const std::st
   all_.createDirectory(name, parent, shown(std::move(handler)));
 }
 
-void RestrictedDocuments::rename(const std::string& identifier, const std::string& name,
+// Paths are not for its callers: of theirs, only the identifier is handed on.
+
+void RestrictedDocuments::rename(const ItemTarget& item, const std::string& name,
                                  ItemHandler handler) {
-  if (auto own = requireOwn(identifier); !own) return handler(fail(own.error()));
-  all_.rename(identifier, name, shown(std::move(handler)));
+  if (auto own = requireOwn(item.itemIdentifier); !own) return handler(fail(own.error()));
+  all_.rename(item.itemIdentifier, name, shown(std::move(handler)));
 }
 
-void RestrictedDocuments::reparent(const std::string& identifier, const std::string& parent,
+void RestrictedDocuments::reparent(const ItemTarget& item, const std::string& parent,
                                    const std::optional<std::string>& newName, ItemHandler handler) {
   if (auto own = requireOwn(parent); !own) return handler(fail(own.error()));
-  if (auto own = requireOwn(identifier); !own) return handler(fail(own.error()));
-  all_.reparent(identifier, parent, newName, shown(std::move(handler)));
+  if (auto own = requireOwn(item.itemIdentifier); !own) return handler(fail(own.error()));
+  all_.reparent(item.itemIdentifier, parent, newName, shown(std::move(handler)));
 }
 
-void RestrictedDocuments::remove(const std::string& identifier, ErrorHandler handler) {
-  if (auto own = requireOwn(identifier); !own) return handler(own.error());
-  all_.remove(identifier, std::move(handler));
+void RestrictedDocuments::remove(const ItemTarget& item, ErrorHandler handler) {
+  if (auto own = requireOwn(item.itemIdentifier); !own) return handler(own.error());
+  all_.remove(item.itemIdentifier, std::move(handler));
 }
 
-void RestrictedDocuments::trash(const std::string& identifier, ItemHandler handler) {
-  if (auto own = requireOwn(identifier); !own) return handler(fail(own.error()));
-  all_.trash(identifier, shown(std::move(handler)));
+void RestrictedDocuments::trash(const ItemTarget& item, ItemHandler handler) {
+  if (auto own = requireOwn(item.itemIdentifier); !own) return handler(fail(own.error()));
+  all_.trash(item.itemIdentifier, shown(std::move(handler)));
 }
 
-void RestrictedDocuments::restore(const std::string& identifier,
-                                  const std::optional<std::string>& parent, ItemHandler handler) {
-  if (auto own = requireOwn(identifier); !own) return handler(fail(own.error()));
+void RestrictedDocuments::restore(const ItemTarget& item, const std::optional<std::string>& parent,
+                                  ItemHandler handler) {
+  if (auto own = requireOwn(item.itemIdentifier); !own) return handler(fail(own.error()));
   if (parent) {
     if (auto own = requireOwn(*parent); !own) return handler(fail(own.error()));
   }
-  all_.restore(identifier, parent, shown(std::move(handler)));
+  all_.restore(item.itemIdentifier, parent, shown(std::move(handler)));
 }
 
 void RestrictedDocuments::setLastUsedDate(const std::string& identifier,

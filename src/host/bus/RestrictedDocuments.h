@@ -30,12 +30,12 @@ class RestrictedDocuments final : public Documents {
                       ItemHandler handler) override;
   void createDirectory(const std::string& name, const std::string& parent,
                        ItemHandler handler) override;
-  void rename(const std::string& identifier, const std::string& name, ItemHandler handler) override;
-  void reparent(const std::string& identifier, const std::string& parent,
+  void rename(const ItemTarget& item, const std::string& name, ItemHandler handler) override;
+  void reparent(const ItemTarget& item, const std::string& parent,
                 const std::optional<std::string>& newName, ItemHandler handler) override;
-  void remove(const std::string& identifier, ErrorHandler handler) override;
-  void trash(const std::string& identifier, ItemHandler handler) override;
-  void restore(const std::string& identifier, const std::optional<std::string>& parent,
+  void remove(const ItemTarget& item, ErrorHandler handler) override;
+  void trash(const ItemTarget& item, ItemHandler handler) override;
+  void restore(const ItemTarget& item, const std::optional<std::string>& parent,
                ItemHandler handler) override;
   void setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,
                        ItemHandler handler) override;

@@ -31,7 +31,7 @@ class HostileService {
                             });
     answerWithText(bus::managerInterface, "GetStatus", "");
     answerWithText(bus::providerInterface, "GetItem", "s");
-    answerWithText(bus::operationsInterface, "Trash", "s");
+    answerWithText(bus::operationsInterface, "Trash", "sa{sv}");
     object_->finishRegistration();
     connection_->enterEventLoopAsync();
   }

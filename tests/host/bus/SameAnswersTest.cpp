@@ -29,7 +29,7 @@ void writeFile(const TempHome& home, const std::string& name, const std::string&
 }
 
 void prepare(const TempHome& home) {
-  for (const char* folder : {"folder", "target", "many"})
+  for (const char* folder : {"folder", "target", "many", "a", "b"})
     home.makeFolder(folder);
   writeFile(home, "letter.txt", "Dear Aunt", 1);
   writeFile(home, noUTF8, "bytes", 2);
@@ -40,6 +40,10 @@ void prepare(const TempHome& home) {
     writeFile(home, "many/" + std::to_string(i), "", 6 + i);
   home.makeSymlink("link", "letter.txt");
   home.makeFifo("fifo");
+  for (const std::string name : {"a/linked", "b/linked", "b/linked too"}) {
+    if (name == "a/linked") writeFile(home, name, "linked", 6);
+    if (name != "a/linked") fs::create_hard_link(home.at("a/linked"), home.at(name));
+  }
   fs::create_directory(home.path() + "/outside");
   std::ofstream(home.path() + "/outside/new.txt") << "new";
   std::ofstream(home.path() + "/outside/" + noUTF8) << "bytes from outside";
@@ -288,6 +292,17 @@ const Words commands[] = {
     {"search", "1", "--limit", "3"},
     {"search", " "},
     {"recent", "--limit", "2"},
+    // Of a file with several names, the one that is given.
+    {"rename", "@/b/linked", "linked " + noUTF8},
+    {"info", "@/b/linked"},
+    {"info", "@/a/linked"},
+    {"mv", "@/b/linked " + noUTF8, "@/target"},
+    {"trash", "@/a/linked"},
+    {"restore", "@/.Trash/linked"},
+    {"rm", "@/target/linked " + noUTF8},
+    {"ls", "@/a"},
+    {"ls", "@/b"},
+    {"rm", "@/a/linked"},
     // The trash.
     {"trash", "@/target/note.txt", "@/" + noUTF8, "@/missing", "@/many"},
     {"trash", "root"},

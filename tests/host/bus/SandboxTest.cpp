@@ -137,8 +137,8 @@ TEST_F(Sandboxed, CallersCannotTellWhatIsSomebodyElsesFromWhatIsNotThere) {
         [&](auto& id) { return client.operations("Reparent", own, id, options); },
         [&](auto& id) { return client.operations("CreateDirectory", name, id, options); },
         [&](auto& id) { return client.operations("ImportDocument", handed, name, id, options); },
-        [&](auto& id) { return client.operations("Delete", id); },
-        [&](auto& id) { return client.operations("Trash", id); },
+        [&](auto& id) { return client.operations("Delete", id, BusOptions()); },
+        [&](auto& id) { return client.operations("Trash", id, BusOptions()); },
         [&](auto& id) { return client.operations("Restore", id, options); },
         [&](auto& id) {
           return client.operations("Restore", own, BusOptions{{"parent", sdbus::Variant(id)}});
@@ -263,7 +263,7 @@ TEST_F(Sandboxed, AnotherUsersProgramIsRefused) {
     EXPECT_EQ(client.provider("ListItems", root, nothing).error, accessDenied);
     EXPECT_EQ(client.provider("Watch", root).error, accessDenied);
     EXPECT_EQ(client.provider("Unwatch", root).error, accessDenied);
-    EXPECT_EQ(client.operations("Delete", root).error, accessDenied);
+    EXPECT_EQ(client.operations("Delete", root, BusOptions()).error, accessDenied);
     EXPECT_EQ(client.call(bus::managerInterface, "GetHome").error, accessDenied);
   });
 }
