@@ -24,44 +24,6 @@ class Pages : public CommandLineFixture {
   }
 };
 
-TEST_F(Pages, FullPagesAreFollowedByAnother) {
-  struct Case {
-    int files;
-    std::vector<std::size_t> pages;
-  };
-  int made = 0;
-  for (const Case& c : {Case{0, {0}}, Case{199, {199}}, Case{200, {200, 0}}, Case{201, {200, 1}},
-                        Case{400, {200, 200, 0}}}) {
-    for (; made < c.files; ++made)
-      home.writeFile("f" + std::to_string(made));
-    const auto pages = lines(run({"ls", "--json"}));
-    ASSERT_EQ(pages.size(), c.pages.size()) << c.files;
-    for (std::size_t i = 0; i < pages.size(); ++i) {
-      EXPECT_EQ(pages[i].at("items").size(), c.pages[i]) << c.files;
-      EXPECT_EQ(pages[i].at("nextPage").is_null(), i + 1 == pages.size()) << c.files;
-    }
-  }
-}
-
-TEST_F(Pages, OfSeveralProcessesMakeUpTheFolder) {
-  fill(450);
-  std::multiset<std::string> names;
-  std::vector<std::string> command = {"--json", "ls", "--pages", "1"};
-  int count = 0;
-  for (; count < 10; ++count) {
-    const nlohmann::json page = run(command).json();
-    for (const auto& item : page.at("items"))
-      names.insert(item.at("filename"));
-    if (page.at("nextPage").is_null()) break;
-    command = {"--json", "ls", "--pages", "1", "--page", page.at("nextPage")};
-  }
-  EXPECT_EQ(count, 2);
-  std::multiset<std::string> all;
-  for (int i = 0; i < 450; ++i)
-    all.insert("f" + std::to_string(i));
-  EXPECT_EQ(names, all);
-}
-
 // A listing of 6,000 in seven processes, while others use the folder.
 TEST_F(Pages, GiveEachEntryOnceWhileOthersComeAndChangeTheirNames) {
   constexpr int count = 6'000;
@@ -186,26 +148,6 @@ TEST_F(Pages, ThatAreNoneOfThisHistoryStartOver) {
       *FSChangeToken::decode(std::span<const std::uint8_t>(dataFromString(*fromBase64(page))));
   token.offset = ~std::uint64_t{0} - 1;
   expectFailure(run({"ls", "--page", base64(stringView(token.encode()))}), 4, "start over");
-}
-
-TEST_F(Pages, OfEverythingAndOfAllFoldersAreListedByTheirWords) {
-  home.makeFolder("folder");
-  home.makeFolder("folder/inner");
-  home.writeFile("folder/inner/doc");
-  home.makeFolder(".Trash");
-  home.writeFile(".Trash/erased");
-  home.makeFolder("workingset");
-  const auto names = [&](const std::string& item) {
-    std::set<std::string> seen;
-    const nlohmann::json page = run({"--json", "ls", item}).json();
-    for (const auto& each : page.at("items"))
-      seen.insert(each.at("filename"));
-    return seen;
-  };
-  using Names = std::set<std::string>;
-  EXPECT_EQ(names("workingset"), (Names{"folder", "inner", "doc", "workingset", "erased"}));
-  EXPECT_EQ(names("alldirs"), (Names{"folder", "inner", "workingset"}));
-  EXPECT_EQ(names(home.at("workingset")), Names{});
 }
 
 }  // namespace
