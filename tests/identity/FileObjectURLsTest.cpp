@@ -19,6 +19,9 @@ constexpr std::size_t always = 1000;
 
 class FileObjectURLsTest : public ::testing::Test {
  protected:
+  // Lines without a level's word.
+  static LogLine debug(const std::string& text) { return {LogLevel::debug, text}; }
+  static LogLine error(const std::string& text) { return {LogLevel::error, text}; }
   std::string idOf(std::string_view name) {
     return identity.itemIdentifier(fake.url(name)).value_or("nothing");
   }
@@ -75,31 +78,9 @@ TEST_F(FileObjectURLsTest, RootsAreTheRootContainerAndTheLibraries) {
   fake.volume.makeFolder("/apps/draw/Documents/a");
   EXPECT_EQ(identity.itemIdentifier(URL::fileURL("/apps/draw/Documents/a")),
             "fid=" + std::to_string(fake.volume.at("/apps/draw/Documents/a").fileID));
-
-  class Orphan final : public AppLibraryRoots {
-    List rootURLsForAppLibraries() const override {
-      return std::make_shared<std::vector<URL>>(folders());
-    }
-    std::vector<URL> folders() const override { return {URL::fileURL("/apps/gone/Documents")}; }
-  } orphan;
-  const FileObjectURLs other(fake.platform(), orphan);
-  EXPECT_FALSE(other.itemIdentifier(URL::fileURL("/apps/gone/Documents")));
-  EXPECT_THAT(log.lines(), ElementsAre(LogLine{LogLevel::error,
-                                               "[ERROR] can't find bundle proxy at "
-                                               "file:///apps/gone/Documents"}));
 }
 
-TEST_F(FileObjectURLsTest, OnlyFilesInSightHaveAnIdentifier) {
-  EXPECT_FALSE(identity.itemIdentifier(URL::fromString("https://example.org/a")));
-  EXPECT_FALSE(identity.itemIdentifier(URL::fileURL("/var/tmp/a")));
-  EXPECT_THAT(
-      log.lines(),
-      ElementsAre(
-          LogLine{LogLevel::error, "can't compute file object identifier if not a file URL"},
-          LogLine{LogLevel::debug,
-                  "can't compute file object identifier because \"/private/var/tmp/a\" is not "
-                  "part of Mirabel"}));
-  // Containment is a plain string prefix.
+TEST_F(FileObjectURLsTest, ContainmentIsAPlainStringPrefix) {
   fake.volume.makeFolder("/home/me/Documents2/f");
   EXPECT_TRUE(identity.itemIdentifier(URL::fileURL("/home/me/Documents2/f")));
 }
@@ -118,82 +99,79 @@ TEST(FileObjectURLsCanonical, BothSpellingsOfVarAreOnePlace) {
   }
 }
 
-TEST_F(FileObjectURLsTest, EachFailingStepSaysWhatItWas) {
+TEST_F(FileObjectURLsTest, WhatHasNoIdentifierSaysWhy) {
   fake.volume.writeFile(fake.path("f"));
-  const std::string path = "\"" + fake.path("f") + "\"";
+  fake.volume.makeFolder(fake.path("folder"));
+  // Of these something is known already.
+  const URL folder = fake.url("folder");
+  folder.resources().set(ResourceKey::isDirectory, true);
+  folder.resources().set(ResourceKey::isPackage, false);
+  const URL undocumented = fake.url("f");
+  undocumented.resources().set(ResourceKey::documentIdentifier, ResourceValue{});
   const Error gone = Error::file(FileErrorCode::noSuchFile);
   const Error broken = Error::posix(EIO);
-  struct Case {
+  const std::string value = "can't get resource value for ";
+  const std::string path = "\"" + fake.path("f") + "\"";
+  const struct {
+    URL url;
     Op op;
     Error error;
     LogLine line;
+  } cases[] = {
+      {URL::fromString("https://example.org/a"), Op::device, broken,
+       error("can't compute file object identifier if not a file URL")},
+      {URL::fileURL("/var/tmp/a"), Op::device, broken,
+       debug("can't compute file object identifier because \"/private/var/tmp/a\" is not part of "
+             "Mirabel")},
+      {URL::fileURL("/apps/gone/Documents"), Op::device, broken,
+       error("[ERROR] can't find bundle proxy at file:///apps/gone/Documents")},
+      {fake.url("f"), Op::readValues, gone,
+       debug(value + "documentIdentifier; " + gone.description())},
+      {fake.url("f"), Op::readValues, broken,
+       error(value + "documentIdentifier; " + broken.description())},
+      {folder, Op::readValues, broken, error(value + "fileIdentifier; " + broken.description())},
+      {undocumented, Op::readValues, broken,
+       error("can't get resource isPackage for " + path + "; " + broken.description())},
+      {fake.url("f"), Op::openObject, Error::posix(EACCES),
+       error("can't open file at " + path + "; " + std::to_string(EACCES))},
+      {fake.url("f"), Op::attributes, broken,
+       error("can't get attribute list for " + path + "; " + std::to_string(EIO))},
+      {fake.url("f"), Op::permanentStorage, broken,
+       error("can't get permanent storage for " + path)},
   };
-  const Case cases[] = {
-      {Op::readValues,
-       gone,
-       {LogLevel::debug, "can't get resource value for documentIdentifier; " + gone.description()}},
-      {Op::readValues,
-       broken,
-       {LogLevel::error,
-        "can't get resource value for documentIdentifier; " + broken.description()}},
-      {Op::openObject,
-       Error::posix(EACCES),
-       {LogLevel::error, "can't open file at " + path + "; " + std::to_string(EACCES)}},
-      {Op::attributes,
-       broken,
-       {LogLevel::error, "can't get attribute list for " + path + "; " + std::to_string(EIO)}},
-      {Op::permanentStorage, broken, {LogLevel::error, "can't get permanent storage for " + path}},
-  };
-  for (const Case& c : cases) {
+  FakeApplications unregistered(fake.faults);
+  unregistered.installed.push_back({"gone", URL::fileURL("/apps/gone"), {}});
+  const FakeAppLibraries orphaned(unregistered);
+  const FileObjectURLs identifying(fake.platform(), orphaned);
+  for (const auto& c : cases) {
     fake.faults.reset();
     fake.faults.fail(c.op, c.error, 1, always);
     log.clear();
-    EXPECT_EQ(idOf("f"), "nothing");
+    EXPECT_FALSE(identifying.itemIdentifier(c.url));
     EXPECT_THAT(log.lines(), ElementsAre(c.line));
   }
 }
 
-TEST_F(FileObjectURLsTest, CachedKindDecidesWhichValueIsMissed) {
-  fake.volume.makeFolder(fake.path("f"));
-  const Error broken = Error::posix(EIO);
-  fake.faults.fail(Op::readValues, broken, 1, always);
-  const URL folder = fake.url("f");
-  folder.resources().set(ResourceKey::isDirectory, true);
-  folder.resources().set(ResourceKey::isPackage, false);
-  EXPECT_FALSE(identity.itemIdentifier(folder));
-  const URL file = fake.url("f");
-  file.resources().set(ResourceKey::documentIdentifier, ResourceValue{});
-  EXPECT_FALSE(identity.itemIdentifier(file));
-  EXPECT_THAT(
-      log.lines(),
-      ElementsAre(LogLine{LogLevel::error,
-                          "can't get resource value for fileIdentifier; " + broken.description()},
-                  LogLine{LogLevel::error, "can't get resource isPackage for \"" + fake.path("f") +
-                                               "\"; " + broken.description()}));
-}
-
 TEST_F(FileObjectURLsTest, IdentifiersThatNameNothingAreRefusedWithTheirReason) {
-  const auto components = [](std::string_view count) {
-    return LogLine{
-        LogLevel::error,
-        "invalid identifier; identifier should have 2 components, not " + std::string(count)};
+  const auto components = [](const std::string& count) {
+    return error("invalid identifier; identifier should have 2 components, not " + count);
   };
-  const auto unresolved = [](std::string_view number) {
-    return LogLine{LogLevel::debug, "can't resolve path matching file ID \"" + std::string(number) +
-                                        "\"; " + std::to_string(ENOENT)};
+  const auto unresolved = [](const std::string& number) {
+    return debug("can't resolve path matching file ID \"" + number + "\"; " +
+                 std::to_string(ENOENT));
   };
   const std::pair<std::string_view, LogLine> cases[] = {
       {"", components("1")},
       {"#org.example.draw", components("1")},
       {"did=5=6", components("3")},
-      {"xid=5", {LogLevel::error, "invalid host for identifier \"xid=5\""}},
-      {"FID=5", {LogLevel::error, "invalid host for identifier \"FID=5\""}},
+      {"xid=5", error("invalid host for identifier \"xid=5\"")},
+      {"FID=5", error("invalid host for identifier \"FID=5\"")},
       {"fid=abc", unresolved("0")},
       {"fid=", unresolved("0")},
       {"fid=-7x", unresolved("-7")},
       {"fid=18446744073709551615", unresolved("9223372036854775807")},
       {"fid=-99999999999999999999", unresolved("-9223372036854775808")},
-      {"did=7", {LogLevel::error, "can't resolve doc ID \"7\"; " + std::to_string(ENOENT)}},
+      {"did=7", error("can't resolve doc ID \"7\"; " + std::to_string(ENOENT))},
   };
   for (const auto& [identifier, line] : cases) {
     log.clear();
@@ -203,15 +181,14 @@ TEST_F(FileObjectURLsTest, IdentifiersThatNameNothingAreRefusedWithTheirReason) 
 }
 
 TEST_F(FileObjectURLsTest, VolumeWithoutADeviceResolvesNothing) {
+  const LogLine line =
+      error("can't get device ID for \"" + fake.path("") + "\"; " + std::to_string(EIO));
   for (const Op op : {Op::openObject, Op::device}) {
     fake.faults.fail(op, Error::posix(EIO), 1, 2);
-    log.clear();
     EXPECT_FALSE(identity.fileURLWithItemIdentifier("fid=100"));
     EXPECT_FALSE(identity.fileURLWithFileIdentifier(100));
-    const LogLine line{LogLevel::error,
-                       "can't get device ID for \"" + fake.path("") + "\"; " + std::to_string(EIO)};
-    EXPECT_THAT(log.lines(), ElementsAre(line, line));
   }
+  EXPECT_THAT(log.lines(), ElementsAre(line, line, line, line));
   EXPECT_EQ(identity.deviceID(fake.url("missing")), 0U);
   EXPECT_EQ(identity.deviceIDWithError(fake.url("missing")).error(), Error::posix(ENOENT));
 }
@@ -219,39 +196,31 @@ TEST_F(FileObjectURLsTest, VolumeWithoutADeviceResolvesNothing) {
 TEST_F(FileObjectURLsTest, DocumentIsAskedForUpToSixTimes) {
   fake.volume.writeFile(fake.path("f"));
   ASSERT_EQ(idOf("f"), "did=1");
-  const auto resting = [](int code) {
-    return LogLine{LogLevel::debug, "doc ID resolution failed with errno(" + std::to_string(code) +
-                                        "), let's try again after resting"};
-  };
-  struct Case {
+  const struct {
     std::vector<int> failures;
-    bool isFound;
-    std::vector<LogLine> last;
-  };
-  const Case cases[] = {
-      {{EBUSY, EBUSY}, true, {}},
-      {{EAGAIN, EBUSY, ESTALE, EAGAIN, EAGAIN}, true, {}},
+    std::optional<LogLine> last;
+  } cases[] = {
+      {{EBUSY, EBUSY}, {}},
+      {{EAGAIN, EBUSY, ESTALE, EAGAIN, EAGAIN}, {}},
       {{EAGAIN, EAGAIN, EAGAIN, EAGAIN, EAGAIN, EAGAIN},
-       false,
-       {{LogLevel::debug, "can't resolve doc ID \"1\" after five attempts"}}},
-      {{EAGAIN, EIO},
-       false,
-       {{LogLevel::error, "can't resolve doc ID \"1\"; " + std::to_string(EIO)}}},
+       debug("can't resolve doc ID \"1\" after five attempts")},
+      {{EAGAIN, EIO}, error("can't resolve doc ID \"1\"; " + std::to_string(EIO))},
   };
-  for (const Case& c : cases) {
+  for (const auto& c : cases) {
     fake.faults.reset();
     fake.clock.sleeps.clear();
     log.clear();
     std::vector<LogLine> expected;
-    for (std::size_t i = 0; i < c.failures.size(); ++i) {
-      fake.faults.fail(Op::fileIDOfDocument, Error::posix(c.failures[i]), i + 1);
-      expected.push_back(resting(c.failures[i]));
+    for (const int code : c.failures) {
+      expected.push_back(debug("doc ID resolution failed with errno(" + std::to_string(code) +
+                               "), let's try again after resting"));
+      fake.faults.fail(Op::fileIDOfDocument, Error::posix(code), expected.size());
     }
-    if (!c.isFound) expected.back() = c.last.front();
-    EXPECT_EQ(identity.fileURLWithItemIdentifier("did=1").has_value(), c.isFound);
+    if (c.last) expected.back() = *c.last;
+    EXPECT_EQ(identity.fileURLWithItemIdentifier("did=1").has_value(), !c.last);
     EXPECT_EQ(log.lines(), expected);
     EXPECT_EQ(fake.clock.sleeps,
-              std::vector(c.failures.size() - (c.isFound ? 0 : 1), std::chrono::milliseconds(1)));
+              std::vector(c.failures.size() - (c.last ? 1 : 0), std::chrono::milliseconds(1)));
   }
 }
 
