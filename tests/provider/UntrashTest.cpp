@@ -9,13 +9,12 @@
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"
 #include "provider/ProviderFixture.h"
+#include "support/Transcript.h"
 
 namespace mirabel::testing {
 namespace {
 
-using ::testing::AllOf;
 using ::testing::Contains;
-using ::testing::IsSupersetOf;
 
 /// A file of an app library that lies in the trash, with a note of where it was.
 class UntrashTest : public ProviderFixture {
@@ -25,6 +24,8 @@ class UntrashTest : public ProviderFixture {
     fake.volume.writeFile(library + "/Notes/a.txt", "12345");
     file = idAt(library + "/Notes/a.txt");
     vessel->trashItemWithIdentifier(file, done.handler());
+    fake.volume.makeFolder(library + "/.Trash/folder");
+    trashed = idAt(library + "/.Trash/folder");
     clear();
   }
   void untrash(const std::optional<std::string>& parent = {},
@@ -40,113 +41,91 @@ class UntrashTest : public ProviderFixture {
   const std::string library = "/apps/draw/Documents";
   const std::string putBack = "file:///apps/draw/Documents/Notes/a.txt";
   std::string file;
+  std::string trashed;  ///< a folder
 };
 
-TEST_F(UntrashTest, TheItemGoesBackToItsFolderAndLosesItsDateOnly) {
+TEST_F(UntrashTest, TheItemLosesItsDateOnly) {
   untrash();
-  EXPECT_EQ(pathAfterwards(), library + "/Notes/a.txt");
   EXPECT_EQ(done.item()->itemIdentifier(), file);
   EXPECT_FALSE(done.item()->isTrashed());
   const auto& attributes = fake.volume.at(library + "/Notes/a.txt").attributes;
   EXPECT_FALSE(attributes.contains(attributename::trashDate));
   EXPECT_TRUE(attributes.contains(attributename::putBack));
-  EXPECT_EQ(log.sectionLabels().front(), "untrash item \"" + file + "\"");
-  EXPECT_EQ(log.messages(),
-            (std::vector{debug("found file://" + library + "/.Trash/a.txt"),
-                         debug("putback url is " + putBack), debug("removing trash date xattr"),
-                         debug("setting trash date on " + putBack), debug("found " + file)}));
-}
-
-TEST_F(UntrashTest, AParentThatIsGivenComesBeforeThePlaceItCameFrom) {
-  untrash(id("folder"));
-  EXPECT_EQ(pathAfterwards(), fake.path("folder/a.txt"));
-}
-
-TEST_F(UntrashTest, AParentThatIsNoneIsPassedOver) {
-  fake.volume.makeFolder(library + "/.Trash/folder");
-  const std::string trashed = idAt(library + "/.Trash/folder");
-  const std::pair<std::string, std::vector<LogLine>> cases[] = {
-      {trashed,
-       {debug("can't use provided parent item " + trashed + " because it's trashed; " + library +
-              "/.Trash/folder"),
-        debug("putback url is " + putBack)}},
-      {"fid=4711", {debug("putback url is " + putBack)}},
-  };
-  for (const auto& [parent, lines] : cases) {
-    log.clear();
-    untrash(parent);
-    EXPECT_EQ(pathAfterwards(), library + "/Notes/a.txt");
-    EXPECT_THAT(log.messages(), IsSupersetOf(lines));
-    done.results.clear();
-    vessel->trashItemWithIdentifier(file, done.handler());
-  }
-}
-
-TEST_F(UntrashTest, AFolderThatHoldsNothingAnyMoreGivesWayToTheLibrary) {
-  const std::string folder = library + "/Notes";
-  const std::function<void()> changes[] = {
-      [&] { fake.volume.remove(folder); },
-      [&] { fake.volume.writeFile(folder, "a file now"); },
-      [&] {
-        fake.volume.remove(folder);
-        fake.volume.makeSymlink(folder, "..");
-      },
-  };
-  for (const auto& change : changes) {
-    clear();
-    change();
-    untrash();
-    EXPECT_EQ(pathAfterwards(), library + "/a.txt");
-    EXPECT_THAT(log.messages(),
-                AllOf(Contains(debug("putback url is not reachable; " + putBack)),
-                      Contains(debug("use #org.example.draw's root as recover location"))));
-    // Back into the trash as it was, with the note of its old place.
-    fake.volume.rename(library + "/a.txt", library + "/.Trash/a.txt");
-  }
-}
-
-TEST_F(UntrashTest, APlaceInTheTrashGivesWayToTheLibrary) {
-  fake.volume.makeFolder(library + "/.Trash/Notes");
-  fake.volume.at(library + "/.Trash/a.txt").attributes[std::string(attributename::putBack)] =
-      keyedarchive::archiveString(".Trash/Notes/b.txt").value();
-  untrash();
-  EXPECT_EQ(pathAfterwards(), library + "/b.txt");
-}
-
-TEST_F(UntrashTest, WithoutANoteTheItemGoesToTheLibraryUnderItsName) {
-  fake.volume.at(library + "/.Trash/a.txt").attributes.clear();
-  fake.volume.rename(library + "/.Trash/a.txt", library + "/.Trash/b.txt");
-  untrash();
-  EXPECT_EQ(pathAfterwards(), library + "/b.txt");
-  EXPECT_THAT(log.messages(),
-              IsSupersetOf({debug("no putback url"),
-                            debug("use #org.example.draw's root as recover location")}));
-}
-
-TEST_F(UntrashTest, TheNameIsTheOneItHadUnlessTheHostKnowsBetter) {
-  struct Case {
-    std::optional<std::string> parent;
-    std::optional<std::string> formerName;
-    std::string path;
-  };
-  const Case cases[] = {
-      {{}, {}, library + "/Notes/a.txt"},
-      {{}, "known.txt", library + "/Notes/known.txt"},
-      {id("folder"), {}, fake.path("folder/a.txt")},
-      {id("folder"), "known.txt", fake.path("folder/known.txt")},
-  };
-  for (const Case& c : cases) {
-    // Another was there before it in the trash.
-    fake.volume.rename(fake.volume
-                           .pathsOfFileID(fake.volume.fileIDOfDocument(
-                               static_cast<std::uint64_t>(std::stoi(file.substr(4)))))
-                           .front(),
-                       library + "/.Trash/a 2.txt");
-    untrash(c.parent, c.formerName);
-    EXPECT_EQ(pathAfterwards(), c.path);
-  }
+  expectTranscript(log, R"(
+┏untrash item "did=1"
+[DEBUG] putback url is file:///apps/draw/Documents/Notes/a.txt
+[DEBUG] removing trash date xattr
+[DEBUG] setting trash date on file:///apps/draw/Documents/Notes/a.txt
+)");
   untrash();
   EXPECT_EQ(done.error(), Error::invalidParameter("itemIdentifier", file));
+}
+
+TEST_F(UntrashTest, ItsPlaceAndNameAreThoseThatItHadUnlessTheHostKnowsBetterOrTheyAreNoMore) {
+  const std::string notes = library + "/Notes";
+  const std::string trash = library + "/.Trash";
+  const auto nothing = [] {};
+  const auto setNote = [&](std::string_view place) {
+    fake.volume.at(trash + "/a.txt").attributes[std::string(attributename::putBack)] =
+        keyedarchive::archiveString(place).value();
+  };
+  // Another of that name was there before it.
+  const auto renamed = [&] { fake.volume.rename(trash + "/a.txt", trash + "/a 2.txt"); };
+  const std::string unreachable = "putback url is not reachable; " + putBack;
+  const std::string recovered = "use #org.example.draw's root as recover location";
+  const struct {
+    std::function<void()> arrange;
+    std::string parent;
+    std::optional<std::string> formerName;
+    std::string path;
+    std::string line;
+  } cases[] = {
+      {nothing, "", {}, notes + "/a.txt", "putback url is " + putBack},
+      {nothing, id("folder"), {}, fake.path("folder/a.txt"), ""},
+      {nothing, "fid=4711", {}, notes + "/a.txt", "putback url is " + putBack},
+      {nothing,
+       trashed,
+       {},
+       notes + "/a.txt",
+       "can't use provided parent item " + trashed + " because it's trashed; " + trash + "/folder"},
+      {renamed, "", {}, notes + "/a.txt", ""},
+      {renamed, "", "known.txt", notes + "/known.txt", ""},
+      {renamed, id("folder"), {}, fake.path("folder/a.txt"), ""},
+      {renamed, id("folder"), "known.txt", fake.path("folder/known.txt"), ""},
+      {[&] { setNote(".Trash/folder/b.txt"); }, "", {}, library + "/b.txt", recovered},
+      {[&] { fake.volume.at(trash + "/a.txt").attributes.clear(); },
+       "",
+       {},
+       library + "/a.txt",
+       "no putback url"},
+      {[&] { fake.volume.remove(notes); }, "", {}, library + "/a.txt", unreachable},
+      {[&] { fake.volume.writeFile(notes, "a file now"); },
+       "",
+       {},
+       library + "/a.txt",
+       unreachable},
+      {[&] {
+         fake.volume.remove(notes);
+         fake.volume.makeSymlink(notes, "..");
+       },
+       "",
+       {},
+       library + "/a.txt",
+       recovered},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.path + " " + c.line);
+    c.arrange();
+    clear();
+    untrash(c.parent.empty() ? std::nullopt : std::optional(c.parent), c.formerName);
+    EXPECT_EQ(pathAfterwards(), c.path);
+    if (!c.line.empty()) {
+      EXPECT_THAT(log.messages(), Contains(debug(c.line)));
+    }
+    // Back into the trash as it was, with the note of its old place.
+    fake.volume.rename(c.path, trash + "/a.txt");
+    setNote("Notes/a.txt");
+  }
 }
 
 TEST_F(UntrashTest, ANameThatIsTakenIsNoObstacle) {
