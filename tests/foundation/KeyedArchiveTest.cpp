@@ -92,13 +92,5 @@ TEST(KeyedArchive, FitsAnExtendedAttribute) {
   EXPECT_EQ(readersOf(altered("value", PropertyList(std::string(70'000, 'p')))), "");
 }
 
-TEST(KeyedArchive, CutAnywhereIsRefused) {
-  const Data bytes = archiveStrings({"red", "\xFF", "é"}).value();
-  for (std::size_t length = 0; length < bytes.size(); ++length) {
-    EXPECT_EQ(readersOf({bytes.begin(), bytes.begin() + static_cast<std::ptrdiff_t>(length)}), "")
-        << length;
-  }
-}
-
 }  // namespace
 }  // namespace mirabel::keyedarchive
