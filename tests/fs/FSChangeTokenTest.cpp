@@ -75,13 +75,5 @@ TEST(FSChangeTokenTest, AnythingElseIsNoToken) {
   EXPECT_TRUE(log.lines().empty());
 }
 
-TEST(FSChangeTokenTest, BytesThatWereCutAreNoToken) {
-  const LogCapture log;
-  const Data bytes = FSChangeToken{0, volume, 7, 200, 3}.encode();
-  for (std::size_t length = 0; length < bytes.size(); ++length) {
-    EXPECT_FALSE(FSChangeToken::decode(std::span(bytes).first(length))) << length;
-  }
-}
-
 }  // namespace
 }  // namespace mirabel::testing

@@ -60,14 +60,6 @@ TEST_F(GatherPhaseResumeCheckTest, ChangesAndMovesLetTheListingGoOn) {
   EXPECT_FALSE(check(7).hasNameLeft);
 }
 
-TEST_F(GatherPhaseResumeCheckTest, DeletionNamesTheItemAndItsPath) {
-  events.append(fake.path("gone"), 4712);
-  const auto result = check();
-  EXPECT_EQ(result.status,
-            (FSEventReaderGatherPhaseResumeStatus{Verdict::deletionOccurred,
-                                                  "[fid=4712, path:'" + fake.path("gone") + "']"}));
-}
-
 TEST_F(GatherPhaseResumeCheckTest, GapInTheHistoryIsFoundOut) {
   using namespace eventflag;
   const Verdict gap = Verdict::cantReplayHistoricalFSEvents;
