@@ -7,8 +7,7 @@
 #include <string_view>
 #include <vector>
 
-#include "items/LocalItem.h"
-#include "platform/EnumerationObservers.h"
+#include "support/ChangeLog.h"
 #include "support/FakePlatform.h"
 #include "support/LogCapture.h"
 
@@ -34,41 +33,12 @@ inline std::vector<std::string> shown(const std::vector<BundleProxy>& records) {
   return texts;
 }
 
-/// Writes down what it is told, one text per call: names or identifiers.
-class ChangeLog final : public VesselChangeObserver {
- public:
-  void didUpdateItems(const VesselItems& items) override {
-    std::string call = "update";
-    for (const auto& item : items)
-      call += " " + item->filename();
-    calls.push_back(call);
-  }
-  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override {
-    std::string call = "delete";
-    for (const std::string& identifier : identifiers)
-      call += " " + identifier;
-    calls.push_back(call);
-  }
-  void finishEnumeratingChangesUpToSyncAnchor(const Data&, bool) override {
-    calls.emplace_back("finish");
-  }
-  void finishEnumeratingWithError(const Error&) override { calls.emplace_back("error"); }
-
-  std::vector<std::string> calls;
-};
-
 /// A platform with applications and caches, and what was logged.
 class AppLibraryFixture : public ::testing::Test {
  protected:
   /// An application that shows its documents.
   void install(std::string_view identifier, std::optional<std::string> name = {}) {
     fake.install(identifier, "/apps/" + std::string(identifier), std::move(name));
-    fake.applications.installed.back().supportsOpenInPlace = true;
-    fake.applications.installed.back().fileSharingEnabled = true;
-  }
-  void uninstall(std::string_view identifier) {
-    std::erase_if(fake.applications.installed,
-                  [&](const BundleProxy& proxy) { return proxy.bundleIdentifier == identifier; });
   }
   /// The messages so far, which are then forgotten.
   std::vector<std::string> messages() {

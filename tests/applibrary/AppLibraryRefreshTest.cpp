@@ -104,7 +104,7 @@ TEST_F(AppLibraryRefreshTest, EveryDifferenceOfTheContainersIsAChange) {
   EXPECT_TRUE(refresh());
   installed[0].dataContainerURL = URL::fileURL("/apps/moved");
   EXPECT_TRUE(refresh());
-  uninstall("a");
+  fake.uninstall("a");
   EXPECT_TRUE(refresh());
   installed.clear();
   EXPECT_TRUE(refresh());

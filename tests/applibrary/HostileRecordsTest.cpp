@@ -14,11 +14,8 @@ using ::testing::ElementsAreArray;
 class HostileRecordsTest : public AppLibraryFixture {
  protected:
   void put(std::optional<std::string> identifier, std::string_view container) {
-    fake.volume.makeFolder(std::string(container) + "/Documents");
-    BundleProxy record{std::move(identifier), URL::fileURL(container), "Name"};
-    record.supportsOpenInPlace = true;
-    record.fileSharingEnabled = true;
-    fake.applications.installed.push_back(record);
+    fake.install("", container, "Name");
+    fake.applications.installed.back().bundleIdentifier = std::move(identifier);
   }
   std::vector<std::string> shownLibraries() {
     shared.refreshFromRegistry();
@@ -82,8 +79,6 @@ TEST_F(HostileRecordsTest, FolderThatBelongsToAnotherIsNotTakenOver) {
 TEST_F(HostileRecordsTest, StorageBelowALibraryIsRefusedToo) {
   FakePlatform nested("/apps/host/Documents/me/Documents");
   nested.install("around", "/apps/host");
-  nested.applications.installed.back().supportsOpenInPlace = true;
-  nested.applications.installed.back().fileSharingEnabled = true;
   MRBAppLibraryManager manager(nested.platform());
   ASSERT_TRUE(manager.refreshFromRegistry());
   EXPECT_TRUE(manager.upgradeFromMainCache());

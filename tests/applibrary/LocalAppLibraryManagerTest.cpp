@@ -46,7 +46,7 @@ TEST_F(LocalAppLibraryManagerTest, FollowsTheRegistryAndTellsTheObserver) {
   EXPECT_EQ(manager.versionToken(), 1U);
   EXPECT_THAT(identifiers(), ElementsAre("#org.a", "#org.b"));
 
-  uninstall("org.a");
+  fake.uninstall("org.a");
   install("org.c", "C");
   changes.calls.clear();
   EXPECT_TRUE(follow(&changes));
@@ -58,17 +58,6 @@ TEST_F(LocalAppLibraryManagerTest, FollowsTheRegistryAndTellsTheObserver) {
   EXPECT_TRUE(follow(&changes));
   EXPECT_THAT(changes.calls, ElementsAre("delete #org.b #org.c"));
   EXPECT_THAT(*manager.rootURLsForAppLibraries(), IsEmpty());
-}
-
-TEST_F(LocalAppLibraryManagerTest, EqualTokenReloadsNothing) {
-  install("org.a");
-  ASSERT_TRUE(follow());
-  fake.faults.reset();
-  log.clear();
-  EXPECT_FALSE(shared.upgradeFromMainCache());
-  EXPECT_EQ(fake.faults.calls(), 0U);
-  EXPECT_THAT(log.sectionLabels(), ElementsAre("upgrading content from main cache"));
-  EXPECT_THAT(messages(), IsEmpty());
 }
 
 TEST_F(LocalAppLibraryManagerTest, DeletedDomainsLeaveTheIndexBeforeTheNewAnswersAreGiven) {
@@ -91,8 +80,6 @@ TEST_F(LocalAppLibraryManagerTest, DeletedDomainsLeaveTheIndexBeforeTheNewAnswer
 
 TEST_F(LocalAppLibraryManagerTest, AnswersForFoldersAndWhatLiesInThem) {
   fake.install("org.var", "/var/apps/v", "V");
-  fake.applications.installed.back().supportsOpenInPlace = true;
-  fake.applications.installed.back().fileSharingEnabled = true;
   install("org.a");
   ASSERT_TRUE(follow());
   EXPECT_THAT(*manager.rootURLsForAppLibraries(),
@@ -239,8 +226,6 @@ TEST_F(LocalAppLibraryManagerTest, ChangeOfOneAmongTenThousandCostsOne) {
   const auto add = [&](std::size_t i) {
     fake.install("org.a" + std::to_string(i),
                  "/apps/" + std::to_string(i / 100) + "/" + std::to_string(i % 100), "Name");
-    fake.applications.installed.back().supportsOpenInPlace = true;
-    fake.applications.installed.back().fileSharingEnabled = true;
   };
   for (std::size_t i = 0; i < count; ++i)
     add(i);

@@ -8,10 +8,9 @@
 #include <vector>
 
 #include "enumeration/LocalFileEnumerator.h"
-#include "support/FakeAppLibraries.h"
+#include "support/ChangeLog.h"
 #include "support/FakeEventStreams.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 
@@ -47,32 +46,6 @@ class PageObserver final : public VesselEnumerationObserver {
   ListedPage page;
 };
 
-/// Writes down what it is told, one short text per call.
-class ChangeLog final : public VesselChangeObserver {
- public:
-  void didUpdateItems(const VesselItems& items) override {
-    std::string call = "update";
-    for (const auto& item : items)
-      call += " " + item->filename();
-    calls.push_back(call);
-  }
-  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override {
-    std::string call = "delete";
-    for (const std::string& identifier : identifiers)
-      call += " " + identifier;
-    calls.push_back(call);
-  }
-  void finishEnumeratingChangesUpToSyncAnchor(const Data& anchor, bool moreComing) override {
-    calls.push_back("finish at " + std::to_string(FSChangeToken::decode(anchor)->streamEventID) +
-                    (moreComing ? ", more" : ""));
-  }
-  void finishEnumeratingWithError(const Error& error) override {
-    calls.push_back("error " + std::to_string(error.code));
-  }
-
-  std::vector<std::string> calls;
-};
-
 /// An enumeration that reports what the test makes it report.
 class FakeChangesEnumeration final : public ChangesEnumeration {
  public:
@@ -102,14 +75,11 @@ class FakeChangesEnumerations final : public ChangesEnumerations {
   std::vector<std::weak_ptr<FakeChangesEnumeration>> made;
 };
 
-class EnumerationTest : public ::testing::Test {
+class EnumerationTest : public ItemsFixture {
  protected:
   static inline const std::string workingSet{VesselWorkingSetContainerItemIdentifier};
   static inline const std::string allDirectories{VesselAllDirectoriesContainerItemIdentifier};
   static Data firstPage() { return dataFromString(VesselInitialPageSortedByName); }
-  static LogLine debug(const std::string& text) { return {LogLevel::debug, "[DEBUG] " + text}; }
-  static LogLine info(const std::string& text) { return {LogLevel::info, "[INFO] " + text}; }
-  static LogLine error(const std::string& text) { return {LogLevel::error, "[ERROR] " + text}; }
 
   void addFile(std::string_view name) {
     fake.volume.makeFolder(fake.url(name).deletingLastPathComponent().path());
@@ -152,15 +122,10 @@ class EnumerationTest : public ::testing::Test {
     fake.positions.kept.clear();
   }
 
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
   FakeEventStreams events;
   FakeChangesEnumerations changes;
   OpenWalks walks;
-  EnumerationServices services{
-      {fake.platform(), identity, libraries}, {events, fake.diagnostics, changes}, walks};
-  LogCapture log;
+  EnumerationServices services{context, {events, fake.diagnostics, changes}, walks};
 };
 
 }  // namespace mirabel::testing

@@ -67,7 +67,7 @@ TEST_F(EnumeratingChanges, BatchesArePassedOnAndTheFirstFinishReleasesTheEnumera
   // The enumeration alone keeps its enumerator while it runs.
   const std::weak_ptr<LocalFileEnumerator> kept = of;
   of.reset();
-  const std::weak_ptr<VesselChangeObserver> context = enumeration->observer;
+  const std::weak_ptr<VesselChangeObserver> observed = enumeration->observer;
   enumeration->observer->didUpdateItems(items("a"));
   enumeration->observer->didDeleteItemsWithIdentifiers({"fid=4", "did=5"});
   EXPECT_EQ(fake.faults.calls(Op::permanentStorageForItemAtURL), 0U);
@@ -76,10 +76,11 @@ TEST_F(EnumeratingChanges, BatchesArePassedOnAndTheFirstFinishReleasesTheEnumera
   EXPECT_EQ(kept.lock()->runningEnumerations(), 0U);
   enumeration->observer->finishEnumeratingChangesUpToSyncAnchor(token.encode(), false);
   enumeration->observer->finishEnumeratingWithError(Error::posix(EIO));
-  EXPECT_THAT(observer->calls, ElementsAre("update a", "delete fid=4 did=5", "finish at 0, more"));
+  EXPECT_THAT(observer->calls, ElementsAre("update a", "delete fid=4 did=5", "finish, more"));
+  EXPECT_EQ(observer->anchor, token.encode());
   enumeration.reset();
   EXPECT_TRUE(kept.expired());
-  EXPECT_TRUE(context.expired());
+  EXPECT_TRUE(observed.expired());
 }
 
 TEST_F(EnumeratingChanges, WorkingSetRefreshesFileIDsBeforeTheBatchIsPassedOn) {

@@ -3,10 +3,8 @@
 #include <gtest/gtest.h>
 
 #include "fs/FSChangesNotifier.h"
-#include "support/FakeAppLibraries.h"
 #include "support/FakeEventStreams.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 namespace {
@@ -21,7 +19,7 @@ using ::testing::StartsWith;
 const std::string root(VesselRootContainerItemIdentifier);
 const std::string workingSet(VesselWorkingSetContainerItemIdentifier);
 
-class FSChangesNotifierTest : public ::testing::Test {
+class FSChangesNotifierTest : public ItemsFixture {
  protected:
   FSChangesNotifierTest() {
     fileID = fake.volume.writeFile(fake.path("file")).fileID;
@@ -58,14 +56,9 @@ class FSChangesNotifierTest : public ::testing::Test {
     return signals();
   }
 
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  ItemContext context{fake.platform(), identity, libraries};
   FakeEventStreams events;
   std::shared_ptr<FSChangesNotifier> notifier;
   std::uint64_t fileID = 0;
-  LogCapture log;
 };
 
 TEST_F(FSChangesNotifierTest, EachBatchWithChangesIsOneSignal) {

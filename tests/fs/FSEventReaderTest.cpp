@@ -4,10 +4,8 @@
 #include <gtest/gtest.h>
 
 #include "fs/FSEventReader.h"
-#include "support/FakeAppLibraries.h"
 #include "support/FakeEventStreams.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 #include "support/ReaderLog.h"
 
 namespace mirabel::testing {
@@ -21,7 +19,7 @@ using ::testing::Not;
 constexpr auto pathBased = FSEventReaderMode::pathBased;
 constexpr auto docIDBased = FSEventReaderMode::docIDBased;
 
-class FSEventReaderTest : public ::testing::Test {
+class FSEventReaderTest : public ItemsFixture {
  protected:
   FSEventReaderTest() {
     fake.install("org.example.draw", "/apps/draw", "Draw");
@@ -61,16 +59,11 @@ class FSEventReaderTest : public ::testing::Test {
   static LogLine debug(const std::string& text) { return {LogLevel::debug, "[DEBUG] " + text}; }
   static LogLine error(const std::string& text) { return {LogLevel::error, "[ERROR] " + text}; }
 
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  ItemContext context{fake.platform(), identity, libraries};
   FakeEventStreams events;
   std::shared_ptr<ReaderLog> delegate;
   std::shared_ptr<FSEventReader> reader;
   std::uint64_t folderID = 0, fileID = 0;
   std::string folder;
-  LogCapture log;
 };
 
 TEST_F(FSEventReaderTest, DiskDecidesWhatAnEventMeans) {

@@ -6,14 +6,12 @@
 #include <vector>
 
 #include "fs/LinkNames.h"
-#include "support/FakeAppLibraries.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 namespace {
 
-class LinkNamesTest : public ::testing::Test {
+class LinkNamesTest : public ItemsFixture {
  protected:
   using Depth = LinkNames::Depth;
 
@@ -48,12 +46,6 @@ class LinkNamesTest : public ::testing::Test {
       fake.volume.remove(absolute(each));
     return name ? name->path() : "";
   }
-
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  ItemContext context{fake.platform(), identity, libraries};
-  LogCapture log;
 };
 
 TEST_F(LinkNamesTest, TheSmallestPathThatIsListedIsShown) {

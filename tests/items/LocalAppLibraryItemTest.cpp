@@ -5,25 +5,18 @@
 
 #include "foundation/KeyedArchive.h"
 #include "items/LocalAppLibraryItem.h"
-#include "support/FakeAppLibraries.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 namespace {
 
 using ::testing::ElementsAre;
 
-class LocalAppLibraryItemTest : public ::testing::Test {
+class LocalAppLibraryItemTest : public ItemsFixture {
  protected:
   static constexpr std::string_view documents = "/apps/draw/Documents";
 
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  ItemContext context{fake.platform(), identity, libraries};
   BundleProxy proxy = fake.install("org.example.draw", "/apps/draw", "Draw");
-  LogCapture log;
 };
 
 TEST_F(LocalAppLibraryItemTest, IdentityAndNameComeFromTheRegistry) {

@@ -7,9 +7,7 @@
 #include "foundation/KeyedArchive.h"
 #include "items/LocalItem.h"
 #include "mirabel/TagData.h"
-#include "support/FakeAppLibraries.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 namespace {
@@ -23,7 +21,7 @@ constexpr std::string_view rankAttribute = "com.norvane.favorite-rank.number#PS"
 constexpr std::string_view putBackAttribute = "com.norvane.trash.putback#PS";
 constexpr std::size_t always = 1000;
 
-class LocalItemTest : public ::testing::Test {
+class LocalItemTest : public ItemsFixture {
  protected:
   std::shared_ptr<LocalItem> item(std::string_view name, ItemOverrides overrides = {}) {
     return LocalItem::create(context, fake.url(name), std::move(overrides));
@@ -35,12 +33,6 @@ class LocalItemTest : public ::testing::Test {
   static void set(FakeNode& node, std::string_view attribute, Data value) {
     node.attributes[std::string(attribute)] = std::move(value);
   }
-
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  ItemContext context{fake.platform(), identity, libraries};
-  LogCapture log;
 };
 
 TEST_F(LocalItemTest, FileTellsEverythingOfItself) {

@@ -24,8 +24,6 @@ class HostedFixture : public ::testing::Test {
   /// An application that shows its documents.
   void install(const std::string& identifier, std::optional<std::string> name = {}) {
     fake.install(identifier, "/apps/" + identifier, std::move(name));
-    fake.applications.installed.back().supportsOpenInPlace = true;
-    fake.applications.installed.back().fileSharingEnabled = true;
   }
   /// Makes the provider, and returns when it has seen what is installed.
   void start() {

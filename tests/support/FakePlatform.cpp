@@ -382,8 +382,16 @@ BundleProxy FakePlatform::install(std::string_view bundleIdentifier, std::string
   volume.makeFolder(std::string(container) + "/Documents");
   BundleProxy proxy{std::string(bundleIdentifier), URL::fileURL(container),
                     std::move(localizedName)};
+  proxy.supportsOpenInPlace = true;
+  proxy.fileSharingEnabled = true;
   applications.installed.push_back(proxy);
   return proxy;
+}
+
+void FakePlatform::uninstall(std::string_view bundleIdentifier) {
+  std::erase_if(applications.installed, [&](const BundleProxy& proxy) {
+    return proxy.bundleIdentifier == bundleIdentifier;
+  });
 }
 
 }  // namespace mirabel::testing

@@ -79,9 +79,10 @@ class FakePlatform {
   /// A URL below the document storage, made step by step; the storage itself for "".
   [[nodiscard]] URL url(std::string_view relative = {}) const;
   [[nodiscard]] std::string path(std::string_view relative) const;
-  /// Adds an application with a data container and, in it, an empty Documents folder.
+  /// Adds an application that shows its documents, with an empty folder for them in its container.
   BundleProxy install(std::string_view bundleIdentifier, std::string_view container,
                       std::optional<std::string> localizedName = {});
+  void uninstall(std::string_view bundleIdentifier);
 
   FakeVolume volume;
   FaultScript faults;
