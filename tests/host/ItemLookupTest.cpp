@@ -29,5 +29,21 @@ TEST(ItemLookupTest, WhatCannotBeLookedAtIsNotSaidToBeMissing) {
   EXPECT_TRUE(!unknown && unknown.error().is(VesselErrorCode::noSuchItem));
 }
 
+TEST(AnchorTest, ThatCannotBeTakenSaysWhy) {
+  TempHome home;
+  home.makeFolder("folder");
+  LinuxPlatform::Options options;
+  options.home = home.path();
+  const auto documents = LocalDocuments::open(std::move(options)).value();
+  const auto folder =
+      documents->container(documents->itemAtPath(home.at("folder"))->itemIdentifier);
+  for (int n = 1;; ++n) {
+    const FailingNthLook failing(n, EIO, 1000);
+    const auto anchor = (*folder)->currentSyncAnchor();
+    EXPECT_TRUE(anchor || anchor.error().isPosix(EIO)) << n << anchor.error().description();
+    if (!failing.wasMet()) break;
+  }
+}
+
 }  // namespace
 }  // namespace mirabel::testing

@@ -32,13 +32,14 @@ Learner::Learner(IdentityStore& store, IdentifierAllocator& allocator, ChangeRec
 
 // Folders ---------------------------------------------------------------------------------------
 
-Result<std::uint64_t> Learner::rootID(const std::string& path) {
+Result<std::uint64_t> Learner::rootID(const std::string& path, bool isReported) {
   const auto folder = roots_.open(path, O_PATH | O_DIRECTORY);
   if (!folder) return fail(folder.error());
   auto status = statusAt(folder->get(), "");
   if (!status) return fail(status.error());
-  auto row = placer_.place(
-      {{folder->get(), "", *status}, path, {0, path}, objectKind(status->kind, false)});
+  Arrival arrival{{folder->get(), "", *status}, path, {0, path}, objectKind(status->kind, false)};
+  arrival.isReported = isReported;
+  auto row = placer_.place(std::move(arrival));
   if (!row) return fail(row.error());
   return row->fileID;
 }
@@ -251,11 +252,12 @@ Result<std::vector<ObjectRow>> Learner::occupants(std::uint64_t folder,
 }
 
 Result<Sighting> Learner::learnPath(const std::string& path, const ObjectStatus& status,
-                                    bool isPackage) {
+                                    bool isPackage, bool isReported) {
   const auto place = roots_.locate(path);
   if (!place || place->relative.empty()) return learnWhole(path, isPackage);
   const SplitPath split = splitPath(path);
   Sighting sighting{split.name, status, isPackage};
+  sighting.isReported = isReported;
   // A name that changed hands while it was looked at is looked at again.
   constexpr int mostLooks = 8;
   for (int look = 0; look < mostLooks; ++look) {

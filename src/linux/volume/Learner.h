@@ -38,8 +38,9 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] Result<std::uint64_t> folderID(const std::string& path, int folder,
                                                const ObjectStatus& status);
 
-  /// File ID of the root at `path`; takes in what has become of its own dates and count.
-  [[nodiscard]] Result<std::uint64_t> rootID(const std::string& path);
+  /// File ID of the root at `path`; takes in what has become of its own dates and count. For
+  /// `isReported` here and below see `Sighting`.
+  [[nodiscard]] Result<std::uint64_t> rootID(const std::string& path, bool isReported = false);
 
   /// Fills in the identities of names seen in that folder. A name that went away meanwhile is
   /// left with the file ID 0; of one that another object has taken, status and kind are renewed.
@@ -51,7 +52,7 @@ class Learner final : private FolderIdentities {
   [[nodiscard]] Result<std::uint64_t> learn(const std::string& folderPath, int folder,
                                             std::uint64_t knownID, std::span<Sighting> sightings);
   [[nodiscard]] Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
-                                           bool isPackage);
+                                           bool isPackage, bool isReported = false);
 
   /// See `Placer`.
   [[nodiscard]] std::set<std::uint64_t> takeArrivedFolders() {

@@ -178,7 +178,7 @@ Result<bool> PlaceLooks::lookAtObject(const ObjectRow& row) {
   if (!look && !saysOutOfReach(look.error())) return fail(look.error());
   if (!look || look->seen.status.inode != row.inode) return false;
   const bool isPackage = context_.isPackageName(row.location->name);
-  auto learned = context_.learner.learnPath(**path, look->seen.status, isPackage);
+  auto learned = context_.learner.learnPath(**path, look->seen.status, isPackage, true);
   if (!learned && !isDisturbance(learned.error())) return fail(learned.error());
   return learned.has_value();
 }
@@ -186,7 +186,7 @@ Result<bool> PlaceLooks::lookAtObject(const ObjectRow& row) {
 /// The document storage is no item; the other roots are.
 Result<bool> PlaceLooks::lookAtRoot(const std::string& path) {
   if (path == context_.roots.firstPath()) return true;
-  auto id = context_.learner.rootID(path);
+  auto id = context_.learner.rootID(path, true);
   // What has become of a root that is not there is found when roots are looked at.
   if (!id && !saysOutOfReach(id.error())) return fail(id.error());
   return true;

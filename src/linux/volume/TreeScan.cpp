@@ -17,6 +17,12 @@ bool isClosedToUs(const Error& error) {
   return lookFailure(error) == LookFailure::closed;
 }
 
+// Whether what was looked at right after a change may have had another one since.
+bool mayChangeUnseen(int object) {
+  const auto status = statusAt(object, "");
+  return timesAreCoarse(object) || !status || isCoarseStamp(status->changeTime);
+}
+
 // What was to be read has gone, or another folder has come to its path, since it was seen.
 bool wasReplaced(const Error& error) {
   return error.isPosix(ESTALE) || saysAbsent(error);
@@ -42,7 +48,8 @@ Result<void> TreeScan::addRoot(const std::string& path) {
   if (!folder) return fail(folder.error());
   // Nobody above it is read who would see what has become of itself.
   const bool isItem = path != context_.roots.firstPath();
-  auto id = isItem ? context_.learner.rootID(path) : context_.learner.folderID(path, folder->get());
+  auto id = isItem ? context_.learner.rootID(path, mayChangeUnseen(folder->get()))
+                   : context_.learner.folderID(path, folder->get());
   if (!id && wasReplaced(id.error())) return missing_.add(0, path);
   if (!id) return fail(id.error());
   add(path, *id, Depth::everything);
