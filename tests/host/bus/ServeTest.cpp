@@ -2,12 +2,16 @@
 #include <csignal>
 #include <cstdlib>
 #include <poll.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <sys/wait.h>
 
+#include "host/LocalDocuments.h"
 #include "host/bus/BusClient.h"
+#include "host/bus/BusService.h"
 #include "host/bus/ServiceFixture.h"
+#include "mirabel/Session.h"
 #include "mirabel/UniqueFd.h"
 
 namespace mirabel::testing {
@@ -71,6 +75,42 @@ TEST_F(Serve, TellsItsManagerWhenItAnswersAndWhenItEnds) {
     EXPECT_EQ(client.provider("GetItem", std::string("did=1")).error,
               "org.freedesktop.DBus.Error.ServiceUnknown");
   }
+}
+
+// A file that may not grow is to SQLite what a failing disk is.
+TEST_F(Serve, FailsWhereTheStateBreaksSoThatItIsStartedAgain) {
+  std::signal(SIGXFSZ, SIG_IGN);  // the program inherits it
+  serve();
+  std::signal(SIGXFSZ, SIG_DFL);
+  home.writeFile("early");
+  EXPECT_NE(BusClient().idOf(home.at("early")), "");  // has identifiers reserved
+  const rlimit none{};
+  ASSERT_EQ(::prlimit(service->id(), RLIMIT_FSIZE, &none, nullptr), 0);
+  home.writeFile("late");
+  ASSERT_THAT(service->errors().rest(), HasSubstr("the next start checks what is there"));
+  const int status = service->end();
+  EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+}
+
+// At login, a program may be started while the service has the volume and no name yet.
+TEST_F(Serve, IsFoundByWhoeverWaitsForTheVolume) {
+  LinuxPlatform::Options held;
+  held.home = home.path();
+  auto documents = LocalDocuments::open(std::move(held)).value();
+  std::unique_ptr<bus::BusService> begun;
+  int told = 0;
+  SessionOptions options;
+  options.home = home.path();
+  options.notice = [&](std::string_view) {
+    if (++told == 1) begun = bus::BusService::start(*documents, [] {}).value();
+  };
+  auto opened = openDocuments(std::move(options));
+  ASSERT_TRUE(opened) << opened.error().description();
+  EXPECT_TRUE((*opened)->itemAtPath(home.documents()));
+  EXPECT_EQ(told, 1);
+  opened->reset();
+  begun->stop();
+  documents.reset();
 }
 
 TEST_F(Serve, IsRefusedWhereItWouldNotBeReached) {
