@@ -121,8 +121,9 @@ struct ApplicationContainer {
 /// given up for time.
 ///
 /// Handlers and watches are called on threads of the library, where the answers of the service
-/// arrive too. They must not call anything here but the end of a watch: what they would wait for
-/// may never come.
+/// arrive too. They must not call anything here but the end of a watch. Through the service, what
+/// has an answer to wait for then fails at once with POSIX EDEADLK; inside the process it may wait
+/// for ever.
 class MIRABEL_EXPORT Documents {
  public:
   using ItemResult = Result<ItemRecord>;
@@ -196,7 +197,7 @@ class MIRABEL_EXPORT Documents {
   virtual void setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,
                                ItemHandler handler) = 0;
   /// In the encoding of mirabel/TagData.h; anything else counts as no tags. The labels are kept,
-  /// colours are not. Where the labels have more than 64 KiB, the tags are taken away.
+  /// colours are not. Error: POSIX E2BIG where the labels have more than 64 KiB.
   virtual void setTagData(const std::string& identifier, const std::optional<Data>& tagData,
                           ItemHandler handler) = 0;
   virtual void setFavoriteRank(const std::string& identifier, const std::optional<Number>& rank,

@@ -48,7 +48,7 @@ enum class LocalVesselError : std::int64_t {
   unableToGetDeviceUUID = 3,  ///< the volume can't be told from others
 };
 
-/// Keys of `Error::userInfo`. An error that comes from the service has none of these.
+/// Keys of `Error::userInfo`.
 namespace errorkey {
 inline constexpr std::string_view collidingURL = "collidingURL";    ///< path of what has the name
 inline constexpr std::string_view collidingItem = "collidingItem";  ///< its identifier

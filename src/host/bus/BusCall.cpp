@@ -1,6 +1,7 @@
 #include "host/bus/BusCall.h"
 
 #include <cerrno>
+#include <exception>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -13,15 +14,15 @@ BusCall::~BusCall() {
 }
 
 void BusCall::reply(const std::function<void(sdbus::Message&)>& write) {
-  isAnswered_ = true;
   try {
     auto answer = message_.createReply();
     if (write) write(answer);
     answer.send();
-  } catch (const sdbus::Error& error) {
-    // The caller may have left, or the answer be larger than a message can be.
-    logError("can't answer \"" + message_.getMemberName() + "\"; " + error.getMessage());
-    fail(sdbus::Error("org.freedesktop.DBus.Error.LimitsExceeded", error.getMessage()));
+    isAnswered_ = true;
+  } catch (const std::exception& error) {
+    // The caller may have left, the answer be larger than a message can be, or memory be short.
+    logError("can't answer \"" + message_.getMemberName() + "\"; " + error.what());
+    fail(sdbus::Error("org.freedesktop.DBus.Error.LimitsExceeded", error.what()));
   }
 }
 
@@ -40,15 +41,22 @@ void BusCall::reply(const Result<std::vector<ItemRecord>>& items) {
 }
 
 void BusCall::fail(const Error& error) {
-  fail(errorForBus(error));
+  const BusError told = errorForBus(error);
+  sendError(told, caller_->wantsErrorsDescribed() ? &told.info() : nullptr);
 }
 
 void BusCall::fail(const sdbus::Error& error) {
+  sendError(error, nullptr);
+}
+
+void BusCall::sendError(const sdbus::Error& error, const BusError::Info* info) {
   isAnswered_ = true;
   try {
-    message_.createErrorReply(error).send();
-  } catch (const sdbus::Error& failure) {
-    logDebug("can't answer \"" + message_.getMemberName() + "\"; " + failure.getMessage());
+    auto answer = message_.createErrorReply(error);
+    if (info != nullptr) answer << *info;
+    answer.send();
+  } catch (const std::exception& failure) {
+    logDebug("can't answer \"" + message_.getMemberName() + "\"; " + failure.what());
   }
 }
 

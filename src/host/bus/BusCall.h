@@ -6,6 +6,7 @@
 #include <stop_token>
 #include <string_view>
 
+#include "host/bus/BusErrors.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/Callers.h"
 #include "mirabel/Error.h"
@@ -36,9 +37,9 @@ class BusCall {
   void readAgain() { message_.rewind(true); }
 
   [[nodiscard]] Caller& caller() const { return *caller_; }
-  [[nodiscard]] const std::shared_ptr<Caller>& sharedCaller() const { return caller_; }
 
-  /// `write` puts the results into the reply.
+  /// `write` puts the results into the reply; where that throws, the call is answered with an
+  /// error.
   void reply(const std::function<void(sdbus::Message& reply)>& write = {});
   void reply(const ItemRecord& item);
   void reply(const Result<ItemRecord>& item);
@@ -52,6 +53,8 @@ class BusCall {
   [[nodiscard]] Documents* allDocuments();
 
  private:
+  void sendError(const sdbus::Error& error, const BusError::Info* info);
+
   sdbus::MethodCall message_;
   std::shared_ptr<Caller> caller_;
   bool isAnswered_ = false;

@@ -120,6 +120,11 @@ bool BusConnection::findOwnerOtherThan(const std::string& former) {
   }
 }
 
+Error BusConnection::deadlock() {
+  return Error::posix(EDEADLK,
+                      "asked where the service's answers arrive; ask on a thread of your own");
+}
+
 sdbus::MethodReply BusConnection::send(const char* interface, const char* method,
                                        const Write& write, Patience patience) {
   const std::string former = ownerName();
@@ -142,7 +147,7 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
   struct Answer {
     std::promise<void> isThere;
     sdbus::MethodReply reply;
-    std::optional<sdbus::Error> error;
+    std::optional<BusError> error;
   };
   const auto answer = std::make_shared<Answer>();
   auto isThere = answer->isThere.get_future();
@@ -150,7 +155,7 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
       message,
       [answer](sdbus::MethodReply& reply, const sdbus::Error* error) {
         if (error != nullptr) {
-          answer->error = *error;
+          answer->error = BusError::read(reply, *error);
         } else {
           answer->reply = reply;
         }
@@ -179,8 +184,8 @@ void BusConnection::callAsync(const char* interface, const char* method, const W
     service.callMethod(
         message,
         [pending = pending_, number](sdbus::MethodReply& reply, const sdbus::Error* error) {
-          if (error != nullptr) return pending->answer(number, nullptr, errorFromBus(*error));
-          pending->answer(number, &reply, {});
+          if (error == nullptr) return pending->answer(number, &reply, {});
+          pending->answer(number, nullptr, errorFromBus(BusError::read(reply, *error)));
         },
         withoutTimeout);
   } catch (const sdbus::Error& error) {
@@ -190,10 +195,13 @@ void BusConnection::callAsync(const char* interface, const char* method, const W
 
 void BusConnection::callInTurn(const char* interface, const char* method, const Write& write,
                                Handler handle) {
-  underway_.acquire();
+  // There, the answer that is handled has just given its turn back.
+  const bool mayWait = !loop_->isOnItsThread();
+  if (mayWait) underway_.acquire();
+  const bool hasTurn = mayWait || underway_.try_acquire();
   callAsync(interface, method, write,
-            [this, handle = std::move(handle)](sdbus::Message* reply, const Error& error) {
-              underway_.release();
+            [this, hasTurn, handle = std::move(handle)](sdbus::Message* reply, const Error& error) {
+              if (hasTurn) underway_.release();
               handle(reply, error);
             });
 }

@@ -36,11 +36,13 @@ class BusConnection {
   static constexpr Patience unlimited = std::nullopt;
 
   /// Calls a method and waits for the answer, however long that takes unless its patience is
-  /// limited. `read` makes the result of it. Errors: see `errorFromBus`.
+  /// limited. `read` makes the result of it. Errors: see `errorFromBus`; POSIX EDEADLK at once on
+  /// the connection's own thread, where the answer would arrive.
   template <class Read>
   [[nodiscard]] auto call(const char* interface, const char* method, const Write& write,
                           Read&& read, Patience patience = unlimited)
       -> Result<std::remove_cvref_t<decltype(read(std::declval<sdbus::Message&>()))>> {
+    if (loop_->isOnItsThread()) return fail(deadlock());
     try {
       auto reply = send(interface, method, write, patience);
       return read(reply);
@@ -53,7 +55,8 @@ class BusConnection {
   void callAsync(const char* interface, const char* method, const Write& write, Handler handle);
 
   /// The same, but waits while many that were called like this have no answer yet: a bus lets a
-  /// client have so many, and no more. Not on the connection's thread.
+  /// client have so many, and no more. On the connection's thread it does not wait, and makes one
+  /// more.
   void callInTurn(const char* interface, const char* method, const Write& write, Handler handle);
 
   /// `signalled` is called for each signal that a container has changed, and `moved` when the
@@ -66,9 +69,9 @@ class BusConnection {
   /// What waits for answers; those that come no more, for the bus has gone, are refused.
   class Pending;
 
+  [[nodiscard]] static Error deadlock();
   [[nodiscard]] sdbus::MethodReply send(const char* interface, const char* method,
                                         const Write& write, Patience patience);
-
   [[nodiscard]] sdbus::MethodReply sendToOwner(const char* interface, const char* method,
                                                const Write& write, Patience patience);
   /// Who has the service's name; empty: nobody.

@@ -102,15 +102,34 @@ bool isOneOf(std::string_view name, std::initializer_list<std::string_view> name
 
 }  // namespace
 
-sdbus::Error errorForBus(const Error& error) {
+BusError BusError::read(sdbus::Message& reply, const sdbus::Error& error) {
+  Info info;
+  try {
+    std::string message;
+    reply >> message >> info;
+  } catch (const sdbus::Error&) {
+    info.clear();  // a service of before
+  }
+  return {error, std::move(info)};
+}
+
+BusError errorForBus(const Error& error) {
+  BusError::Info info;
+  for (const auto& [key, value] : error.userInfo)
+    if (key != toldExplanation) info[key] = dataFromString(value);
   // Paths in it may hold any bytes, and an answer that can't be sent leaves the caller waiting.
-  return {std::string(prefix) + nameOf(error), escaped(explanation(error))};
+  return {sdbus::Error(std::string(prefix) + nameOf(error), escaped(explanation(error))),
+          std::move(info)};
 }
 
 Error errorFromBus(const sdbus::Error& error) {
   const std::string_view name = error.getName();
   if (name.starts_with(prefix)) {
     Error ours = fromOwnName(name.substr(prefix.size()));
+    if (const auto* told = dynamic_cast<const BusError*>(&error)) {
+      for (const auto& [key, value] : told->info())
+        ours.userInfo[key] = stringView(value);
+    }
     ours.userInfo[std::string(toldExplanation)] = error.getMessage();
     return ours;
   }

@@ -1,19 +1,40 @@
 #pragma once
 
+#include <cstdint>
 #include <exception>
-#include <sdbus-c++/Error.h>
+#include <map>
+#include <sdbus-c++/sdbus-c++.h>
+#include <string>
 #include <utility>
+#include <vector>
 
 #include "mirabel/Error.h"
 
 namespace mirabel::bus {
 
+/// An error with what `Error::userInfo` says besides. Callers that have asked for it, see
+/// `Caller::describeErrors`, get that as a second argument, "a{say}", behind the message: not all
+/// libraries find the message of an error that has two.
+class BusError : public sdbus::Error {
+ public:
+  using Info = std::map<std::string, std::vector<std::uint8_t>>;
+
+  BusError(const sdbus::Error& error, Info info) : sdbus::Error(error), info_(std::move(info)) {}
+  [[nodiscard]] const Info& info() const { return info_; }
+  /// The error that came with that reply; without information where it holds none.
+  [[nodiscard]] static BusError read(sdbus::Message& reply, const sdbus::Error& error);
+
+ private:
+  Info info_;
+};
+
 /// The error as a caller on the bus gets it. Its name, below "com.norvane.Vessel1.Error.", says
 /// domain and code: "NoSuchItem", "SyncAnchorExpired", "FileExists", "POSIX.ENOSPC"; its message is
 /// what a person is told.
-[[nodiscard]] sdbus::Error errorForBus(const Error& error);
+[[nodiscard]] BusError errorForBus(const Error& error);
 
-/// The way back: domain and code, and the message as the explanation. POSIX ENOTCONN where the
+/// The way back: domain and code, the information of a `BusError`, and the message as the
+/// explanation. POSIX ENOTCONN where the
 /// service has left the bus or does not answer, EACCES where the bus or the service refuses.
 [[nodiscard]] Error errorFromBus(const sdbus::Error& error);
 

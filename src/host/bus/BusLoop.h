@@ -19,6 +19,11 @@ class BusLoop {
   BusLoop(const BusLoop&) = delete;
   BusLoop& operator=(const BusLoop&) = delete;
 
+  /// Whether the caller is on that thread, where nothing that has yet to come can be waited for.
+  [[nodiscard]] bool isOnItsThread() const {
+    return std::this_thread::get_id() == thread_.get_id();
+  }
+
  private:
   sdbus::IConnection& connection_;
   std::thread thread_;

@@ -29,6 +29,10 @@ class Caller {
   /// Whether it runs in a sandbox; to be asked when `documents` was.
   [[nodiscard]] bool isSandboxed() const { return restricted_ != nullptr; }
 
+  /// Errors are answered with their information from now on, see `BusError`. Any thread.
+  void describeErrors() { describesErrors_ = true; }
+  [[nodiscard]] bool wantsErrorsDescribed() const { return describesErrors_; }
+
   // For calls of the lane in which those of a caller run one after the other.
 
   /// What the caller lists and follows; the least used of them is let go of when they are many, and
@@ -55,6 +59,7 @@ class Caller {
   std::mutex identifying_;
   std::atomic<Documents*> documents_ = nullptr;
   std::unique_ptr<Documents> restricted_;
+  std::atomic<bool> describesErrors_ = false;
 
   std::list<Opened> opened_;  ///< the last used first
 

@@ -27,6 +27,20 @@ void getHome(const CallPointer& call) {
   });
 }
 
+void describeErrors(const CallPointer& call) {
+  if (call->allDocuments() == nullptr) return;
+  call->caller().describeErrors();
+  call->reply();
+}
+
+/// In its turn among all calls, so that errors of those which follow it are described.
+bool describeErrorsAtOnce(BusCall& call) {
+  if (!call.caller().isKnownToSeeAll()) return false;
+  call.caller().describeErrors();
+  call.reply();
+  return true;
+}
+
 void getProgress(const CallPointer& call) {
   Documents* documents = call->allDocuments();
   if (documents == nullptr) return;
@@ -77,6 +91,7 @@ std::vector<BusMethod> managerMethods() {
   return {
       {of, "GetStatus", "", {}, "a{sv}", {"status"}, Lane::enumerations, getStatus},
       {of, "GetHome", "", {}, "ayay", {"home", "stateFolder"}, Lane::lookups, getHome},
+      {of, "DescribeErrors", "", {}, "", {}, Lane::lookups, describeErrors, describeErrorsAtOnce},
       {of,
        "GetProgress",
        "",

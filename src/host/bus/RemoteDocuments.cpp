@@ -108,6 +108,12 @@ Documents::ItemResult itemIn(sdbus::Message& reply) {
   }
 }
 
+/// A service that does not know this leaves errors without information.
+void describeErrors(BusConnection& connection) {
+  connection.callAsync(managerInterface, "DescribeErrors", {},
+                       [](sdbus::Message*, const Error&) {});
+}
+
 /// Begins an operation that hands back the item.
 void begin(BusConnection& connection, const char* method, const Write& write,
            Documents::ItemHandler handler) {
@@ -140,6 +146,7 @@ std::unique_ptr<RemoteDocuments> RemoteDocuments::connect(const HomePlaces& plac
   };
   const auto served = connection->call(managerInterface, "GetHome", {}, readPlaces, patience);
   if (!served || *served != places) return nullptr;
+  describeErrors(*connection);
   return std::unique_ptr<RemoteDocuments>(new RemoteDocuments(std::move(connection), places));
 }
 
@@ -153,7 +160,10 @@ RemoteDocuments::RemoteDocuments(std::shared_ptr<BusConnection> connection, Home
       places_(std::move(places)) {
   connection_->listen(
       [watches = watches_](const std::string& container) { watches->signalled(container); },
-      [watches = watches_](bool isThere) { watches->serviceMoved(isThere); });
+      [connection = connection_.get(), watches = watches_](bool isThere) {
+        if (isThere) describeErrors(*connection);
+        watches->serviceMoved(isThere);
+      });
 }
 
 RemoteDocuments::~RemoteDocuments() = default;

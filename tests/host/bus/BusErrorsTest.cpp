@@ -33,7 +33,7 @@ std::vector<Error> allErrors() {
 TEST(BusErrors, ComeBackWithDomainCodeAndWords) {
   for (Error error : allErrors()) {
     error.userInfo[std::string(errorkey::detail)] += "\"a name\": \u00fc";
-    const sdbus::Error told = bus::errorForBus(error);
+    const bus::BusError told = bus::errorForBus(error);
     EXPECT_THAT(told.getName(),
                 MatchesRegex("com\\.norvane\\.Vessel1\\.Error(\\.[A-Za-z_][A-Za-z0-9_]*)+"));
     const Error back = bus::errorFromBus(told);
@@ -41,6 +41,7 @@ TEST(BusErrors, ComeBackWithDomainCodeAndWords) {
     EXPECT_EQ(back.code, error.code) << told.getName();
     EXPECT_EQ(explanation(back), explanation(error)) << told.getName();
     EXPECT_EQ(exitCodeFor(back), exitCodeFor(error)) << told.getName();
+    EXPECT_EQ(back.description(), error.description()) << told.getName();
   }
 }
 

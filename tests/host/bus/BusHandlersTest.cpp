@@ -1,10 +1,14 @@
 #include <gtest/gtest.h>
 #include <new>
+#include <stdexcept>
 
+#include "host/LocalDocuments.h"
+#include "host/bus/BusCall.h"
 #include "host/bus/BusClient.h"
 #include "host/bus/BusErrors.h"
 #include "host/bus/PrivateBus.h"
 #include "host/bus/RemoteDocuments.h"
+#include "support/TempHome.h"
 
 namespace mirabel::testing {
 namespace {
@@ -39,6 +43,25 @@ TEST_F(BusHandlers, AnswerWhateverExceptionTheyEndWith) {
     EXPECT_EQ(answer.error, "org.freedesktop.DBus.Error.Failed");
     EXPECT_EQ(answer.message, std::bad_alloc().what());
   }
+}
+
+TEST_F(BusHandlers, AnswerAlsoWhereTheReplyCantBeWritten) {
+  const TempHome home;
+  LinuxPlatform::Options options;
+  options.home = home.path();
+  const auto documents = LocalDocuments::open(std::move(options)).value();
+  bus::CallerIdentities identities;
+  const auto nobody = std::make_shared<bus::Caller>("nobody", *documents, identities);
+  object->registerMethod(bus::providerInterface, "GetItem", "s", "a{sv}",
+                         [&](sdbus::MethodCall message) {
+                           bus::BusCall call(std::move(message), nobody);
+                           call.reply([](sdbus::Message&) { throw std::length_error("too long"); });
+                         });
+  begin();
+  connection->enterEventLoopAsync();
+  const auto answer = BusClient().provider("GetItem", std::string("did=1"));
+  EXPECT_EQ(answer.error, "org.freedesktop.DBus.Error.LimitsExceeded");
+  EXPECT_EQ(answer.message, "too long");
 }
 
 TEST_F(BusHandlers, OfSomebodyWhoNeverAnswersAreNotWaitedFor) {
