@@ -7,7 +7,6 @@
 #include <gtest/gtest.h>
 #include <limits>
 #include <set>
-#include <stdexcept>
 #include <thread>
 #include <unistd.h>
 
@@ -107,23 +106,6 @@ TEST(LogSectionDeathTest, RunningOutOfNumbersIsFatal) {
   LogSectionCounter nearlyDone(std::numeric_limits<std::uint64_t>::max() - 1);
   EXPECT_EQ(nearlyDone.draw(), std::numeric_limits<std::uint64_t>::max() - 1);
   EXPECT_EXIT((void)nearlyDone.draw(), ::testing::KilledBySignal(SIGABRT), "used up");
-}
-
-TEST(LogSection, ClosesWhenItsWorkFails) {
-  const LogCapture capture;
-  std::uint64_t number = 0;
-  try {
-    const LogSection section("failing");
-    number = section.number();
-    throw std::runtime_error("work failed");
-  } catch (const std::runtime_error&) {
-    logDebug("caught");
-  }
-  const std::string digits = std::to_string(number);
-  EXPECT_THAT(capture.lines(),
-              ElementsAre(LogLine{LogLevel::debug, "[DEBUG] ┏" + digits + " failing"},
-                          LogLine{LogLevel::debug, "[DEBUG] ┗" + digits},
-                          LogLine{LogLevel::debug, "[DEBUG] caught"}));
 }
 
 TEST(LogSection, NumbersAreUniqueAcrossThreads) {

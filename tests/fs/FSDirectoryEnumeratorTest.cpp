@@ -77,24 +77,6 @@ TEST_F(FSDirectoryEnumeratorTest, OptionsDecideWhatIsSeenAndEntered) {
   }
 }
 
-TEST_F(FSDirectoryEnumeratorTest, EveryPageIsACutOutOfTheWholeWalk) {
-  makeTree();
-  fake.volume.makeFolder(fake.path("a/2/deep"));
-  for (const bool recursively : {false, true}) {
-    ASSERT_TRUE(walk(walker(recursively)));
-    const std::vector<std::string> whole = seen;
-    for (std::size_t offset = 0; offset <= whole.size() + 1; ++offset) {
-      for (std::size_t limit = 0; limit <= whole.size() + 1; ++limit) {
-        const std::uint64_t count = walk(walker(recursively, offset, limit)).value();
-        const std::size_t first = std::min(offset, whole.size());
-        const std::size_t last = std::min(offset + limit, whole.size());
-        EXPECT_EQ(seen, std::vector(whole.begin() + first, whole.begin() + last));
-        EXPECT_EQ(count, limit == 0 ? 0 : last) << offset << " " << limit;
-      }
-    }
-  }
-}
-
 TEST_F(FSDirectoryEnumeratorTest, DirectoriesAreWalkedInOrderAndOpenedOnlyWhenNeeded) {
   makeTree();
   FSDirectoryEnumerator both{{fake.url("p.bundle"), fake.url("a")}, false, 1, 2, {}};
