@@ -10,6 +10,7 @@
 
 #include "host/ErrorText.h"
 #include "host/bus/BusText.h"
+#include "mirabel/Values.h"
 
 namespace mirabel::bus {
 namespace {

@@ -28,7 +28,7 @@ enum class WrittenFile { log = SQLITE_FCNTL_JOURNAL_POINTER, database = SQLITE_F
 
 int lastErrnoOf(sqlite3* database, WrittenFile written) {
   sqlite3_file* file = nullptr;
-  sqlite3_file_control(database, "main", static_cast<int>(written), &file);
+  sqlite3_file_control(database, "main", static_cast<int>(written), static_cast<void*>(&file));
   if (file == nullptr || file->pMethods == nullptr) return 0;
   int number = 0;
   file->pMethods->xFileControl(file, SQLITE_FCNTL_LAST_ERRNO, &number);
