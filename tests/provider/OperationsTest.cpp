@@ -112,20 +112,6 @@ TEST_F(OperationsTest, EachAnswersWithTheItemAsItIsAfterwards) {
   EXPECT_FALSE(exists("folder"));
 }
 
-TEST_F(OperationsTest, WhatTheHostsURLHasCachedIsNotBelieved) {
-  const URL stale = URL::fileURL(fake.path("b.txt"));
-  ResourceValues wrong;
-  wrong.fileID = 4711;
-  wrong.documentID = 4711;
-  wrong.typeIdentifier = "inode/directory";
-  stale.resources().fill(wrong);
-  stale.resources().setAttributeNames({});
-  fake.reports.outcome = stale;
-  vessel->renameItemWithIdentifier(file, "b.txt", item());
-  EXPECT_EQ(done.item()->itemIdentifier(), file);
-  EXPECT_EQ(done.item()->typeIdentifier(), "text/plain");
-}
-
 TEST_F(OperationsTest, NothingIsWrittenIntoTheRoot) {
   for (const Operation& operation : operations) {
     if (!operation.writesIntoParent()) continue;

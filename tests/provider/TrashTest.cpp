@@ -128,17 +128,6 @@ TEST_F(TrashTest, AFailedMoveLeavesTheItemAsItWas) {
   EXPECT_EQ(done.error(), Error::collision(id("a.txt")));
 }
 
-TEST_F(TrashTest, ANameThatIsInTheTrashAlreadyIsNoObstacle) {
-  vessel->trashItemWithIdentifier(file, done.handler());
-  fake.volume.writeFile(before, "1");
-  const std::string second = idAt(before);
-  done.results.clear();
-  vessel->trashItemWithIdentifier(second, done.handler());
-  EXPECT_NE(done.item()->filename(), "a.txt");
-  EXPECT_EQ(done.item()->putBackURL(), URL::fileURL(before));
-  EXPECT_EQ(idAt(after), file);
-}
-
 class TrashOutsideDocumentsTest : public ProviderFixture {
  protected:
   TrashOutsideDocumentsTest() : ProviderFixture("/home/me/Files") {}

@@ -128,15 +128,6 @@ TEST_F(UntrashTest, ItsPlaceAndNameAreThoseThatItHadUnlessTheHostKnowsBetterOrTh
   }
 }
 
-TEST_F(UntrashTest, ANameThatIsTakenIsNoObstacle) {
-  fake.volume.writeFile(library + "/Notes/a.txt", "1");
-  const std::string other = idAt(library + "/Notes/a.txt");
-  untrash();
-  EXPECT_NE(done.item()->filename(), "a.txt");
-  EXPECT_EQ(done.item()->fileURL().deletingLastPathComponent().path(), library + "/Notes");
-  EXPECT_EQ(idAt(library + "/Notes/a.txt"), other);
-}
-
 TEST_F(UntrashTest, WhatIsNotInTheTrashIsRefused) {
   fake.volume.rename(library + "/.Trash/a.txt", library + "/a.txt");
   untrash(id("folder"));
