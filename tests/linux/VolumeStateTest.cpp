@@ -235,6 +235,7 @@ TEST_F(VolumeStateTest, AFullDiskOrQuotaPasses) {
       EXPECT_NE(document(name), 0u) << "the reserve was to be given up";
       EXPECT_FALSE(std::filesystem::exists(reserve));
     }
+    write(name + " is not alone");
     {
       const FailingWrites full(error);
       const auto refused = index().currentEventID();
