@@ -59,6 +59,10 @@ function(mirabel_tests name)
                                         GTest::gtest_main)
   # Half the time to build them; it is in what they test that time is spent when they run.
   target_compile_options(${name} PRIVATE -O0)
+  if(MIRABEL_SANITIZE MATCHES undefined)
+    # A third of that again; what may be undefined is looked for in what they test.
+    target_compile_options(${name} PRIVATE -fno-sanitize=undefined)
+  endif()
   gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
                        PROPERTIES TIMEOUT 300 ${mirabel_test_environment}
                                   LABELS "${ARG_LABELS}")

@@ -30,29 +30,43 @@ class OperationRaces : public OperationsTest {
   }
 };
 
-TEST_F(OperationRaces, ALinkThatIsPutInTheWayLeadsNoRemovalOutOfTheTree) {
-  const std::string precious = home.path() + "/precious";
-  for (int number = 1; number < 12; ++number) {
-    fs::create_directories(precious + "/deep");
-    std::ofstream(precious + "/file") << "mine";
-    std::ofstream(precious + "/deep/file") << "mine";
-    makeFolder("folder/sub/deep");
-    home.writeFile("folder/sub/file", "x");
-    home.writeFile("folder/sub/deep/file", "x");
-    beforeCall("open below", number, [&] {
-      for (const auto& entry : fs::recursive_directory_iterator(home.documents())) {
+TEST_F(OperationRaces, ALinkThatIsPutInTheWayLeadsNoRemovalAndNoCopyOutOfTheTree) {
+  const std::string precious = home.path() + "/precious", source = home.path() + "/source";
+  const auto make = [](const std::string& folder, const char* contents) {
+    fs::create_directories(folder + "/deep");
+    std::ofstream(folder + "/file") << contents;
+    std::ofstream(folder + "/deep/file") << contents;
+  };
+  // Before the `number`th folder is opened, a link has taken the place of the one called "sub".
+  const auto lead = [&](const std::string& tree, int number) {
+    beforeCall("open below", number, [=, this] {
+      for (const auto& entry : fs::recursive_directory_iterator(tree)) {
         if (entry.path().filename() != "sub" || entry.is_symlink()) continue;
         fs::rename(entry.path(), home.path() + "/moved");
         fs::create_directory_symlink(precious, entry.path());
         break;
       }
     });
+  };
+  for (int number = 1; number < 12; ++number) {
+    make(precious, "mine");
+    make(home.at("folder/sub"), "x");
+    lead(home.documents(), number);
     static_cast<void>(remove("folder"));
     setCheck({});
     close();
     EXPECT_TRUE(fs::exists(precious + "/file")) << number;
     EXPECT_TRUE(fs::exists(precious + "/deep/file")) << number;
     for (const std::string& left : {home.path() + "/moved", home.at("folder")})
+      fs::remove_all(left);
+
+    make(source + "/sub", "x");
+    lead(source, number);
+    static_cast<void>(import(source, ""));
+    setCheck({});
+    for (const auto& [name, contents] : tree())
+      EXPECT_NE(contents, "mine") << name << ", " << number;
+    for (const std::string& left : {home.path() + "/moved", source, home.at("source")})
       fs::remove_all(left);
   }
 }
