@@ -48,8 +48,9 @@ TEST_F(RemoteDocumentsTest, QuestionsFromItsOwnCallsAreRefusedAtOnce) {
 
   std::promise<Documents::ItemResult> askedAgain;
   std::once_flag once;
-  const auto watch = documents->watch(
-      folder, [&] { std::call_once(once, [&] { askedAgain.set_value(documents->item(folder)); }); });
+  const auto watch = documents->watch(folder, [&] {
+    std::call_once(once, [&] { askedAgain.set_value(documents->item(folder)); });
+  });
   home.writeFile("folder/change");
   EXPECT_TRUE(askedAgain.get_future().get().error().isPosix(EDEADLK));
 }
