@@ -70,6 +70,9 @@ TEST_F(EnumerationLogTest, TellsOfChanges) {
 [ERROR] can't create change token from anchor data, resetting
 [ERROR] can't get volume UUID for "/home/me/Documents"
 )");
+  const auto begun = changes.made.front().lock();
+  ASSERT_TRUE(begun);
+  begun->observer->finishEnumeratingWithError(Error::syncAnchorExpired());
 }
 
 }  // namespace
