@@ -49,9 +49,13 @@ if(MIRABEL_SANITIZE)
       "LSAN_OPTIONS=suppressions=${CMAKE_SOURCE_DIR}/tests/leaks.supp:print_suppressions=0")
 endif()
 
-# One folder of tests/ as one test program, whose cases ctest sees one by one.
+# One folder of tests/ as one test program, whose cases ctest sees one by one; TIMEOUT is what one
+# case may take, in seconds.
 function(mirabel_tests name)
-  cmake_parse_arguments(ARG "" "" "SOURCES;LINKS;LABELS" ${ARGN})
+  cmake_parse_arguments(ARG "" "TIMEOUT" "SOURCES;LINKS;LABELS" ${ARGN})
+  if(NOT ARG_TIMEOUT)
+    set(ARG_TIMEOUT 300)
+  endif()
   add_executable(${name} ${ARG_SOURCES})
   mirabel_unity(${name})
   target_include_directories(${name} PRIVATE ${CMAKE_SOURCE_DIR}/tests)
@@ -64,6 +68,6 @@ function(mirabel_tests name)
     target_compile_options(${name} PRIVATE -fno-sanitize=undefined)
   endif()
   gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
-                       PROPERTIES TIMEOUT 300 ${mirabel_test_environment}
+                       PROPERTIES TIMEOUT ${ARG_TIMEOUT} ${mirabel_test_environment}
                                   LABELS "${ARG_LABELS}")
 endfunction()
