@@ -1,8 +1,8 @@
 #include <condition_variable>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <memory>
 #include <mutex>
-#include <thread>
 #include <vector>
 
 #include "foundation/VSPacer.h"
@@ -18,8 +18,7 @@ using testing::FakePacerClock;
 /// A block that notes when it ran and where, and can be held up.
 class Runs {
  public:
-  explicit Runs(SerialQueue queue, PacerClock& clock = PacerClock::steady())
-      : queue_(std::move(queue)), clock_(clock) {}
+  Runs(SerialQueue queue, PacerClock& clock) : queue_(std::move(queue)), clock_(clock) {}
   void operator()() {
     queue_.assertOnQueue();
     std::unique_lock lock(mutex_);
@@ -50,72 +49,70 @@ class Runs {
   std::vector<PacerClock::Time::duration> starts_;
 };
 
-TEST(VSPacer, MergesWhatComesWhileARunIsPending) {
-  FakePacerClock clock;
-  SerialQueue queue("pacer test");
-  Runs runs(queue, clock);
-  VSPacer pacer("pacer", queue, 40ms, clock);
-  pacer.setEventBlock([&] { runs(); });
-  pacer.signal();
-  pacer.resume();
-  pacer.waitUntilIdle();
-  for (int i = 0; i < 1000; ++i)
-    pacer.signal();
-  clock.pass(39ms);
-  clock.pass(1ms);
-  pacer.waitUntilIdle();
-  clock.pass(1h);
-  pacer.signal();
-  pacer.waitUntilIdle();
-  EXPECT_THAT(runs.starts(), ElementsAre(0ms, 40ms, 1h + 40ms)) << "after a rest it runs at once";
-}
-
-TEST(VSPacer, SignalsLaterUnlessItRanMeanwhile) {
-  FakePacerClock clock;
-  SerialQueue queue("pacer test");
-  Runs runs(queue, clock);
-  VSPacer pacer("pacer", queue, 1ms, clock);
-  pacer.setEventBlock([&] { runs(); });
-  pacer.resume();
-  pacer.signalAfter(10s);
-  pacer.waitUntilIdle();
-  clock.pass(10s);
-  pacer.waitUntilIdle();
-  pacer.signalAfter(10s);
-  clock.pass(5s);
-  pacer.signal();
-  pacer.waitUntilIdle();
-  clock.pass(1min);
-  pacer.waitUntilIdle();
-  EXPECT_THAT(runs.starts(), ElementsAre(10s, 15s));
-}
-
-TEST(VSPacer, ASignalDuringARunMakesAnother) {
-  SerialQueue queue("pacer test");
-  Runs runs(queue);
-  runs.hold(true);
-  VSPacer pacer("pacer", queue, 1ms);
-  pacer.setEventBlock([&] { runs(); });
-  pacer.resume();
-  pacer.signal();
-  runs.waitFor(1);
-  pacer.signal();
-  runs.hold(false);
-  runs.waitFor(2);
-}
-
-TEST(VSPacer, EndsWithWhatIsPendingUndone) {
-  SerialQueue queue("pacer test");
-  Runs runs(queue);
-  {
-    VSPacer pacer("pacer", queue, 1h);
-    pacer.setEventBlock([&] { runs(); });
-    pacer.resume();
-    pacer.signal();
-    runs.waitFor(1);
-    pacer.signal();
+/// A pacer whose runs are noted; its time passes when a test lets it.
+class VSPacerTest : public ::testing::Test {
+ protected:
+  VSPacerTest() {
+    pacer_->setEventBlock([this] { runs_(); });
   }
-  EXPECT_EQ(runs.starts().size(), 1U);
+
+  void pass(std::chrono::milliseconds time) {
+    clock_.pass(time);
+    pacer_->waitUntilIdle();
+  }
+  void signal() {
+    pacer_->signal();
+    pacer_->waitUntilIdle();
+  }
+
+  FakePacerClock clock_;
+  SerialQueue queue_{"pacer test"};
+  Runs runs_{queue_, clock_};
+  std::unique_ptr<VSPacer> pacer_ = std::make_unique<VSPacer>("pacer", queue_, 40ms, clock_);
+};
+
+TEST_F(VSPacerTest, MergesWhatComesWhileARunIsPending) {
+  pacer_->signal();
+  pacer_->resume();
+  pacer_->waitUntilIdle();
+  for (int i = 0; i < 1000; ++i)
+    pacer_->signal();
+  clock_.pass(39ms);
+  pass(1ms);
+  clock_.pass(1h);
+  signal();
+  EXPECT_THAT(runs_.starts(), ElementsAre(0ms, 40ms, 1h + 40ms)) << "after a rest it runs at once";
+}
+
+TEST_F(VSPacerTest, SignalsLaterUnlessItRanMeanwhile) {
+  pacer_->resume();
+  pacer_->signalAfter(10s);
+  pacer_->waitUntilIdle();
+  pass(10s);
+  pacer_->signalAfter(10s);
+  clock_.pass(5s);
+  signal();
+  pass(1min);
+  EXPECT_THAT(runs_.starts(), ElementsAre(10s, 15s));
+}
+
+TEST_F(VSPacerTest, ASignalDuringARunMakesAnother) {
+  runs_.hold(true);
+  pacer_->resume();
+  pacer_->signal();
+  runs_.waitFor(1);
+  pacer_->signal();
+  runs_.hold(false);
+  pass(40ms);
+  EXPECT_EQ(runs_.starts().size(), 2U);
+}
+
+TEST_F(VSPacerTest, EndsWithWhatIsPendingUndone) {
+  pacer_->resume();
+  signal();
+  pacer_->signal();
+  pacer_.reset();
+  EXPECT_EQ(runs_.starts().size(), 1U);
 }
 
 }  // namespace

@@ -5,6 +5,7 @@
 #include <chrono>
 #include <fcntl.h>
 #include <mutex>
+#include <type_traits>
 #include <utility>
 
 #include "foundation/Log.h"
@@ -71,29 +72,15 @@ class StoredVolumeIndex final : public VolumeIndex {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
     const std::string path = plainPath(folderPath);
-    std::uint64_t folderID = 0;
-    auto done = inTransactionAtLast([&]() -> Result<void> {
-      auto learned = learner_.learn(path, folder, sightings);
-      if (!learned) return fail(learned.error());
-      folderID = *learned;
-      return {};
-    });
-    if (!done) return fail(done.error());
-    return folderID;
+    return answeredInTransaction([&] { return learner_.learn(path, folder, sightings); });
   }
 
   Result<Sighting> learnPath(const std::string& path, const ObjectStatus& status,
                              bool isPackage) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
-    Result<Sighting> answer = fail(Error::posix(ENOENT));
-    auto done = inTransactionAtLast([&]() -> Result<void> {
-      answer = learner_.learnPath(plainPath(path), status, isPackage);
-      if (!answer) return fail(answer.error());
-      return {};
-    });
-    if (!done) return fail(done.error());
-    return answer;
+    return answeredInTransaction(
+        [&] { return learner_.learnPath(plainPath(path), status, isPackage); });
   }
 
   Result<void> learnPaths(std::span<const std::string> paths) override {
@@ -121,51 +108,39 @@ class StoredVolumeIndex final : public VolumeIndex {
     // Where changes are heard of, what has not happened to it need not be searched for.
     auto done = follower_.isInStep() ? stand(fileID, path) : Result<void>();
     if (done && !path && follower_.isInStep()) done = follower_.catchUp(transactions());
-    if (done && !path) {
-      done = inTransactionAtLast([&]() -> Result<void> { return find(fileID, path); });
-    }
     if (!done) return fail(done.error());
-    if (!path) return fail(Error::posix(ENOENT));
-    return std::move(*path);
+    if (path) return std::move(*path);
+    auto found = answeredInTransaction([&] { return learner_.find(fileID); });
+    if (!found) return fail(found.error());
+    if (!*found) return fail(Error::posix(ENOENT));
+    return std::move(**found);
   }
 
   Result<std::vector<std::string>> pathsOfFileID(std::uint64_t fileID) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
-    std::vector<std::string> paths;
-    auto done = inTransactionAtLast([&]() -> Result<void> {
+    return answeredInTransaction([&]() -> Result<std::vector<std::string>> {
       auto row = state_->store().objectByFileID(fileID);
       if (!row) return fail(row.error());
       if (!*row) return {};
       auto standing = paths_.standingPaths(**row);
-      if (!standing) return fail(standing.error());
-      paths = std::move(*standing);
-      std::optional<std::string> found;
-      if (paths.empty()) {
-        if (auto looked = find(fileID, found); !looked) return looked;
-      }
-      if (found) paths.push_back(std::move(*found));
-      return {};
+      if (!standing || !standing->empty()) return standing;
+      auto found = learner_.find(fileID);
+      if (!found) return fail(found.error());
+      if (*found) standing->push_back(std::move(**found));
+      return standing;
     });
-    if (!done) return fail(done.error());
-    return paths;
   }
 
   Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
-    std::optional<std::uint64_t> fileID;
     auto done = follower_.isInStep() ? follower_.catchUp(transactions()) : Result<void>();
     if (!done) return fail(done.error());
-    done = inTransactionAtLast([&]() -> Result<void> {
-      auto holder = learner_.holderOf(documentID);
-      if (!holder) return fail(holder.error());
-      fileID = *holder;
-      return {};
-    });
-    if (!done) return fail(done.error());
-    if (!fileID) return fail(Error::posix(ENOENT));
-    return *fileID;
+    auto holder = answeredInTransaction([&] { return learner_.holderOf(documentID); });
+    if (!holder) return fail(holder.error());
+    if (!*holder) return fail(Error::posix(ENOENT));
+    return **holder;
   }
 
   Result<void> reconcile() override {
@@ -281,6 +256,18 @@ class StoredVolumeIndex final : public VolumeIndex {
     return inTransaction(work);
   }
 
+  /// The same, for what has an answer.
+  template <class Work>
+  std::invoke_result_t<Work> answeredInTransaction(const Work& work) {
+    std::invoke_result_t<Work> answer = fail(Error::posix(ENOENT));
+    auto done = inTransactionAtLast([&]() -> Result<void> {
+      answer = work();
+      return answer ? Result<void>() : fail(answer.error());
+    });
+    if (!done) return fail(done.error());
+    return answer;
+  }
+
   Transaction transactions() {
     return [this](const std::function<Result<void>()>& work) { return inTransaction(work); };
   }
@@ -325,13 +312,6 @@ class StoredVolumeIndex final : public VolumeIndex {
     auto row = state_->store().objectAt(0, path);
     if (!row || !*row) return row ? Result<void>() : fail(row.error());
     return recorder_.changed(**row, {0, path});
-  }
-
-  Result<void> find(std::uint64_t fileID, std::optional<std::string>& path) {
-    auto found = learner_.find(fileID);
-    if (!found) return fail(found.error());
-    path = std::move(*found);
-    return {};
   }
 
   // Names are kept by their place, so each place must have one path. Below a root no component is
