@@ -6,7 +6,10 @@
 #include <map>
 #include <optional>
 #include <set>
+#include <sys/stat.h>
 
+#include "linux/FailingLooks.h"
+#include "linux/PrivateMount.h"
 #include "linux/VolumeFixture.h"
 #include "linux/volume/FollowedFolders.h"
 
@@ -187,6 +190,29 @@ TEST_P(FollowedFoldersTest, ALinkInThePlaceOfOneLeadsNowhere) {
   const std::uint64_t later = anchor();
   writeTo(base_ + "/elsewhere/Documents/more.txt");
   EXPECT_TRUE(toldSince(later).paths.empty());
+}
+
+TEST_P(FollowedFoldersTest, ADeadMountOverOneHidesItAndOverTheDocumentsIsAnError) {
+  follow({{libraryOf("one"), "One"}, {libraryOf("two"), "Two"}}, 1);
+  write("a.txt");
+  const std::uint64_t since = anchor();
+  for (const std::string& folder : {libraryOf("two"), documents_}) {
+    close();  // what is open belongs to the mounts of before
+    const PrivateMount mounted(folder);
+    if (!mounted.isThere()) GTEST_SKIP() << "may not mount";
+    const auto device = statusOf(folder).value().device;
+    const FailingLooks failing([&](int directory, const char* name) {
+      struct stat status;
+      const bool isIt = *name == '\0' && ::fstat(directory, &status) == 0;
+      return folder == name || (isIt && status.st_dev == device) ? ENOTCONN : 0;
+    });
+    const bool isOpen = folder != documents_;
+    ASSERT_EQ(tryOpen().has_value(), isOpen);
+    EXPECT_TRUE(!isOpen || index().currentEventID());
+  }
+  const Told told = toldSince(since);
+  EXPECT_TRUE(told.paths.contains("apps/two/Documents/sub/a.txt")) << "gone, and there again";
+  EXPECT_FALSE(told.paths.contains("Documents/a.txt"));
 }
 
 INSTANTIATE_TEST_SUITE_P(Watching, FollowedFoldersTest,

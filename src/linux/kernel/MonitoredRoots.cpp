@@ -118,7 +118,9 @@ bool MonitoredRoots::refresh(Root& root) {
   const auto resolve = root.isKeptOpen ? 0 : withoutLinks;
   auto opened = openLongPath(AT_FDCWD, root.path, O_PATH | O_DIRECTORY, resolve);
   const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
-  if (!status && (!root.isThere || !saysOutOfReach(status.error()))) return false;
+  // The document storage itself may be mounted, from a server that does not answer just now.
+  const bool isSilent = !status && root.isKeptOpen && status.error().isPosix(EXDEV);
+  if (!status && (!root.isThere || isSilent || !saysOutOfReach(status.error()))) return false;
   if (status && root.isThere && status->inode == root.inode && status->device == root.device) {
     return false;
   }

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <climits>
 #include <cstdio>
 #include <cstring>
 #include <fcntl.h>
@@ -14,6 +15,7 @@
 #include <sys/utsname.h>
 #include <sys/vfs.h>
 #include <time.h>
+#include <unistd.h>
 #include <utility>
 
 #include "linux/kernel/LongPath.h"
@@ -76,8 +78,20 @@ bool isKernelBefore(int wantedMajor, int wantedMinor) {
   return major < wantedMajor || (major == wantedMajor && minor < wantedMinor);
 }
 
+// Where what is open lies, if it has a name still.
+std::string pathOfDescriptor(int descriptor) {
+  std::array<char, PATH_MAX> path;
+  const std::string link = "/proc/self/fd/" + std::to_string(descriptor);
+  const ssize_t length = ::readlink(link.c_str(), path.data(), path.size());
+  return length > 0 ? std::string(path.data(), static_cast<std::size_t>(length)) : std::string();
+}
+
 // The kernel itself knows, without asking the file system that is mounted there.
 bool isMountPoint(int directory, const char* name) {
+  if (*name == '\0' && directory >= 0) {
+    const std::string path = pathOfDescriptor(directory);
+    return !path.empty() && isMountPoint(AT_FDCWD, path.c_str());
+  }
   const SplitPath place = splitPath(name);
   if (place.name.empty()) return false;
   UniqueFd parent;

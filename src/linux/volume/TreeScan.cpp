@@ -50,7 +50,9 @@ Result<void> TreeScan::addRoot(const std::string& path) {
   const bool isItem = path != context_.roots.firstPath();
   auto id = isItem ? context_.learner.rootID(path, mayChangeUnseen(folder->get()))
                    : context_.learner.folderID(path, folder->get());
-  if (!id && wasReplaced(id.error())) return missing_.add(0, path);
+  // A library may have a volume mounted over it whose server is dead.
+  const bool isOver = !id && isItem && isClosedToUs(id.error());
+  if (isOver || (!id && wasReplaced(id.error()))) return missing_.add(0, path);
   if (!id) return fail(id.error());
   add(path, *id, Depth::everything);
   return {};
