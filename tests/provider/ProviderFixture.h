@@ -83,9 +83,9 @@ class ProviderFixture : public ::testing::Test {
 
   FakePlatform fake;
   FakeAppLibraries libraries{fake.applications};
-  std::unique_ptr<LocalVessel> vessel;
   Completions done;
   LogCapture log;
+  std::unique_ptr<LocalVessel> vessel;  // waits at its end for what is still to be completed
 };
 
 }  // namespace mirabel::testing
