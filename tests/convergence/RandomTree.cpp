@@ -38,7 +38,8 @@ std::vector<std::string> RandomTree::all(bool folders) const {
   for (const std::string& root : roots) {
     if (folders) result.push_back(root);
     for (const auto& entry : fs::recursive_directory_iterator(root)) {
-      if (fs::is_directory(entry.symlink_status()) == folders) result.push_back(entry.path());
+      const bool isFolder = !entry.is_symlink() && entry.is_directory();
+      if (isFolder == folders) result.push_back(entry.path());
     }
   }
   std::ranges::sort(result);
