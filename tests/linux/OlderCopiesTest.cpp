@@ -84,6 +84,7 @@ class OlderCopies : public VolumeFixture {
       EXPECT_TRUE(before.insert(std::to_string(document(name))).second) << name;
     }
     if (!isLong) {
+      EXPECT_EQ(document("first"), first_);
       EXPECT_GT(index().currentEventID().value(), lastAnchor_) << "or nothing is shown";
     }
     const UUID renewed = index().historyUUID();

@@ -2,7 +2,7 @@
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
-#include <functional>
+#include <gmock/gmock.h>
 #include <map>
 #include <optional>
 #include <random>
@@ -18,15 +18,10 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// What a client keeps of one thing. Not its path: that changes with every folder above it.
-struct Replica {
-  std::string parent;
-  std::string name;
-  std::int64_t changeTime;
-  std::uint64_t size;
-  std::uint32_t linkCount;
-};
-using Replicas = std::map<std::string, Replica>;
+/// What a client keeps of each thing: its parent and name, the time of its last change and its
+/// size. Not its path: that changes with every folder above it. Nor any name of one that has
+/// several: which of them it is held under is for the listing to choose.
+using Replicas = std::map<std::string, std::string>;
 
 class ReconcilerTest : public VolumeFixture {
  protected:
@@ -35,22 +30,24 @@ class ReconcilerTest : public VolumeFixture {
                                     : "fid=" + std::to_string(sighting.fileID);
   }
 
-  Replica replicaOf(const std::string& relative, const Sighting& seen) {
+  void hold(Replicas& replicas, const std::string& relative) {
+    const Sighting seen = see(relative);
     const fs::path place(relative);
-    const std::string parent =
-        place.has_parent_path() ? identity(see(place.parent_path().native())) : "root";
-    return {parent, place.filename(), seen.status.changeTime, seen.status.size,
-            seen.status.linkCount};
+    std::string replica =
+        std::to_string(seen.status.changeTime) + " " + std::to_string(seen.status.size) + " bytes";
+    if (seen.status.linkCount == 1) {
+      const fs::path parent = place.parent_path();
+      replica += " " + (parent.empty() ? "" : identity(see(parent.native()))) + "/" +
+                 place.filename().native();
+    }
+    replicas.insert_or_assign(identity(seen), replica);
   }
 
-  /// What a fresh look at everything shows. A hard-linked file stands under one of its paths.
+  /// What a fresh look at everything shows.
   Replicas everything() {
     Replicas all;
-    for (const auto& entry : fs::recursive_directory_iterator(documents_)) {
-      const std::string relative = entry.path().native().substr(documents_.size() + 1);
-      const Sighting seen = see(relative);
-      all.insert_or_assign(identity(seen), replicaOf(relative, seen));
-    }
+    for (const auto& entry : fs::recursive_directory_iterator(documents_))
+      hold(all, entry.path().native().substr(documents_.size() + 1));
     return all;
   }
 
@@ -77,41 +74,10 @@ class ReconcilerTest : public VolumeFixture {
       if (record.documentID != 0) replicas.erase("did=" + std::to_string(record.documentID));
       auto path = index().pathOfFileID(record.fileID);
       if (!path || *path == documents_) continue;
-      const std::string relative = path->substr(documents_.size() + 1);
-      const Sighting seen = see(relative);
-      replicas.erase(identity(seen));
-      replicas.insert_or_assign(identity(seen), replicaOf(relative, seen));
-    }
-  }
-
-  static void expectEqual(const Replicas& replicas, const Replicas& fresh) {
-    for (const auto& [id, replica] : fresh) {
-      const auto held = replicas.find(id);
-      ASSERT_NE(held, replicas.end()) << id << " " << replica.name << " was not told";
-      // Which of several names a thing is held under is for the listing to choose.
-      if (replica.linkCount == 1) {
-        EXPECT_EQ(held->second.name, replica.name) << id;
-        EXPECT_EQ(held->second.parent, replica.parent) << id << " " << replica.name;
-      }
-      EXPECT_EQ(held->second.changeTime, replica.changeTime) << id << " " << replica.name;
-      EXPECT_EQ(held->second.size, replica.size) << id << " " << replica.name;
-    }
-    for (const auto& [id, replica] : replicas) {
-      EXPECT_TRUE(fresh.contains(id)) << id << " " << replica.name << " is gone";
+      hold(replicas, path->substr(documents_.size() + 1));
     }
   }
 };
-
-TEST_F(ReconcilerTest, AnUnchangedTreeMakesNoEvents) {
-  makeFolder("a/b/c");
-  for (int i = 0; i < 20; ++i)
-    write("a/b/f" + std::to_string(i));
-  const std::uint64_t first = anchor();
-  close();
-  EXPECT_EQ(anchor(), first);
-  EXPECT_TRUE(index().events(first, 10)->empty());
-  EXPECT_TRUE(index().events(first + 1, 10).error().isPosix(ESTALE)) << "never given out";
-}
 
 // A container that showed a file under a name, or will, learns of it only from a record of a place
 // in it: so each name that came or went, or whose turn may have come, is named.
@@ -126,94 +92,53 @@ class HardLinksTest : public ReconcilerTest,
 
 TEST_P(HardLinksTest, NamesAreToldThatCameOrWent) {
   struct Case {
-    const char* name;
-    std::function<void()> make;
-    std::vector<std::string> told;
+    const char* steps;
+    std::set<std::string> told;
     bool needsHandles = false;  ///< inotify does not say to which object it happened
   };
-  const auto unlink = [this](const char* name) { fs::remove(path(name)); };
-  const std::string outside = base_ + "/outside";
-  const auto moveOut = [&](const char* name) { fs::rename(path(name), outside); };
-  const auto moveIn = [&](const char* name) {
-    fs::create_hard_link(path("a/x"), outside);
-    fs::rename(outside, path(name));
-  };
   const Case cases[] = {
-      {"a name more", [&] { link("a/x", "c/z"); }, {"a/x", "b/y", "c/z"}},
-      {"a name less", [&] { unlink("b/y"); }, {"b/y"}},
-      {"the first name less", [&] { unlink("a/x"); }, {"a/x", "b/y"}},
-      {"no name left", [&] { unlink("a/x"), unlink("b/y"); }, {"a/x", "b/y"}},
-      {"saved over one name", [&] { write("new"), fs::rename(path("new"), path("b/y")); }, {"b/y"}},
-      {"saved over one name, the other gone",
-       [&] { unlink("a/x"), write("new"), fs::rename(path("new"), path("b/y")); },
-       {"a/x", "b/y"}},
-      {"saved over the first name, the folder of the other moved below it",
-       [&] {
-         write("new");
-         fs::rename(path("new"), path("a/x"));
-         makeFolder("a/deep");
-         fs::rename(path("b"), path("a/deep/b"));
-       },
-       {"a/x", "a/deep/b/y"}},
-      {"under one new name",
-       [&] { unlink("a/x"), fs::rename(path("b/y"), path("c/z")); },
-       {"a/x", "b/y", "c/z"}},
-      {"written to, and one name changed",
-       [&] { write("a/x", "longer"), fs::rename(path("a/x"), path("c/z")); },
-       {"a/x", "b/y", "c/z"}},
-      {"the folder of one name renamed", [&] { fs::rename(path("b"), path("d")); }, {"d/y"}},
-      {"the folder of the first name renamed", [&] { fs::rename(path("a"), path("d")); }, {"d/x"}},
-      {"the folder of one name hidden", [&] { fs::rename(path("b"), path(".b")); }, {".b/y"}},
-      {"the folder of one name deleted", [&] { fs::remove_all(path("b")); }, {"b/y"}},
-      {"the folder of the first name deleted", [&] { fs::remove_all(path("a")); }, {"a/x", "b/y"}},
-      {"written to under a name whose folder then left",
-       [&] { write("b/y", "longer"), moveOut("b"); },
-       {"a/x", "b/y"}},
-      {"written to under the first name, whose folder then left",
-       [&] { write("a/x", "longer"), moveOut("a"); },
-       {"a/x", "b/y"}},
-      {"written to under a name that then left",
-       [&] { write("b/y", "longer"), moveOut("b/y"); },
-       {"a/x", "b/y"}},
-      {"written to under a name that had come and then left",
-       [&] { moveIn("c/z"), write("c/z", "longer"), moveOut("c/z"); },
-       {"a/x", "b/y"},
-       true},
-      {"written to under a name that had come and whose folder then left",
-       [&] { moveIn("c/z"), write("c/z", "longer"), moveOut("c"); },
-       {"a/x", "b/y"},
-       true},
-      {"written to under a name in a new folder",
-       [&] { makeFolder("d"), link("a/x", "d/z"), write("d/z", "longer"); },
-       {"a/x", "b/y", "d/z"}},
+      {"ln a/x c/z", {"a/x", "b/y", "c/z"}},
+      {"rm b/y", {"b/y"}},
+      {"rm a/x", {"a/x", "b/y"}},
+      {"rm a/x; rm b/y", {"a/x", "b/y"}},
+      {"write new; mv new b/y", {"b/y"}},
+      {"rm a/x; write new; mv new b/y", {"a/x", "b/y"}},
+      {"write new; mv new a/x; mkdir a/deep; mv b a/deep/b", {"a/x", "a/deep/b/y"}},
+      {"rm a/x; mv b/y c/z", {"a/x", "b/y", "c/z"}},
+      {"write a/x longer; mv a/x c/z", {"a/x", "b/y", "c/z"}},
+      {"mv b d", {"d/y"}},
+      {"mv a d", {"d/x"}},
+      {"mv b .b", {".b/y"}},
+      {"rm b", {"b/y"}},
+      {"rm a", {"a/x", "b/y"}},
+      {"write b/y longer; mv b ../out", {"a/x", "b/y"}},
+      {"write a/x longer; mv a ../out", {"a/x", "b/y"}},
+      {"write b/y longer; mv b/y ../out", {"a/x", "b/y"}},
+      {"ln a/x ../out; mv ../out c/z; write c/z longer; mv c/z ../out", {"a/x", "b/y"}, true},
+      {"ln a/x ../out; mv ../out c/z; write c/z longer; mv c ../outside", {"a/x", "b/y"}, true},
+      {"mkdir d; ln a/x d/z; write d/z longer", {"a/x", "b/y", "d/z"}},
   };
   for (const Case& c : cases) {
+    SCOPED_TRACE(c.steps);
     if (c.needsHandles && GetParam() == WatcherKind::inotify) continue;
     close();
-    fs::remove_all(documents_);
-    fs::remove_all(outside);
-    fs::create_directory(documents_);
-    for (const char* folder : {"a", "b", "c"})
-      makeFolder(folder);
-    write("a/x");
-    file("a/x");
-    link("a/x", "b/y");
+    for (const char* used : {"../out", "../outside", ""})
+      fs::remove_all(path(used));
+    run("mkdir a; mkdir b; mkdir c; write a/x; look a/x; ln a/x b/y");
     const std::uint64_t id = file("b/y");
     const std::uint32_t document = this->document("b/y");
     const std::uint64_t since = anchor();
-    c.make();
+    run(c.steps);
     anchor();
     std::set<std::string> told;
     const auto records = index().events(since, 1000).value();
     for (const JournalRecord& record : records) {
-      if (!record.isDocument && record.fileID == id) {
-        told.insert(record.path.substr(documents_.size() + 1));
-      }
+      if (record.isDocument || record.fileID != id) continue;
+      told.insert(record.path.substr(documents_.size() + 1));
     }
-    for (const std::string& name : c.told)
-      EXPECT_TRUE(told.contains(name)) << c.name << ": " << name;
+    EXPECT_THAT(told, ::testing::IsSupersetOf(c.told));
     if (index().pathOfFileID(id)) {
-      EXPECT_EQ(index().fileIDOfDocument(document), id) << c.name << ": another document";
+      EXPECT_EQ(index().fileIDOfDocument(document), id) << "another document";
     }
   }
 }
@@ -221,31 +146,6 @@ TEST_P(HardLinksTest, NamesAreToldThatCameOrWent) {
 INSTANTIATE_TEST_SUITE_P(Watching, HardLinksTest,
                          ::testing::Values(std::nullopt, WatcherKind::folderMarks,
                                            WatcherKind::inotify));
-
-TEST_F(ReconcilerTest, AWholeTreeThatIsDeletedOrMovedOutIsToldThingByThing) {
-  makeFolder("keep");
-  makeFolder("tree/sub");
-  write("tree/sub/a");
-  write("tree/b");
-  Replicas replicas = everything();
-  std::uint64_t since = anchor();
-  replicas = everything();
-  fs::rename(path("tree"), base_ + "/outside");
-  catchUp(replicas, since);
-  expectEqual(replicas, everything());
-  EXPECT_EQ(replicas.size(), 1u);
-
-  since = anchor();
-  fs::rename(base_ + "/outside", path("keep/back"));
-  catchUp(replicas, since);
-  expectEqual(replicas, everything());
-  EXPECT_EQ(replicas.size(), 5u);
-
-  since = anchor();
-  remove("keep");
-  catchUp(replicas, since);
-  EXPECT_TRUE(replicas.empty());
-}
 
 // Random changes, watched and not, restarts and anchors in between: a client that applies the
 // events holds what a fresh look shows.
@@ -371,12 +271,12 @@ TEST_P(RandomReconciling, AreToldSoThatAClientHoldsWhatIsThere) {
     }
     if (pick(2) == 0) close();
     catchUp(replicas, since);
-    expectEqual(replicas, everything());
-    if (::testing::Test::HasFailure()) return;
+    ASSERT_EQ(replicas, everything());
     since = anchor();
   }
   ASSERT_TRUE(index().reconcile());
   EXPECT_EQ(index().status().lastEventID, since) << "what was followed, a comparison confirms";
+  EXPECT_TRUE(index().events(since + 1, 10).error().isPosix(ESTALE)) << "never given out";
 }
 
 INSTANTIATE_TEST_SUITE_P(

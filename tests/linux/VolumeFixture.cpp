@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <sstream>
 #include <stdio.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -63,6 +64,33 @@ void VolumeFixture::remove(std::string_view relative) const {
 
 void VolumeFixture::link(std::string_view from, std::string_view to) const {
   ASSERT_EQ(::link(path(from).c_str(), path(to).c_str()), 0);
+}
+
+void VolumeFixture::run(const std::string& steps) {
+  std::istringstream all(steps);
+  for (std::string step; std::getline(all, step, ';');) {
+    std::istringstream words(step);
+    std::string verb, one, two;
+    words >> verb >> one >> two;
+    if (verb == "write") {
+      write(one, two.empty() ? "x" : two);
+    } else if (verb == "mkdir") {
+      makeFolder(one);
+    } else if (verb == "mv") {
+      rename(one, two);
+    } else if (verb == "ln") {
+      link(one, two);
+    } else if (verb == "swap") {
+      exchange(one, two);
+    } else if (verb == "rm") {
+      remove(one);
+    } else if (verb == "look") {
+      see(one);
+    } else {
+      ASSERT_EQ(verb, "close");
+      close();
+    }
+  }
 }
 
 std::uint64_t VolumeFixture::inode(std::string_view relative) const {

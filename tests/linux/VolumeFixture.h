@@ -33,6 +33,9 @@ class VolumeFixture : public ::testing::Test {
   void exchange(std::string_view a, std::string_view b) const;
   void remove(std::string_view relative) const;
   void link(std::string_view from, std::string_view to) const;
+  /// Does steps such as "write f; mkdir d; mv f d/g; ln d/g h; swap h i; rm d; look i; close". What
+  /// is written is a further word, or "x".
+  void run(const std::string& steps);
   std::uint64_t inode(std::string_view relative) const;
   ObjectStatus status(std::string_view relative) const;
 

@@ -1,5 +1,6 @@
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <set>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -60,14 +61,16 @@ TEST_F(VolumeStateTest, WhatIsLongGoneIsForgottenAndItsIdentifiersAreNotGivenAga
   }
 }
 
-TEST_F(VolumeStateTest, OneProcessOwnsTheVolumeAndOthersAreTold) {
-  write("doc");
-  see("doc");
-  auto second = tryOpen(std::chrono::milliseconds(30));
-  ASSERT_FALSE(second);
-  EXPECT_TRUE(second.error().isPosix(EBUSY));
-  ASSERT_EQ(notices_.size(), 1u);
-  EXPECT_NE(notices_[0].find("waiting"), std::string::npos);
+TEST_F(VolumeStateTest, OneProcessOwnsTheVolumeAndOthersAreToldThoughItsLockIsRemoved) {
+  index();
+  for (const int round : {0, 1}) {
+    const auto second = tryOpen(std::chrono::milliseconds(round == 0 ? 30 : 0));
+    ASSERT_FALSE(second) << round;
+    EXPECT_TRUE(second.error().isPosix(EBUSY)) << second.error().description();
+    ASSERT_EQ(notices_.size(), 1u) << round;
+    EXPECT_NE(notices_[0].find("waiting"), std::string::npos);
+    std::filesystem::remove(volumeFolder() + "/lock");
+  }
   close();
   EXPECT_TRUE(tryOpen());
 }
@@ -76,9 +79,7 @@ TEST_F(VolumeStateTest, AStateFolderThatIsNotOursIsRefused) {
   write("doc");
   std::filesystem::create_directory(base_ + "/real");
   std::filesystem::create_symlink(base_ + "/real", state_);
-  auto linked = tryOpen();
-  ASSERT_FALSE(linked);
-  EXPECT_TRUE(linked.error().isPosix(EPERM)) << linked.error().description();
+  EXPECT_TRUE(tryOpen().error().isPosix(EPERM));
   EXPECT_TRUE(std::filesystem::is_empty(base_ + "/real"));
   std::filesystem::remove(state_);
 
@@ -89,9 +90,7 @@ TEST_F(VolumeStateTest, AStateFolderThatIsNotOursIsRefused) {
   if (::geteuid() != 0) GTEST_SKIP() << "only root can give a folder away";
   std::filesystem::create_directory(state_);
   ASSERT_EQ(::chown(state_.c_str(), 65534, 65534), 0);
-  auto foreign = tryOpen();
-  ASSERT_FALSE(foreign);
-  EXPECT_TRUE(foreign.error().isPosix(EPERM));
+  EXPECT_TRUE(tryOpen().error().isPosix(EPERM));
   EXPECT_TRUE(std::filesystem::is_empty(state_));
 }
 
@@ -107,97 +106,31 @@ TEST_F(VolumeStateTest, TheStateIsForItsOwnerOnly) {
   }
 }
 
-struct Damage {
-  const char* name;
-  void (*make)(const std::string& database);
-};
-
-class DamagedState : public VolumeStateTest, public ::testing::WithParamInterface<Damage> {};
-
 // Whatever happened to the database, nothing that comes after gets an identity of before.
-TEST_P(DamagedState, NewIdentitiesAreNotMixedWithOld) {
+TEST_F(VolumeStateTest, WithoutADatabaseNewIdentitiesAreNotMixedWithOld) {
   std::set<std::uint64_t> files;
   std::set<std::uint32_t> documents;
-  for (int i = 0; i < 40; ++i)
-    write("f" + std::to_string(i));
-  makeFolder("folder");
-  const UUID history = index().historyUUID();
-  for (const Sighting& sighting : list()) {
-    files.insert(sighting.fileID);
-    if (sighting.documentID != 0) documents.insert(sighting.documentID);
+  std::set<UUID> histories;
+  const std::function<void()> losses[] = {[] {}, [&] { std::filesystem::remove(database()); },
+                                          [&] {
+                                            std::ofstream(database(), std::ios::in | std::ios::out)
+                                                << "not a database";
+                                            std::filesystem::remove(volumeFolder() + "/witness");
+                                          }};
+  for (const auto& lose : losses) {
+    lose();
+    std::filesystem::remove_all(documents_);
+    makeFolder("folder");
+    for (int i = 0; i < 40; ++i)
+      write(std::to_string(i));
+    for (const Sighting& sighting : list()) {
+      EXPECT_TRUE(files.insert(sighting.fileID).second) << sighting.name;
+      if (sighting.name == "folder") continue;
+      EXPECT_TRUE(documents.insert(sighting.documentID).second) << sighting.name;
+    }
+    EXPECT_TRUE(histories.insert(index().historyUUID()).second);
+    close();
   }
-  close();
-  GetParam().make(database());
-  for (int i = 0; i < 40; ++i)
-    remove("f" + std::to_string(i));
-  remove("folder");
-  for (int i = 0; i < 40; ++i)
-    write("g" + std::to_string(i));
-  makeFolder("another");
-  for (const Sighting& sighting : list()) {
-    EXPECT_FALSE(files.contains(sighting.fileID)) << sighting.name;
-    EXPECT_FALSE(documents.contains(sighting.documentID)) << sighting.name;
-  }
-  EXPECT_NE(index().historyUUID(), history);
-  // It is said once, and the next start finds everything in order.
-  const UUID renewed = index().historyUUID();
-  const std::uint32_t kept = document("g0");
-  notices_.clear();
-  close();
-  EXPECT_EQ(document("g0"), kept);
-  EXPECT_EQ(index().historyUUID(), renewed);
-  EXPECT_TRUE(notices_.empty());
-}
-
-void overwrite(const std::string& file, std::streamoff offset, std::string_view bytes) {
-  std::fstream stream(file, std::ios::in | std::ios::out | std::ios::binary);
-  stream.seekp(offset);
-  stream << bytes;
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Each, DamagedState,
-    ::testing::Values(
-        Damage{"Header", [](const std::string& db) { overwrite(db, 0, "not a database"); }},
-        Damage{"Page",
-               [](const std::string& db) { overwrite(db, 4096, std::string(900, '\xee')); }},
-        Damage{"OneByteOfAName",
-               [](const std::string& db) {
-                 std::ifstream in(db, std::ios::binary);
-                 const std::string bytes((std::istreambuf_iterator<char>(in)), {});
-                 overwrite(db, static_cast<std::streamoff>(bytes.find("f17")) + 1, "9");
-               }},
-        Damage{"Truncated",
-               [](const std::string& db) {
-                 std::filesystem::resize_file(db, std::filesystem::file_size(db) / 2);
-               }},
-        Damage{"Empty", [](const std::string& db) { std::filesystem::resize_file(db, 0); }},
-        Damage{"Removed", [](const std::string& db) { std::filesystem::remove(db); }},
-        Damage{"WitnessGoneToo",
-               [](const std::string& db) {
-                 overwrite(db, 0, "not a database");
-                 std::filesystem::remove(std::filesystem::path(db).parent_path() / "witness");
-               }}),
-    [](const auto& test) { return test.param.name; });
-
-TEST_F(VolumeStateTest, AnOlderCopyPutBackGivesNoIdentityTwice) {
-  write("early");
-  const std::uint32_t early = document("early");
-  const UUID history = index().historyUUID();
-  close();
-  std::filesystem::copy_file(database(), base_ + "/copy");
-  write("late");
-  const Sighting late = see("late");
-  close();
-  std::filesystem::copy_file(base_ + "/copy", database(),
-                             std::filesystem::copy_options::overwrite_existing);
-  remove("late");
-  write("later");
-  const Sighting later = see("later");
-  EXPECT_NE(later.documentID, late.documentID);
-  EXPECT_NE(later.fileID, late.fileID);
-  EXPECT_EQ(document("early"), early);
-  EXPECT_NE(index().historyUUID(), history);
 }
 
 // Nobody can say then how old the database is: identities stay, the history does not.
@@ -265,15 +198,6 @@ TEST_F(VolumeStateTest, AFailingDiskEndsItUntilItIsOpenedAnew) {
   EXPECT_TRUE(index().currentEventID());
   EXPECT_EQ(this->document("doc"), document);
   EXPECT_EQ(index().historyUUID(), history);
-}
-
-TEST_F(VolumeStateTest, ALockThatWasRemovedLetsNobodyIn) {
-  write("doc");
-  see("doc");
-  std::filesystem::remove(volumeFolder() + "/lock");
-  const auto second = tryOpen();
-  ASSERT_FALSE(second);
-  EXPECT_TRUE(second.error().isPosix(EBUSY)) << second.error().description();
 }
 
 }  // namespace
