@@ -1,8 +1,8 @@
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
 
+#include "linux/EnvironmentVariable.h"
 #include "linux/FilesFixture.h"
 #include "linux/files/LinuxPlatform.h"
 
@@ -14,28 +14,7 @@ using ::testing::HasSubstr;
 
 class OpeningThePlatform : public ::testing::Test {
  protected:
-  static std::string detailOf(const Error& error) {
-    const auto found = error.userInfo.find(errorkey::detail);
-    return found == error.userInfo.end() ? "" : found->second;
-  }
-  /// Sets variables of the environment until the test ends.
-  void setEnvironment(const char* name, const std::string& value) {
-    const char* before = std::getenv(name);
-    saved_.emplace_back(name,
-                        before == nullptr ? std::nullopt : std::optional(std::string(before)));
-    ::setenv(name, value.c_str(), 1);
-  }
-  void TearDown() override {
-    for (const auto& [name, value] : saved_) {
-      if (value) ::setenv(name, value->c_str(), 1);
-      if (!value) ::unsetenv(name);
-    }
-  }
-
   TempHome home;
-
- private:
-  std::vector<std::pair<const char*, std::optional<std::string>>> saved_;
 };
 
 TEST_F(OpeningThePlatform, FailsWithAWordForWhatIsNoHome) {
@@ -54,7 +33,8 @@ TEST_F(OpeningThePlatform, FailsWithAWordForWhatIsNoHome) {
   for (const Case& c : cases) {
     const auto opened = LinuxPlatform::open({.home = c.home});
     ASSERT_EQ(failureOf(opened), c.code) << c.home;
-    EXPECT_THAT(detailOf(opened.error()), HasSubstr(c.detail)) << c.home;
+    EXPECT_THAT(opened.error().userInfo.find(errorkey::detail)->second, HasSubstr(c.detail))
+        << c.home;
   }
   fs::remove_all(home.documents());
   std::ofstream(home.documents()) << "x";
@@ -86,22 +66,21 @@ TEST_F(OpeningThePlatform, LeavesAMissingDocumentStorageMissing) {
 
 TEST_F(OpeningThePlatform, HonoursTheEnvironmentOnlyWithoutAnExplicitHome) {
   const TempHome other;
-  setEnvironment("HOME", home.path());
-  setEnvironment("XDG_STATE_HOME", other.path() + "/states");
-  EXPECT_EQ(LinuxPlatform::open({}).value()->stateFolder(), other.path() + "/states/mirabel");
-  EXPECT_EQ(LinuxPlatform::open({.home = home.path()}).value()->stateFolder(), home.stateFolder());
-  setEnvironment("XDG_STATE_HOME", "relative");
-  EXPECT_EQ(LinuxPlatform::open({}).value()->stateFolder(), home.stateFolder());
-
-  const auto applicationSupport = [](LinuxPlatform::Options options) {
+  const std::string states = other.path() + "/states", data = other.path() + "/data";
+  const EnvironmentVariable variable("HOME", home.path().c_str());
+  const EnvironmentVariable state("XDG_STATE_HOME", states.c_str());
+  const EnvironmentVariable share("XDG_DATA_HOME", data.c_str());
+  const auto folders = [](LinuxPlatform::Options options) {
     const auto opened = LinuxPlatform::open(std::move(options)).value();
-    return opened->platform().caches.applicationSupportURL().path();
+    return std::pair(opened->stateFolder(),
+                     opened->platform().caches.applicationSupportURL().path());
   };
-  setEnvironment("XDG_DATA_HOME", other.path() + "/data");
-  EXPECT_EQ(applicationSupport({}), other.path() + "/data");
-  EXPECT_EQ(applicationSupport({.home = home.path()}), home.path() + "/.local/share");
-  setEnvironment("XDG_DATA_HOME", "relative");
-  EXPECT_EQ(applicationSupport({}), home.path() + "/.local/share");
+  const std::pair own(home.stateFolder(), home.path() + "/.local/share");
+  EXPECT_EQ(folders({}), std::pair(states + "/mirabel", data));
+  EXPECT_EQ(folders({.home = home.path()}), own);
+  for (const EnvironmentVariable* each : {&state, &share})
+    each->set("relative");
+  EXPECT_EQ(folders({}), own);
 }
 
 }  // namespace

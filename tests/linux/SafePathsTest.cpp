@@ -31,6 +31,15 @@ class SafePaths : public FilesTest {
     EXPECT_FALSE(p.sizes.directorySize(home.url(folder)));
     EXPECT_FALSE(p.operations.createDirectory(home.url(std::string(folder) + "/made")));
   }
+  void expectListedAndNotEntered(std::string_view folder) {
+    home.writeFile("beside", "123");
+    home.writeFile(std::string(folder) + "/inside", "12345");
+    EXPECT_EQ(valuesOf(folder).kind, FileKind::folder);
+    EXPECT_TRUE(platform().objects.open(home.url(folder)).value()->attributes());
+    EXPECT_EQ(platform().objects.status(home.url(folder)).value().linkCount, 2);
+    expectOutOfReach(folder, "inside");
+    EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 3U);
+  }
 };
 
 TEST_F(SafePaths, ASymlinkSwappedInForAFolderLeadsNowhere) {
@@ -64,6 +73,29 @@ TEST_F(SafePaths, DotDotDoesNotLeaveTheRoot) {
   EXPECT_TRUE(platform().resources.readValues(home.url("folder/..")));
 }
 
+TEST_F(SafePaths, CreateDirectoryTakesNothingButFoldersOnItsWay) {
+  home.writeFile("file");
+  home.makeFolder("real");
+  home.makeSymlink("link", "real");
+  home.makeSymlink("broken", "nowhere");
+  for (const std::string_view name :
+       {"file", "file/new", "link", "link/new", "broken", "broken/new"}) {
+    EXPECT_FALSE(platform().operations.createDirectory(home.url(name))) << name;
+  }
+  EXPECT_TRUE(std::filesystem::is_empty(home.at("real")));
+  EXPECT_FALSE(std::filesystem::exists(home.at("nowhere")));
+}
+
+TEST_F(SafePaths, CreateDirectoryWorksOutsideTheRootsThroughLinksOfTheUser) {
+  home.makeFolder("unused");
+  const std::string state = home.path() + "/state";
+  std::filesystem::create_directory(state);
+  std::filesystem::create_symlink(state, home.path() + "/linked");
+  EXPECT_TRUE(platform().operations.createDirectory(URL::fileURL(home.path() + "/linked/a/b")));
+  EXPECT_TRUE(std::filesystem::is_directory(state + "/a/b"));
+  EXPECT_EQ(failureOf(platform().operations.createDirectory(URL::fileURL("/proc/new/a"))), ENOENT);
+}
+
 TEST_F(SafePaths, PathsLongerThanTheKernelTakesWorkEverywhere) {
   std::string deep;
   for (int i = 0; i < 40; ++i)
@@ -91,25 +123,17 @@ TEST_F(SafePaths, PathsLongerThanTheKernelTakesWorkEverywhere) {
 
 TEST_F(SafePaths, AMountBelowARootIsListedAndNotEntered) {
   home.makeFolder("mounted");
-  home.writeFile("beside", "123");
   if (::unshare(CLONE_NEWNS) != 0 ||
       ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
       ::mount("none", home.at("mounted").c_str(), "tmpfs", 0, nullptr) != 0) {
     GTEST_SKIP() << "mounting is not permitted here";
   }
-  home.writeFile("mounted/inside", "12345");
-  const ResourceValues values = valuesOf("mounted");
-  EXPECT_EQ(values.kind, FileKind::folder);
-  EXPECT_TRUE(platform().objects.open(home.url("mounted")).value()->attributes());
-  EXPECT_EQ(platform().objects.status(home.url("mounted")).value().linkCount, 2);
-  expectOutOfReach("mounted", "inside");
-  EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 3U);
+  expectListedAndNotEntered("mounted");
   EXPECT_EQ(::umount(home.at("mounted").c_str()), 0);
 }
 
 // A subvolume is no mount to the kernel. Its objects bear the numbers of the root's own.
 TEST_F(SafePaths, ASubvolumeBelowARootIsListedAndNotEntered) {
-  home.writeFile("beside", "123");
   btrfs_ioctl_vol_args arguments{};
   std::string_view("subvolume").copy(arguments.name, BTRFS_PATH_NAME_MAX);
   const UniqueFd documents(::open(home.documents().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
@@ -117,15 +141,10 @@ TEST_F(SafePaths, ASubvolumeBelowARootIsListedAndNotEntered) {
     GTEST_SKIP() << "this file system has no subvolumes";
   }
   home.makeFolder("subvolume/folder");
-  home.writeFile("subvolume/inside", "12345");
   home.writeFile("subvolume/folder/inside", "12345");
-  EXPECT_EQ(valuesOf("subvolume").kind, FileKind::folder);
-  EXPECT_TRUE(platform().objects.open(home.url("subvolume")).value()->attributes());
-  EXPECT_EQ(platform().objects.status(home.url("subvolume")).value().linkCount, 2);
+  expectListedAndNotEntered("subvolume");
   EXPECT_EQ(failureOf(platform().directories.open(home.url("subvolume"))), EXDEV);
-  expectOutOfReach("subvolume", "inside");
   expectOutOfReach("subvolume/folder", "inside");
-  EXPECT_EQ(platform().sizes.directorySize(home.url()).value(), 3U);
 }
 
 }  // namespace

@@ -1,10 +1,13 @@
 #include <algorithm>
 #include <gio/gio.h>
 #include <gtest/gtest.h>
+#include <iterator>
+#include <sstream>
+#include <string>
 #include <sys/stat.h>
+#include <vector>
 
 #include "linux/files/NamePatterns.h"
-#include "linux/files/PackageTypes.h"
 #include "linux/files/TypeTable.h"
 
 namespace mirabel::testing {
@@ -27,53 +30,16 @@ ObjectStatus fileStatus(FileKind kind, std::uint16_t mode = S_IFREG) {
 // What was kept for one name must never be answered for another whose type differs, whichever of
 // them came first.
 TEST(TypesByName, AreWhatTheDatabaseSaysInAnyOrder) {
-  std::vector<std::string> names = {"a.txt",
-                                    "b.TXT",
-                                    "x.C",
-                                    "x.c",
-                                    "a.gz",
-                                    "a.tar.gz",
-                                    "A.TAR.GZ",
-                                    "a.svg.gz",
-                                    "a.b.12.jpg",
-                                    "Makefile",
-                                    "makefile.am",
-                                    "x.am",
-                                    "core",
-                                    "core.txt",
-                                    "x.core",
-                                    "README",
-                                    "readme.pdf",
-                                    "x.readme",
-                                    "notes.txt~",
-                                    "x~",
-                                    "x.txt,v",
-                                    "x,v",
-                                    "man.1",
-                                    "lib.so",
-                                    "lib.so.6",
-                                    "lib.so.6.1",
-                                    "x.6",
-                                    "a.7z.001",
-                                    "b.001",
-                                    "123.vdr",
-                                    "12.vdr",
-                                    "x.vdr",
-                                    ".bashrc",
-                                    ".txt",
-                                    "a.",
-                                    "a..txt",
-                                    "noextension",
-                                    "\xff\xfe.pdf",
-                                    "caf\xc3\x89.PDF",
-                                    "x.\xff",
-                                    "x.anim3",
-                                    "x.anim",
-                                    "copying",
-                                    "CMakeLists.txt",
-                                    "x.unknown-ending",
-                                    std::string(250, 'n') + ".jpg",
-                                    "a." + std::string(200, 'e')};
+  // Parted by spaces.
+  std::istringstream list(
+      "a.txt b.TXT x.C x.c a.gz a.tar.gz A.TAR.GZ a.svg.gz a.b.12.jpg Makefile makefile.am x.am "
+      "core core.txt x.core README readme.pdf x.readme notes.txt~ x~ x.txt,v x,v man.1 lib.so "
+      "lib.so.6 lib.so.6.1 x.6 a.7z.001 b.001 123.vdr 12.vdr x.vdr .bashrc .txt a. a..txt "
+      "noextension \xff\xfe.pdf caf\xc3\x89.PDF x.\xff x.anim3 x.anim copying CMakeLists.txt "
+      "letter.quill x.unknown-ending");
+  std::vector<std::string> names{std::istream_iterator<std::string>(list), {}};
+  names.push_back(std::string(250, 'n') + ".jpg");
+  names.push_back("a." + std::string(200, 'e'));
   for (int order = 0; order < 2; ++order, std::ranges::reverse(names)) {
     TypeTable types;
     for (int time = 0; time < 2; ++time) {
@@ -93,17 +59,29 @@ TEST(TypesByName, EndingsWithoutBoundAreForgottenNotMistaken) {
   EXPECT_EQ(types.typeOf("a.txt", fileStatus(FileKind::regular)), "text/plain");
 }
 
-TEST(TypesByKind, ComeBeforeNames) {
+TEST(TypesByKind, ComeBeforeNamesUnlessAFolderIsAPackage) {
   TypeTable types;
-  const std::pair<ObjectStatus, std::string_view> cases[] = {
+  const std::pair<ObjectStatus, std::string_view> kinds[] = {
       {fileStatus(FileKind::folder, S_IFDIR), "inode/directory"},
       {fileStatus(FileKind::symbolicLink, S_IFLNK), "inode/symlink"},
       {fileStatus(FileKind::other, S_IFIFO), "inode/fifo"},
       {fileStatus(FileKind::other, S_IFSOCK), "inode/socket"},
       {fileStatus(FileKind::other, S_IFCHR), "inode/chardevice"},
       {fileStatus(FileKind::other, S_IFBLK), "inode/blockdevice"}};
-  for (const auto& [status, type] : cases)
+  for (const auto& [status, type] : kinds)
     EXPECT_EQ(types.typeOf("a.txt", status), type);
+  const std::pair<std::string_view, std::string_view> folders[] = {
+      {"a.quill", "com.norvane.quillsuite.document"},
+      {"a.QuillSheet", "com.norvane.quillsuite.spreadsheet"},
+      {"a.quilldeck", "com.norvane.quillsuite.presentation"},
+      {"a.lumenbeat", "com.norvane.lumenbeat.project"},
+      {"a.lumenband", "com.norvane.lumenbeat.band"},
+      {"\xff.package", "com.norvane.package"},
+      {".hidden.quill", "com.norvane.quillsuite.document"}};
+  for (const auto& [name, type] : folders)
+    EXPECT_EQ(types.typeOf(name, kinds[0].first), type) << name;
+  for (const std::string_view name : {".quill", "quill", "a.quill.d", "a.quills", "a.", ""})
+    EXPECT_EQ(types.typeOf(name, kinds[0].first), "inode/directory") << name;
 }
 
 // What a database holds that this machine's does not.
@@ -127,26 +105,6 @@ TEST(NamePatterns, NamesWhoseTypeHangsOnMoreThanTheirEndingAreKnown) {
   EXPECT_FALSE(patterns.needsWholeName("plain"));
   patterns.add("[a-z]?");
   EXPECT_TRUE(patterns.needsWholeName("plain"));
-}
-
-TEST(PackageTypes, AreToldByTheSuffixOfAFolder) {
-  const std::pair<std::string_view, std::string_view> cases[] = {
-      {"a.quill", "com.norvane.quillsuite.document"},
-      {"a.QuillSheet", "com.norvane.quillsuite.spreadsheet"},
-      {"a.quilldeck", "com.norvane.quillsuite.presentation"},
-      {"a.lumenbeat", "com.norvane.lumenbeat.project"},
-      {"a.lumenband", "com.norvane.lumenbeat.band"},
-      {"a.package", "com.norvane.package"},
-      {".hidden.quill", "com.norvane.quillsuite.document"},
-      {"\xff.quill", "com.norvane.quillsuite.document"},
-      {".quill", ""},
-      {"quill", ""},
-      {"a.quill.d", ""},
-      {"a.quills", ""},
-      {"a.", ""},
-      {"", ""}};
-  for (const auto& [name, type] : cases)
-    EXPECT_EQ(PackageTypes::typeOf(name), type) << name;
 }
 
 }  // namespace

@@ -1,10 +1,9 @@
-#include <cstdlib>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <optional>
 #include <string>
 #include <vector>
 
+#include "linux/EnvironmentVariable.h"
 #include "linux/apps/ApplicationDirectories.h"
 #include "linux/apps/ContainerFolders.h"
 
@@ -14,33 +13,10 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-/// Sets a variable, or takes it away, as long as it lives.
-class Variable {
- public:
-  Variable(const char* name, const char* value) : name_(name) {
-    if (const char* before = std::getenv(name)) before_ = before;
-    set(value);
-  }
-  ~Variable() { set(before_ ? before_->c_str() : nullptr); }
-  Variable(const Variable&) = delete;
-  Variable& operator=(const Variable&) = delete;
-
- private:
-  void set(const char* value) {
-    if (value == nullptr) {
-      ::unsetenv(name_);
-    } else {
-      ::setenv(name_, value, 1);
-    }
-  }
-  const char* name_;
-  std::optional<std::string> before_;
-};
-
 ApplicationDirectories with(const char* dataHome, const char* dataDirectories,
                             ApplicationDirectories::Reach reach) {
-  const Variable home("XDG_DATA_HOME", dataHome);
-  const Variable directories("XDG_DATA_DIRS", dataDirectories);
+  const EnvironmentVariable home("XDG_DATA_HOME", dataHome);
+  const EnvironmentVariable directories("XDG_DATA_DIRS", dataDirectories);
   return ApplicationDirectories::of("/h", reach);
 }
 
