@@ -1,5 +1,6 @@
 #pragma once
 
+#include <gtest/gtest.h>
 #include <memory>
 #include <optional>
 #include <string>
@@ -44,5 +45,15 @@ class ApplicationsHome {
 /// The reason why something was left out, as both types were enumerated; empty for what was not.
 [[nodiscard]] std::string reasonFor(LinuxApplicationRegistry& registry,
                                     std::string_view identifier);
+
+/// A registry of what is installed in a home.
+class RegistryTest : public ::testing::Test {
+ protected:
+  std::vector<std::string> users() { return identifiersOf(registry, ApplicationType::user); }
+  std::vector<std::string> systems() { return identifiersOf(registry, ApplicationType::system); }
+
+  ApplicationsHome home;
+  LinuxApplicationRegistry registry{home.options()};
+};
 
 }  // namespace mirabel::testing

@@ -4,7 +4,6 @@
 #include <vector>
 
 #include "foundation/Unicode.h"
-#include "linux/apps/ApplicationIdentifier.h"
 #include "linux/apps/DesktopEntry.h"
 
 namespace mirabel::testing {
@@ -17,21 +16,6 @@ std::optional<DesktopEntry> parse(const std::string& text,
 
 DesktopEntry ofLines(const std::string& lines, const std::vector<std::string>& locales = {"C"}) {
   return parse("[Desktop Entry]\nType=Application\n" + lines + "\n", locales).value();
-}
-
-TEST(DesktopEntryTest, OnlyApplicationsThatAreNotDeletedCount) {
-  const std::pair<const char*, bool> cases[] = {
-      {"Type=Application\n", true},
-      {"Type=Application\nNoDisplay=true\n", true},
-      {"Type=Application\nHidden=false\n", true},
-      {"Type=Application\nHidden=true\n", false},
-      {"Type=Link\nURL=https://localhost\n", false},
-      {"Name=A\n", false},
-      {"", false},
-  };
-  for (const auto& [lines, isApplication] : cases)
-    EXPECT_EQ(parse("[Desktop Entry]\n" + std::string(lines)).value().isApplication, isApplication)
-        << lines;
 }
 
 TEST(DesktopEntryTest, OtherBytesAreNoEntry) {
@@ -118,39 +102,6 @@ TEST(DesktopEntryTest, KeysAreBooleansOrFalse) {
     EXPECT_EQ(entry.hasKeys(), expected.has_value()) << lines;
     EXPECT_EQ(entry.supportsOpenInPlace, std::nullopt) << lines;
   }
-}
-
-TEST(ApplicationIdentifierTest, OnlyPlainNamesAreIdentifiers) {
-  const std::string_view good[] = {"org.gnome.Notes", "firefox", "a-b_c+d@e.f", "0"};
-  for (const std::string_view text : good)
-    EXPECT_TRUE(isApplicationIdentifier(text)) << text;
-  EXPECT_TRUE(isApplicationIdentifier(std::string(255, 'a')));
-  const std::string bad[] = {"",
-                             ".",
-                             "..",
-                             ".a",
-                             "a/b",
-                             "a b",
-                             "a\nb",
-                             "\x1b[31m",
-                             "\xC3\xBC",
-                             std::string(256, 'a'),
-                             "a\\b",
-                             "a\xff",
-                             std::string("a\0b", 3),
-                             "#a",
-                             "a%2Fb"};
-  for (const std::string& text : bad)
-    EXPECT_FALSE(isApplicationIdentifier(text)) << text;
-}
-
-TEST(ApplicationIdentifierTest, FolderOfAnEntryIsPartOfItsIdentifier) {
-  EXPECT_EQ(identifierOfEntry("a.b.desktop"), "a.b");
-  EXPECT_EQ(identifierOfEntry("kde/sub/a.desktop"), "kde-sub-a");
-  EXPECT_EQ(identifierOfEntry(".desktop"), "");
-  EXPECT_EQ(identifierOfEntry("../a.desktop"), "..-a");
-  for (const char* path : {"a", "a.desktop~", "a.DESKTOP", "desktop", "a.desktop.bak"})
-    EXPECT_FALSE(identifierOfEntry(path)) << path;
 }
 
 }  // namespace

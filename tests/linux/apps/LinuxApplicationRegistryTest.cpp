@@ -17,29 +17,22 @@ namespace fs = std::filesystem;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-class LinuxApplicationRegistryTest : public ::testing::Test {
+class LinuxApplicationRegistryTest : public RegistryTest {
  protected:
-  std::vector<std::string> users() { return identifiersOf(registry, ApplicationType::user); }
-  std::vector<std::string> systems() { return identifiersOf(registry, ApplicationType::system); }
   std::string nameOf(std::string_view identifier) {
     const auto proxy = registry.proxyForBundleIdentifier(identifier);
     return proxy ? proxy->localizedName.value_or("unnamed") : "absent";
   }
-
-  ApplicationsHome home;
-  LinuxApplicationRegistry registry{home.options()};
 };
 
 TEST_F(LinuxApplicationRegistryTest, EntryWithoutKeysIsJudgedByWhatItDoes) {
   const std::string opens = "Exec=x %f\nMimeType=text/plain;\n";
   struct Case {
     std::string lines;
-    bool hasDocuments;
-    bool inPlace;
-    bool sharing;
+    bool hasDocuments, inPlace, sharing;
   };
   const Case cases[] = {
-      {"Name=a", true, false, true},
+      {"Name=a\nNoDisplay=true\nHidden=false", true, false, true},
       {opens, true, true, true},
       {opens, false, true, false},
       {opens + "X-Vessel-SupportsDocumentBrowser=false", true, false, false},
@@ -60,24 +53,22 @@ TEST_F(LinuxApplicationRegistryTest, EntryWithoutKeysIsJudgedByWhatItDoes) {
 }
 
 TEST_F(LinuxApplicationRegistryTest, EarlierDirectoryHidesTheLaterOne) {
-  home.write(home.system("a.desktop"), entryText("Name=system"));
-  home.write(home.system("b.desktop"), entryText("Name=system"));
-  home.write(home.system("c.desktop"), entryText("Name=system"));
-  home.write(home.system("d.desktop"), entryText("Name=system"));
-  home.write(home.system("sub-e.desktop"), entryText("Name=system"));
+  for (const char* name : {"a", "b", "c", "d", "sub-e"})
+    home.write(home.system(name) + ".desktop", entryText("Name=system"));
   home.write(home.user("a.desktop"), entryText("Name=user"));
   home.write(home.user("b.desktop"), entryText("Hidden=true"));
   home.write(home.user("c.desktop"), "[Desktop Entry]\nType=Link\n");
+  home.write(home.user("f.desktop"), "[Desktop Entry]\nName=A\n");
   fs::create_symlink("nowhere", home.user("d.desktop"));
   home.write(home.user("sub/e.desktop"), entryText("Name=user"));
   EXPECT_THAT(users(), ElementsAre("a", "sub-e"));
   EXPECT_THAT(systems(), ElementsAre("d"));
   LinuxApplicationRegistry fresh(home.options());
   for (LinuxApplicationRegistry* each : {&registry, &fresh}) {
-    EXPECT_EQ(each->proxyForBundleIdentifier("a")->localizedName, "user");
-    EXPECT_EQ(each->proxyForBundleIdentifier("sub-e")->localizedName, "user");
+    for (const char* identifier : {"a", "sub-e"})
+      EXPECT_EQ(each->proxyForBundleIdentifier(identifier)->localizedName, "user");
     EXPECT_EQ(each->proxyForBundleIdentifier("d")->localizedName, "system");
-    for (const char* hidden : {"b", "c"})
+    for (const char* hidden : {"b", "c", "f"})
       EXPECT_FALSE(each->proxyForBundleIdentifier(hidden)) << hidden;
   }
 }

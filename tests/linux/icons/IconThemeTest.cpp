@@ -1,5 +1,4 @@
 #include <cerrno>
-#include <filesystem>
 #include <gmock/gmock.h>
 
 #include "linux/icons/IconFixture.h"
@@ -73,12 +72,6 @@ TEST_F(IconThemeTest, DirectoriesThatCannotBeOnesAreLeftOut) {
   EXPECT_THAT(directoriesOf("\x01\x02 no key file"),
               ElementsAre(::testing::HasSubstr("no file of keys")));
   EXPECT_TRUE(IconTheme::read(at("missing")).error().isPosix(ENOENT));
-}
-
-TEST_F(IconThemeTest, WhatIsLargerThanAnyIndexIsNotRead) {
-  write("index.theme", "[Icon Theme]\n");
-  std::filesystem::resize_file(at("index.theme"), (1u << 20) + 1);
-  EXPECT_TRUE(IconTheme::read(at("index.theme")).error().isPosix(EFBIG));
 }
 
 }  // namespace

@@ -67,9 +67,8 @@ TEST_F(LinuxIconServiceTest, ADrawingIsDrawnAtTheSizeThatIsWanted) {
 
 TEST_F(LinuxIconServiceTest, EveryCutAndDamagedPictureIsRefusedOrWhole) {
   const Data whole = png({16, 16, red});
-  for (std::size_t size = 0; size < whole.size(); ++size) {
-    // The checksum of the end tells nothing more.
-    if (size + 4 >= whole.size()) break;
+  // The checksum of the end tells nothing more.
+  for (std::size_t size = 0; size + 4 < whole.size(); ++size) {
     write(file, stringView(whole).substr(0, size));
     expectFailure(icon("app"), IconStep::cachedBitmap, EILSEQ);
   }
@@ -83,10 +82,10 @@ TEST_F(LinuxIconServiceTest, EveryCutAndDamagedPictureIsRefusedOrWhole) {
 }
 
 TEST_F(LinuxIconServiceTest, WhatIsLargerThanAnyIconIsRefusedBeforeItIsDecoded) {
-  write(file, Picture{4097, 1, red});
-  expectFailure(icon("app"), IconStep::cachedBitmap, EFBIG);
-  write(file, Picture{1, 4097, red});
-  expectFailure(icon("app"), IconStep::cachedBitmap, EFBIG);
+  for (const Picture& picture : {Picture{4097, 1, red}, Picture{1, 4097, red}}) {
+    write(file, picture);
+    expectFailure(icon("app"), IconStep::cachedBitmap, EFBIG);
+  }
   write(file, Picture{4096, 1, red});
   EXPECT_EQ(pictureIn(icon("app").value()), (Picture{48, 1, red}));
   fs::resize_file(at(file), (8u << 20) + 1);
