@@ -33,44 +33,38 @@ TEST_F(OperationsOnDisk, AnImportedTreeIsLikeItsSource) {
   fs::create_hard_link(source + "/sub/\xFF/file", source + "/second name");
   fs::create_symlink("../away", source + "/sub/link");
   ASSERT_EQ(::mkfifo((source + "/fifo").c_str(), 0600), 0);
-  {
-    std::ofstream sparse(source + "/sparse");
-    sparse.seekp(64 << 20);
-    sparse << "end";
-  }
+  std::ofstream(source + "/sparse") << "begin";
+  fs::resize_file(source + "/sparse", 64 << 20);
   ASSERT_EQ(::chmod((source + "/sub/\xFF/file").c_str(), 0440), 0);
   ASSERT_EQ(::chmod((source + "/sub").c_str(), 0550), 0);
   const timespec times[] = {{1'000'000, 1}, {2'000'000, 123'456'789}};
   ASSERT_EQ(::utimensat(AT_FDCWD, (source + "/sub").c_str(), times, 0), 0);
   const bool hasAttributes = ::setxattr((source + "/sub").c_str(), "user.mine", "value", 5, 0) == 0;
 
-  const auto imported = import(source, "");
-  ASSERT_TRUE(imported) << imported.error().description();
-  EXPECT_EQ(imported->path(), home.at("source"));
-  EXPECT_EQ(tree("source").at("sub/\xFF/file"), "contents");
-  EXPECT_EQ(tree("source").at("sub/link"), "-> ../away");
-  EXPECT_EQ(tree("source").at("fifo"), "special");
+  EXPECT_EQ(import(source, "").value().path(), home.at("source"));
+  EXPECT_EQ(tree("source"), tree("../source"));
+  for (const char* name : {"/sub", "/sub/\xFF/file", "/fifo", "/sparse"}) {
+    const struct stat copy = statusOf("source" + std::string(name));
+    const struct stat original = statusOf("../source" + std::string(name));
+    EXPECT_EQ(copy.st_mode, original.st_mode) << name;
+    EXPECT_EQ(copy.st_mtim.tv_sec, original.st_mtim.tv_sec) << name;
+    EXPECT_EQ(copy.st_mtim.tv_nsec, original.st_mtim.tv_nsec) << name;
+  }
   EXPECT_EQ(statusOf("source/sub/\xFF/file").st_ino, statusOf("source/second name").st_ino);
-  EXPECT_EQ(statusOf("source/sub/\xFF/file").st_mode & 07777, 0440U);
-  EXPECT_EQ(statusOf("source/sub").st_mode & 07777, 0550U);
-  EXPECT_EQ(statusOf("source/sub").st_mtim.tv_sec, 2'000'000);
-  EXPECT_EQ(statusOf("source/sub").st_mtim.tv_nsec, 123'456'789);
-  EXPECT_EQ(statusOf("source/sparse").st_size, (64 << 20) + 3);
   EXPECT_LT(statusOf("source/sparse").st_blocks, 2048);
   char value[8];
   if (hasAttributes) {
     EXPECT_EQ(::getxattr(home.at("source/sub").c_str(), "user.mine", value, sizeof value), 5);
   }
-  fs::permissions(source + "/sub", fs::perms::owner_all);
-  fs::permissions(home.at("source/sub"), fs::perms::owner_all);
+  for (const std::string& folder : {source + "/sub", home.at("source/sub")})
+    fs::permissions(folder, fs::perms::owner_all);
 }
 
 TEST_F(OperationsOnDisk, WhatMayNotBeChangedStaysWhole) {
-  makeFolder("closed/sub");
-  home.writeFile("closed/file", "1");
-  makeFolder("open/closed");
-  home.writeFile("open/a", "A");
-  home.writeFile("open/closed/file", "2");
+  for (const char* folder : {"closed/sub", "open/closed"})
+    makeFolder(folder);
+  for (const char* file : {"closed/file", "open/a", "open/closed/file"})
+    home.writeFile(file, file);
   makeFolder("target");
   home.setMode("open/closed", 0555);
   home.setMode("closed", 0555);
@@ -120,7 +114,6 @@ TEST_F(OperationsOnDisk, WhatCanNotBeRenamedIsSaidToBeSo) {
   makeFolder("target");
   setCheck([](std::string_view call) { return call == "rename" ? EXDEV : 0; });
   for (const Result<URL>& outcome : {rename("folder", "new"), move("folder", "target")}) {
-    ASSERT_FALSE(outcome);
     EXPECT_EQ(outcome.error(),
               Error::posix(ENOTSUP, "it can't be renamed on this kind of file system"));
   }
@@ -251,9 +244,7 @@ TEST_F(OtherFileSystem, TakesItemsWholeAndGivesThemBack) {
 TEST_F(OperationsOnDisk, AnotherNameOfTheSameFileIsTaken) {
   home.writeFile("one", "x");
   home.link("one", "two");
-  const auto renamed = rename("one", "two");
-  ASSERT_FALSE(renamed);
-  EXPECT_TRUE(renamed.error().is(FileErrorCode::fileExists));
+  EXPECT_TRUE(rename("one", "two").error().is(FileErrorCode::fileExists));
   EXPECT_EQ(tree().size(), 2U);
 }
 

@@ -62,21 +62,6 @@ class Recovery : public OperationsTest {
   std::string state_;
 };
 
-TEST_F(Recovery, OfAMoveGivesTheItemItsNameBackUnlessItsCopyHasOne) {
-  home.writeFile("from/" + hidden, "item");
-  home.writeFile("to/" + std::string(prefix) + "2", "copy");
-  start(moveOf(copyAt("to/" + std::string(prefix) + "2")));
-  EXPECT_EQ(tree(), (Tree{{"from", "/"}, {"from/doc", "item"}, {"to", "/"}}));
-
-  home.rename("from/doc", "from/" + hidden);
-  home.writeFile("to/doc", "item");
-  setSameTime("to/doc", "from/" + hidden);
-  start(moveOf(copyAt("to/doc")));
-  EXPECT_EQ(tree(), (Tree{{"from", "/"}, {"to", "/"}, {"to/doc", "item"}}));
-  EXPECT_THAT(hiddenNames(), ::testing::IsEmpty());
-  EXPECT_FALSE(hasPendingWork());
-}
-
 TEST_F(Recovery, OfAMoveWhoseCopyIsNotToBeFoundKeepsTheItem) {
   // Its name is taken by something new, and the folder that it was to go to is gone.
   home.writeFile("from/" + hidden, "item");
@@ -111,8 +96,7 @@ TEST_F(Recovery, OfAMoveKeepsBothUnlessTheCopyIsTheOneThatWasMadeAndStillLikeThe
     PendingRecords records = moveOf(copyAt("to/doc"));
     change.make(records.moves.front().copy);
     start(records);
-    EXPECT_EQ(tree().count("from/doc"), 1) << change.what;
-    EXPECT_EQ(tree().count("to/doc"), 1) << change.what;
+    EXPECT_TRUE(tree().contains("from/doc") && tree().contains("to/doc")) << change.what;
     EXPECT_FALSE(hasPendingWork()) << change.what;
     home.remove("from/doc");
     home.remove("to/doc");
