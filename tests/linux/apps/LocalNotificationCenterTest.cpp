@@ -17,27 +17,32 @@ void awaitEnd(const std::weak_ptr<int>& captured) {
     std::this_thread::yield();
 }
 
-TEST(LocalNotificationCenterTest, RemovalWaitsForTheCallbackThatRuns) {
-  LocalNotificationCenter center;
-  std::promise<void> entered;
-  int calls = 0;
-  std::atomic<bool> isDone = false;
-  auto token = std::make_shared<int>();
-  const std::weak_ptr<int> other = token;
-  center.addObserver(&center, "a", [&](std::string_view) {
-    ++calls;
-    entered.set_value();
-    awaitEnd(other);
-    isDone = true;
-  });
-  center.addObserver(&center, "b", [token = std::move(token)](std::string_view) {});
-  center.post("a");
-  entered.get_future().wait();
-  // Waits to be delivered, and will find nobody.
-  center.post("a");
-  center.removeEveryObserver(&center);
-  EXPECT_TRUE(isDone);
-  EXPECT_EQ(calls, 1);
+TEST(LocalNotificationCenterTest, RemovalAndEndWaitForTheCallbackThatRunsAndDropTheRest) {
+  for (const bool ends : {false, true}) {
+    std::optional<LocalNotificationCenter> center(std::in_place);
+    std::promise<void> entered;
+    std::atomic<int> calls = 0;
+    std::atomic<bool> isDone = false;
+    auto token = std::make_shared<int>();
+    const std::weak_ptr<int> other = token;
+    center->addObserver(&calls, "a", [&](std::string_view) {
+      ++calls;
+      entered.set_value();
+      awaitEnd(other);
+      isDone = true;
+    });
+    center->addObserver(&calls, "b", [&, token = std::move(token)](std::string_view) { ++calls; });
+    center->post("a");
+    center->post("b");
+    entered.get_future().wait();
+    if (ends) {
+      center.reset();
+    } else {
+      center->removeEveryObserver(&calls);
+    }
+    EXPECT_TRUE(isDone);
+    EXPECT_EQ(calls, 1);
+  }
 }
 
 TEST(LocalNotificationCenterTest, PostsThatWaitAreDeliveredOnce) {
@@ -56,26 +61,6 @@ TEST(LocalNotificationCenterTest, PostsThatWaitAreDeliveredOnce) {
   goOn.set_value();
   center.removeEveryObserver(nullptr);
   EXPECT_EQ(calls, 2);
-}
-
-TEST(LocalNotificationCenterTest, EndDropsWhatIsNotDelivered) {
-  std::optional<LocalNotificationCenter> center(std::in_place);
-  std::promise<void> entered;
-  std::atomic<int> calls = 0;
-  auto token = std::make_shared<int>();
-  const std::weak_ptr<int> other = token;
-  center->addObserver(nullptr, "a", [&](std::string_view) {
-    ++calls;
-    entered.set_value();
-    awaitEnd(other);
-  });
-  center->addObserver(nullptr, "b",
-                      [&calls, token = std::move(token)](std::string_view) { ++calls; });
-  center->post("a");
-  center->post("b");
-  entered.get_future().wait();
-  center.reset();
-  EXPECT_EQ(calls, 1);
 }
 
 }  // namespace

@@ -21,27 +21,45 @@ class IconLookupTest : public IconFixture {
   }
 
   const std::string sizes =
-      "Directories=16,48,48@2,any\n[16]\nSize=16\nType=Fixed\n[48]\nSize=48\nType=Fixed\n"
-      "[48@2]\nSize=48\nScale=2\nType=Fixed\n"
+      "Directories=16,32,48,24@2,48@2,any\n[16]\nSize=16\nType=Fixed\n"
+      "[32]\nSize=32\nThreshold=3\n[48]\nSize=48\nType=Fixed\n"
+      "[24@2]\nSize=24\nScale=2\nType=Fixed\n[48@2]\nSize=48\nScale=2\nType=Fixed\n"
       "[any]\nSize=128\nMinSize=64\nMaxSize=512\nType=Scalable\n";
 };
 
 TEST_F(IconLookupTest, TheFirstDirectoryThatFitsWinsAndElseTheNearest) {
   writeTheme("mine", "", sizes);
   for (const char* file : {"16/a.png", "48/a.png", "48@2/a.png", "any/a.svg", "16/small.png",
-                           "48/both.svg", "48/both.png"})
+                           "48/both.svg", "48/both.png", "16/b.png", "32/b.png", "48/b.png",
+                           "24@2/c.png", "48/c.png", "any/d.svg", "48@2/d.png"})
     write(icons + "mine/" + file, "x");
   const struct {
     const char* name;
     IconSize size;
     const char* file;
-  } cases[] = {
-      {"a", {16, 1}, "16/a.png"},       {"a", {48, 1}, "48/a.png"},
-      {"a", {48, 2}, "48@2/a.png"},     {"a", {64, 1}, "any/a.svg"},
-      {"a", {20, 1}, "16/a.png"},       {"a", {40, 1}, "48/a.png"},
-      {"a", {4096, 1}, "any/a.svg"},    {"small", {512, 1}, "16/small.png"},
-      {"both", {48, 1}, "48/both.png"}, {"both.svg", {48, 1}, "48/both.png"},
-  };
+  } cases[] = {{"a", {16, 1}, "16/a.png"},
+               {"a", {48, 1}, "48/a.png"},
+               {"a", {48, 2}, "48@2/a.png"},
+               {"a", {64, 1}, "any/a.svg"},
+               {"a", {20, 1}, "16/a.png"},
+               {"a", {40, 1}, "48/a.png"},
+               {"a", {4096, 1}, "any/a.svg"},
+               {"small", {512, 1}, "16/small.png"},
+               {"both", {48, 1}, "48/both.png"},
+               {"both.svg", {48, 1}, "48/both.png"},
+               {"b", {29, 1}, "32/b.png"},
+               {"b", {35, 1}, "32/b.png"},
+               {"b", {43, 1}, "48/b.png"},
+               {"b", {42, 1}, "48/b.png"},
+               {"b", {41, 1}, "32/b.png"},
+               {"b", {23, 1}, "32/b.png"},
+               {"b", {21, 1}, "16/b.png"},
+               // The pixels fit, the drawing does not.
+               {"c", {24, 2}, "24@2/c.png"},
+               {"c", {48, 1}, "48/c.png"},
+               {"d", {63, 1}, "any/d.svg"},
+               {"d", {512, 1}, "any/d.svg"},
+               {"d", {90, 1}, "any/d.svg"}};
   for (const auto& c : cases)
     EXPECT_EQ(find(c.name, c.size, "mine"), icons + "mine/" + c.file) << c.name << c.size.size;
 }
