@@ -1,6 +1,4 @@
 #include <filesystem>
-#include <fstream>
-#include <gmock/gmock.h>
 
 #include "linux/EnvironmentVariable.h"
 #include "linux/FilesFixture.h"
@@ -10,37 +8,11 @@ namespace mirabel::testing {
 namespace {
 
 namespace fs = std::filesystem;
-using ::testing::HasSubstr;
 
 class OpeningThePlatform : public ::testing::Test {
  protected:
   TempHome home;
 };
-
-TEST_F(OpeningThePlatform, FailsWithAWordForWhatIsNoHome) {
-  home.makeFolder("inner");
-  home.makeFolder("inner/Documents");
-  std::ofstream(home.path() + "/file") << "x";
-  struct Case {
-    std::string home;
-    int code;
-    std::string detail;
-  };
-  const Case cases[] = {{home.path() + "/missing", ENOENT, "cannot be reached"},
-                        {home.path() + "/file", ENOTDIR, "is not a folder"},
-                        {home.at("inner"), EINVAL, "below another folder named \"Documents\""},
-                        {"", EINVAL, "cannot be reached"}};
-  for (const Case& c : cases) {
-    const auto opened = LinuxPlatform::open({.home = c.home});
-    ASSERT_EQ(failureOf(opened), c.code) << c.home;
-    EXPECT_THAT(opened.error().userInfo.find(errorkey::detail)->second, HasSubstr(c.detail))
-        << c.home;
-  }
-  fs::remove_all(home.documents());
-  std::ofstream(home.documents()) << "x";
-  EXPECT_EQ(failureOf(LinuxPlatform::open({.home = home.path()})), ENOTDIR);
-  EXPECT_FALSE(fs::exists(home.path() + "/.local"));
-}
 
 TEST_F(OpeningThePlatform, ResolvesSymlinksOnTheWayToTheDocumentsOnce) {
   const TempHome elsewhere;

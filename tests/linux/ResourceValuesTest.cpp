@@ -1,4 +1,4 @@
-#include <algorithm>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <vector>
 
@@ -110,7 +110,6 @@ TEST_F(ResourceValuesOnDisk, WritableMeansThatThisUserMayWrite) {
   for (const Case& file : files)
     home.writeFile(file.name, "1");
   home.makeFolder("locked");
-  home.writeFile("locked/inside");
   home.makeFolder("listed");
   if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
   for (const Case& file : files)
@@ -128,11 +127,35 @@ TEST_F(ResourceValuesOnDisk, WritableMeansThatThisUserMayWrite) {
     EXPECT_EQ(urls[i].resources().snapshot()->isWritable, files[i].isWritable) << files[i].name;
   }
   EXPECT_FALSE(valuesOf("listed").isWritable);
-  EXPECT_EQ(platform().objects.status(home.url("locked")).value().linkCount, 2);
-  EXPECT_EQ(failureOf(platform().resources.readValues(home.url("locked/inside"))), EACCES);
-  EXPECT_EQ(failureOf(platform().directories.open(home.url("locked"))), EACCES);
   EXPECT_EQ(failureOf(platform().sizes.directorySize(home.url())), EACCES);
   closePlatform();
+}
+
+TEST_F(ResourceValuesOnDisk, SizesCountEachFileOnceAndLinksNot) {
+  home.makeFolder("a");
+  home.writeFile("a/file", "12345");
+  home.link("a/file", "a/same");
+  home.makeSymlink("a/link", "/usr");
+  home.makeFifo("a/fifo");
+  EXPECT_EQ(platform().sizes.directorySize(home.url("a")).value(), 5U);
+  EXPECT_EQ(failureOf(platform().sizes.directorySize(home.url("a/file"))), ENOTDIR);
+  EXPECT_FALSE(platform().sizes.directorySize(home.url("a/link")));
+}
+
+TEST_F(ResourceValuesOnDisk, DepthCostsNoDescriptors) {
+  std::string path = "d";
+  for (int depth = 0; depth < 300; ++depth)
+    path += "/d";
+  ASSERT_TRUE(platform().operations.createDirectory(home.url(path)));
+  home.writeFile(path + "/file", "1234567");
+  rlimit before{};
+  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
+  rlimit few = before;
+  few.rlim_cur = 64;
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &few), 0);
+  const auto size = platform().sizes.directorySize(home.url());
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+  EXPECT_EQ(size.value(), 7U);
 }
 
 }  // namespace

@@ -135,11 +135,6 @@ TEST_F(OperationsOnDisk, ManyOfOneNameFindFreeNamesQuickly) {
   EXPECT_EQ(tree(".Trash").at("same.txt"), "1");
   EXPECT_EQ(tree(".Trash").at("same 300.txt"), "300");
   EXPECT_LT(looks, 100);
-  const std::string longest(255, 'n');
-  home.writeFile("from/" + longest, "first");
-  ASSERT_TRUE(trash("from/" + longest));
-  home.writeFile("from/" + longest, "second");
-  EXPECT_EQ(trash("from/" + longest)->lastPathComponent(), std::string(253, 'n') + " 2");
 }
 
 /// Where one folder answers to two spellings of its name, as in a folder that takes them for the
