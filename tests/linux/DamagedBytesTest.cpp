@@ -88,13 +88,8 @@ class DamagedBytes : public VolumeFixture {
     folder_ = fs::directory_iterator(state_)->path();
   }
   void change() {
-    for (const char* name : {"folder/doc1", "folder/doc2"}) {
-      write("tmp", "new");
-      rename("tmp", name);
-    }
-    rename("folder/doc3", "moved");
-    remove("folder/doc4");
-    makeFolder("folder/inner");
+    run("write tmp new; mv tmp folder/doc1; write tmp new; mv tmp folder/doc2; "
+        "mv folder/doc3 moved; rm folder/doc4; mkdir folder/inner");
     index().currentEventID().value();
   }
 
@@ -160,7 +155,18 @@ class DamagedBytes : public VolumeFixture {
     }
   }
 
-  void damageEach(const std::string& name, const std::set<std::size_t>& offsets) {
+  /// Changes bytes of the file: its beginning, some of each piece behind the header, and some of
+  /// the rest.
+  void damageBytes(const std::string& name, std::size_t header, std::size_t piece) {
+    const std::size_t size = files_.at(name).size();
+    std::set<std::size_t> offsets;
+    for (std::size_t i = 0; i < std::min<std::size_t>(size, 32); ++i)
+      offsets.insert(i);
+    std::mt19937_64 random(seed());
+    for (std::size_t start = header; start < size; start += piece)
+      offsets.insert(std::min(size - 1, start + random() % 24));
+    for (int i = 0; i < 60; ++i)
+      offsets.insert(random() % size);
     for (const std::size_t offset : offsets) {
       mend();
       std::string bytes = files_.at(name);
@@ -170,7 +176,13 @@ class DamagedBytes : public VolumeFixture {
       if (HasFailure()) return;
     }
   }
-  void truncateAt(const std::string& name, const std::set<std::size_t>& sizes) {
+  /// Cuts it off everywhere between pieces, and within them.
+  void cut(const std::string& name, std::size_t header, std::size_t piece) {
+    const std::size_t whole = files_.at(name).size();
+    std::set<std::size_t> sizes{0, header};
+    for (std::size_t start = header + piece; start <= whole; start += piece)
+      sizes.insert({start - 1, start - piece / 2, start});
+    sizes.erase(whole);
     for (const std::size_t size : sizes) {
       mend();
       fs::resize_file(file(name), size);
@@ -179,27 +191,6 @@ class DamagedBytes : public VolumeFixture {
     }
   }
 
-  /// The beginning of the file, that of each piece, and some of the rest.
-  static std::set<std::size_t> sample(std::size_t size, std::size_t header, std::size_t piece,
-                                      std::size_t count) {
-    std::set<std::size_t> offsets;
-    for (std::size_t i = 0; i < std::min<std::size_t>(size, 32); ++i)
-      offsets.insert(i);
-    std::mt19937_64 random(seed());
-    for (std::size_t start = header; start < size; start += piece)
-      offsets.insert(std::min(size - 1, start + random() % 24));
-    for (std::size_t i = 0; i < count; ++i)
-      offsets.insert(random() % size);
-    return offsets;
-  }
-  static std::set<std::size_t> cuts(std::size_t size, std::size_t header, std::size_t piece) {
-    std::set<std::size_t> sizes{0, header};
-    for (std::size_t start = header + piece; start <= size; start += piece) {
-      sizes.insert({start - 1, start - piece / 2});
-      if (start < size) sizes.insert(start);
-    }
-    return sizes;
-  }
   static unsigned long seed() {
     const char* given = std::getenv("MIRABEL_TEST_SEED");
     return given == nullptr ? 7 : std::strtoul(given, nullptr, 10);
@@ -223,14 +214,12 @@ TEST_F(DamagedBytes, OfAClosedStateGiveTheRightChangesOrStartOver) {
   change();
   close();
   keep();
-  const std::size_t size = files_.at("volume.db").size();
-  damageEach("volume.db", sample(size, 0, databasePageSize, 60));
-  truncateAt("volume.db", cuts(size, 0, databasePageSize));
-  EXPECT_EQ(keptRight_, 0) << "no byte of the database is without use";
-  const std::size_t witness = files_.at("witness").size();
-  damageEach("witness", sample(witness, 0, 8, 40));
-  truncateAt("witness", {0, 1, witness - 1});
-  EXPECT_EQ(keptRight_, 0);
+  for (const auto& [name, piece] :
+       {std::pair{"volume.db", databasePageSize}, std::pair{"witness", std::size_t{8}}}) {
+    damageBytes(name, 0, piece);
+    cut(name, 0, piece);
+  }
+  EXPECT_EQ(keptRight_, 0) << "no byte is without use";
   mend();
   expectRightOrStartOver("mended");
   EXPECT_EQ(keptRight_, 1);
@@ -247,16 +236,13 @@ TEST_F(DamagedBytes, OfAKilledProcessGiveTheRightChangesOrStartOver) {
     ASSERT_EQ(process.line(), "done");
   }
   keep();
-  const std::size_t log = files_.at("volume.db-wal").size();
-  ASSERT_GT(log, frameSize);
-  damageEach("volume.db-wal", sample(log, logHeaderSize, frameSize, 60));
-  truncateAt("volume.db-wal", cuts(log, logHeaderSize, frameSize));
+  damageBytes("volume.db-wal", logHeaderSize, frameSize);
+  cut("volume.db-wal", logHeaderSize, frameSize);
   const int startedOver = startedOver_;
   EXPECT_GT(startedOver, 0);
   // What the log holds as well is not read from the database.
-  const std::size_t size = files_.at("volume.db").size();
-  damageEach("volume.db", sample(size, 0, databasePageSize, 60));
-  truncateAt("volume.db", cuts(size, 0, databasePageSize));
+  damageBytes("volume.db", 0, databasePageSize);
+  cut("volume.db", 0, databasePageSize);
   EXPECT_GT(startedOver_, startedOver);
   EXPECT_GT(keptRight_, 0);
 }

@@ -123,19 +123,20 @@ TEST_P(FollowedFoldersTest, WhatWasLookedAtWhileNobodyFollowedThemIsToldWhenThey
   fs::create_hard_link(library + "/sub/a.txt", library + "/linked.txt");
   auto expected = contentsOf("one");
   expected.insert("apps/one/Documents/linked.txt");
+  const auto lookAt = [&](const std::vector<const char*>& places) {
+    for (const char* place : places)
+      documentAt(library + place);
+  };
   const std::function<void()> looks[] = {
       [&] {
-        for (const char* place : {"/sub/a.txt", "/sub", "/linked.txt", ""})
-          documentAt(library + place);
+        lookAt({"/sub/a.txt", "/sub", "/linked.txt", ""});
       },
       [&] {
-        for (const char* place : {"", "/linked.txt", "/sub", "/sub/a.txt"})
-          documentAt(library + place);
+        lookAt({"", "/linked.txt", "/sub", "/sub/a.txt"});
       },
       [&] {
         list(library, {"sub", "linked.txt"}), list(library + "/sub", {"a.txt"});
-      },
-  };
+      }};
   std::uint64_t version = 0;
   for (const auto& look : looks) {
     follow({{library, "One"}}, ++version);
@@ -170,14 +171,6 @@ TEST_P(FollowedFoldersTest, AreKnownToTheNextProcess) {
   fs::create_directories(libraryOf("two") + "/sub");
   writeTo(libraryOf("two") + "/sub/a.txt");
   EXPECT_EQ(toldSince(later).paths, contentsOf("two")) << "its folder was made again";
-}
-
-TEST_P(FollowedFoldersTest, OneThatComesWhileNobodyLooksIsReadByTheNextProcess) {
-  const std::uint64_t start = anchor();
-  close();
-  follow({{libraryOf("one"), "One"}}, 1);
-  close();
-  EXPECT_EQ(toldSince(start).paths, contentsOf("one"));
 }
 
 TEST_P(FollowedFoldersTest, ALinkInThePlaceOfOneLeadsNowhere) {

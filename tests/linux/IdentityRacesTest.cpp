@@ -25,8 +25,7 @@ TEST_F(IdentityRaces, ALookThatComesLateTurnsNothingBack) {
   write("doc");
   const Sighting before = see("doc");
   Sighting late{"doc", status("doc")};
-  write("tmp", "new");
-  rename("tmp", "doc");
+  run("write tmp; mv tmp doc");
   const Sighting saved = see("doc");
   ASSERT_EQ(saved.documentID, before.documentID);
 
@@ -34,19 +33,14 @@ TEST_F(IdentityRaces, ALookThatComesLateTurnsNothingBack) {
   EXPECT_EQ(late.documentID, before.documentID);
   EXPECT_EQ(late.fileID, saved.fileID);
   EXPECT_EQ(late.status.inode, inode("doc"));
-  write("tmp", "newer");
-  rename("tmp", "doc");
+  run("write tmp; mv tmp doc");
   EXPECT_EQ(findDocument(before.documentID), "doc");
 }
 
 TEST_F(IdentityRaces, WhatWentAwayAfterItWasSeenHasNoIdentity) {
-  makeFolder("known");
-  file("known");
-  rename("known", "moved");
-  makeFolder("unknown");
+  run("mkdir known; look known; mv known moved; mkdir unknown");
   Sighting gone[] = {{"moved", status("moved")}, {"unknown", status("unknown")}};
-  remove("moved");
-  remove("unknown");
+  run("rm moved; rm unknown");
   ASSERT_TRUE(learnIn(index(), documents_, gone));
   EXPECT_EQ(gone[0].fileID, 0u);
   EXPECT_EQ(gone[1].fileID, 0u);

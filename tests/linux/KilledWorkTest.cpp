@@ -220,8 +220,6 @@ TEST_F(KilledWork, LeavesAllThatItWasToldStanding) {
   EXPECT_TRUE(notices_.empty());
   EXPECT_GT(anchors_.size(), 10u);
   EXPECT_GT(names_.size(), 50u);
-  RecordProperty("anchors", static_cast<int>(anchors_.size()));
-  RecordProperty("identities", static_cast<int>(names_.size()));
 }
 
 }  // namespace

@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <sstream>
 #include <stdio.h>
 #include <sys/stat.h>
@@ -72,24 +73,16 @@ void VolumeFixture::run(const std::string& steps) {
     std::istringstream words(step);
     std::string verb, one, two;
     words >> verb >> one >> two;
-    if (verb == "write") {
-      write(one, two.empty() ? "x" : two);
-    } else if (verb == "mkdir") {
-      makeFolder(one);
-    } else if (verb == "mv") {
-      rename(one, two);
-    } else if (verb == "ln") {
-      link(one, two);
-    } else if (verb == "swap") {
-      exchange(one, two);
-    } else if (verb == "rm") {
-      remove(one);
-    } else if (verb == "look") {
-      see(one);
-    } else {
-      ASSERT_EQ(verb, "close");
-      close();
-    }
+    const std::map<std::string, std::function<void()>> verbs{
+        {"write", [&] { write(one, two.empty() ? "x" : two); }},
+        {"mkdir", [&] { makeFolder(one); }},
+        {"mv", [&] { rename(one, two); }},
+        {"ln", [&] { link(one, two); }},
+        {"swap", [&] { exchange(one, two); }},
+        {"rm", [&] { remove(one); }},
+        {"look", [&] { see(one); }},
+        {"close", [&] { close(); }}};
+    verbs.at(verb)();
   }
 }
 
