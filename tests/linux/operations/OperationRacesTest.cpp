@@ -4,10 +4,9 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
-#include <linux/fs.h>
 #include <random>
 #include <set>
-#include <sys/syscall.h>
+#include <stdio.h>
 #include <thread>
 #include <unistd.h>
 
@@ -159,11 +158,12 @@ class ManyPrograms : public OperationsTest {
       std::ofstream(name) << text;
       written_[editor].insert(text);
       const std::string document = home.at(documentAt(random()));
-      if (::syscall(SYS_renameat2, AT_FDCWD, name.c_str(), AT_FDCWD, document.c_str(),
-                    RENAME_EXCHANGE) == 0) {
+      const auto renames = [&](unsigned flags) {
+        return ::renameat2(AT_FDCWD, name.c_str(), AT_FDCWD, document.c_str(), flags) == 0;
+      };
+      if (renames(RENAME_EXCHANGE)) {
         std::ifstream(name) >> replaced_[editor].emplace_back();
-      } else if (::syscall(SYS_renameat2, AT_FDCWD, name.c_str(), AT_FDCWD, document.c_str(),
-                           RENAME_NOREPLACE) == 0) {
+      } else if (renames(RENAME_NOREPLACE)) {
         continue;
       } else {
         replaced_[editor].push_back(text);
@@ -173,9 +173,8 @@ class ManyPrograms : public OperationsTest {
   }
 
   // A minute's worth of them takes some 600,000.
-  const int saves_ = std::getenv("MIRABEL_TEST_SAVES") == nullptr
-                         ? 1000
-                         : std::atoi(std::getenv("MIRABEL_TEST_SAVES"));
+  const char* const given_ = std::getenv("MIRABEL_TEST_SAVES");
+  const int saves_ = given_ == nullptr ? 1000 : std::atoi(given_);
   std::atomic<bool> isOver_ = false;
   std::set<std::string> written_[2];
   std::vector<std::string> replaced_[2];
@@ -207,10 +206,10 @@ TEST_F(ManyPrograms, LoseNothingThatWasWritten) {
   }
 
   std::multiset<std::string> expected;
-  for (const int editor : {0, 1})
-    expected.insert(written_[editor].begin(), written_[editor].end());
-  for (const int editor : {0, 1}) {
-    for (const std::string& text : replaced_[editor])
+  for (const auto& written : written_)
+    expected.insert(written.begin(), written.end());
+  for (const auto& replaced : replaced_) {
+    for (const std::string& text : replaced)
       expected.erase(expected.find(text));
   }
   std::multiset<std::string> found;
