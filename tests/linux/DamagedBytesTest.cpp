@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
@@ -77,7 +76,7 @@ TEST_F(PageSums, NoByteOfADatabaseChangesUnnoticed) {
 /// A volume's state with a history in it, which can be damaged and mended any number of times.
 class DamagedBytes : public VolumeFixture {
  protected:
-  std::string file(const std::string& name) const { return folder_ + "/" + name; }
+  std::string file(const std::string& name) const { return volumeFolder() + "/" + name; }
 
   void makeTree() {
     makeFolder("folder");
@@ -85,7 +84,6 @@ class DamagedBytes : public VolumeFixture {
       write("folder/doc" + std::to_string(i));
     anchor_ = index().currentEventID().value();
     history_ = index().historyUUID();
-    folder_ = fs::directory_iterator(state_)->path();
   }
   void change() {
     run("write tmp new; mv tmp folder/doc1; write tmp new; mv tmp folder/doc2; "
@@ -95,7 +93,7 @@ class DamagedBytes : public VolumeFixture {
 
   /// Remembers the files as they are, and what is right.
   void keep() {
-    for (const auto& entry : fs::directory_iterator(folder_)) {
+    for (const auto& entry : fs::directory_iterator(volumeFolder())) {
       files_[entry.path().filename()] = bytesOf(entry.path());
     }
     // The witness knows its own file.
@@ -108,7 +106,7 @@ class DamagedBytes : public VolumeFixture {
 
   void mend() {
     close();
-    for (const auto& entry : fs::directory_iterator(folder_))
+    for (const auto& entry : fs::directory_iterator(volumeFolder()))
       if (!files_.contains(entry.path().filename())) fs::remove(entry.path());
     fs::remove(file("witness"));
     ASSERT_EQ(::link((base_ + "/witness").c_str(), file("witness").c_str()), 0);
@@ -162,7 +160,7 @@ class DamagedBytes : public VolumeFixture {
     std::set<std::size_t> offsets;
     for (std::size_t i = 0; i < std::min<std::size_t>(size, 32); ++i)
       offsets.insert(i);
-    std::mt19937_64 random(seed());
+    std::mt19937_64 random(seedOr(7));
     for (std::size_t start = header; start < size; start += piece)
       offsets.insert(std::min(size - 1, start + random() % 24));
     for (int i = 0; i < 60; ++i)
@@ -191,12 +189,6 @@ class DamagedBytes : public VolumeFixture {
     }
   }
 
-  static unsigned long seed() {
-    const char* given = std::getenv("MIRABEL_TEST_SEED");
-    return given == nullptr ? 7 : std::strtoul(given, nullptr, 10);
-  }
-
-  std::string folder_;
   UUID history_;
   std::uint64_t anchor_ = 0;
   std::map<std::string, std::string> files_;

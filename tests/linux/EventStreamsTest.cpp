@@ -1,12 +1,15 @@
 // Event streams on real folders, heard of by each kind of watcher.
+#include <atomic>
 #include <filesystem>
 #include <fstream>
 
 #include "linux/FailingWrites.h"
 #include "linux/VolumeFixture.h"
 #include "linux/events/LinuxEventStreams.h"
+#include "linux/volume/FollowThread.h"
 #include "platform/EventStreamsConformance.h"
 #include "support/FakeEventStreams.h"
+#include "support/NoDescriptors.h"
 #include "support/TempHome.h"
 
 namespace mirabel::testing {
@@ -104,6 +107,22 @@ TEST(LinuxEventStreams, LibrariesThatCouldNotBeFollowedAreBeforeTheNextEventID) 
   StreamListener listener(history);
   listener.startForPaths({apps.at("library")}, since);
   EXPECT_TRUE(listener.waitForPath(apps.at("library/f")));
+}
+
+TEST(FollowThread, EndsAlsoWhereTheProcessMayHaveNoFurtherDescriptors) {
+  if (NoDescriptors::areNeeded) GTEST_SKIP() << "the sanitizer takes descriptors itself";
+  std::atomic<bool> hasLooked = false;
+  {
+    const NoDescriptors none;
+    const FollowThread thread({[] { return nullptr; },
+                               [&] {
+                                 hasLooked = true;
+                                 hasLooked.notify_all();
+                               },
+                               [] { return true; }});
+    hasLooked.wait(false);
+  }
+  SUCCEED() << "it looked, and its end was not waited for in vain";
 }
 
 }  // namespace

@@ -37,7 +37,6 @@ class FollowedFoldersTest : public VolumeFixture,
   }
   void writeTo(const std::string& path) const { write(fs::relative(path, documents_).native()); }
 
-  std::uint64_t anchor() { return index().currentEventID().value(); }
   void follow(const std::vector<FollowedFolder>& folders, std::uint64_t version) {
     const auto done = index().follow(folders, version);
     ASSERT_TRUE(done) << done.error().description();

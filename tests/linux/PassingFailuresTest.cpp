@@ -32,8 +32,6 @@ class PassingFailuresTest : public VolumeFixture, public ::testing::WithParamInt
       files_[name] = file(name);
   }
 
-  std::uint64_t anchor() { return index().currentEventID().value(); }
-
   ::testing::AssertionResult isAtOrUnknown(const Result<std::string>& found, const char* name) {
     if (!found && !found.error().isPosix(ENOENT)) return ::testing::AssertionSuccess();
     if (found && *found == path(name)) return ::testing::AssertionSuccess();

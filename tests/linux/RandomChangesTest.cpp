@@ -165,8 +165,8 @@ class RandomChanges : public VolumeFixture {
 };
 
 TEST_F(RandomChanges, NeverLoseOrMixIdentities) {
-  const unsigned seed = std::random_device{}();
-  SCOPED_TRACE("seed " + std::to_string(seed));
+  const auto seed = static_cast<unsigned>(seedOr(std::random_device{}()));
+  SCOPED_TRACE("MIRABEL_TEST_SEED=" + std::to_string(seed));
   random_.seed(seed);
   for (int i = 0; i < 400 && !HasFailure(); ++i)
     step();

@@ -67,6 +67,11 @@ void VolumeFixture::link(std::string_view from, std::string_view to) const {
   ASSERT_EQ(::link(path(from).c_str(), path(to).c_str()), 0);
 }
 
+unsigned long VolumeFixture::seedOr(unsigned long otherwise) {
+  const char* given = std::getenv("MIRABEL_TEST_SEED");
+  return given == nullptr ? otherwise : std::strtoul(given, nullptr, 10);
+}
+
 void VolumeFixture::run(const std::string& steps) {
   std::istringstream all(steps);
   for (std::string step; std::getline(all, step, ';');) {
@@ -113,6 +118,16 @@ Result<std::unique_ptr<VolumeIndex>> VolumeFixture::tryOpen(std::chrono::millise
 VolumeIndex& VolumeFixture::index() {
   if (!index_) index_ = std::move(tryOpen().value());
   return *index_;
+}
+
+std::uint64_t VolumeFixture::anchor() {
+  const auto id = index().currentEventID();
+  EXPECT_TRUE(id) << (id ? "" : id.error().description());
+  return id.value_or(0);
+}
+
+std::string VolumeFixture::volumeFolder() const {
+  return std::filesystem::directory_iterator(state_)->path();
 }
 
 Sighting VolumeFixture::see(std::string_view relative) {

@@ -39,9 +39,16 @@ class VolumeFixture : public ::testing::Test {
   std::uint64_t inode(std::string_view relative) const;
   ObjectStatus status(std::string_view relative) const;
 
+  /// What MIRABEL_TEST_SEED says, or else that.
+  static unsigned long seedOr(unsigned long otherwise);
+
   /// Closes the index in order; the next use opens it again.
   void close() { index_.reset(); }
   VolumeIndex& index();
+  /// After everything that happened so far.
+  std::uint64_t anchor();
+  /// Where the state of the volume lies, which there must be.
+  std::string volumeFolder() const;
   Result<std::unique_ptr<VolumeIndex>> tryOpen(std::chrono::milliseconds timeout = {});
 
   /// What the index makes of one name.

@@ -15,11 +15,6 @@ namespace {
 
 class VolumeStateTest : public VolumeFixture {
  protected:
-  std::string volumeFolder() const {
-    for (const auto& entry : std::filesystem::directory_iterator(state_))
-      return entry.path();
-    return "";
-  }
   std::string database() const { return volumeFolder() + "/volume.db"; }
 };
 
@@ -97,7 +92,8 @@ TEST_F(VolumeStateTest, TheStateIsForItsOwnerOnly) {
 }
 
 // Whatever happened to the database, nothing that comes after gets an identity of before.
-TEST_F(VolumeStateTest, WithoutADatabaseNewIdentitiesAreNotMixedWithOld) {
+using DamagedState = VolumeStateTest;
+TEST_F(DamagedState, NewIdentitiesAreNotMixedWithOld) {
   std::set<std::uint64_t> files;
   std::set<std::uint32_t> documents;
   std::set<UUID> histories;
