@@ -19,7 +19,13 @@ TEST_F(ResourceValuesOnDisk, NamesOfAnyBytesAreReadAndFoundAgain) {
     home.writeFile(name, name);
     urls.push_back(home.url().appendingPathComponent(name));
   }
+  urls.insert(urls.begin(),
+              {home.url(), URL::fromString("https://example.org/"), home.url("missing")});
   ASSERT_TRUE(platform().resources.prefetch(urls));
+  // A root is no entry of a folder that is presented.
+  EXPECT_TRUE(urls[0].resources().isFilled());
+  EXPECT_FALSE(urls[1].resources().isFilled() || urls[2].resources().isFilled());
+  urls.erase(urls.begin(), urls.begin() + 3);
   const DeviceID device = platform().objects.open(home.url()).value()->device().value();
   for (const URL& url : urls) {
     const auto cached = url.resources().snapshot();
@@ -62,29 +68,6 @@ TEST_F(ResourceValuesOnDisk, ADocumentThatWasReadIsNotLookedAtOnceMoreToRefreshI
   GenerationalStore& documents = platform().documents;
   EXPECT_EQ(documents.permanentStorageForItemAtURL(url, Allocation::never).value_or(0), known);
   EXPECT_FALSE(documents.permanentStorageForItemAtURL(url, Allocation::ifNone));
-}
-
-TEST_F(ResourceValuesOnDisk, ManyNamesOfSeveralFoldersAreReadTogetherPastMissingOnes) {
-  std::vector<URL> urls;
-  for (int i = 0; i < 300; ++i) {
-    const std::string folder = "f" + std::to_string(i % 3);
-    if (i < 3) home.makeFolder(folder);
-    const std::string name = folder + "/" + std::to_string(i);
-    if (i % 7 != 0) home.writeFile(name, std::string(static_cast<std::size_t>(i), 'x'));
-    urls.push_back(home.url(name));
-  }
-  urls.push_back(home.url());  // a root is no entry of a folder that is presented
-  urls.push_back(URL::fromString("https://example.org/"));
-  ASSERT_TRUE(platform().resources.prefetch(urls));
-  for (std::size_t i = 0; i < 300; ++i) {
-    const auto values = urls[i].resources().snapshot();
-    ASSERT_EQ(values.has_value(), i % 7 != 0) << i;
-    if (!values) continue;
-    EXPECT_EQ(values->size, i);
-    EXPECT_EQ(values->fileID, platform().resources.readValues(urls[i]).value().fileID);
-  }
-  EXPECT_TRUE(urls[300].resources().isFilled());
-  EXPECT_FALSE(urls[301].resources().isFilled());
 }
 
 TEST_F(ResourceValuesOnDisk, WhatIsNotThereIsNoSuchFile) {
