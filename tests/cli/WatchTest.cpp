@@ -35,29 +35,24 @@ class Watch : public CommandLineFixture {
   static Batch awaitItem(Running& watch, const std::string& name, std::size_t size) {
     Batch found;
     await(watch, [&](const Batch& batch) {
-      for (const Batch& item : batch.at("updated")) {
-        if (item.at("filename") != name || item.at("documentSize") != std::to_string(size))
-          continue;
-        found = item;
-        return true;
-      }
-      return false;
-    });
-    return found;
-  }
-  /// Waits until an item of that name is told.
-  static Batch awaitUpdate(Running& watch, const std::string& name) {
-    Batch found;
-    await(watch, [&](const Batch& batch) {
-      for (const Batch& item : batch.at("updated")) {
-        if (item.at("filename") == name) found = item;
-      }
+      for (const Batch& item : batch.at("updated"))
+        if (item.at("filename") == name && item.at("documentSize") == std::to_string(size))
+          found = item;
       return !found.is_null();
     });
     return found;
   }
-  static void expectDone(int status) {
+  static void expectBegins(Running& watch) {
+    EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  }
+  static void end(Running& watch, int signal = SIGTERM) {
+    watch.send(signal);
+    const int status = watch.end();
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << status;
+  }
+  static void expectEndsWithItsFolder(Running& watch) {
+    EXPECT_THAT(watch.errors().line(), HasSubstr("no item has this identifier"));
+    EXPECT_EQ(WEXITSTATUS(watch.end()), 3);
   }
   /// The anchor in the line that people get.
   static std::string anchorIn(const std::string& line) {
@@ -90,8 +85,7 @@ TEST_F(Watch, TellsEachChangeWhileItRunsAndKeepsIdentities) {
     home.remove("doc");
     const Batch batch = await(watch, [](const Batch& b) { return !b.at("deleted").empty(); });
     EXPECT_EQ(batch.at("deleted"), Batch({made.at("itemIdentifier")}));
-    watch.send(SIGTERM);
-    expectDone(watch.end());
+    end(watch);
     EXPECT_EQ(watch.errors().rest(), "");
   }
 }
@@ -103,8 +97,7 @@ TEST_F(Watch, EndsWithTheAnchorToGoOnFrom) {
     // Made by one system call, so that no part of it comes after the anchor.
     home.makeFolder("seen");
     EXPECT_THAT(watch.output().line(), HasSubstr(home.at("seen") + "\n"));
-    watch.send(signal);
-    expectDone(watch.end());
+    end(watch, signal);
     const std::string anchor = anchorIn(watch.errors().rest());
     home.makeFolder("later");
     const Answer later = run({"changes", "--since", anchor, "workingset"});
@@ -131,8 +124,7 @@ TEST_F(Watch, FirstTellsWhatChangedSinceAnAnchor) {
   EXPECT_EQ(told.size(), 250u);
   home.writeFile("live");
   EXPECT_FALSE(awaitItem(watch, "live", 0).is_null());
-  watch.send(SIGTERM);
-  expectDone(watch.end());
+  end(watch);
   for (const char* bad : {"garbage", "AAAA", ""})
     expectFailure(run({"watch", "--since", bad}), 4, "start over");
 }
@@ -140,15 +132,14 @@ TEST_F(Watch, FirstTellsWhatChangedSinceAnAnchor) {
 TEST_F(Watch, FollowsAFolderByItsIdentityToItsEnd) {
   home.makeFolder("folder");
   Running watch(command({"watch", home.at("folder")}));
-  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  expectBegins(watch);
   home.rename("folder", "renamed");
   home.makeFolder("renamed/first");
   EXPECT_THAT(watch.output().line(), HasSubstr(home.at("renamed/first")));
   home.makeFolder("renamed/second");
   EXPECT_THAT(watch.output().line(), HasSubstr(home.at("renamed/second")));
   home.remove("renamed");
-  EXPECT_THAT(watch.errors().line(), HasSubstr("no item has this identifier"));
-  EXPECT_EQ(WEXITSTATUS(watch.end()), 3);
+  expectEndsWithItsFolder(watch);
 }
 
 // What the record of the name that it left says of it is not what it is by now.
@@ -158,59 +149,31 @@ TEST_F(Watch, TellsThatAFolderLeftWhichThenBecameAPackage) {
   const std::string identifier = run({"id", home.at("watched/x")}).out;
   ASSERT_THAT(identifier, StartsWith("fid="));
   Running watch(command({"watch", home.at("watched")}));
-  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  expectBegins(watch);
   home.rename("watched/x", "other/e.package/e.package");
   home.rename("other/e.package", "other/plain");
   home.makeFolder("watched/later");
   std::string told;
   for (std::string line = "told\n"; !line.empty() && !line.ends_with("/later\n"); told += line)
     line = watch.output().line();
-  watch.send(SIGTERM);
-  expectDone(watch.end());
+  end(watch);
   EXPECT_THAT(told + watch.output().rest(), HasSubstr("deleted  " + identifier));
-}
-
-TEST_F(Watch, TellsOfApplicationsThatComeAndGoAndOfWhatHappensInThem) {
-  const InstalledApps apps(home);
-  for (const std::string container : {"root", "workingset", "alldirs"}) {
-    const std::string bundle = "org.example." + container;
-    std::filesystem::create_directories(apps.documents(bundle) + "/old");
-    Running watch(command({"--json", "watch", container}));
-    EXPECT_NE(watch.output().line(), "");
-    const bool holdsLibraries = container != "alldirs";
-    apps.install(bundle, "App");
-    EXPECT_FALSE(awaitUpdate(watch, holdsLibraries ? "App" : "old").is_null()) << container;
-
-    const std::string place = container == "root" ? home.documents() : apps.documents(bundle);
-    std::filesystem::create_directory(place + "/new");
-    const Batch folder = awaitUpdate(watch, "new");
-    ASSERT_FALSE(folder.is_null()) << container;
-
-    apps.remove(bundle);
-    const Batch gone = holdsLibraries ? Batch("#" + bundle) : folder.at("itemIdentifier");
-    const Batch batch =
-        await(watch, [&](const Batch& b) { return std::ranges::count(b.at("deleted"), gone) > 0; });
-    EXPECT_FALSE(batch.is_null()) << container;
-    watch.send(SIGTERM);
-    expectDone(watch.end());
-  }
 }
 
 TEST_F(Watch, OfAnApplicationThatIsRemovedEnds) {
   const InstalledApps apps(home);
   apps.install("org.example.Draw", "Draw");
   Running watch(command({"watch", "#org.example.Draw"}));
-  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  expectBegins(watch);
   std::filesystem::create_directory(apps.documents("org.example.Draw") + "/new");
   EXPECT_THAT(watch.output().line(), HasSubstr("/new\n"));
   apps.remove("org.example.Draw");
-  EXPECT_THAT(watch.errors().line(), HasSubstr("no item has this identifier"));
-  EXPECT_EQ(WEXITSTATUS(watch.end()), 3);
+  expectEndsWithItsFolder(watch);
 }
 
 TEST_F(Watch, EndsQuietlyWhenItsReaderHasLeftThoughNothingChanges) {
   Running watch(command({"watch"}));
-  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  expectBegins(watch);
   watch.output().leave();
   const int status = watch.end();
   EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGPIPE) << status;
@@ -292,11 +255,10 @@ TEST_F(WatchWithFewMarks, ChangesAreRightAndTheLimitIsToldOnce) {
 TEST_F(WatchWithFewMarks, ChangesAreToldAsTheyCome) {
   Running watch(limited({"watch", "workingset"}));
   expectSaidOnce(watch.errors().line());
-  EXPECT_THAT(watch.errors().line(), HasSubstr("watching"));
+  expectBegins(watch);
   home.writeFile("folder7/doc", "Dear Uncle");
   EXPECT_THAT(watch.output().line(), HasSubstr(home.at("folder7/doc")));
-  watch.send(SIGTERM);
-  expectDone(watch.end());
+  end(watch);
   EXPECT_FALSE(anchorIn(watch.errors().rest()).empty());
 }
 

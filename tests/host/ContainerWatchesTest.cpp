@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <chrono>
 #include <filesystem>
 #include <gtest/gtest.h>
@@ -23,7 +24,7 @@ class ContainerWatchesTest : public ::testing::TestWithParam<std::string_view> {
     watched = watches->add(identifier, [this] { woken.release(); }).value();
     anchor = container->currentSyncAnchor().value();
   }
-  /// Whether something of that name is told, once the watch wakes for it.
+  /// Whether something of that name is told, once the watch wakes for it, or that it is gone.
   bool isWokenFor(std::string_view name) {
     while (woken.try_acquire_for(30s)) {
       for (bool more = true; more;) {
@@ -32,6 +33,7 @@ class ContainerWatchesTest : public ::testing::TestWithParam<std::string_view> {
         more = changes.moreComing;
         for (const ItemRecord& item : changes.updated)
           if (item.filename == name) return true;
+        if (std::ranges::count(changes.deleted, name) > 0) return true;
       }
     }
     return false;
@@ -51,7 +53,7 @@ class ContainerWatchesTest : public ::testing::TestWithParam<std::string_view> {
   Data anchor;
 };
 
-TEST_P(ContainerWatchesTest, AreWokenForApplicationsThatComeAndForWhatHappensInThem) {
+TEST_P(ContainerWatchesTest, AreWokenForApplicationsThatComeAndGoAndForWhatHappensInThem) {
   const std::string bundle = "org.example.Draw";
   std::filesystem::create_directories(apps.documents(bundle) + "/old");
   watch();
@@ -63,6 +65,14 @@ TEST_P(ContainerWatchesTest, AreWokenForApplicationsThatComeAndForWhatHappensInT
   const bool isRoot = GetParam() == VesselRootContainerItemIdentifier;
   std::filesystem::create_directory((isRoot ? home.documents() : apps.documents(bundle)) + "/new");
   EXPECT_TRUE(isWokenFor("new"));
+  const std::string gone =
+      isOfFolders
+          ? provider->vessel()
+                .persistentIdentifierForItemAtURL(URL::fileURL(apps.documents(bundle) + "/new"))
+                .value()
+          : "#" + bundle;
+  apps.remove(bundle);
+  EXPECT_TRUE(isWokenFor(gone));
 }
 
 INSTANTIATE_TEST_SUITE_P(Each, ContainerWatchesTest,
