@@ -13,7 +13,6 @@ using ::testing::HasSubstr;
 
 class BadInput : public CommandLineFixture {
  protected:
-  void expectNoState() const { EXPECT_FALSE(fs::exists(home.path() + "/.local/state/mirabel")); }
   std::string database() const {
     for (const auto& entry : fs::directory_iterator(home.stateFolder())) {
       return entry.path() / "volume.db";
@@ -48,41 +47,8 @@ TEST_F(BadInput, ADocumentStorageThatIsNoneIsNamed) {
   expectFailure(run({"info", "root"}), 1, "/Documents\" is a link to nothing");
   EXPECT_FALSE(fs::exists(home.path() + "/nowhere"));
   fs::remove(home.documents());
-  fs::remove_all(home.path() + "/.local");
   std::ofstream(home.documents()) << "x";
   expectFailure(run({"ls"}), 1, "/Documents\" is not a folder");
-  expectNoState();
-}
-
-TEST_F(BadInput, LinksToTheHomeAndToTheDocumentsWork) {
-  const TempHome elsewhere;
-  elsewhere.writeFile("doc");
-  fs::remove(home.documents());
-  fs::create_directory_symlink(elsewhere.documents(), home.documents());
-  fs::create_directory_symlink(home.path(), home.path() + "/alias");
-  EXPECT_EQ(run({"id", home.at("doc")}).out, "did=1\n");
-  EXPECT_EQ(run({"path", "did=1"}).out, elsewhere.at("doc") + "\n");
-  EXPECT_EQ(run({"id", home.documents()}).out, "VesselRootContainerItemIdentifier\n");
-  EXPECT_THAT(shell("\"$mirabel\" --home \"$home/alias\" ls").out, HasSubstr("did=1 "));
-}
-
-TEST_F(BadInput, AStateFolderThatIsNotOursIsLeftAlone) {
-  const std::string parent = home.path() + "/.local/state";
-  fs::create_directories(parent);
-  fs::create_directory(home.path() + "/elsewhere");
-  fs::create_directory_symlink(home.path() + "/elsewhere", home.stateFolder());
-  expectFailure(run({"ls"}), 5, "is a symbolic link; move it away");
-  EXPECT_TRUE(fs::is_empty(home.path() + "/elsewhere"));
-  EXPECT_EQ(run({"doctor"}).code, 1);
-  fs::remove(home.stateFolder());
-  std::ofstream(home.stateFolder()) << "x";
-  expectFailure(run({"ls"}), 5, "is no folder");
-  fs::remove(home.stateFolder());
-  if (!OrdinaryUser::isRoot()) return;
-  fs::create_directory(home.stateFolder());
-  ASSERT_EQ(::chown(home.stateFolder().c_str(), OrdinaryUser::substitute, 0), 0);
-  expectFailure(run({"ls"}), 5, "belongs to somebody else");
-  EXPECT_TRUE(fs::is_empty(home.stateFolder()));
 }
 
 TEST_F(BadInput, ADamagedDatabaseIsSetAsideAndThatIsSaidOnce) {
