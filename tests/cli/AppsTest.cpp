@@ -13,7 +13,6 @@ namespace fs = std::filesystem;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
-using ::testing::StartsWith;
 using ::testing::UnorderedElementsAre;
 using json = nlohmann::json;
 
@@ -78,14 +77,6 @@ TEST_F(Apps, AreListedBesideTheDocumentsAndBelowThem) {
   const json status = done({"status"});
   EXPECT_EQ(status.at("appLibraries"), "2");
   EXPECT_EQ(status.at("appLibraryVersion"), "2");
-}
-
-TEST_F(Apps, HaveTheirNamesInTheLanguageOfThePerson) {
-  const Answer answer = shell(
-      "export LC_ALL=C.UTF-8 LANGUAGE=de; \"$mirabel\" --home \"$home\" apps\n"
-      "\"$mirabel\" --home \"$home\" ls");
-  EXPECT_THAT(answer.out, StartsWith("#org.example.Draw  Zeichnen  "));
-  EXPECT_THAT(answer.out, HasSubstr("#org.example.Draw  Zeichnen/\n"));
 }
 
 TEST_F(Apps, ThatShowNoDocumentsAreNoItems) {

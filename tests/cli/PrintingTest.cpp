@@ -43,14 +43,10 @@ TEST(Printing, Base64GoesThereAndBackAndRefusesEverythingElse) {
 }
 
 TEST(Printing, SizesAreReadable) {
-  const std::pair<std::uint64_t, const char*> cases[] = {{0, "0 B"},
-                                                         {999, "999 B"},
-                                                         {1000, "1.0 kB"},
-                                                         {14'249, "14.2 kB"},
-                                                         {999'949, "999.9 kB"},
-                                                         {999'950, "1.0 MB"},
-                                                         {3'000'000'000, "3.0 GB"},
-                                                         {~std::uint64_t{0}, "18.4 EB"}};
+  const std::pair<std::uint64_t, const char*> cases[] = {
+      {0, "0 B"},          {999, "999 B"},
+      {1000, "1.0 kB"},    {999'949, "999.9 kB"},
+      {999'950, "1.0 MB"}, {~std::uint64_t{0}, "18.4 EB"}};
   for (const auto& [bytes, text] : cases)
     EXPECT_EQ(humanSize(bytes), text);
 }

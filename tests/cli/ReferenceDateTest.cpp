@@ -58,28 +58,12 @@ TEST(ReferenceDate, TheFirstDayBeginsBeforeTheCalendarInTheEast) {
 }
 
 TEST(ReferenceDate, EverythingElseIsRefused) {
-  for (const char* text : {"",
-                           "d",
-                           "30",
-                           "30 d",
-                           "-30d",
-                           "+30d",
-                           "30D",
-                           "3.5d",
-                           "30days",
-                           "1d2h",
-                           "0x1d",
-                           "yesterday",
-                           "2026-13-01",
-                           "2026-02-30",
-                           "2026-11-21T25:00:00Z",
-                           "26-11-21",
-                           "9223372036854775807w",
-                           "99999999999999999999d",
-                           "999999w",
-                           "2026-11-21x"}) {
+  for (const char* text :
+       {"", "d", "30", "30 d", "-30d", "+30d", "30D", "3.5d", "30days", "1d2h", "0x1d", "yesterday",
+        "2026-13-01", "2026-02-30", "26-11-21", "999999w", "2026-11-21x"})
     EXPECT_EQ(referenceDateFrom(text, now), std::nullopt) << text;
-  }
+  for (const char* text : {"2026-11-21T25:00:00Z", "9223372036854775807w", "99999999999999999999d"})
+    EXPECT_EQ(referenceDateFrom(text, now), std::nullopt) << text;
 }
 
 }  // namespace
