@@ -9,30 +9,16 @@ namespace {
 
 constexpr int files = 150;
 
-/// Everything that there is in one generation, whose number is its anchor. The identifiers are the
-/// names, which are the same in each process.
-std::vector<std::string> namesOf(int generation) {
-  std::vector<std::string> names;
-  for (int i = 0; i < files; ++i)
-    names.push_back("gen" + std::to_string(generation) + " no" + std::to_string(i));
-  return names;
-}
-
-/// Goes from one generation to the next, in turn by starting over and by changes, and says each
-/// that was acknowledged.
+/// Goes from one generation, whose number is its anchor, to the next, in turn by starting over and
+/// by changes, and says each that was acknowledged.
 void feed(const KilledProcess::Self& self, const std::string& folder) {
   SearchItems items;
   const auto index = SearchIndex::open(folder).value();
   int generation = std::stoi(std::string(stringView(index->anchor().value_or(anchorOf("0")))));
   while (true) {
-    const auto gone = namesOf(generation);
+    const auto gone = namesOfGeneration(generation, files);
     const Data anchor = anchorOf(std::to_string(++generation));
-    VesselItems next;
-    for (const std::string& name : namesOf(generation)) {
-      ItemOverrides overrides;
-      overrides.customItemID = name;
-      next.push_back(items.item(name, overrides));
-    }
+    const VesselItems next = items.namedItems(namesOfGeneration(generation, files));
     bool done = false;
     if (generation % 2 == 0) {
       done = index->apply(next, gone, anchor).has_value();

@@ -36,6 +36,15 @@ class SearchItems {
       made.push_back(item(name));
     return made;
   }
+  VesselItems namedItems(const std::vector<std::string>& identifiers) {
+    VesselItems made;
+    for (const std::string& identifier : identifiers) {
+      ItemOverrides overrides;
+      overrides.customItemID = identifier;
+      made.push_back(item(identifier, overrides));
+    }
+    return made;
+  }
   /// One that lies in the documents of an application.
   std::shared_ptr<LocalItem> itemOf(const std::string& bundle, const std::string& name) {
     if (!libraries_.contains(bundle)) fake_.install(bundle, "/apps/" + bundle);
@@ -82,6 +91,15 @@ class SearchItems {
   std::map<std::string, bool> libraries_;
   std::map<std::string, std::string> names_;
 };
+
+/// All names of one generation. Each is its item's identifier too, so that it is
+/// the same in each process.
+inline std::vector<std::string> namesOfGeneration(int generation, int count) {
+  std::vector<std::string> names;
+  for (int i = 0; i < count; ++i)
+    names.push_back("gen" + std::to_string(generation) + " no" + std::to_string(i));
+  return names;
+}
 
 inline Data anchorOf(std::string_view text) {
   return dataFromString(text);
