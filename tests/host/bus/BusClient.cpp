@@ -7,12 +7,12 @@
 namespace mirabel::testing {
 namespace {
 
-constexpr std::uint64_t longestAnswer = 30'000'000;  // microseconds
-constexpr int longestWait = 30'000;                  // milliseconds
+constexpr int longestWait = 30'000;  // milliseconds
 
 }  // namespace
 
-BusClient::BusClient() : connection_(sdbus::createSessionBusConnection()) {
+BusClient::BusClient(std::uint64_t longestAnswer)
+    : longestAnswer_(longestAnswer), connection_(sdbus::createSessionBusConnection()) {
   service_ = sdbus::createProxy(*connection_, bus::serviceName, bus::objectPath);
   service_->registerSignalHandler(bus::providerInterface, "EnumeratorSignaled",
                                   [this](sdbus::Signal& signal) {
@@ -25,7 +25,7 @@ BusClient::BusClient() : connection_(sdbus::createSessionBusConnection()) {
 
 BusClient::Answer BusClient::send(const sdbus::MethodCall& message) {
   try {
-    return {"", "", service_->callMethod(message, longestAnswer)};
+    return {"", "", service_->callMethod(message, longestAnswer_)};
   } catch (const sdbus::Error& error) {
     for (const char* silence : {"NoReply", "Timeout", "Disconnected"})
       EXPECT_NE(error.getName(), std::string("org.freedesktop.DBus.Error.") + silence);

@@ -17,7 +17,8 @@ using BusOptions = std::map<std::string, sdbus::Variant>;
 /// it may change what it is: its user, its root.
 class BusClient {
  public:
-  BusClient();
+  /// Waits for an answer so many microseconds.
+  explicit BusClient(std::uint64_t longestAnswer = 30'000'000);
 
   /// An answer, or the name of the error.
   struct Answer {
@@ -69,6 +70,7 @@ class BusClient {
   static bool isAnswer(const Answer& answer);
   void takeIn();
 
+  const std::uint64_t longestAnswer_;
   std::unique_ptr<sdbus::IConnection> connection_;
   std::unique_ptr<sdbus::IProxy> service_;
   std::deque<std::string> signals_;

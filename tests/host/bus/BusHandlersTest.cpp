@@ -1,3 +1,6 @@
+#include <cerrno>
+#include <functional>
+#include <future>
 #include <gtest/gtest.h>
 #include <new>
 #include <stdexcept>
@@ -22,6 +25,19 @@ class BusHandlers : public ::testing::Test {
     connection = sdbus::createSessionBusConnection();
     object = sdbus::createObject(*connection, bus::objectPath);
   }
+  void answerGetItem(const std::function<void(sdbus::MethodCall)>& handler) {
+    object->registerMethod(bus::providerInterface, "GetItem", "s", "a{sv}", handler);
+    begin();
+    connection->enterEventLoopAsync();
+  }
+  /// As other types than the service does.
+  void answerWithText(const char* interface, const char* method, const char* arguments) {
+    object->registerMethod(interface, method, arguments, "s", [](const sdbus::MethodCall& call) {
+      auto reply = call.createReply();
+      reply << "nothing that was asked for";
+      reply.send();
+    });
+  }
   void begin() {
     object->finishRegistration();
     connection->requestName(bus::serviceName);
@@ -33,10 +49,7 @@ class BusHandlers : public ::testing::Test {
 };
 
 TEST_F(BusHandlers, AnswerWhateverExceptionTheyEndWith) {
-  const auto fails = [](const sdbus::MethodCall&) { throw std::bad_alloc(); };
-  object->registerMethod(bus::providerInterface, "GetItem", "s", "a{sv}", bus::guarded(fails));
-  begin();
-  connection->enterEventLoopAsync();
+  answerGetItem(bus::guarded([](const sdbus::MethodCall&) { throw std::bad_alloc(); }));
   BusClient client;
   for (int i = 0; i < 2; ++i) {
     const auto answer = client.provider("GetItem", std::string("did=1"));
@@ -52,13 +65,10 @@ TEST_F(BusHandlers, AnswerAlsoWhereTheReplyCantBeWritten) {
   const auto documents = LocalDocuments::open(std::move(options)).value();
   bus::CallerIdentities identities;
   const auto nobody = std::make_shared<bus::Caller>("nobody", *documents, identities);
-  object->registerMethod(bus::providerInterface, "GetItem", "s", "a{sv}",
-                         [&](sdbus::MethodCall message) {
-                           bus::BusCall call(std::move(message), nobody);
-                           call.reply([](sdbus::Message&) { throw std::length_error("too long"); });
-                         });
-  begin();
-  connection->enterEventLoopAsync();
+  answerGetItem([&](sdbus::MethodCall message) {
+    bus::BusCall call(std::move(message), nobody);
+    call.reply([](sdbus::Message&) { throw std::length_error("too long"); });
+  });
   const auto answer = BusClient().provider("GetItem", std::string("did=1"));
   EXPECT_EQ(answer.error, "org.freedesktop.DBus.Error.LimitsExceeded");
   EXPECT_EQ(answer.message, "too long");
@@ -67,6 +77,35 @@ TEST_F(BusHandlers, AnswerAlsoWhereTheReplyCantBeWritten) {
 TEST_F(BusHandlers, OfSomebodyWhoNeverAnswersAreNotWaitedFor) {
   begin();
   EXPECT_EQ(bus::RemoteDocuments::connect({}, std::chrono::milliseconds(50)), nullptr);
+}
+
+TEST_F(BusHandlers, WhoseAnswersAreOfOtherTypesGiveErrors) {
+  const HomePlaces places{"/home/me", "/home/me/.local/state/mirabel"};
+  object->registerMethod(bus::managerInterface, "GetHome", "", "ayay",
+                         [&](const sdbus::MethodCall& call) {
+                           auto reply = call.createReply();
+                           bus::write(reply, dataFromString(places.home));
+                           bus::write(reply, dataFromString(places.stateFolder));
+                           reply.send();
+                         });
+  answerWithText(bus::managerInterface, "GetStatus", "");
+  answerWithText(bus::providerInterface, "GetItem", "s");
+  answerWithText(bus::operationsInterface, "Trash", "sa{sv}");
+  begin();
+  connection->enterEventLoopAsync();
+  const auto documents = bus::RemoteDocuments::connect(places);
+  ASSERT_NE(documents, nullptr);
+  EXPECT_TRUE(documents->item("did=1").error().isPosix(EIO));
+  EXPECT_TRUE(documents->status().error().isPosix(EIO));
+  // What waits for an operation is told, or else that nobody will tell it.
+  auto promise = std::make_shared<std::promise<Documents::ItemResult>>();
+  auto told = promise->get_future();
+  documents->trash("did=1", [promise = std::move(promise)](const Documents::ItemResult& result) {
+    promise->set_value(result);
+  });
+  Documents::ItemResult result;
+  ASSERT_NO_THROW(result = told.get());
+  EXPECT_TRUE(result.error().isPosix(EIO));
 }
 
 }  // namespace

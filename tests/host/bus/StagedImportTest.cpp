@@ -39,17 +39,6 @@ TEST_F(Staging, KeepsThePermissionsThatSomebodyChose) {
   EXPECT_EQ(stagedMode(UniqueFd(::memfd_create("in memory", MFD_CLOEXEC))), 0600u);
 }
 
-TEST_F(Staging, SaysWhatIsWrongWithAName) {
-  const UniqueFd file(::memfd_create("file", MFD_CLOEXEC));
-  for (const std::string name : {"", "..", "a/b"}) {
-    const auto staged = StagedImport::of(file.get(), name, folder, stopping.get_token());
-    ASSERT_FALSE(staged) << name;
-    EXPECT_TRUE(staged.error().isPosix(EINVAL) &&
-                staged.error().userInfo.contains(errorkey::detail))
-        << name;
-  }
-}
-
 TEST_F(Staging, LeavesNothingWhenItIsToStop) {
   const UniqueFd file(::memfd_create("large", MFD_CLOEXEC));
   ASSERT_EQ(::ftruncate(file.get(), 1 << 20), 0);
