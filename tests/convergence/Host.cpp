@@ -1,10 +1,11 @@
 #include "convergence/Host.h"
 
-#include <future>
 #include <gtest/gtest.h>
 #include <stdexcept>
 #include <utility>
 
+#include "host/ItemRecords.h"
+#include "host/LocalContainer.h"
 #include "mirabel/Values.h"
 
 namespace mirabel::testing {
@@ -14,59 +15,35 @@ std::string text(const std::optional<Date>& date) {
   return date ? date->rfc3339() : "-";
 }
 
-HeldItem heldItem(const LocalItem& item) {
-  std::string properties = item.typeIdentifier();
+HeldItem heldItem(const ItemRecord& item) {
+  std::string properties = item.typeIdentifier;
   const auto add = [&](const std::string& value) { properties += " | " + value; };
-  add(item.documentSize() ? item.documentSize()->description() : "-");
-  add(text(item.creationDate()));
-  add(text(item.contentModificationDate()));
-  add(item.childItemCount() ? std::to_string(*item.childItemCount()) : "-");
-  add(std::to_string(item.capabilities()));
-  add(item.isTrashed() ? "trashed" : "-");
-  add(text(item.lastUsedDate()));
-  add(item.tagData() ? std::string(stringView(*item.tagData())) : "-");
-  add(item.favoriteRank() ? item.favoriteRank()->description() : "-");
-  add(item.fileID() ? std::to_string(*item.fileID()) : "-");
-  return {item.parentItemIdentifier(), item.filename(), properties};
+  add(item.documentSize ? item.documentSize->description() : "-");
+  add(text(item.creationDate));
+  add(text(item.contentModificationDate));
+  add(item.childItemCount ? std::to_string(*item.childItemCount) : "-");
+  add(std::to_string(item.capabilities));
+  add(item.isTrashed ? "trashed" : "-");
+  add(text(item.lastUsedDate));
+  add(item.tagData ? std::string(stringView(*item.tagData)) : "-");
+  add(item.favoriteRank ? item.favoriteRank->description() : "-");
+  add(item.fileID ? std::to_string(*item.fileID) : "-");
+  return {item.parentItemIdentifier, item.filename, properties};
 }
 
 class PageCollector final : public VesselEnumerationObserver {
  public:
   void didEnumerateItems(const VesselItems& items) override {
-    collected.insert(collected.end(), items.begin(), items.end());
+    for (const auto& item : items)
+      collected.push_back(recordOf(*item));
   }
   void finishEnumeratingUpToPage(const std::optional<Data>& page) override { next = page; }
-  void finishEnumeratingWithError(const Error& failure) override { error = failure; }
-
-  VesselItems collected;
-  std::optional<Data> next;
-  std::optional<Error> error;
-};
-
-class ChangeCollector final : public VesselChangeObserver {
- public:
-  void didUpdateItems(const VesselItems& items) override {
-    updated.insert(updated.end(), items.begin(), items.end());
-  }
-  void didDeleteItemsWithIdentifiers(const std::vector<std::string>& identifiers) override {
-    deleted.insert(deleted.end(), identifiers.begin(), identifiers.end());
-  }
-  void finishEnumeratingChangesUpToSyncAnchor(const Data& reached, bool more) override {
-    anchor = reached;
-    moreComing = more;
-    done.set_value();
-  }
   void finishEnumeratingWithError(const Error& failure) override {
-    error = failure;
-    done.set_value();
+    ADD_FAILURE() << failure.description();
   }
 
-  VesselItems updated;
-  std::vector<std::string> deleted;
-  Data anchor;
-  bool moreComing = false;
-  std::optional<Error> error;
-  std::promise<void> done;
+  std::vector<ItemRecord> collected;
+  std::optional<Data> next;
 };
 
 }  // namespace
@@ -102,41 +79,37 @@ std::shared_ptr<VesselEnumerator> Host::enumerator(const std::string& container)
 }
 
 // A client of a folder holds what has that folder as its parent.
-void Host::apply(Replica& replica, const LocalItem& item) const {
+void Host::apply(Replica& replica, const ItemRecord& item) {
   const bool isFolder = replica.container != VesselWorkingSetContainerItemIdentifier &&
                         replica.container != VesselAllDirectoriesContainerItemIdentifier;
-  if (isFolder && item.parentItemIdentifier() != replica.container) {
-    replica.items.erase(item.itemIdentifier());
+  if (isFolder && item.parentItemIdentifier != replica.container) {
+    replica.items.erase(item.itemIdentifier);
     return;
   }
   HeldItem held = heldItem(item);
   // The working set is told of app libraries when they come or go, not of what they are called or
   // of their dates and counts.
-  const bool isLibrary = item.itemIdentifier().starts_with('#');
+  const bool isLibrary = item.itemIdentifier.starts_with('#');
   if (isLibrary && replica.container == VesselWorkingSetContainerItemIdentifier) {
     held.filename = "library";
     held.text.clear();
   }
-  replica.items.insert_or_assign(item.itemIdentifier(), std::move(held));
+  replica.items.insert_or_assign(item.itemIdentifier, std::move(held));
 }
 
 Replica Host::list(const std::string& container) {
   Replica replica{container, {}, {}};
   const auto enumerating = enumerator(container);
   if (!enumerating) return replica;
-  enumerating->currentSyncAnchor([&](std::optional<Data> anchor) {
-    ASSERT_TRUE(anchor);
-    replica.anchor = *anchor;
-  });
+  replica.anchor = currentAnchorOf(*enumerating).value();
   Data page = dataFromString(VesselInitialPageSortedByName);
   while (true) {
     PageCollector collector;
     enumerating->enumerateItems(collector, page);
-    EXPECT_FALSE(collector.error) << container << ": " << collector.error->description();
-    for (const auto& item : collector.collected) {
-      EXPECT_FALSE(replica.items.contains(item->itemIdentifier()))
-          << container << ": " << item->filename() << " is listed twice";
-      apply(replica, *item);
+    for (const ItemRecord& item : collector.collected) {
+      EXPECT_FALSE(replica.items.contains(item.itemIdentifier))
+          << container << ": " << item.filename << " is listed twice";
+      apply(replica, item);
     }
     if (!collector.next) return replica;
     page = *collector.next;
@@ -147,24 +120,22 @@ void Host::catchUp(Replica& replica) {
   const auto enumerating = enumerator(replica.container);
   if (!enumerating) return;
   for (bool more = true; more;) {
-    const auto collector = std::make_shared<ChangeCollector>();
-    enumerating->enumerateChanges(collector, replica.anchor);
-    collector->done.get_future().wait();
-    if (collector->error) {
-      ASSERT_TRUE(collector->error->is(VesselErrorCode::syncAnchorExpired))
-          << collector->error->description();
+    const auto changes = changesSince(*enumerating, replica.anchor);
+    if (!changes) {
+      ASSERT_TRUE(changes.error().is(VesselErrorCode::syncAnchorExpired))
+          << changes.error().description();
       const int restarts = replica.restarts + 1;
       replica = list(replica.container);
       replica.restarts = restarts;
       return;
     }
-    for (const auto& item : collector->updated)
-      apply(replica, *item);
-    for (const std::string& identifier : collector->deleted)
+    for (const ItemRecord& item : changes->updated)
+      apply(replica, item);
+    for (const std::string& identifier : changes->deleted)
       replica.items.erase(identifier);
-    EXPECT_LE(collector->updated.size() + collector->deleted.size(), 100u);
-    replica.anchor = collector->anchor;
-    more = collector->moreComing;
+    EXPECT_LE(changes->updated.size() + changes->deleted.size(), 100u);
+    replica.anchor = changes->anchor;
+    more = changes->moreComing;
   }
 }
 

@@ -7,6 +7,7 @@
 
 #include "host/HostedProvider.h"
 #include "linux/FaultyWatcher.h"
+#include "mirabel/ItemRecord.h"
 
 namespace mirabel::testing {
 
@@ -48,7 +49,7 @@ class Host {
  private:
   std::shared_ptr<WatcherFaults> faults_ = std::make_shared<WatcherFaults>();
   std::shared_ptr<VesselEnumerator> enumerator(const std::string& container);
-  void apply(Replica& replica, const LocalItem& item) const;
+  static void apply(Replica& replica, const ItemRecord& item);
 
   std::unique_ptr<HostedProvider> provider_;
   /// Those of the root, the working set and all directories, which know what was told last.

@@ -1,15 +1,11 @@
 #include "convergence/Scenario.h"
 
-#include <csignal>
-#include <fcntl.h>
 #include <filesystem>
 #include <memory>
 #include <random>
-#include <spawn.h>
-#include <stdexcept>
-#include <sys/wait.h>
 
 #include "cli/Printing.h"
+#include "cli/Running.h"
 #include "convergence/Host.h"
 #include "convergence/RandomApplications.h"
 #include "convergence/RandomTree.h"
@@ -19,38 +15,6 @@ namespace mirabel::testing {
 namespace {
 
 constexpr int mostShrinkingRuns = 300;
-
-/// `mirabel changes` in a process of its own, to be killed.
-class Follower {
- public:
-  Follower(const std::string& home, const Data& anchor) {
-    std::vector<std::string> words{MIRABEL_PROGRAM, "--home",  home,
-                                   "changes",       "--since", base64(stringView(anchor)),
-                                   "workingset"};
-    std::vector<char*> arguments;
-    arguments.reserve(words.size() + 1);
-    for (std::string& word : words)
-      arguments.push_back(word.data());
-    arguments.push_back(nullptr);
-    posix_spawn_file_actions_t actions;
-    ::posix_spawn_file_actions_init(&actions);
-    for (const int stream : {STDOUT_FILENO, STDERR_FILENO})
-      ::posix_spawn_file_actions_addopen(&actions, stream, "/dev/null", O_WRONLY, 0);
-    const int failure =
-        ::posix_spawn(&process_, MIRABEL_PROGRAM, &actions, nullptr, arguments.data(), environ);
-    ::posix_spawn_file_actions_destroy(&actions);
-    if (failure != 0) throw std::runtime_error("posix_spawn");
-  }
-  ~Follower() {
-    ::kill(process_, SIGKILL);
-    ::waitpid(process_, nullptr, 0);
-  }
-  Follower(const Follower&) = delete;
-  Follower& operator=(const Follower&) = delete;
-
- private:
-  pid_t process_ = -1;
-};
 
 /// What a client holds wrongly; empty when it holds what a fresh listing shows.
 std::string difference(const Replica& replica, const Replica& fresh) {
@@ -135,7 +99,8 @@ class Run {
     tell("killed while it catches up:");
     host_.reset();
     {
-      const Follower follower(home_.path(), replicas_.front().anchor);
+      const Running follower({MIRABEL_PROGRAM, "--home", home_.path(), "changes", "--since",
+                              base64(stringView(replicas_.front().anchor)), "workingset"});
       for (std::size_t changes = tree_.pick(40); changes > 0; --changes)
         tell("  " + tree_.change());
     }
