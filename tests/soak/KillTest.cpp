@@ -158,13 +158,11 @@ std::string difference(const Items& held, const Items& listed) {
   std::string text;
   for (const auto& [identifier, item] : held) {
     const auto found = listed.find(identifier);
-    if (found == listed.end()) {
-      text += identifier + " " + item.filename + " is held and not listed\n";
-    } else if (!(found->second == item)) {
-      text += identifier + " is held as " + item.filename + " in " + item.parentItemIdentifier +
-              " and listed as " + found->second.filename + " in " +
-              found->second.parentItemIdentifier + "\n";
-    }
+    if (found != listed.end() && found->second == item) continue;
+    text += identifier + " is held as " + item.filename + " in " + item.parentItemIdentifier;
+    text += found == listed.end() ? " and not listed\n"
+                                  : " and listed as " + found->second.filename + " in " +
+                                        found->second.parentItemIdentifier + "\n";
   }
   for (const auto& [identifier, item] : listed)
     if (!held.contains(identifier)) text += identifier + " " + item.filename + " is not held\n";

@@ -4,9 +4,10 @@
 #include <map>
 #include <memory>
 #include <random>
-#include <sdbus-c++/sdbus-c++.h>
 #include <string>
 #include <vector>
+
+#include "host/bus/BusClient.h"
 
 namespace mirabel::testing {
 
@@ -29,27 +30,29 @@ class SoakClient {
   static std::size_t askWithoutReading(const SoakTruth& truth, std::size_t calls);
 
  private:
+  static constexpr std::uint64_t longestAnswer = 120'000'000;  // microseconds
+
   void connect();
   [[nodiscard]] std::size_t pick(std::size_t count);
-  sdbus::MethodReply call(const char* interface, const char* method,
-                          const std::function<void(sdbus::MethodCall&)>& write = {});
   std::size_t lookUp();
-  std::size_t list();
+  std::size_t listFolder();
   std::size_t leaveInTheMiddle();
   std::size_t follow();
-  std::size_t watch();
   std::size_t search();
   std::size_t sendNonsense();
 
   const SoakTruth& truth_;
   std::mt19937 random_;
-  std::unique_ptr<sdbus::IConnection> connection_;
-  std::unique_ptr<sdbus::IProxy> service_;
+  std::unique_ptr<BusClient> client_;
   std::vector<std::uint8_t> anchor_;  ///< of the busy folder
 };
 
 struct SoakFailure {
   std::string what;
 };
+
+std::vector<std::string> sortedIdentifiers(const std::vector<ItemRecord>& items);
+/// Appends what lies in the container; answers how many calls that took. Throws `SoakFailure`.
+std::size_t list(BusClient& client, const std::string& container, std::vector<ItemRecord>& items);
 
 }  // namespace mirabel::testing

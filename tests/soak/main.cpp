@@ -8,8 +8,6 @@
 #include <limits>
 #include <sys/resource.h>
 
-#include "host/bus/BusItems.h"
-#include "host/bus/BusNames.h"
 #include "platform/VesselManager.h"
 #include "soak/Footprint.h"
 #include "soak/ServedHome.h"
@@ -37,35 +35,23 @@ void fill(const TempHome& home) {
   home.makeFolder("busy");
 }
 
-std::vector<ItemRecord> allItems(sdbus::IProxy& service, const std::string& container) {
-  std::vector<ItemRecord> items;
-  std::vector<std::uint8_t> page;
-  do {
-    auto call = service.createMethodCall(bus::providerInterface, "ListItems");
-    call << container << page;
-    auto reply = service.callMethod(call);
-    const auto some = bus::readItems(reply);
-    items.insert(items.end(), some.begin(), some.end());
-    page = bus::readBytes(reply);
-  } while (!page.empty());
-  return items;
-}
-
-SoakTruth learn(sdbus::IProxy& service) {
+SoakTruth learn() {
+  BusClient client;
   SoakTruth truth;
-  for (const ItemRecord& folder :
-       allItems(service, std::string(VesselRootContainerItemIdentifier))) {
+  std::vector<ItemRecord> root;
+  list(client, std::string(VesselRootContainerItemIdentifier), root);
+  for (const ItemRecord& folder : root) {
     if (folder.filename == "busy") {
       truth.busyFolder = folder.itemIdentifier;
       continue;
     }
-    auto& within = truth.folders[folder.itemIdentifier];
-    for (const ItemRecord& file : allItems(service, folder.itemIdentifier)) {
+    std::vector<ItemRecord> files;
+    list(client, folder.itemIdentifier, files);
+    truth.folders[folder.itemIdentifier] = sortedIdentifiers(files);
+    for (const ItemRecord& file : files) {
       truth.identifiers.push_back(file.itemIdentifier);
       truth.names[file.itemIdentifier] = file.filename;
-      within.push_back(file.itemIdentifier);
     }
-    std::sort(within.begin(), within.end());
   }
   return truth;
 }
@@ -87,9 +73,7 @@ std::string soak(const Wanted& wanted) {
   const TempHome home;
   fill(home);
   const ServedHome served(home.path());
-  const auto connection = sdbus::createSessionBusConnection();
-  const auto service = sdbus::createProxy(*connection, bus::serviceName, bus::objectPath);
-  const SoakTruth truth = learn(*service);
+  const SoakTruth truth = learn();
   // What a service that has been used once holds on to is not counted: its caches, and what the
   // allocator keeps at hand for each of its threads.
   Soak first(truth, home, {Clock::now() + std::chrono::seconds(30), firstCalls, wanted.clients});
