@@ -60,9 +60,7 @@ TEST_F(BusHandlers, AnswerWhateverExceptionTheyEndWith) {
 
 TEST_F(BusHandlers, AnswerAlsoWhereTheReplyCantBeWritten) {
   const TempHome home;
-  LinuxPlatform::Options options;
-  options.home = home.path();
-  const auto documents = LocalDocuments::open(std::move(options)).value();
+  const auto documents = LocalDocuments::open({.home = home.path()}).value();
   bus::CallerIdentities identities;
   const auto nobody = std::make_shared<bus::Caller>("nobody", *documents, identities);
   answerGetItem([&](sdbus::MethodCall message) {

@@ -15,9 +15,7 @@ class RemoteDocumentsTest : public ServiceFixture {
     home.makeFolder("folder");
     home.makeFolder("folder/taken");
     serve();
-    SessionOptions options;
-    options.home = home.path();
-    documents = openDocuments(std::move(options)).value();
+    documents = openDocuments({.home = home.path()}).value();
     folder = documents->itemAtPath(home.at("folder")).value().itemIdentifier;
   }
 

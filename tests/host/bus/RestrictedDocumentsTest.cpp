@@ -22,9 +22,7 @@ class Restricted : public ::testing::Test {
   Restricted() {
     apps.install(one, "One");
     fs::create_directory(at("folder"));
-    LinuxPlatform::Options options;
-    options.home = home.path();
-    all = LocalDocuments::open(std::move(options)).value();
+    all = LocalDocuments::open({.home = home.path()}).value();
     restricted = std::make_unique<bus::RestrictedDocuments>(*all, one);
   }
   std::string at(const std::string& name) const { return apps.documents(one) + "/" + name; }

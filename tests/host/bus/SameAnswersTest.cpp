@@ -149,115 +149,57 @@ class SameAnswers : public ServiceFixture, public ::testing::WithParamInterface<
 
 // In this order: what one does shows in those that follow. Of words in braces each is said in turn.
 constexpr const char* commands = R"(
-status
-info {@/letter.txt,@/folder,@/BYTES,@/LINES,@/LONG,@/link,@/fifo,@,root,#org.example.Draw}
-info {#org.example.Plain,#,#NOUTF8,#HUGE,did=99999,fid=99999999999999999999,@/missing,@/NOUTF8}
-info {@/letter.txt/below,@/LONGn,~/outside,~/.var/app/org.example.Draw/Documents/sketch.txt}
-id @/BYTES
-path $
-id @/folder
-{path,info} $
-id {~/outside/new.txt,@/.Trash}
-path {VesselWorkingSetContainerItemIdentifier,did=0}
-ls {root,@,workingset,alldirs,@/folder,#org.example.Draw,#org.example.Plain,#NOUTF8}
-ls {@/letter.txt,@/link,@/missing}
-ls @/many --pages 1
-ls {@/many,@/folder} --page $
-ls @/many --page {,AAAA,not-base64}
-ls @/letter.txt --page not-base64
-ls @/letter.txt --pages 0
-anchor @/folder
-changes --since $ @/folder
-changes --since {,AAAA,not-base64} root
-changes --since not-base64 @/letter.txt
-anchor {@/letter.txt,did=99999,alldirs,workingset}
-mkdir {new,new} --in root
-mkdir {BYTES,LINES,NOTEXT} --in @/folder
-rename @/folder/NOTEXT NOTEXT2
-ls @/folder
-mkdir {LONG,LONGn,,.,..,a/b} --in @/folder
-mkdir inside --in {@/letter.txt,did=99999,#org.example.Draw,#org.example.Plain}
-import ~/outside/new.txt ~/outside/BYTES ~/missing --in @/folder
-import {~/outside/new.txt,@/fifo,@/folder,} --in @/folder
-import ~/outside --in root
-import ~/outside/new.txt --in @/missing
-changes --since $ workingset
-rename @/letter.txt note.txt
-rename @/note.txt {BYTES,note.txt,x/y,LONGn,BYTESBYTES}
-rename @/BYTESBYTES note.txt
-rename {root,#org.example.Draw,@/missing} other
-mv @/note.txt @/folder
-mv @/folder/note.txt root --name {new,BYTES2}
-mv @/BYTES2 @/target --name note.txt
-mv @/target/note.txt {@/missing,@/link}
-mv {@/target,root} @/target
-mv @/target/note.txt #org.example.Draw
-mv ~/.var/app/org.example.Draw/Documents/note.txt @/target
-tag @/target/note.txt Red Grün
-tag @/target/note.txt
-tag @/target/note.txt {NOUTF8,ENORMOUS}
-tag @/target {,Red}
-tag {@/missing,root} Red
-tag @/BYTES {Blue,--clear}
-favorite @/target/note.txt 2
-favorite @/BYTES -1
-favorite @/LINES 18446744073709551615
-favorite @/folder 0.1
-favorite @/target {nan,1e300,red}
-favorite @/missing
-favorites
-favorites --limit 2
-favorite @/folder --clear
-used @/target/note.txt 2001-02-03T04:05:06.789Z
-used @/BYTES 1969-12-31T23:59:59.000000001Z
-used @/LINES 2001-02-03
-used @/target yesterday
-used {@/missing,root} 2001-02-03
-info {@/target/note.txt,@/BYTES}
-used @/BYTES --clear
-search {note,CAF,NOUTF8,HUGE,}
-search --tag {red,NOUTF8}
-search --type NOUTF8
-search --type text/* --since 90m
-search --before 2001-01-01
-search --since never x
-search 1 --limit 3
-recent --limit 2
-rename @/b/linked linkedBYTES
-info {@/b/linked,@/a/linked}
-mv @/b/linkedBYTES @/target
-trash @/a/linked
-restore @/.Trash/linked
-rm @/target/linkedBYTES
-ls {@/a,@/b}
-rm @/a/linked
-trash @/target/note.txt @/BYTES @/missing @/many
-trash {root,#org.example.Draw}
-search note --trashed
-ls @/.Trash
-info @/.Trash/note.txt
-restore {@/.Trash/note.txt,@/target/note.txt}
-restore @/.Trash/many --to @/folder
-restore @/.Trash/BYTES --to {@/link,did=99999}
-expire --older-than {30d,2100-01-01} --dry-run
-expire --older-than {2100-01-01,long}
-rm @/folder @/missing --dry-run
-anchor workingset
-rm @/folder/inside.txt @/missing @/new
-changes --since $ workingset
-rm {root,#org.example.Draw,@/folder}
-apps
-container {org.example.Draw,org.example.Plain,org.example.Missing,,NOUTF8}
-icon {@/LINES,@/missing} -o ~/icon.png
-icon #org.example.Draw -o ~/missing/icon.png
-icon #org.example.Draw -o ~/icon.png --size {16,0}
-status
+status;
+info {@/letter.txt,@/folder,@/BYTES,@/LINES,@/LONG,@/link,@/fifo,@,root,#org.example.Draw};
+info {#org.example.Plain,#,#NOUTF8,#HUGE,did=99999,fid=99999999999999999999,@/missing,@/NOUTF8};
+info {@/letter.txt/below,@/LONGn,~/outside,~/.var/app/org.example.Draw/Documents/sketch.txt};
+id @/BYTES; path $; id @/folder; {path,info} $; id {~/outside/new.txt,@/.Trash};
+path {VesselWorkingSetContainerItemIdentifier,did=0};
+ls {root,@,workingset,alldirs,@/folder,#org.example.Draw,#org.example.Plain,#NOUTF8};
+ls {@/letter.txt,@/link,@/missing}; ls @/many --pages 1; ls {@/many,@/folder} --page $;
+ls @/many --page {,AAAA,not-base64}; ls @/letter.txt --page not-base64; anchor @/folder;
+changes --since $ @/folder; changes --since {,AAAA,not-base64} root;
+changes --since not-base64 @/letter.txt;
+anchor {@/letter.txt,did=99999,alldirs,workingset}; mkdir {new,new} --in root;
+mkdir {BYTES,LINES,NOTEXT} --in @/folder; rename @/folder/NOTEXT NOTEXT2; ls @/folder;
+mkdir {LONG,LONGn,,.,..,a/b} --in @/folder;
+mkdir inside --in {@/letter.txt,did=99999,#org.example.Draw,#org.example.Plain};
+import ~/outside/new.txt ~/outside/BYTES ~/missing --in @/folder;
+import {~/outside/new.txt,@/fifo,@/folder,} --in @/folder; import ~/outside --in root;
+import ~/outside/new.txt --in @/missing; changes --since $ workingset; rename @/letter.txt note.txt;
+rename @/note.txt {BYTES,note.txt,x/y,LONGn,BYTESBYTES}; rename @/BYTESBYTES note.txt;
+rename {root,#org.example.Draw,@/missing} other; mv @/note.txt @/folder;
+mv @/folder/note.txt root --name {new,BYTES2}; mv @/BYTES2 @/target --name note.txt;
+mv @/target/note.txt {@/missing,@/link}; mv {@/target,root} @/target;
+mv @/target/note.txt #org.example.Draw; mv ~/.var/app/org.example.Draw/Documents/note.txt @/target;
+tag @/target/note.txt Red Grün; tag @/target/note.txt; tag @/target/note.txt {NOUTF8,ENORMOUS};
+tag @/target {,Red}; tag {@/missing,root} Red; tag @/BYTES {Blue,--clear};
+favorite @/target/note.txt 2; favorite @/BYTES -1; favorite @/LINES 18446744073709551615;
+favorite @/folder 0.1; favorite @/target {nan,1e300}; favorite @/missing; favorites;
+favorites --limit 2; favorite @/folder --clear;
+used @/target/note.txt 2001-02-03T04:05:06.789Z; used @/BYTES 1969-12-31T23:59:59.000000001Z;
+used @/LINES 2001-02-03; used {@/missing,root} 2001-02-03; info {@/target/note.txt,@/BYTES};
+used @/BYTES --clear; search {note,CAF,NOUTF8,HUGE,}; search --tag {red,NOUTF8};
+search --type NOUTF8; search --type text/* --since 90m; search --before 2001-01-01;
+search 1 --limit 3; recent --limit 2; rename @/b/linked linkedBYTES; info {@/b/linked,@/a/linked};
+mv @/b/linkedBYTES @/target; trash @/a/linked; restore @/.Trash/linked; rm @/target/linkedBYTES;
+ls {@/a,@/b}; rm @/a/linked;
+trash @/target/note.txt @/BYTES @/missing @/many; trash {root,#org.example.Draw};
+search note --trashed; ls @/.Trash; info @/.Trash/note.txt;
+restore {@/.Trash/note.txt,@/target/note.txt}; restore @/.Trash/many --to @/folder;
+restore @/.Trash/BYTES --to {@/link,did=99999};
+expire --older-than {30d,2100-01-01} --dry-run; expire --older-than 2100-01-01;
+rm @/folder @/missing --dry-run; anchor workingset; rm @/folder/inside.txt @/missing @/new;
+changes --since $ workingset; rm {root,#org.example.Draw,@/folder}; apps;
+container {org.example.Draw,org.example.Plain,org.example.Missing,,NOUTF8};
+icon {@/LINES,@/missing} -o ~/icon.png; icon #org.example.Draw -o ~/missing/icon.png;
+icon #org.example.Draw -o ~/icon.png --size 16; status;
 )";
 
 std::vector<Words> commandsOf(const std::string& text) {
   std::vector<Words> all;
   std::istringstream lines(text);
-  for (std::string line; std::getline(lines, line);) {
+  for (std::string line; std::getline(lines, line, ';');) {
     const std::size_t open = line.find('{');
     const std::size_t close = line.find('}');
     std::istringstream choices(open == line.npos ? "?"

@@ -94,9 +94,7 @@ TEST_F(Serve, FailsWhereTheStateBreaksSoThatItIsStartedAgain) {
 
 // At login, a program may be started while the service has the volume and no name yet.
 TEST_F(Serve, IsFoundByWhoeverWaitsForTheVolume) {
-  LinuxPlatform::Options held;
-  held.home = home.path();
-  auto documents = LocalDocuments::open(std::move(held)).value();
+  auto documents = LocalDocuments::open({.home = home.path()}).value();
   std::unique_ptr<bus::BusService> begun;
   int told = 0;
   SessionOptions options;
