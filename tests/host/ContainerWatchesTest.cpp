@@ -42,9 +42,7 @@ class ContainerWatchesTest : public ::testing::TestWithParam<std::string_view> {
   const TempHome home;
   const InstalledApps apps{home};
   std::unique_ptr<HostedProvider> provider = [this] {
-    LinuxPlatform::Options options;
-    options.home = home.path();
-    return HostedProvider::open(std::move(options)).value();
+    return HostedProvider::open({.home = home.path()}).value();
   }();
   std::counting_semaphore<> woken{0};
   std::unique_ptr<DocumentContainer> container;

@@ -8,41 +8,42 @@
 namespace mirabel::testing {
 namespace {
 
-TEST(ItemLookupTest, WhatCannotBeLookedAtIsNotSaidToBeMissing) {
-  TempHome home;
-  home.makeFolder("folder");
-  home.writeFile("folder/letter.txt", "text");
-  LinuxPlatform::Options options;
-  options.home = home.path();
-  const auto documents = LocalDocuments::open(std::move(options)).value();
-  for (const std::string& path : {home.at(""), home.at("folder"), home.at("folder/letter.txt")}) {
-    const std::string identifier = documents->itemAtPath(path)->itemIdentifier;
+class ItemLookupTest : public ::testing::Test {
+ protected:
+  ItemLookupTest() {
+    home.makeFolder("folder");
+    home.writeFile("folder/letter.txt", "text");
+    documents = LocalDocuments::open({.home = home.path()}).value();
+  }
+  std::string idOf(const std::string& name) const {
+    return documents->itemAtPath(home.at(name))->itemIdentifier;
+  }
+  /// Asks while one look after the other fails.
+  template <class Ask>
+  static void expectTheErrorOrAnAnswer(const Ask& ask) {
     for (int n = 1;; ++n) {
       const FailingNthLook failing(n, EIO, 1000);
-      const auto item = documents->lookup().byIdentifier(identifier);
-      EXPECT_TRUE(item || item.error().isPosix(EIO)) << path << ": " << item.error().description();
+      const auto answer = ask();
+      EXPECT_TRUE(answer || answer.error().isPosix(EIO)) << n << answer.error().description();
       if (!failing.wasMet()) break;
     }
-    EXPECT_TRUE(documents->lookup().byIdentifier(identifier)) << path;
+    EXPECT_TRUE(ask());
+  }
+
+  TempHome home;
+  std::unique_ptr<LocalDocuments> documents;
+};
+
+TEST_F(ItemLookupTest, WhatCannotBeLookedAtIsNotSaidToBeMissing) {
+  for (const char* name : {"", "folder", "folder/letter.txt"}) {
+    SCOPED_TRACE(name);
+    const std::string identifier = idOf(name);
+    expectTheErrorOrAnAnswer([&] { return documents->lookup().byIdentifier(identifier); });
   }
   const auto unknown = documents->lookup().byIdentifier("did=12345");
   EXPECT_TRUE(!unknown && unknown.error().is(VesselErrorCode::noSuchItem));
-}
-
-TEST(AnchorTest, ThatCannotBeTakenSaysWhy) {
-  TempHome home;
-  home.makeFolder("folder");
-  LinuxPlatform::Options options;
-  options.home = home.path();
-  const auto documents = LocalDocuments::open(std::move(options)).value();
-  const auto folder =
-      documents->container(documents->itemAtPath(home.at("folder"))->itemIdentifier);
-  for (int n = 1;; ++n) {
-    const FailingNthLook failing(n, EIO, 1000);
-    const auto anchor = (*folder)->currentSyncAnchor();
-    EXPECT_TRUE(anchor || anchor.error().isPosix(EIO)) << n << anchor.error().description();
-    if (!failing.wasMet()) break;
-  }
+  const auto folder = documents->container(idOf("folder"));
+  expectTheErrorOrAnAnswer([&] { return (*folder)->currentSyncAnchor(); });
 }
 
 }  // namespace

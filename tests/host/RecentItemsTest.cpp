@@ -45,9 +45,7 @@ class RecentItemsTest : public ::testing::Test {
     home.makeFolder("other/inner");
     home.writeFile("folder/inner/letter.txt", "text");
     home.writeFile("folder/inner/second.txt", "more");
-    LinuxPlatform::Options options;
-    options.home = home.path();
-    documents = LocalDocuments::open(std::move(options)).value();
+    documents = LocalDocuments::open({.home = home.path()}).value();
     identifier = documents->itemAtPath(letter)->itemIdentifier;
   }
   /// Asks until the item is remembered, which it is once its last change is a while ago.

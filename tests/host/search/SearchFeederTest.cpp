@@ -49,12 +49,9 @@ class SearchFeederTest : public ::testing::Test {
     index.reset();
     workingSet.reset();
     provider.reset();
-    LinuxPlatform::Options options;
-    options.home = home.path();
-    provider = HostedProvider::open(std::move(options)).value();
-    workingSet = provider->vessel()
-                     .enumeratorForContainerItemIdentifier(VesselWorkingSetContainerItemIdentifier)
-                     .value();
+    provider = HostedProvider::open({.home = home.path()}).value();
+    const std::string container(VesselWorkingSetContainerItemIdentifier);
+    workingSet = provider->vessel().enumeratorForContainerItemIdentifier(container).value();
     index = SearchIndex::open(indexFolder()).value();
   }
   void catchUp() {
