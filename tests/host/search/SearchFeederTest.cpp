@@ -2,7 +2,6 @@
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
-#include <semaphore>
 #include <set>
 #include <thread>
 
@@ -120,32 +119,6 @@ TEST_F(SearchFeederTest, RowsEqualAFreshListingAfterEveryKindOfChange) {
   catchUp();
   expectFresh("a restart");
   EXPECT_THAT(find("note"), IsEmpty());
-}
-
-TEST_F(SearchFeederTest, TagsRanksAndTheTrashArriveWithTheChanges) {
-  if (!hasUserAttributes(home.documents())) GTEST_SKIP() << "no attributes here";
-  home.writeFile("a.txt");
-  home.writeFile("b.txt");
-  catchUp();
-  LocalVessel& vessel = provider->vessel();
-  const auto identifier = [&](const char* name) {
-    return vessel.persistentIdentifierForItemAtURL(home.url(name)).value();
-  };
-  const std::string a = identifier("a.txt"), b = identifier("b.txt");
-  const auto wait = [](const LocalVessel::ItemResult& result) { ASSERT_TRUE(result); };
-  vessel.setTagData(encodeTagData({{"Wörk", 0}}).value(), a, wait);
-  vessel.setFavoriteRank(Number::of(std::uint64_t{3}), a, wait);
-  std::binary_semaphore trashed(0);
-  vessel.trashItemWithIdentifier(b, [&](const auto& result) {
-    EXPECT_TRUE(result);
-    trashed.release();
-  });
-  trashed.acquire();
-  catchUp();
-  EXPECT_THAT(find("work"), ElementsAre("a.txt"));
-  EXPECT_THAT(index->favorites().value(), ElementsAre(a));
-  EXPECT_THAT(find("b.txt"), IsEmpty());
-  expectFresh("metadata");
 }
 
 TEST_F(SearchFeederTest, ADomainThatWasDeletedIsToldAgainWhenItComesBack) {
