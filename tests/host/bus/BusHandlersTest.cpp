@@ -1,7 +1,6 @@
 #include <cerrno>
 #include <functional>
 #include <future>
-#include <gtest/gtest.h>
 #include <new>
 #include <stdexcept>
 
@@ -9,19 +8,18 @@
 #include "host/bus/BusCall.h"
 #include "host/bus/BusClient.h"
 #include "host/bus/BusErrors.h"
-#include "host/bus/PrivateBus.h"
 #include "host/bus/RemoteDocuments.h"
-#include "support/TempHome.h"
+#include "host/bus/ServiceFixture.h"
 
 namespace mirabel::testing {
 namespace {
 
 /// Somebody who has the service's name, and is not the service.
-class BusHandlers : public ::testing::Test {
+class BusHandlers : public ServiceFixture {
  protected:
   void SetUp() override {
-    if (!PrivateBus::isPossible()) GTEST_SKIP() << "there is no dbus-daemon";
-    bus = std::make_unique<PrivateBus>();
+    ServiceFixture::SetUp();
+    if (IsSkipped()) return;
     connection = sdbus::createSessionBusConnection();
     object = sdbus::createObject(*connection, bus::objectPath);
   }
@@ -43,7 +41,6 @@ class BusHandlers : public ::testing::Test {
     connection->requestName(bus::serviceName);
   }
 
-  std::unique_ptr<PrivateBus> bus;
   std::unique_ptr<sdbus::IConnection> connection;
   std::unique_ptr<sdbus::IObject> object;
 };
@@ -59,7 +56,6 @@ TEST_F(BusHandlers, AnswerWhateverExceptionTheyEndWith) {
 }
 
 TEST_F(BusHandlers, AnswerAlsoWhereTheReplyCantBeWritten) {
-  const TempHome home;
   const auto documents = LocalDocuments::open({.home = home.path()}).value();
   bus::CallerIdentities identities;
   const auto nobody = std::make_shared<bus::Caller>("nobody", *documents, identities);

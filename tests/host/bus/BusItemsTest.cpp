@@ -1,5 +1,4 @@
 #include <functional>
-#include <gtest/gtest.h>
 #include <limits>
 #include <optional>
 #include <rapidcheck.h>
@@ -8,7 +7,7 @@
 #include "host/bus/BusClient.h"
 #include "host/bus/BusItems.h"
 #include "host/bus/BusStatus.h"
-#include "host/bus/PrivateBus.h"
+#include "host/bus/ServiceFixture.h"
 #include "mirabel/TagData.h"
 
 namespace mirabel::testing {
@@ -17,12 +16,11 @@ namespace {
 using Variants = std::map<std::string, sdbus::Variant>;
 
 /// Hands out messages that are written and then read.
-class BusItems : public ::testing::Test {
+class BusItems : public ServiceFixture {
  protected:
   void SetUp() override {
-    if (!PrivateBus::isPossible()) GTEST_SKIP() << "there is no dbus-daemon";
-    bus = std::make_unique<PrivateBus>();
-    client = std::make_unique<BusClient>();
+    ServiceFixture::SetUp();
+    if (!IsSkipped()) client = std::make_unique<BusClient>();
   }
   sdbus::MethodCall sent(const std::function<void(sdbus::Message&)>& write) const {
     auto message = client->methodCall(bus::providerInterface, "Test");
@@ -36,7 +34,6 @@ class BusItems : public ::testing::Test {
     return bus::readItems(message);
   }
 
-  std::unique_ptr<PrivateBus> bus;
   std::unique_ptr<BusClient> client;
 };
 

@@ -1,7 +1,9 @@
+#include <array>
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <sys/mman.h>
+#include <unistd.h>
 
 #include "cli/InstalledApps.h"
 #include "host/bus/BusClient.h"
@@ -26,6 +28,8 @@ const std::string accessDenied = "org.freedesktop.DBus.Error.AccessDenied";
 const std::string noAccess = "com.norvane.Vessel1.Error.POSIX.EACCES";
 const std::string noSuchItem = "com.norvane.Vessel1.Error.NoSuchItem";
 const Data nothing;
+const BusOptions noOptions;
+const std::vector<std::string> words{"doc"};
 
 std::vector<std::string> namesOf(const std::vector<ItemRecord>& items) {
   std::vector<std::string> names;
@@ -82,9 +86,14 @@ TEST_F(Sandboxed, CallersSeeTheirOwnLibraryWithoutPlaces) {
     for (const std::string& item : {document, "#" + itself})
       namesOf({client.item(client.provider("GetItem", item))});
     namesOf({client.item(client.provider("GetDefaultContainer", itself))});
-    const BusOptions options;
-    const std::vector<std::string> words{"doc"};
-    EXPECT_THAT(namesOf(client.items(client.provider("Search", words, options))),
+    auto opened = client.provider("OpenItem", document, std::string("r"));
+    ASSERT_EQ(opened.error, "") << opened.message;
+    sdbus::UnixFd file;
+    opened.reply >> file;
+    std::array<char, 5> text{};
+    EXPECT_EQ(::read(file.get(), text.data(), text.size()), 4);
+    EXPECT_STREQ(text.data(), "text");
+    EXPECT_THAT(namesOf(client.items(client.provider("Search", words, noOptions))),
                 ElementsAre("doc of One"));
     EXPECT_THAT(namesOf(client.items(client.provider("GetRecent", std::uint32_t{10}))),
                 UnorderedElementsAre("doc of One", "stays", "leaves", "goes"));
@@ -123,7 +132,6 @@ TEST_F(Sandboxed, CallersCannotTellWhatIsSomebodyElsesFromWhatIsNotThere) {
                                            outside->idOf(apps.documents(another) + "/doc of Two"),
                                            std::string(VesselRootContainerItemIdentifier)};
   inOne([&](BusClient& client) {
-    const BusOptions options;
     const UniqueFd file(::memfd_create("imported", 0));
     const sdbus::UnixFd handed(file.get());
     const std::string name = "name";
@@ -132,19 +140,19 @@ TEST_F(Sandboxed, CallersCannotTellWhatIsSomebodyElsesFromWhatIsNotThere) {
         [&](auto& id) { return client.provider("GetItem", id); },
         [&](auto& id) { return client.provider("OpenItem", id, std::string("r")); },
         [&](auto& id) { return client.provider("GetIcon", id, std::uint32_t{16}); },
-        [&](auto& id) { return client.operations("Rename", id, name, options); },
-        [&](auto& id) { return client.operations("Reparent", id, "#" + itself, options); },
-        [&](auto& id) { return client.operations("Reparent", own, id, options); },
-        [&](auto& id) { return client.operations("CreateDirectory", name, id, options); },
-        [&](auto& id) { return client.operations("ImportDocument", handed, name, id, options); },
-        [&](auto& id) { return client.operations("Delete", id, BusOptions()); },
-        [&](auto& id) { return client.operations("Trash", id, BusOptions()); },
-        [&](auto& id) { return client.operations("Restore", id, options); },
+        [&](auto& id) { return client.operations("Rename", id, name, noOptions); },
+        [&](auto& id) { return client.operations("Reparent", id, "#" + itself, noOptions); },
+        [&](auto& id) { return client.operations("Reparent", own, id, noOptions); },
+        [&](auto& id) { return client.operations("CreateDirectory", name, id, noOptions); },
+        [&](auto& id) { return client.operations("ImportDocument", handed, name, id, noOptions); },
+        [&](auto& id) { return client.operations("Delete", id, noOptions); },
+        [&](auto& id) { return client.operations("Trash", id, noOptions); },
+        [&](auto& id) { return client.operations("Restore", id, noOptions); },
         [&](auto& id) {
           return client.operations("Restore", own, BusOptions{{"parent", sdbus::Variant(id)}});
         },
         [&](auto& id) { return client.operations("SetLastUsedDate", id, std::string()); },
-        [&](auto& id) { return client.operations("SetTags", id, std::vector<std::string>{"t"}); },
+        [&](auto& id) { return client.operations("SetTags", id, words); },
         [&](auto& id) { return client.operations("SetTagData", id, nothing); },
         [&](auto& id) { return client.operations("ClearFavoriteRank", id); },
     };
@@ -191,10 +199,9 @@ TEST_F(Sandboxed, CallersImportWhatTheyCouldReadAndNothingElse) {
   const UniqueFd writing(::open(file.c_str(), O_WRONLY));
   const UniqueFd folder(::open(home.path().c_str(), O_RDONLY | O_DIRECTORY));
   inOne([&](BusClient& client) {
-    const BusOptions options;
     const auto import = [&](const UniqueFd& from, const std::string& name) {
       return client.operations("ImportDocument", sdbus::UnixFd(from.get()), name, "#" + itself,
-                               options);
+                               noOptions);
     };
     EXPECT_EQ(import(place, "place").error, "com.norvane.Vessel1.Error.POSIX.EBADF");
     EXPECT_EQ(import(writing, "writing").error, "com.norvane.Vessel1.Error.POSIX.EBADF");
@@ -218,22 +225,21 @@ TEST_F(Sandboxed, CallersDoNotComeOutThroughLinksAndNames) {
   const std::string folderLink = outside->idOf(at("folder link"));
   const std::string document = outside->idOf(at("doc of One"));
   inOne([&](BusClient& client) {
-    const BusOptions options;
     const std::string notSupported = "com.norvane.Vessel1.Error.POSIX.EOPNOTSUPP";
     EXPECT_EQ(client.provider("OpenItem", link, std::string("r")).error, notSupported);
     EXPECT_EQ(client.provider("OpenItem", folderLink, std::string("r")).error, notSupported);
     EXPECT_EQ(client.provider("ListItems", folderLink, nothing).error,
               "com.norvane.Vessel1.Error.POSIX.ENOTDIR");
     for (const std::string name : {"../up", "/etc/up", "..", "folder link/in"}) {
-      EXPECT_NE(client.operations("Rename", document, name, options).error, "") << name;
-      EXPECT_NE(client.operations("CreateDirectory", name, "#" + itself, options).error, "")
+      EXPECT_NE(client.operations("Rename", document, name, noOptions).error, "") << name;
+      EXPECT_NE(client.operations("CreateDirectory", name, "#" + itself, noOptions).error, "")
           << name;
       const BusOptions named{{"name", sdbus::Variant(name)}};
       EXPECT_NE(client.operations("Reparent", document, "#" + itself, named).error, "") << name;
     }
-    EXPECT_NE(client.operations("CreateDirectory", std::string("in"), folderLink, options).error,
+    EXPECT_NE(client.operations("CreateDirectory", std::string("in"), folderLink, noOptions).error,
               "");
-    EXPECT_NE(client.operations("Reparent", document, folderLink, options).error, "");
+    EXPECT_NE(client.operations("Reparent", document, folderLink, noOptions).error, "");
   });
   EXPECT_TRUE(fs::is_empty(home.at("private folder")));
   EXPECT_TRUE(fs::exists(at("doc of One")));
@@ -245,8 +251,7 @@ TEST_F(Sandboxed, CallersOfNoKnownApplicationSeeNothing) {
       EXPECT_THAT(client.items(client.provider("ListAppLibraries")), IsEmpty());
       EXPECT_EQ(client.provider("GetItem", "#" + itself).error, noSuchItem);
       EXPECT_EQ(client.provider("GetDefaultContainer", std::string()).error, noSuchItem);
-      const std::vector<std::string> words{"doc"};
-      EXPECT_THAT(client.items(client.provider("Search", words, BusOptions())), IsEmpty());
+      EXPECT_THAT(client.items(client.provider("Search", words, noOptions)), IsEmpty());
     }));
   }
   // A root of its own alone is no sandbox.
@@ -263,7 +268,7 @@ TEST_F(Sandboxed, AnotherUsersProgramIsRefused) {
     EXPECT_EQ(client.provider("ListItems", root, nothing).error, accessDenied);
     EXPECT_EQ(client.provider("Watch", root).error, accessDenied);
     EXPECT_EQ(client.provider("Unwatch", root).error, accessDenied);
-    EXPECT_EQ(client.operations("Delete", root, BusOptions()).error, accessDenied);
+    EXPECT_EQ(client.operations("Delete", root, noOptions).error, accessDenied);
     EXPECT_EQ(client.call(bus::managerInterface, "GetHome").error, accessDenied);
   });
 }
