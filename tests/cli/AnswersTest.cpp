@@ -19,16 +19,15 @@ std::set<std::string> keysOf(const nlohmann::json& object) {
 TEST_F(Answers, AreOneValueForPeopleAndOneObjectForPrograms) {
   home.writeFile("doc");
   EXPECT_EQ(run({"id", home.at("doc")}).out, "did=1\n");
-  EXPECT_EQ(run({"--json", "id", home.at("doc")}).json(),
-            nlohmann::json({{"itemIdentifier", "did=1"}}));
+  EXPECT_EQ(done({"id", home.at("doc")}), nlohmann::json({{"itemIdentifier", "did=1"}}));
   EXPECT_EQ(run({"path", "did=1"}).out, home.at("doc") + "\n");
-  EXPECT_EQ(run({"--json", "path", "did=1"}).json(), nlohmann::json({{"path", home.at("doc")}}));
+  EXPECT_EQ(done({"path", "did=1"}), nlohmann::json({{"path", home.at("doc")}}));
 }
 
 TEST_F(Answers, AnItemHasTheKeysOfWhatItHas) {
   home.writeFile("letter.txt", "Dear Aunt");
   home.makeFolder("folder");
-  const nlohmann::json document = run({"--json", "info", home.at("letter.txt")}).json();
+  const nlohmann::json document = done({"info", home.at("letter.txt")});
   std::set<std::string> keys = {"capabilities",   "contentModificationDate",
                                 "creationDate",   "docID",
                                 "documentSize",   "fileID",
@@ -37,20 +36,18 @@ TEST_F(Answers, AnItemHasTheKeysOfWhatItHas) {
                                 "path",           "typeIdentifier"};
   EXPECT_EQ(keysOf(document), keys);
   EXPECT_EQ(document.at("documentSize"), "9");
-  EXPECT_EQ(document.at("docID"), "1");
   EXPECT_EQ(document.at("isTrashed"), false);
   EXPECT_EQ(document.at("parentItemIdentifier"), "VesselRootContainerItemIdentifier");
-  EXPECT_TRUE(document.at("fileID").is_string());
-  EXPECT_TRUE(document.at("capabilities").is_string());
+  EXPECT_TRUE(document.at("fileID").is_string() && document.at("capabilities").is_string());
   EXPECT_THAT(document.at("creationDate").get<std::string>(),
               MatchesRegex("[0-9]+-[0-9]+-[0-9]+T[0-9:.]+Z"));
-  const nlohmann::json folder = run({"--json", "info", home.at("folder")}).json();
+  const nlohmann::json folder = done({"info", home.at("folder")});
   keys.erase("docID");
   keys.erase("documentSize");
   keys.insert("childItemCount");
   EXPECT_EQ(keysOf(folder), keys);
   EXPECT_EQ(folder.at("childItemCount"), 0);
-  const nlohmann::json page = run({"--json", "ls"}).json();
+  const nlohmann::json page = done({"ls"});
   EXPECT_EQ(page.at("items").size(), 2u);
   for (const nlohmann::json& item : page.at("items")) {
     EXPECT_EQ(item, item.at("filename") == "folder" ? folder : document);
@@ -81,8 +78,8 @@ TEST_F(Answers, NamesAreMadeSafeForPeopleAndKeptForPrograms) {
   }
   EXPECT_EQ(run({"path", home.at(bytes)}).out, home.at(bytes) + "\n");
   EXPECT_EQ(run({"path", home.at(bytes)}, Output::terminal).out, home.at("caf\\xe9\n"));
-  EXPECT_EQ(run({"--json", "info", home.at(escape)}).json().at("filename"), escape);
-  const nlohmann::json item = run({"--json", "info", home.at(bytes)}).json();
+  EXPECT_EQ(done({"info", home.at(escape)}).at("filename"), escape);
+  const nlohmann::json item = done({"info", home.at(bytes)});
   EXPECT_EQ(item.at("filename"), "caf\xEF\xBF\xBD");
   EXPECT_EQ(item.at("filenameBytes"), "Y2Fm6Q==");
   EXPECT_TRUE(item.contains("pathBytes"));

@@ -31,15 +31,6 @@ class Apps : public CommandLineFixture {
     apps.write(plain, "secret.txt", "text");
   }
 
-  json done(std::vector<std::string> arguments) const {
-    arguments.insert(arguments.begin(), "--json");
-    const Answer answer = run(std::move(arguments));
-    EXPECT_EQ(answer.code, 0) << answer.err;
-    return answer.code == 0 ? answer.json() : json();
-  }
-  std::string anchor(const std::string& container) const {
-    return done({"anchor", container}).at("anchor");
-  }
   static std::vector<std::string> values(const json& items, const char* key) {
     std::vector<std::string> all;
     for (const json& item : items)
@@ -124,12 +115,10 @@ TEST_F(Apps, HaveTheirIconsWritten) {
   fs::remove(file);
   const std::tuple<std::vector<std::string>, int, std::string> refused[] = {
       {{"icon", "root", "-o", file}, 1, "has no icon"},
-      {{"icon", inDraw("sketch.txt"), "-o", file}, 1, "has no icon"},
       {{"icon", "#" + plain, "-o", file}, 3, "not shown"},
       {{"icon", "#" + draw}, 2, "--output"},
       {{"icon", "#" + draw, "-o", file, "--size", "0"}, 2, "--size takes 1 to 4096"},
       {{"icon", "#" + draw, "-o", file, "--size", "4097"}, 2, "--size takes 1 to 4096"},
-      {{"icon", "#" + draw, "-o", file, "--size", "big"}, 2, "--size"},
       {{"icon", "#" + draw, "-o", home.path() + "/none/x"}, 3, "no such file or folder"}};
   for (const auto& [arguments, code, text] : refused)
     expectFailure(run(arguments), code, text);

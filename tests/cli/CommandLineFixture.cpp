@@ -31,6 +31,13 @@ Answer CommandLineFixture::run(std::vector<std::string> arguments, Output output
   return {code, out.str(), err.str()};
 }
 
+nlohmann::json CommandLineFixture::done(std::vector<std::string> arguments) const {
+  arguments.insert(arguments.begin(), "--json");
+  const Answer answer = run(std::move(arguments));
+  EXPECT_EQ(answer.code, 0) << answer.err;
+  return answer.code == 0 ? answer.json() : nlohmann::json();
+}
+
 Answer CommandLineFixture::shell(const std::string& script) const {
   const std::string out = home.path() + "/out";
   const std::string err = home.path() + "/err";

@@ -31,6 +31,11 @@ class CommandLineFixture : public ::testing::Test {
 
   /// --home is said in front of the arguments.
   Answer run(std::vector<std::string> arguments, Output output = Output::file) const;
+  /// The one line that a command answers to programs, which must succeed.
+  nlohmann::json done(std::vector<std::string> arguments) const;
+  std::string anchor(const std::string& container = "root") const {
+    return done({"anchor", container}).at("anchor");
+  }
   /// Runs a shell script, in which $mirabel is the program, $home, $documents and $state are set.
   Answer shell(const std::string& script) const;
 

@@ -17,37 +17,23 @@ using ::testing::IsEmpty;
 class ItemCommands : public CommandLineFixture {
  protected:
   void SetUp() override {
-    home.makeFolder("folder");
-    for (const char* name : {"target", "a", "b"})
+    for (const char* name : {"folder", "target", "a", "b"})
       home.makeFolder(name);
     home.writeFile("folder/doc.txt", "text");
     std::ofstream(home.path() + "/source.txt") << "imported";
   }
 
   std::string idOf(std::string_view name) const {
-    return run({"--json", "id", home.at(name)}).json().at("itemIdentifier");
+    return done({"id", home.at(name)}).at("itemIdentifier");
   }
-  nlohmann::json item(std::vector<std::string> arguments) const {
-    arguments.insert(arguments.begin(), "--json");
-    const Answer answer = run(std::move(arguments));
-    EXPECT_EQ(answer.code, 0) << answer.err;
-    return answer.json();
-  }
-  std::string anchor() const { return run({"--json", "anchor", "workingset"}).json().at("anchor"); }
   bool exists(std::string_view name) const { return fs::exists(fs::symlink_status(home.at(name))); }
 
-  /// What the working set is told of since the anchor: identifiers, by how it is told of them.
-  struct Told {
-    std::vector<std::string> updated;
-    std::vector<std::string> deleted;
-  };
-  Told toldSince(const std::string& anchor) const {
-    const auto batch = run({"--json", "changes", "--since", anchor, "workingset"}).json();
-    Told told;
-    for (const auto& each : batch.at("updated"))
-      told.updated.push_back(each.at("itemIdentifier"));
-    for (const auto& each : batch.at("deleted"))
-      told.deleted.push_back(each);
+  /// Identifiers that the working set is told of since the anchor, as "updated" or as "deleted".
+  std::vector<std::string> toldSince(const std::string& anchor, const char* how) const {
+    const auto batch = done({"changes", "--since", anchor, "workingset"});
+    std::vector<std::string> told;
+    for (const auto& each : batch.at(how))
+      told.push_back(each.is_string() ? each : each.at("itemIdentifier"));
     return told;
   }
 };
@@ -66,25 +52,25 @@ TEST_F(ItemCommands, HandBackTheItemThatAListingShowsAndTheChangesName) {
   };
   const std::string document = idOf("folder/doc.txt");
   for (const auto& command : commands) {
-    const std::string before = anchor();
-    const nlohmann::json handedBack = item(command);
-    EXPECT_EQ(item({"info", handedBack.at("itemIdentifier")}), handedBack) << command[0];
-    EXPECT_THAT(toldSince(before).updated,
+    const std::string before = anchor("workingset");
+    const nlohmann::json handedBack = done(command);
+    EXPECT_EQ(done({"info", handedBack.at("itemIdentifier")}), handedBack) << command[0];
+    EXPECT_THAT(toldSince(before, "updated"),
                 Contains(handedBack.at("itemIdentifier").get<std::string>()))
         << command[0];
     if (command[0] != "mkdir" && command[0] != "import") {
       EXPECT_EQ(handedBack.at("itemIdentifier"), document) << command[0];
     }
   }
-  const nlohmann::json last = item({"info", document});
+  const nlohmann::json last = done({"info", document});
   EXPECT_EQ(last.at("path"), home.at("target/moved.txt"));
   EXPECT_EQ(last.at("tags"), nlohmann::json({"red", "blue"}));
   EXPECT_EQ(last.at("favoriteRank"), "7");
   EXPECT_EQ(last.at("lastUsedDate"), "2026-11-21T00:00:00Z");
 
-  const std::string before = anchor();
-  EXPECT_EQ(item({"rm", home.at("target/moved.txt")}), nlohmann::json({{"deleted", {document}}}));
-  EXPECT_THAT(toldSince(before).deleted, Contains(document));
+  const std::string before = anchor("workingset");
+  EXPECT_EQ(done({"rm", home.at("target/moved.txt")}), nlohmann::json({{"deleted", {document}}}));
+  EXPECT_THAT(toldSince(before, "deleted"), Contains(document));
   EXPECT_FALSE(exists("target/moved.txt"));
 }
 
@@ -92,24 +78,19 @@ TEST_F(ItemCommands, MetadataIsClearedAndTagsArePrinted) {
   const std::string doc = home.at("folder/doc.txt");
   EXPECT_EQ(run({"tag", doc, "red", "late\nr"}).code, 0);
   EXPECT_EQ(run({"tag", doc}).out, "red\nlate\\nr\n");
-  EXPECT_EQ(item({"tag", doc, "--clear"}).at("tags"), nlohmann::json::array());
-  EXPECT_EQ(item({"favorite", doc}).at("favoriteRank"), "1");
-  EXPECT_EQ(item({"favorite", doc, "2.5"}).at("favoriteRank"), 2.5);
-  EXPECT_FALSE(item({"favorite", doc, "--clear"}).contains("favoriteRank"));
-  EXPECT_TRUE(item({"used", doc}).contains("lastUsedDate"));
-  EXPECT_FALSE(item({"used", doc, "--clear"}).contains("lastUsedDate"));
+  EXPECT_EQ(done({"tag", doc, "--clear"}).at("tags"), nlohmann::json::array());
+  EXPECT_EQ(done({"favorite", doc}).at("favoriteRank"), "1");
+  EXPECT_EQ(done({"favorite", doc, "2.5"}).at("favoriteRank"), 2.5);
+  EXPECT_FALSE(done({"favorite", doc, "--clear"}).contains("favoriteRank"));
+  EXPECT_TRUE(done({"used", doc}).contains("lastUsedDate"));
+  EXPECT_FALSE(done({"used", doc, "--clear"}).contains("lastUsedDate"));
 }
 
 TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
   home.writeFile("target/doc.txt", "in the way");
   const std::string doc = home.at("folder/doc.txt");
   const std::string taker = idOf("target/doc.txt");
-  struct Row {
-    std::vector<std::string> arguments;
-    int code;
-    std::string message;
-  };
-  const Row rows[] = {
+  const std::tuple<std::vector<std::string>, int, std::string> rows[] = {
       {{"mkdir", "new", "--in", "root"}, 5, "choose a folder in it"},
       {{"mkdir", "a/b", "--in", home.at("folder")}, 1, "a name can't hold \"/\""},
       {{"mkdir", std::string(256, 'x'), "--in", home.at("folder")}, 1, "file name too long"},
@@ -125,10 +106,8 @@ TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
       {{"favorite", doc, "many"}, 2, "a rank is a number"},
       {{"used", doc, "yesterday"}, 2, "a date is written like"},
   };
-  for (const Row& row : rows) {
-    SCOPED_TRACE(row.arguments[0] + " " + row.arguments[1]);
-    expectFailure(run(row.arguments), row.code, row.message);
-  }
+  for (const auto& [arguments, code, message] : rows)
+    expectFailure(run(arguments), code, message);
   EXPECT_EQ(run({"--json", "used", doc, "yesterday"}).error().at("domain"), "usage");
   EXPECT_EQ(run({"tag", doc, "red", "--clear"}).code, 2);
   EXPECT_EQ(run({"mkdir", "new"}).code, 2);
@@ -140,8 +119,7 @@ TEST_F(ItemCommands, OfSeveralItemsOneFailureDoesNotStopTheOthers) {
   const Answer answer = run({"import", home.path() + "/source.txt", home.path() + "/missing",
                              home.path() + "/second.txt", "--in", home.at("folder")});
   EXPECT_EQ(answer.code, 3);
-  EXPECT_TRUE(exists("folder/source.txt"));
-  EXPECT_TRUE(exists("folder/second.txt"));
+  EXPECT_TRUE(exists("folder/source.txt") && exists("folder/second.txt"));
   EXPECT_EQ(run({"rm", home.at("nowhere"), home.at("folder/second.txt")}).code, 3);
   EXPECT_FALSE(exists("folder/second.txt"));
 }
@@ -183,7 +161,7 @@ TEST_F(ItemCommands, OfAFileWithSeveralNamesChangeTheOneThatTheyWereGiven) {
         EXPECT_FALSE(exists(given)) << words[0];
         EXPECT_TRUE(exists(other)) << words[0];
         if (words[0] == "trash") {
-          EXPECT_EQ(item({"restore", home.at(place)}).at("path"), home.at(given));
+          EXPECT_EQ(done({"restore", home.at(place)}).at("path"), home.at(given));
         }
       }
     }
@@ -216,10 +194,10 @@ TEST_F(ItemCommands, OnAFullDiskThingsAreTrashedPutBackAndDeleted) {
 class TrashCommands : public ItemCommands {
  protected:
   std::string trash(std::string_view name) const {
-    return item({"trash", home.at(name)}).at("itemIdentifier");
+    return done({"trash", home.at(name)}).at("itemIdentifier");
   }
   std::string restore(const std::string& identifier) const {
-    return item({"restore", identifier}).at("path");
+    return done({"restore", identifier}).at("path");
   }
 };
 
@@ -246,7 +224,7 @@ TEST_F(TrashCommands, EverythingComesBackToItsPlaceUnderItsOwnName) {
     EXPECT_TRUE(exists(name)) << name;
   }
   EXPECT_TRUE(exists("folder/sub/file"));
-  EXPECT_THAT(run({"--json", "ls", home.at(".Trash")}).json().at("items"), IsEmpty());
+  EXPECT_THAT(done({"ls", home.at(".Trash")}).at("items"), IsEmpty());
 }
 
 TEST_F(TrashCommands, ThingsOfOneNameKeepApart) {

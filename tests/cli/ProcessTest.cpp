@@ -14,9 +14,7 @@ using ::testing::MatchesRegex;
 class Processes : public CommandLineFixture {
  protected:
   std::unique_ptr<LocalDocuments> hold() const {
-    LinuxPlatform::Options options;
-    options.home = home.path();
-    return LocalDocuments::open(std::move(options)).value();
+    return LocalDocuments::open({.home = home.path()}).value();
   }
 };
 

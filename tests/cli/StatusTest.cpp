@@ -11,7 +11,7 @@ using Status = CommandLineFixture;
 TEST_F(Status, TellsHowChangesAreFollowedAndWhatTheHistoryHolds) {
   home.makeFolder("folder");
   home.makeFolder("folder/inner");
-  const nlohmann::json before = run({"--json", "status"}).json();
+  const nlohmann::json before = done({"status"});
   EXPECT_THAT(before.at("watcher").get<std::string>(), MatchesRegex("folderMarks|inotify"));
   EXPECT_EQ(before.at("foldersWatched"), "3");
   EXPECT_GT(std::stoull(before.at("marksAllowed").get<std::string>()), 3u);
@@ -21,7 +21,7 @@ TEST_F(Status, TellsHowChangesAreFollowedAndWhatTheHistoryHolds) {
 
   // It is in step with the disk: what just happened is in the history.
   home.writeFile("folder/inner/doc");
-  const nlohmann::json after = run({"--json", "status"}).json();
+  const nlohmann::json after = done({"status"});
   EXPECT_EQ(after.at("historyUUID"), before.at("historyUUID"));
   EXPECT_EQ(after.at("firstEventID"), "1");
   EXPECT_GT(std::stoull(after.at("lastEventID").get<std::string>()), 0u);
@@ -40,7 +40,7 @@ TEST_F(Status, CountsFoldersThatCannotBeRead) {
   if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
   {
     const OrdinaryUser user;
-    EXPECT_EQ(run({"--json", "status"}).json().at("unreadableFolders"), "1");
+    EXPECT_EQ(done({"status"}).at("unreadableFolders"), "1");
   }
   home.setMode("closed", 0700);
 }

@@ -111,10 +111,10 @@ TEST_F(Watch, EndsWithTheAnchorToGoOnFrom) {
 
 TEST_F(Watch, FirstTellsWhatChangedSinceAnAnchor) {
   home.writeFile("old");
-  const std::string anchor = run({"--json", "anchor"}).json().at("anchor");
+  const std::string before = anchor();
   for (int i = 0; i < 250; ++i)
     home.writeFile("new" + std::to_string(i));
-  Running watch(command({"--json", "watch", "--since", anchor}));
+  Running watch(command({"--json", "watch", "--since", before}));
   std::set<std::string> told;
   await(watch, [&](const Batch& batch) {
     for (const Batch& item : batch.at("updated"))
@@ -248,8 +248,6 @@ TEST_F(WatchWithFewMarks, ChangesAreRightAndTheLimitIsToldOnce) {
   const Batch object = runLimited({"--json", "status"}).json();
   EXPECT_FALSE(object.contains("watcher"));
   EXPECT_THAT(object.at("refusal").get<std::string>(), HasSubstr("raise \"user.max_"));
-  EXPECT_EQ(object.at("marksNeeded"), "51");
-  EXPECT_EQ(object.at("marksAllowed"), "10");
 }
 
 TEST_F(WatchWithFewMarks, ChangesAreToldAsTheyCome) {
