@@ -21,18 +21,36 @@ class BadInput : public CommandLineFixture {
   }
 };
 
-TEST_F(BadInput, AHomeOrADocumentStorageThatIsNoneIsNamed) {
-  for (const char* command : {"ls", "doctor"})
-    expectFailure(shell("\"$mirabel\" --home \"$home/missing\" " + std::string(command)), 1,
-                  "/missing\" cannot be reached: no such file or folder");
+TEST_F(BadInput, AHomeThatIsNoneIsRefused) {
+  home.makeFolder("inner");
+  home.makeFolder("inner/Documents");
+  home.writeFile("file");
+  const std::pair<std::string, std::string> cases[] = {
+      {home.path() + "/missing", "/missing\" cannot be reached: no such file or folder"},
+      {home.at("file"), "/file\" is not a folder"},
+      {home.at("inner"), "lies below another folder named \"Documents\""},
+      {"", "the home folder \"\""}};
+  for (const auto& [path, message] : cases) {
+    for (const char* command : {"ls", "doctor"}) {
+      const Answer answer = shell("\"$mirabel\" --home '" + path + "' " + command);
+      expectFailure(answer, 1, message);
+    }
+  }
+  EXPECT_EQ(shell("env -u HOME \"$mirabel\" --home \"$home\" ls").code, 0);
+  EXPECT_FALSE(fs::exists(home.at("inner/.local")));
+}
+
+TEST_F(BadInput, ADocumentStorageThatIsNoneIsNamed) {
   fs::remove(home.documents());
   expectFailure(run({"ls"}), 3, "/Documents\": no such file or folder");
   fs::create_symlink("nowhere", home.documents());
   expectFailure(run({"info", "root"}), 1, "/Documents\" is a link to nothing");
   EXPECT_FALSE(fs::exists(home.path() + "/nowhere"));
   fs::remove(home.documents());
+  fs::remove_all(home.path() + "/.local");
   std::ofstream(home.documents()) << "x";
   expectFailure(run({"ls"}), 1, "/Documents\" is not a folder");
+  EXPECT_FALSE(fs::exists(home.stateFolder()));
 }
 
 TEST_F(BadInput, ADamagedDatabaseIsSetAsideAndThatIsSaidOnce) {
