@@ -146,8 +146,11 @@ Result<void> FileCopy::copyProperties(int source, const ObjectStatus& status, in
   // First what a file without permission to write would refuse.
   if (auto copied = copyAttributes(source, copy); !copied) return copied;
   if (kind_ == CopyKind::move && status.owner != ::geteuid()) {
-    // Only root may, and only root gets at what belongs to others.
-    static_cast<void>(::fchown(copy, status.owner, static_cast<gid_t>(-1)));
+    // Only root may; what others move becomes theirs.
+    constexpr auto sameGroup = static_cast<gid_t>(-1);
+    if (::fchown(copy, status.owner, sameGroup) != 0 && errno != EPERM) {
+      return fail(Error::posix(errno));
+    }
   }
   if (auto set = calls_.setMode(copy, status.mode & copiedPermissions); !set) return set;
   return calls_.setTime(copy, {}, status.modificationTime);

@@ -153,5 +153,15 @@ TEST_F(HostileEntriesTest, NumbersAreBoundedTheSameWayEachTime) {
             "it has more entries than are read");
 }
 
+TEST_F(HostileEntriesTest, CommandsAreNeverRun) {
+  const std::string witness = home.path() + "/witness";
+  const std::string command = "/bin/touch " + witness;
+  home.install("a", "Exec=" + command + " %f\nTryExec=" + command +
+                        "\nMimeType=text/plain;\nName=$(" + command + ")");
+  EXPECT_THAT(users(), ElementsAre("a"));
+  EXPECT_EQ(registry.proxyForBundleIdentifier("a")->localizedName, "$(" + command + ")");
+  EXPECT_FALSE(fs::exists(witness));
+}
+
 }  // namespace
 }  // namespace mirabel::testing
