@@ -1,10 +1,8 @@
 #include <cerrno>
-#include <csignal>
 #include <gtest/gtest.h>
 #include <string>
 #include <utility>
 
-#include "foundation/FatalError.h"
 #include "mirabel/Error.h"
 
 namespace mirabel {
@@ -31,21 +29,6 @@ TEST(Error, DescribesItselfInOneLine) {
   };
   for (const auto& [error, text] : cases)
     EXPECT_EQ(error.description(), text);
-}
-
-TEST(Error, SaysWhichItemOrParameterIsMeant) {
-  const Error missing = Error::nonExistentItem("did=5");
-  EXPECT_EQ(missing.userInfo.find(errorkey::itemIdentifier)->second, "did=5");
-  EXPECT_NE(missing, Error::nonExistentItem("did=6"));
-  const Error invalid = Error::invalidParameter("rank", "-1");
-  EXPECT_EQ(invalid.userInfo.find(errorkey::parameter)->second, "rank");
-  EXPECT_EQ(invalid.userInfo.find(errorkey::value)->second, "-1");
-}
-
-TEST(ErrorDeathTest, FatalErrorSaysWhyAndAborts) {
-  GTEST_FLAG_SET(death_test_style, "threadsafe");
-  EXPECT_EXIT(fatalError("list of URLs is empty"), ::testing::KilledBySignal(SIGABRT),
-              "\\[ERROR\\] list of URLs is empty\n");
 }
 
 }  // namespace

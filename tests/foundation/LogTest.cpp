@@ -21,22 +21,6 @@ using ::testing::ElementsAre;
 using testing::LogCapture;
 using testing::LogLine;
 
-TEST(Log, LinesCarryTheirLevelWordAndLevel) {
-  const LogCapture capture;
-  logDebug("one");
-  logInfo(std::string("two"));
-  logError("three");
-  logDebug([] { return std::string("four"); });
-  logMessage(LogLevel::info, [] { return "five"; });
-  Log::shared().plain(LogLevel::error, "six %s");
-  EXPECT_THAT(
-      capture.lines(),
-      ElementsAre(LogLine{LogLevel::debug, "[DEBUG] one"}, LogLine{LogLevel::info, "[INFO] two"},
-                  LogLine{LogLevel::error, "[ERROR] three"},
-                  LogLine{LogLevel::debug, "[DEBUG] four"}, LogLine{LogLevel::info, "[INFO] five"},
-                  LogLine{LogLevel::error, "six %s"}));
-}
-
 TEST(Log, LinesBelowTheThresholdAreNotEvenBuilt) {
   const LogCapture capture(LogLevel::info);
   bool isBuilt = false;
@@ -50,22 +34,6 @@ TEST(Log, LinesBelowTheThresholdAreNotEvenBuilt) {
   EXPECT_FALSE(isBuilt);
   logInfo("heard");
   EXPECT_THAT(capture.lines(), ElementsAre(LogLine{LogLevel::info, "[INFO] heard"}));
-}
-
-TEST(Log, SinksLearnSubsystemAndCategory) {
-  struct Recorder : LogSink {
-    std::string seen;
-    void write(LogLevel, std::string_view subsystem, std::string_view category,
-               std::string_view) override {
-      seen = std::string(subsystem) + "/" + std::string(category);
-    }
-  };
-  const auto recorder = std::make_shared<Recorder>();
-  Log::shared().setSink(recorder, LogLevel::debug);
-  logInfo("x");
-  Log::shared().setSink(nullptr, LogLevel::debug);
-  EXPECT_EQ(recorder->seen, "com.norvane.Vessel/mirabel");
-  EXPECT_FALSE(Log::shared().isEnabled(LogLevel::info)) << "null restores the start-up state";
 }
 
 TEST(StandardErrorSink, WritesEachLineInOneCall) {

@@ -33,34 +33,6 @@ struct ResourceReaderTest : ::testing::Test {
   LogCapture log;
 };
 
-TEST_F(ResourceReaderTest, AllValuesComeFromOneLook) {
-  source.values = ResourceValues{.kind = FileKind::regular,
-                                 .isPackage = false,
-                                 .isWritable = true,
-                                 .fileID = std::uint64_t{1} << 62,
-                                 .documentID = 5,
-                                 .size = 12,
-                                 .creationDate = Date{.seconds = 1, .nanoseconds = 2},
-                                 .contentModificationDate = Date{.seconds = 3, .nanoseconds = 4},
-                                 .typeIdentifier = "text/plain"};
-  EXPECT_EQ(reader.string(ResourceKey::name, url), "report 1.txt");
-  EXPECT_EQ(reader.string(ResourceKey::typeIdentifier, url), "text/plain");
-  EXPECT_EQ(reader.number(ResourceKey::fileSize, url), Number::of(std::uint64_t{12}));
-  EXPECT_EQ(reader.number(ResourceKey::fileIdentifier, url), Number::of(std::uint64_t{1} << 62));
-  EXPECT_EQ(reader.number(ResourceKey::documentIdentifier, url), Number::of(std::uint64_t{5}));
-  EXPECT_EQ(reader.date(ResourceKey::creationDate, url), (Date{1, 2}));
-  EXPECT_EQ(reader.date(ResourceKey::contentModificationDate, url), (Date{3, 4}));
-  EXPECT_EQ(reader.boolean(ResourceKey::isDirectory, url), false);
-  EXPECT_EQ(reader.boolean(ResourceKey::isPackage, url), false);
-  EXPECT_EQ(reader.boolean(ResourceKey::isWritable, url), true);
-  EXPECT_EQ(reader.boolean(ResourceKey::isReachable, url), true);
-  EXPECT_EQ(source.reads, 1);
-
-  url.resources().clear();
-  EXPECT_EQ(reader.boolean(ResourceKey::isReachable, url), true);
-  EXPECT_EQ(source.reads, 2) << "a cleared cache looks again";
-}
-
 TEST_F(ResourceReaderTest, AbsentValuesAndOtherTypesReadAsNothingWithoutALine) {
   source.values = ResourceValues{.kind = FileKind::folder, .fileID = 2, .size = 4096};
   EXPECT_EQ(reader.number(ResourceKey::fileSize, url), std::nullopt) << "folders have no size";

@@ -6,7 +6,6 @@
 #include <gtest/gtest.h>
 #include <latch>
 #include <memory>
-#include <numeric>
 #include <stdexcept>
 #include <thread>
 #include <vector>
@@ -19,22 +18,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using ::testing::KilledBySignal;
-
-TEST(SerialQueue, RunsAsyncAndSyncBlocksInTheOrderInWhichTheyCame) {
-  SerialQueue queue("order");
-  std::vector<int> order;
-  std::promise<void> gate;
-  queue.async([opened = gate.get_future().share()] { opened.wait(); });
-  for (int i = 0; i < 50; ++i)
-    queue.async([&order, i] { order.push_back(i); });
-  gate.set_value();
-  queue.sync([&] { order.push_back(50); });
-  queue.async([&] { order.push_back(51); });
-  queue.sync([&] { order.push_back(52); });
-  std::vector<int> expected(53);
-  std::iota(expected.begin(), expected.end(), 0);
-  EXPECT_EQ(order, expected);
-}
 
 TEST(SerialQueue, KeepsBlocksOfManyThreadsApartAndEachThreadsInOrder) {
   constexpr int perThread = 500;
@@ -93,22 +76,6 @@ TEST(SerialQueue, WhatFollowsRunsOnTheCallingThreadInOrder) {
   queue.async([&] { note(5); });
   queue.syncWithWhatFollows([&] { note(6); });
   EXPECT_EQ(order.back(), 6);
-}
-
-TEST(SerialQueue, IsCurrentOnlyInItsOwnBlocksAndThoseCalledFromThem) {
-  SerialQueue outer("outer");
-  SerialQueue inner("inner");
-  EXPECT_FALSE(outer.isCurrent());
-  outer.sync([&] {
-    EXPECT_TRUE(outer.isCurrent());
-    EXPECT_FALSE(inner.isCurrent());
-    inner.sync([&] {
-      outer.assertOnQueue();
-      inner.assertOnQueue();
-    });
-    inner.async([&] { EXPECT_FALSE(outer.isCurrent()); });
-  });
-  inner.sync([&] { EXPECT_FALSE(outer.isCurrent()); });
 }
 
 TEST(SerialQueueDeathTest, MisuseIsFatal) {
@@ -197,21 +164,6 @@ TEST(DispatchGroup, NotifiesOnceWhenTheCountIsZero) {
   group.enter();
   group.leave();
   EXPECT_EQ(count(), 3);
-}
-
-TEST(DispatchGroup, WaitsForTheLastToLeave) {
-  DispatchGroup group;
-  EXPECT_TRUE(group.wait(0ms));
-  group.enter();
-  EXPECT_FALSE(group.wait(1ms));
-  int written = 0;
-  SerialQueue queue("leaving");
-  queue.async([&, group]() mutable {
-    written = 1;
-    group.leave();
-  });
-  group.wait();
-  EXPECT_EQ(written, 1);
 }
 
 }  // namespace
