@@ -115,16 +115,6 @@ TEST_F(LocalFileEnumeratorTest, MovesBetweenPagesSkipNoNeighbour) {
   EXPECT_EQ(second.names.front(), "203");
 }
 
-TEST_F(LocalFileEnumeratorTest, FolderWhoseParentIsMovedWhileListedStartsTheListingOver) {
-  addFiles("x/y/", 201);
-  const auto inner = LocalFileEnumerator::create(services, folderID("x/y"), {fake.url("x/y")});
-  const ListedPage opened = list(*inner);
-  fake.volume.rename(fake.path("x"), fake.path("z"));  // of which no event tells
-  EXPECT_EQ(list(*inner, *opened.next).error, startOver);
-  forgetWalks();
-  EXPECT_TRUE(list(*inner, *opened.next).error);
-}
-
 TEST_F(LocalFileEnumeratorTest, WhatIsNotShownMakesNoItems) {
   for (const char* file : {"a", ".hidden/h", "Inbox/i", "sub/Inbox/i", "p.bundle/in", "sub/s",
                            ".Trash/t/deep", ".Trash/u", ".Trash/.v", "sub/.Trash/w"}) {
@@ -237,21 +227,6 @@ TEST_F(LocalFileEnumeratorTest, EnumeratorWithoutANotifierStillLists) {
         static_cast<void>(LocalFileEnumerator::create(services, "fid=1", {}));
       },
       "can't create enumerator for an empty list of URLs");
-}
-
-TEST_F(LocalFileEnumeratorTest, NotifierRunsUntilTheEnumeratorGoes) {
-  addFile("a");
-  auto listing = enumerator();
-  SerialQueue queue = listing->notifier()->reader()->streamQueue();
-  listing->startNotifier();
-  queue.sync([] {});
-  events.append(fake.path("a"));
-  events.deliver();
-  EXPECT_THAT(fake.signals.containers, SizeIs(2));
-  listing.reset();
-  EXPECT_EQ(events.runningStreams(), 0U);
-  for (const LogLine& line : log.lines())
-    EXPECT_NE(line.level, LogLevel::error) << line;
 }
 
 }  // namespace

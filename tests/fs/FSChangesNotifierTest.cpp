@@ -75,9 +75,6 @@ TEST_F(FSChangesNotifierTest, EachBatchWithChangesIsOneSignal) {
   EXPECT_THAT(signalsAfter("", eventflag::historyDone), IsEmpty());
   EXPECT_THAT(signalsAfter(fake.path(".hidden")), IsEmpty());
   EXPECT_THAT(signalsAfter("/elsewhere"), IsEmpty());
-}
-
-TEST_F(FSChangesNotifierTest, WorkingSetIsSignalledAlone) {
   start(workingSet);
   EXPECT_THAT(signalsAfter(fake.path("file")), ElementsAre(workingSet));
 }
@@ -122,23 +119,6 @@ TEST_F(FSChangesNotifierTest, VolumeWithoutHistoryHasNoNotifier) {
   EXPECT_THAT(log.lines(),
               ElementsAre(LogLine{LogLevel::error,
                                   "[ERROR] can't get volume UUID for \"" + fake.path("") + "\""}));
-  EXPECT_DEATH(
-      {
-        Log::shared().setSink(nullptr, LogLevel::error);
-        static_cast<void>(
-            FSChangesNotifier::create(context, events, fake.diagnostics, "fid=5", {}, {}));
-      },
-      "require at least one URL to init a change notifier");
-}
-
-TEST_F(FSChangesNotifierTest, DelegateCallOffTheQueueIsFatal) {
-  start("fid=5");
-  EXPECT_DEATH(
-      {
-        Log::shared().setSink(nullptr, LogLevel::error);
-        notifier->didProcessEvents(*notifier->reader());
-      },
-      "not running on queue \"mirabel.fsevents-stream\"");
 }
 
 }  // namespace

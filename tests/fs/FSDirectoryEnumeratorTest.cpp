@@ -77,34 +77,6 @@ TEST_F(FSDirectoryEnumeratorTest, OptionsDecideWhatIsSeenAndEntered) {
   }
 }
 
-TEST_F(FSDirectoryEnumeratorTest, DirectoriesAreWalkedInOrderAndOpenedOnlyWhenNeeded) {
-  makeTree();
-  FSDirectoryEnumerator both{{fake.url("p.bundle"), fake.url("a")}, false, 1, 2, {}};
-  EXPECT_EQ(walk(both).value(), 3U);
-  EXPECT_THAT(seen, ElementsAre("a/2", "a/1"));
-
-  fake.faults.reset();
-  both.limit = 0;
-  EXPECT_EQ(walk(both).value(), 0U);
-  EXPECT_EQ(fake.faults.calls(), 0U);
-  // A full page is noticed at the next entry, by each directory for itself: "p.bundle" and "a"
-  // have none after the page's last, so that the directory after them is still opened.
-  fake.volume.remove(fake.path("a/1"));
-  fake.volume.remove(fake.path("a/3"));
-  fake.volume.writeFile(fake.path("a/2/y"));
-  const std::pair<std::string_view, std::size_t> opened[] = {{"p.bundle", 2}, {"a/2", 1}, {"a", 3}};
-  for (const auto& [first, count] : opened) {
-    fake.faults.reset();
-    const std::uint64_t limit = first == "a" ? 2 : 1;
-    ASSERT_TRUE(walk({{fake.url(first), fake.url("p.bundle")}, true, 0, limit, {}}));
-    EXPECT_EQ(fake.faults.calls(Op::openDirectory), count) << first;
-  }
-  fake.faults.reset();
-  // A folder that ends the page is handed over unopened.
-  EXPECT_EQ(walk(walker(true, 0, 1)).value(), 1U);
-  EXPECT_EQ(fake.faults.calls(Op::openDirectory), 1U);
-}
-
 TEST_F(FSDirectoryEnumeratorTest, FailuresEndTheWalk) {
   makeTree();
   failsAt = "a/2/x";
@@ -135,12 +107,6 @@ TEST_F(FSDirectoryEnumeratorTest, WhatCannotBeLookedAtIsListedAndNotEntered) {
   EXPECT_EQ(walk(walker(true)).value(), 4U);
   EXPECT_THAT(seen, ElementsAre("a", "p.bundle", "b", "c"));
   EXPECT_THAT(log.lines(), IsEmpty());
-}
-
-TEST_F(FSDirectoryEnumeratorTest, ReadErrorLooksLikeTheEnd) {
-  makeTree();
-  fake.faults.fail(Op::nextEntry, Error::posix(EIO), 4);
-  EXPECT_EQ(walk(walker(false)).value(), 1U);
 }
 
 }  // namespace

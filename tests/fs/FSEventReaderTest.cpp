@@ -242,23 +242,6 @@ TEST_F(FSEventReaderTest, WhatCannotBeLookedAtIsNotTakenForGone) {
                                   "drop lookFailed at " + file + " (5)", "batch"));
 }
 
-TEST_F(FSEventReaderTest, AsksForTheStreamsOfItsMode) {
-  events.append(fake.path("a"));
-  start(pathBased, 1);
-  start(docIDBased, 1);
-  const auto requests = events.requests();
-  ASSERT_EQ(requests.size(), 2U);
-  EXPECT_THAT(requests[0].paths, ElementsAre(fake.path(""), "/apps/draw/Documents"));
-  EXPECT_EQ(requests[0].device, 0U);
-  EXPECT_THAT(requests[1].paths, ElementsAre("/.docid"));
-  EXPECT_EQ(requests[1].device, FakePlatform::deviceID);
-  for (const auto& request : requests) {
-    EXPECT_EQ(request.since, 1U);
-    EXPECT_EQ(request.latency, std::chrono::milliseconds(500));
-    EXPECT_EQ(request.flags, 0x51U);
-  }
-}
-
 TEST_F(FSEventReaderTest, StartAndStopAreToldInTheLog) {
   start(pathBased);
   const std::string description = reader->description();

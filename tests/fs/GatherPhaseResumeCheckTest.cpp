@@ -2,20 +2,17 @@
 #include <gtest/gtest.h>
 
 #include "fs/GatherPhaseResumeCheck.h"
-#include "support/FakeAppLibraries.h"
 #include "support/FakeEventStreams.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 namespace {
 
 using Verdict = FSEventReaderGatherPhaseResumeStatus::Case;
 
-class GatherPhaseResumeCheckTest : public ::testing::Test {
+class GatherPhaseResumeCheckTest : public ItemsFixture {
  protected:
   GatherPhaseResumeCheckTest() {
-    folderID = fake.volume.makeFolder(fake.path("folder")).fileID;
     fileID = fake.volume.writeFile(fake.path("file")).fileID;
     events.append(fake.path("gone before"), 4711);
   }
@@ -25,40 +22,9 @@ class GatherPhaseResumeCheckTest : public ::testing::Test {
     return result;
   }
 
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  ItemContext context{fake.platform(), identity, libraries};
   FakeEventStreams events;
-  std::uint64_t folderID = 0, fileID = 0;
-  LogCapture log;
+  std::uint64_t fileID = 0;
 };
-
-TEST_F(GatherPhaseResumeCheckTest, ChangesAndMovesLetTheListingGoOn) {
-  EXPECT_EQ(check().status.status, Verdict::canResume);
-  EXPECT_EQ(check().lastProcessedFSEventID, 1U);
-  events.append(fake.path("file"), fileID);
-  events.append(fake.path("folder"), folderID);
-  events.append(fake.path(".hidden"));
-  auto result = check();
-  EXPECT_EQ(result.status.status, Verdict::canResume);
-  EXPECT_EQ(result.lastProcessedFSEventID, 4U);
-  EXPECT_FALSE(result.hasNameLeft || result.hasFolderMoved);
-
-  fake.volume.rename(fake.path("file"), fake.path("folder/file"));
-  events.append(fake.path("file"), fileID);
-  events.append(fake.path("folder/file"), fileID);
-  result = check();
-  EXPECT_EQ(result.status.status, Verdict::canResume);
-  EXPECT_TRUE(result.hasNameLeft);
-  EXPECT_FALSE(result.hasFolderMoved);
-
-  fake.volume.rename(fake.path("folder"), fake.path("moved"));
-  events.append(fake.path("folder"), folderID);
-  EXPECT_TRUE(check().hasFolderMoved);
-  // Nothing of it since then.
-  EXPECT_FALSE(check(7).hasNameLeft);
-}
 
 TEST_F(GatherPhaseResumeCheckTest, GapInTheHistoryIsFoundOut) {
   using namespace eventflag;

@@ -4,22 +4,17 @@
 #include <vector>
 
 #include "fs/ShownItems.h"
-#include "support/FakeAppLibraries.h"
-#include "support/FakePlatform.h"
-#include "support/LogCapture.h"
+#include "support/ItemsFixture.h"
 
 namespace mirabel::testing {
 namespace {
 
-TEST(ShownItemsTest, OnlyWhatTheVolumeSaysIsNowhereIsNotShown) {
-  FakePlatform fake;
-  FakeAppLibraries libraries{fake.applications};
-  FileObjectURLs identity{fake.platform(), libraries};
-  LogCapture log;
+using ShownItemsTest = ItemsFixture;
+
+TEST_F(ShownItemsTest, OnlyWhatTheVolumeSaysIsNowhereIsNotShown) {
   fake.volume.makeFolder(fake.path("folder"));
   fake.volume.writeFile(fake.path("file"));
-  ShownItems shown({fake.platform(), identity, libraries}, libraries, {fake.url()},
-                   LinkNames::Depth::children);
+  ShownItems shown(context, libraries, {fake.url()}, LinkNames::Depth::children);
   for (const char* name : {"folder", "file"}) {
     const std::string identifier = identity.itemIdentifier(fake.url(name)).value();
     ASSERT_TRUE(shown.ofIdentifier(identifier).value()) << name;

@@ -14,11 +14,5 @@ TEST(WalkPosition, IsTheSameAfterItWasWrittenAndRead) {
   }
 }
 
-TEST(WalkPosition, CutShortIsNone) {
-  const Data whole = WalkPosition{7, 1, {{"/home", 1, 9}, {"a", 2, 3}}, "b"}.encode();
-  for (std::size_t size = 0; size < whole.size(); ++size)
-    EXPECT_FALSE(WalkPosition::decode(std::span(whole).first(size))) << size;
-}
-
 }  // namespace
 }  // namespace mirabel::testing
