@@ -128,15 +128,6 @@ TEST_F(ApplicationsTest, AFailureLeavesThemAsTheyAreForAWhile) {
   EXPECT_THAT(log.sectionLabels(), IsEmpty()) << "all is well";
 }
 
-TEST_F(ApplicationsTest, ABurstOfNotificationsMakesOneRefresh) {
-  start();
-  log.clear();
-  for (int i = 0; i < 1000; ++i)
-    notifications.post(notification::applicationRegistered);
-  pass(500ms);
-  EXPECT_EQ(std::ranges::count(log.sectionLabels(), "pacer event"), 1);
-}
-
 TEST_F(ApplicationsTest, ALateNotificationDoesNothing) {
   start();
   EXPECT_EQ(notifications.observers(), 2U);

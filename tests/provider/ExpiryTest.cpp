@@ -168,32 +168,6 @@ TEST_F(ExpiryTest, AFullTrashIsRemovedWithAFewDeletionsAtATime) {
   EXPECT_TRUE(fake.volume.at(trash).entries.empty());
 }
 
-TEST_F(ExpiryTest, WhatCannotBeDeletedStaysForTheNextTime) {
-  const std::string kept = trashed(trash + "/a");
-  trashed(trash + "/b");
-  fake.faults.fail(Op::deleteItem, Error::posix(EACCES));
-  expire();
-  EXPECT_EQ(dateAt(kept), longAgo);
-  EXPECT_FALSE(existsAt(trash + "/b"));
-  clear();
-  fake.faults.fail(Op::readValues, Error::posix(EIO), 1, 100);
-  fake.faults.fail(Op::openObject, Error::posix(EIO), 1, 100);
-  expire();
-  EXPECT_EQ(dateAt(kept), longAgo);
-  clear();
-  expire();
-  EXPECT_FALSE(existsAt(kept));
-}
-
-TEST_F(ExpiryTest, AHardLinkInTheDocumentsOutlivesTheOneInTheTrash) {
-  // The identifier leads to the name that comes first.
-  fake.volume.link(fake.path("a.txt"), trash + "/a.txt");
-  setDate(trash + "/a.txt", keyedarchive::archiveDate(longAgo).value());
-  expire();
-  EXPECT_TRUE(exists("a.txt"));
-  EXPECT_FALSE(existsAt(trash + "/a.txt"));
-}
-
 TEST_F(ExpiryTest, WhicheverCallFailsTheHostIsToldAndNothingYoungGoes) {
   const std::string library = trashed(libraryTrash + "/old");
   const std::string young = trashed(trash + "/young", reference);

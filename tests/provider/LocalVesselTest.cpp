@@ -22,20 +22,6 @@ class LocalVesselTest : public ProviderFixture {
   const std::string folder;
 };
 
-TEST_F(LocalVesselTest, IdentifierLeadsToItsItemAndURL) {
-  const std::pair<std::string, std::string> cases[] = {
-      {std::string(VesselRootContainerItemIdentifier), fake.path("")},
-      {"#org.example.draw", "/apps/draw/Documents"},
-      {folder, fake.path("folder")},
-  };
-  for (const auto& [identifier, path] : cases) {
-    const auto item = vessel->itemForIdentifier(identifier);
-    ASSERT_TRUE(item) << identifier;
-    EXPECT_EQ((*item)->itemIdentifier(), identifier);
-    EXPECT_EQ(vessel->URLForItemWithPersistentIdentifier(identifier), URL::fileURL(path));
-  }
-}
-
 TEST_F(LocalVesselTest, EachLookAtAURLIsAFreshOne) {
   const URL url = URL::fileURL(fake.path("folder/file"));
   const auto before = vessel->_propertiesForItemAtURL(url).value();
@@ -90,28 +76,6 @@ TEST_F(LocalVesselTest, URLLeadsToItsIdentifier) {
   EXPECT_EQ(vessel->persistentIdentifierForItemAtURL(namesake),
             vessel->identity().itemIdentifier(namesake).value());
   EXPECT_FALSE(vessel->persistentIdentifierForItemAtURL(fake.url("missing")));
-}
-
-TEST_F(LocalVesselTest, PropertiesOfAURLAreThoseOfItsItem) {
-  const auto file = vessel->_propertiesForItemAtURL(fake.url("folder/file"));
-  ASSERT_TRUE(file);
-  EXPECT_EQ((*file)->itemIdentifier(), "did=1");
-  EXPECT_EQ((*file)->parentItemIdentifier(), folder);
-  const auto library = vessel->_propertiesForItemAtURL(URL::fileURL("/apps/draw/Documents"));
-  ASSERT_TRUE(library);
-  EXPECT_EQ((*library)->filename(), "Draw");
-  EXPECT_EQ(vessel->_propertiesForItemAtURL(fake.url("missing")).error(), invalidIdentifier);
-}
-
-TEST_F(LocalVesselTest, ProvidingCompletesAtOnceWithoutAnError) {
-  std::vector<std::optional<Error>> completions;
-  const auto complete = [&](std::optional<Error> outcome) { completions.push_back(outcome); };
-  vessel->providePlaceholderAtURL(fake.url("missing"), complete);
-  vessel->startProvidingItemAtURL(URL::fromString("https://example.org"), complete);
-  vessel->stopProvidingItemAtURL(fake.url("missing"));
-  vessel->itemChangedAtURL(fake.url("missing"));
-  EXPECT_THAT(completions, ElementsAre(std::nullopt, std::nullopt));
-  EXPECT_THAT(log.lines(), IsEmpty());
 }
 
 TEST_F(LocalVesselTest, AnyFailingCallGivesTheRightAnswerOrALoggedError) {

@@ -77,41 +77,6 @@ class OperationsTest : public ProviderFixture {
   };
 };
 
-TEST_F(OperationsTest, EachAnswersWithTheItemAsItIsAfterwards) {
-  vessel->importDocumentAtURL(URL::fileURL("/elsewhere/new.txt"), folder, item());
-  EXPECT_EQ(done.item()->fileURL().path(), fake.path("folder/new.txt"));
-  EXPECT_EQ(done.item()->documentSize(), Number::of(std::int64_t{3}));
-  EXPECT_EQ(done.item()->parentItemIdentifier(), folder);
-  EXPECT_TRUE(existsAt("/elsewhere/new.txt"));
-
-  clear();
-  vessel->createDirectoryWithName("made", "#org.example.draw", item());
-  const std::string made = done.item()->itemIdentifier();
-  EXPECT_EQ(done.item()->parentItemIdentifier(), "#org.example.draw");
-  EXPECT_EQ(done.item()->childItemCount(), 0);
-
-  clear();
-  vessel->renameItemWithIdentifier(file, "b.txt", item());
-  EXPECT_EQ(done.item()->itemIdentifier(), file);
-  EXPECT_EQ(done.item()->filename(), "b.txt");
-
-  clear();
-  vessel->reparentItemWithIdentifier(file, made, {}, item());
-  EXPECT_EQ(done.item()->itemIdentifier(), file);
-  EXPECT_EQ(done.item()->parentItemIdentifier(), made);
-  EXPECT_EQ(done.item()->filename(), "b.txt");
-  EXPECT_EQ(done.item()->vs_appContainerBundleIdentifier(), "org.example.draw");
-
-  clear();
-  vessel->reparentItemWithIdentifier(file, folder, "c.txt", item());
-  EXPECT_EQ(done.item()->fileURL().path(), fake.path("folder/c.txt"));
-
-  clear();
-  vessel->deleteItemWithIdentifier(folder, done.errorHandler());
-  EXPECT_EQ(done.item(), nullptr);
-  EXPECT_FALSE(exists("folder"));
-}
-
 TEST_F(OperationsTest, NothingIsWrittenIntoTheRoot) {
   for (const Operation& operation : operations) {
     if (!operation.writesIntoParent()) continue;

@@ -20,6 +20,7 @@ class Scene : public ProviderFixture {
     trashed = idAt(library + "/Notes/trashed.txt");
     folder = idAt(library + "/Notes");
     vessel->trashItemWithIdentifier(trashed, Completions().handler());
+    fake.faults.reset();
   }
   void TestBody() override {}
 
@@ -28,11 +29,10 @@ class Scene : public ProviderFixture {
     const std::uint64_t documentID = std::stoull(identifier.substr(4));
     return fake.volume.pathsOfFileID(fake.volume.fileIDOfDocument(documentID)).size();
   }
-  LocalVessel& provider() { return *vessel; }
-  FakePlatform& platform() { return fake; }
-  Completions& completions() { return done; }
-  LocalVessel::ItemHandler item() { return done.handler(); }
 
+  using ProviderFixture::done;
+  using ProviderFixture::fake;
+  using ProviderFixture::vessel;
   const std::string library = "/apps/draw/Documents";
   std::string kept;
   std::string trashed;
@@ -41,42 +41,41 @@ class Scene : public ProviderFixture {
 
 struct Operation {
   const char* name;
-  std::function<void(Scene&)> start;
+  std::function<void(Scene&, LocalVessel&, const LocalVessel::ItemHandler&)> start;
   bool isRemoval = false;
 };
 
 const Operation operations[] = {
-    {"import",
-     [](Scene& s) {
-       s.provider().importDocumentAtURL(s.platform().url("a.txt"), s.folder, s.item());
-     }},
-    {"create", [](Scene& s) { s.provider().createDirectoryWithName("b", s.folder, s.item()); }},
-    {"rename", [](Scene& s) { s.provider().renameItemWithIdentifier(s.kept, "b", s.item()); }},
+    {"import", [](Scene& s, auto& v,
+                  auto& done) { v.importDocumentAtURL(s.fake.url("a.txt"), s.folder, done); }},
+    {"create",
+     [](Scene& s, auto& v, auto& done) { v.createDirectoryWithName("b", s.folder, done); }},
+    {"rename",
+     [](Scene& s, auto& v, auto& done) { v.renameItemWithIdentifier(s.kept, "b", done); }},
     {"rename to a taken name",
-     [](Scene& s) { s.provider().renameItemWithIdentifier(s.folder, ".Trash", s.item()); }},
+     [](Scene& s, auto& v, auto& done) { v.renameItemWithIdentifier(s.folder, ".Trash", done); }},
     {"move",
-     [](Scene& s) {
-       s.provider().reparentItemWithIdentifier(s.kept, "#org.example.draw", "b", s.item());
+     [](Scene& s, auto& v, auto& done) {
+       v.reparentItemWithIdentifier(s.kept, "#org.example.draw", "b", done);
      }},
-    {"trash", [](Scene& s) { s.provider().trashItemWithIdentifier(s.kept, s.item()); }},
-    {"untrash", [](Scene& s) { s.provider().untrashItemWithIdentifier(s.trashed, {}, s.item()); }},
+    {"trash", [](Scene& s, auto& v, auto& done) { v.trashItemWithIdentifier(s.kept, done); }},
+    {"untrash",
+     [](Scene& s, auto& v, auto& done) { v.untrashItemWithIdentifier(s.trashed, {}, done); }},
     {"untrash into a parent",
-     [](Scene& s) { s.provider().untrashItemWithIdentifier(s.trashed, s.folder, s.item()); }},
+     [](Scene& s, auto& v, auto& done) { v.untrashItemWithIdentifier(s.trashed, s.folder, done); }},
     {"delete",
-     [](Scene& s) {
-       s.provider().deleteItemWithIdentifier(s.kept, s.completions().errorHandler());
-     },
+     [](Scene& s, auto& v, auto&) { v.deleteItemWithIdentifier(s.kept, s.done.errorHandler()); },
      true},
     {"default container",
-     [](Scene& s) {
-       s.provider()._defaultApplicationContainerForBundleIdentifier("org.example.draw", s.item());
+     [](Scene&, auto& v, auto& done) {
+       v._defaultApplicationContainerForBundleIdentifier("org.example.draw", done);
      }},
     {"last used date",
-     [](Scene& s) {
-       s.provider().setLastUsedDate(Date{1, 0}, s.kept, s.item());
+     [](Scene& s, auto& v, auto& done) {
+       v.setLastUsedDate(Date{1, 0}, s.kept, done);
      }},
-    {"tags", [](Scene& s) { s.provider().setTagData({}, s.kept, s.item()); }},
-    {"favorite rank", [](Scene& s) { s.provider().setFavoriteRank({}, s.kept, s.item()); }},
+    {"tags", [](Scene& s, auto& v, auto& done) { v.setTagData({}, s.kept, done); }},
+    {"favorite rank", [](Scene& s, auto& v, auto& done) { v.setFavoriteRank({}, s.kept, done); }},
 };
 
 TEST(UnreliablePlatformTest, WhicheverCallFailsTheHostIsToldOnceAndNothingIsLost) {
@@ -86,11 +85,10 @@ TEST(UnreliablePlatformTest, WhicheverCallFailsTheHostIsToldOnceAndNothingIsLost
     for (bool wasReached = true; wasReached;) {
       ASSERT_LT(++n, 500U) << operation.name << " never came to an end";
       Scene scene;
-      scene.platform().faults.reset();
-      scene.platform().faults.failCall(n, Error::posix(EIO));
-      operation.start(scene);
-      wasReached = scene.platform().faults.calls() >= n;
-      const auto outcome = scene.completions().result();
+      scene.fake.faults.failCall(n, Error::posix(EIO));
+      operation.start(scene, *scene.vessel, scene.done.handler());
+      wasReached = scene.fake.faults.calls() >= n;
+      const auto outcome = scene.done.result();
       if (!outcome) ++failures;
       EXPECT_TRUE(outcome || wasReached || operation.name == std::string("rename to a taken name"))
           << operation.name << " without a failing call";
