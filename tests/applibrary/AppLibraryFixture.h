@@ -2,10 +2,6 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <optional>
-#include <string>
-#include <string_view>
-#include <vector>
 
 #include "support/ChangeLog.h"
 #include "support/FakePlatform.h"

@@ -77,24 +77,6 @@ TEST_F(AppLibraryRefreshTest, EntriesThatLackSomethingAreSkipped) {
   EXPECT_EQ(fake.faults.calls(Op::infoDictionary), 3U);
 }
 
-TEST_F(AppLibraryRefreshTest, UnchangedRegistryWritesNothing) {
-  EXPECT_FALSE(refresh());
-  install("a");
-  install("b");
-  EXPECT_TRUE(refresh());
-  EXPECT_EQ(messages().back(), "[DEBUG] main cache version token is now 1");
-  fake.applications.installed[1].localizedName = "not compared";
-  for (int time = 0; time < 2; ++time) {
-    EXPECT_FALSE(refresh());
-    EXPECT_EQ(messages().back(), "[DEBUG] bundle proxies are identical to previous version");
-  }
-  AppLibraryCaches next(fake.caches);
-  EXPECT_FALSE(refreshMainCache(fake.applications, next.main).value());
-  EXPECT_EQ(next.main.versionToken(), 1U);
-  EXPECT_EQ(fake.faults.calls(Op::cacheReplace), 1U);
-  EXPECT_EQ(fake.faults.calls(Op::claimVersion), 1U);
-}
-
 TEST_F(AppLibraryRefreshTest, EveryDifferenceOfTheContainersIsAChange) {
   install("a");
   install("b");

@@ -1,5 +1,3 @@
-#include <gmock/gmock.h>
-
 #include "applibrary/AppLibraryFixture.h"
 #include "applibrary/MRBAppLibraryManager.h"
 

@@ -1,12 +1,5 @@
 #pragma once
 
-#include <gtest/gtest.h>
-#include <memory>
-#include <optional>
-#include <string>
-#include <utility>
-#include <vector>
-
 #include "enumeration/LocalFileEnumerator.h"
 #include "support/ChangeLog.h"
 #include "support/FakeEventStreams.h"

@@ -1,6 +1,4 @@
 #include <cerrno>
-#include <gtest/gtest.h>
-#include <memory>
 
 #include "enumeration/EnumerationFixture.h"
 #include "support/Transcript.h"

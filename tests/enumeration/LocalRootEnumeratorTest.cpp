@@ -1,5 +1,4 @@
 #include <cerrno>
-#include <gmock/gmock.h>
 
 #include "enumeration/EnumerationFixture.h"
 #include "enumeration/LocalRootEnumerator.h"

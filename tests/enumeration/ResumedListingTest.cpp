@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <cerrno>
-#include <gmock/gmock.h>
 
 #include "enumeration/EnumerationFixture.h"
 #include "enumeration/LocalFileEnumerator.h"

@@ -1,6 +1,4 @@
 #include <cerrno>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "fs/FSChangesNotifier.h"
 #include "support/FakeEventStreams.h"

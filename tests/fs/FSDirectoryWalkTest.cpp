@@ -1,15 +1,16 @@
+#include <cerrno>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <string>
-#include <vector>
 
 #include "fs/FSDirectoryWalk.h"
 #include "support/FakePlatform.h"
+#include "support/LogCapture.h"
 
 namespace mirabel::testing {
 namespace {
 
 using ::testing::ElementsAre;
+using ::testing::IsEmpty;
 
 constexpr std::uint64_t noEnd = 1'000'000;
 
@@ -74,6 +75,39 @@ TEST_F(FSDirectoryWalkTest, StepsOfAnySizeMakeUpTheWholeWalk) {
     EXPECT_EQ(parts.openDirectories(), 0U);
     EXPECT_EQ(takenUpAnewAfterEach(step), all) << step;
   }
+}
+
+TEST_F(FSDirectoryWalkTest, FailuresEndIt) {
+  const LogCapture log;
+  const Error error = Error::posix(EMFILE);
+  const auto failure = [&](const FSDirectoryWalk::Visitor& visitor) {
+    FSDirectoryWalk whole = walk();
+    return whole.next(noEnd, visitor).error();
+  };
+  EXPECT_EQ(failure([&](const URL& url) -> Result<void> {
+              if (url == fake.url("a/deep/x")) return fail(error);
+              return {};
+            }),
+            error);
+  EXPECT_THAT(log.lines(), IsEmpty());
+  // Opened as the second is the folder "a"; closed as the first is what lies deepest.
+  for (const auto& [op, number] : {std::pair(Op::openDirectory, 2U), {Op::closeDirectory, 1U}}) {
+    fake.faults.reset();
+    fake.faults.fail(op, error, number);
+    EXPECT_EQ(failure([](const URL&) { return Result<void>(); }), error);
+  }
+  EXPECT_THAT(
+      log.lines(),
+      ElementsAre(LogLine{LogLevel::debug, "[DEBUG] can't open directory at " + fake.path("a") +
+                                               "; " + error.description()},
+                  LogLine{LogLevel::debug, "[DEBUG] can't close directory at " +
+                                               fake.path("a/deep") + "; " + error.description()}));
+}
+
+TEST_F(FSDirectoryWalkTest, WhatCannotBeLookedAtIsListedAndNotEntered) {
+  fake.faults.fail(Op::readValues, Error::posix(EIO));
+  FSDirectoryWalk whole = walk();
+  EXPECT_THAT(take(whole), ElementsAre("a", "b", "p.bundle", "c"));
 }
 
 }  // namespace

@@ -1,7 +1,5 @@
 #include <algorithm>
 #include <cerrno>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "fs/FSEventReader.h"
 #include "support/FakeEventStreams.h"

@@ -1,5 +1,4 @@
 #include <cerrno>
-#include <gtest/gtest.h>
 
 #include "fs/GatherPhaseResumeCheck.h"
 #include "support/FakeEventStreams.h"

@@ -1,9 +1,4 @@
 #include <cerrno>
-#include <gtest/gtest.h>
-#include <memory>
-#include <string>
-#include <string_view>
-#include <vector>
 
 #include "fs/LinkNames.h"
 #include "support/ItemsFixture.h"

@@ -1,7 +1,4 @@
 #include <cerrno>
-#include <gtest/gtest.h>
-#include <string>
-#include <vector>
 
 #include "fs/ShownItems.h"
 #include "support/ItemsFixture.h"

@@ -1,8 +1,6 @@
 #include <cerrno>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <string>
-#include <vector>
 
 #include "identity/FileObjectURLs.h"
 #include "support/FakeAppLibraries.h"
@@ -53,19 +51,6 @@ TEST_F(FileObjectURLsTest, DocumentsAreNamedByDocumentIDAndTheRestByFileID) {
     const auto url = identity.fileURLWithItemIdentifier(idOf(name));
     ASSERT_TRUE(url) << name;
     EXPECT_EQ(*url, fake.url(name));
-  }
-}
-
-TEST_F(FileObjectURLsTest, AnsweringAgainDoesNotTouchTheDisk) {
-  fake.volume.makeFolder(fake.path("folder"));
-  fake.volume.writeFile(fake.path("file"));
-  fake.volume.makeFolder(fake.path("letter.quill"));
-  for (const std::string_view name : {"folder", "file", "letter.quill"}) {
-    const URL url = fake.url(name);
-    const auto first = identity.itemIdentifier(url);
-    fake.faults.reset();
-    EXPECT_EQ(identity.itemIdentifier(url), first);
-    EXPECT_EQ(fake.faults.calls(), 0U) << name;
   }
 }
 

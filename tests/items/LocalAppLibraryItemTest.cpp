@@ -1,8 +1,3 @@
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <string>
-#include <vector>
-
 #include "foundation/KeyedArchive.h"
 #include "items/LocalAppLibraryItem.h"
 #include "support/ItemsFixture.h"

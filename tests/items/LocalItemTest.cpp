@@ -1,8 +1,4 @@
 #include <cerrno>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <string>
-#include <vector>
 
 #include "foundation/KeyedArchive.h"
 #include "items/LocalItem.h"

@@ -2,8 +2,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <limits>
-#include <string>
-#include <vector>
 
 #include "provider/AppThumbnails.h"
 #include "provider/Lines.h"

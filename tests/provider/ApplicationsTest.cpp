@@ -1,11 +1,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <memory>
-#include <utility>
-#include <vector>
 
 #include "provider/HostedFixture.h"
 

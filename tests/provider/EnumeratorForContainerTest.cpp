@@ -1,6 +1,4 @@
 #include <cerrno>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include "enumeration/LocalFileEnumerator.h"
 #include "enumeration/LocalRootEnumerator.h"

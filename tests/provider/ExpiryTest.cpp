@@ -1,11 +1,6 @@
 #include <cerrno>
-#include <functional>
 #include <future>
-#include <gtest/gtest.h>
-#include <string>
-#include <string_view>
 #include <thread>
-#include <vector>
 
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"

@@ -1,10 +1,7 @@
 #pragma once
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <memory>
-#include <optional>
-#include <string>
-#include <string_view>
 
 #include "applibrary/MRBAppLibraryManager.h"
 #include "fs/FSChangesEnumerations.h"

@@ -1,9 +1,5 @@
 #include <algorithm>
 #include <cerrno>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <string>
-#include <vector>
 
 #include "provider/ProviderFixture.h"
 

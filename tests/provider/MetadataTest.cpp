@@ -1,11 +1,5 @@
 #include <cerrno>
-#include <functional>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <limits>
-#include <map>
-#include <string>
-#include <vector>
 
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"
@@ -32,30 +26,6 @@ class MetadataTest : public ProviderFixture {
 
   std::string file;
 };
-
-TEST_F(MetadataTest, WhatIsSetIsOnTheItemAndIsClearedAgain) {
-  vessel->setLastUsedDate(date, file, done.handler());
-  EXPECT_EQ(done.item()->lastUsedDate(), date);
-  clear();
-  vessel->setLastUsedDate({}, file, done.handler());
-  EXPECT_EQ(done.item()->lastUsedDate(), std::nullopt);
-
-  for (const Number& rank :
-       {Number::of(std::int64_t{-1}), Number::of(std::numeric_limits<std::uint64_t>::max()),
-        Number::of(0.5)}) {
-    clear();
-    vessel->setFavoriteRank(rank, file, done.handler());
-    EXPECT_EQ(done.item()->favoriteRank(), rank);
-  }
-  clear();
-  vessel->setFavoriteRank({}, file, done.handler());
-  EXPECT_EQ(done.item()->favoriteRank(), std::nullopt);
-  EXPECT_THAT(attributes(), IsEmpty());
-  // Nothing there to clear is no failure.
-  clear();
-  vessel->setFavoriteRank({}, file, done.handler());
-  EXPECT_TRUE(done.result());
-}
 
 TEST_F(MetadataTest, OfTagsTheLabelsAreKeptInTheirOrder) {
   const auto tags = encodeTagData({{"work", 3}, {"\xff", 0}, {"", 1}, {"work", 0}}).value();

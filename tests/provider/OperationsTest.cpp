@@ -1,12 +1,6 @@
 #include <cerrno>
-#include <functional>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <latch>
-#include <string>
-#include <string_view>
 #include <thread>
-#include <vector>
 
 #include "provider/ProviderFixture.h"
 
@@ -197,6 +191,72 @@ TEST_F(OperationsTest, DefaultContainerIsTheApplicationsLibrary) {
     clear();
     vessel->_defaultApplicationContainerForBundleIdentifier(identifier, item());
     EXPECT_EQ(done.error(), Error::invalidParameter("bundleIdentifier", identifier));
+  }
+}
+
+/// With an item in the trash as well, and with operations that are done when the call returns.
+class UnreliablePlatform : public OperationsTest {
+ public:
+  UnreliablePlatform() {
+    fake.volume.makeFolder("/apps/draw/Documents/Notes");
+    fake.volume.writeFile("/apps/draw/Documents/Notes/b.txt");
+    trashed = idAt("/apps/draw/Documents/Notes/b.txt");
+    vessel->trashItemWithIdentifier(trashed, Completions().handler());
+    all = operations;
+    const std::pair<std::string_view, void (*)(UnreliablePlatform&)> others[] = {
+        {"rename to a taken name",
+         [](auto& s) { s.vessel->renameItemWithIdentifier(s.folder, "a.txt", s.item()); }},
+        {"untrash to where it was",
+         [](auto& s) { s.vessel->untrashItemWithIdentifier(s.trashed, {}, s.item()); }},
+        {"last used date",
+         [](auto& s) {
+           s.vessel->setLastUsedDate(Date{1, 0}, s.file, s.item());
+         }},
+        {"tags", [](auto& s) { s.vessel->setTagData({}, s.file, s.item()); }},
+        {"favorite rank", [](auto& s) { s.vessel->setFavoriteRank({}, s.file, s.item()); }},
+    };
+    for (const auto& [name, start] : others)
+      all.push_back({name, {}, [this, start = start](auto&, auto&) { start(*this); }, {}});
+  }
+  void TestBody() override {}
+
+  /// What comes of it where the `n`-th call fails, and whether there were as many.
+  std::pair<LocalVessel::ItemResult, bool> outcomeOf(const Operation& operation, std::size_t n) {
+    clear();
+    fake.faults.failCall(n, Error::posix(EIO));
+    operation.start(operation.name == "untrash" ? trashed : file, folder);
+    return {done.result(), fake.faults.calls() >= n};
+  }
+  /// How many places hold a file of that identifier.
+  std::size_t placesOf(const std::string& identifier) {
+    const std::uint64_t documentID = std::stoull(identifier.substr(4));
+    return fake.volume.pathsOfFileID(fake.volume.fileIDOfDocument(documentID)).size();
+  }
+
+  using OperationsTest::file;
+  std::string trashed;
+  std::vector<Operation> all;
+};
+
+TEST(UnreliablePlatformTest, WhicheverCallFailsTheHostIsToldOnceAndNothingIsLost) {
+  const std::size_t count = UnreliablePlatform().all.size();
+  for (std::size_t i = 0; i < count; ++i) {
+    std::size_t n = 0;
+    std::size_t failures = 0;
+    for (bool wasReached = true; wasReached;) {
+      UnreliablePlatform scene;
+      const auto& operation = scene.all[i];
+      ASSERT_LT(++n, 500U) << operation.name << " never came to an end";
+      const auto [outcome, hasFailed] = scene.outcomeOf(operation, n);
+      wasReached = hasFailed;
+      if (!outcome) ++failures;
+      EXPECT_TRUE(outcome || wasReached || operation.name == "rename to a taken name")
+          << operation.name << " without a failing call";
+      EXPECT_EQ(scene.placesOf(scene.trashed), 1U) << operation.name << " " << n;
+      const bool isGone = operation.name == "delete" && outcome;
+      EXPECT_EQ(scene.placesOf(scene.file), isGone ? 0U : 1U) << operation.name << " " << n;
+    }
+    EXPECT_GE(failures, 3U) << i;
   }
 }
 

@@ -1,12 +1,7 @@
 #pragma once
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <memory>
-#include <optional>
-#include <string>
-#include <string_view>
-#include <utility>
-#include <vector>
 
 #include "provider/Lines.h"
 #include "provider/LocalVessel.h"

@@ -1,6 +1,5 @@
 #include <cerrno>
-#include <gtest/gtest.h>
-#include <string>
+#include <future>
 
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"
@@ -135,7 +134,10 @@ TEST_F(ProviderLogTest, TellsOfExpiry) {
     fake.volume.writeFile(path).attributes[std::string(attributename::trashDate)] = payload;
   };
   const auto expire = [&] {
-    provider._removeTrashedItemsOlderThanDate({1'760'000'000, 0}, error());
+    std::promise<void> heard;  // on another thread
+    provider._removeTrashedItemsOlderThanDate(
+        {1'760'000'000, 0}, [&](const std::optional<Error>&) { heard.set_value(); });
+    heard.get_future().wait();
   };
   trashed("/home/me/Documents/.Trash/old", keyedarchive::archiveDate({0, 0}).value());
   trashed("/apps/draw/Documents/.Trash/unreadable", {});

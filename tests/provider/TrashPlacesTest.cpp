@@ -35,22 +35,6 @@ TEST(TrashPlacesTest, TrashFolderLiesInTheFirstFolderNamedDocuments) {
   }
 }
 
-TEST(TrashPlacesTest, ComponentsThatNameNoFileAreRefusedWithTheirList) {
-  const std::pair<std::vector<std::string>, std::string> cases[] = {
-      {{}, "[]"},
-      {{"Documents", ".Trash"}, R"(["Documents", ".Trash"])"},
-      {{"/", std::string("a\0", 2), ".Trash"}, std::string("[\"/\", \"a\0\", \".Trash\"]", 21)},
-  };
-  for (const auto& [components, list] : cases) {
-    LogCapture log;
-    const auto folder = trashFolderAt(components);
-    ASSERT_FALSE(folder) << list;
-    EXPECT_EQ(folder.error(), Error::invalidParameter("trashComponents", list));
-    EXPECT_THAT(log.lines(),
-                ElementsAre(error("can't build trash URL from components \"" + list + "\"")));
-  }
-}
-
 TEST(TrashPlacesTest, PutBackStringIsThePathBehindTheLibrary) {
   struct Case {
     const char* item;

@@ -1,10 +1,4 @@
 #include <cerrno>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <map>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"

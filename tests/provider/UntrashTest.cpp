@@ -1,10 +1,4 @@
 #include <cerrno>
-#include <functional>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <optional>
-#include <string>
-#include <vector>
 
 #include "foundation/KeyedArchive.h"
 #include "items/AttributeNames.h"
