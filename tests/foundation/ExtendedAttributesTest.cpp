@@ -23,6 +23,10 @@ class ExtendedAttributes : public ::testing::Test {
 
 TEST_F(ExtendedAttributes, FailuresToReadAreLoggedByWhatFailedAndWhy) {
   attributes["a"] = {1};
+  const URL url = fake.url("f");
+  for (const char* name : {"b", "c"})
+    EXPECT_EQ(extendedAttribute(store, name, url), std::nullopt);
+  EXPECT_EQ(fake.faults.calls(), 1U) << "the names, once";
   const std::string missing = "POSIX error 2: No such file or directory";
   const std::string broken = "POSIX error 5: Input/output error";
   const struct {
