@@ -43,10 +43,7 @@ TEST_F(ResourceReaderTest, AbsentValuesAndOtherTypesReadAsNothingWithoutALine) {
   EXPECT_EQ(reader.boolean(ResourceKey::isDirectory, url), true);
 
   EXPECT_EQ(reader.number(ResourceKey::name, url), std::nullopt);
-  EXPECT_EQ(reader.string(ResourceKey::fileIdentifier, url), std::nullopt);
-  EXPECT_EQ(reader.data(ResourceKey::isDirectory, url), std::nullopt);
-  EXPECT_EQ(reader.date(ResourceKey::isPackage, url), std::nullopt);
-  EXPECT_EQ(reader.boolean(ResourceKey::name, url), std::nullopt);
+  EXPECT_EQ(reader.date(ResourceKey::isDirectory, url), std::nullopt);
   EXPECT_THAT(log.lines(), IsEmpty());
 
   EXPECT_EQ(reader.string(ResourceKey::name, URL::fileURL("/")), "/");

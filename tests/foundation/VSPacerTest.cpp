@@ -1,8 +1,8 @@
-#include <condition_variable>
+#include <future>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <memory>
-#include <mutex>
+#include <utility>
 #include <vector>
 
 #include "foundation/VSPacer.h"
@@ -15,45 +15,17 @@ using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using testing::FakePacerClock;
 
-/// A block that notes when it ran and where, and can be held up.
-class Runs {
- public:
-  Runs(SerialQueue queue, PacerClock& clock) : queue_(std::move(queue)), clock_(clock) {}
-  void operator()() {
-    queue_.assertOnQueue();
-    std::unique_lock lock(mutex_);
-    starts_.push_back(clock_.now().time_since_epoch());
-    changed_.notify_all();
-    changed_.wait(lock, [this] { return !isHeld_; });
-  }
-  void hold(bool held) {
-    const std::lock_guard lock(mutex_);
-    isHeld_ = held;
-    changed_.notify_all();
-  }
-  void waitFor(std::size_t count) {
-    std::unique_lock lock(mutex_);
-    changed_.wait(lock, [&] { return starts_.size() >= count; });
-  }
-  std::vector<PacerClock::Time::duration> starts() {
-    const std::lock_guard lock(mutex_);
-    return starts_;
-  }
-
- private:
-  SerialQueue queue_;
-  PacerClock& clock_;
-  std::mutex mutex_;
-  std::condition_variable changed_;
-  bool isHeld_ = false;
-  std::vector<PacerClock::Time::duration> starts_;
-};
-
 /// A pacer whose runs are noted; its time passes when a test lets it.
 class VSPacerTest : public ::testing::Test {
  protected:
   VSPacerTest() {
-    pacer_->setEventBlock([this] { runs_(); });
+    pacer_->setEventBlock([this] {
+      queue_.assertOnQueue();
+      starts_.push_back(clock_.now().time_since_epoch());
+      if (!std::exchange(signalsWhileItRuns_, false)) return;
+      pacer_->signal();
+      hasSignalled_.set_value();
+    });
   }
 
   void pass(std::chrono::milliseconds time) {
@@ -64,10 +36,17 @@ class VSPacerTest : public ::testing::Test {
     pacer_->signal();
     pacer_->waitUntilIdle();
   }
+  std::vector<PacerClock::Time::duration> starts() {
+    std::vector<PacerClock::Time::duration> starts;
+    queue_.sync([&] { starts = starts_; });
+    return starts;
+  }
 
   FakePacerClock clock_;
   SerialQueue queue_{"pacer test"};
-  Runs runs_{queue_, clock_};
+  std::vector<PacerClock::Time::duration> starts_;
+  bool signalsWhileItRuns_ = false;
+  std::promise<void> hasSignalled_;
   std::unique_ptr<VSPacer> pacer_ = std::make_unique<VSPacer>("pacer", queue_, 40ms, clock_);
 };
 
@@ -81,7 +60,7 @@ TEST_F(VSPacerTest, MergesWhatComesWhileARunIsPending) {
   pass(1ms);
   clock_.pass(1h);
   signal();
-  EXPECT_THAT(runs_.starts(), ElementsAre(0ms, 40ms, 1h + 40ms)) << "after a rest it runs at once";
+  EXPECT_THAT(starts(), ElementsAre(0ms, 40ms, 1h + 40ms)) << "after a rest it runs at once";
 }
 
 TEST_F(VSPacerTest, SignalsLaterUnlessItRanMeanwhile) {
@@ -93,18 +72,16 @@ TEST_F(VSPacerTest, SignalsLaterUnlessItRanMeanwhile) {
   clock_.pass(5s);
   signal();
   pass(1min);
-  EXPECT_THAT(runs_.starts(), ElementsAre(10s, 15s));
+  EXPECT_THAT(starts(), ElementsAre(10s, 15s));
 }
 
 TEST_F(VSPacerTest, ASignalDuringARunMakesAnother) {
-  runs_.hold(true);
+  signalsWhileItRuns_ = true;
   pacer_->resume();
   pacer_->signal();
-  runs_.waitFor(1);
-  pacer_->signal();
-  runs_.hold(false);
+  hasSignalled_.get_future().wait();
   pass(40ms);
-  EXPECT_EQ(runs_.starts().size(), 2U);
+  EXPECT_EQ(starts().size(), 2U);
 }
 
 TEST_F(VSPacerTest, EndsWithWhatIsPendingUndone) {
@@ -112,7 +89,7 @@ TEST_F(VSPacerTest, EndsWithWhatIsPendingUndone) {
   signal();
   pacer_->signal();
   pacer_.reset();
-  EXPECT_EQ(runs_.starts().size(), 1U);
+  EXPECT_EQ(starts().size(), 1U);
 }
 
 }  // namespace

@@ -110,14 +110,5 @@ TEST_F(FSChangesNotifierTest, HostThatDoesNotAnswerIsReportedAndNotWaitedForEver
     handler(std::nullopt);
 }
 
-TEST_F(FSChangesNotifierTest, VolumeWithoutHistoryHasNoNotifier) {
-  fake.faults.fail(Op::historyUUID, Error::posix(EIO));
-  EXPECT_EQ(FSChangesNotifier::create(context, events, fake.diagnostics, "fid=5", {fake.url()}, {}),
-            nullptr);
-  EXPECT_THAT(log.lines(),
-              ElementsAre(LogLine{LogLevel::error,
-                                  "[ERROR] can't get volume UUID for \"" + fake.path("") + "\""}));
-}
-
 }  // namespace
 }  // namespace mirabel::testing

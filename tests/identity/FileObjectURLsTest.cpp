@@ -54,17 +54,6 @@ TEST_F(FileObjectURLsTest, DocumentsAreNamedByDocumentIDAndTheRestByFileID) {
   }
 }
 
-TEST_F(FileObjectURLsTest, RootsAreTheRootContainerAndTheLibraries) {
-  fake.install("org.example.draw", "/apps/draw");
-  EXPECT_EQ(idOf(""), VesselRootContainerItemIdentifier);
-  const URL library = URL::fileURL("/apps/draw/Documents");
-  EXPECT_EQ(identity.itemIdentifier(library), "#org.example.draw");
-  // A folder of that library is named by itself.
-  fake.volume.makeFolder("/apps/draw/Documents/a");
-  EXPECT_EQ(identity.itemIdentifier(URL::fileURL("/apps/draw/Documents/a")),
-            "fid=" + std::to_string(fake.volume.at("/apps/draw/Documents/a").fileID));
-}
-
 TEST_F(FileObjectURLsTest, ContainmentIsAPlainStringPrefix) {
   fake.volume.makeFolder("/home/me/Documents2/f");
   EXPECT_TRUE(identity.itemIdentifier(URL::fileURL("/home/me/Documents2/f")));
