@@ -37,11 +37,11 @@ class ReconcilerTest : public VolumeFixture {
     std::string replica =
         std::to_string(seen.status.changeTime) + " " + std::to_string(seen.status.size) + " bytes";
     if (seen.status.linkCount == 1) {
-      // Of what lies in a package nobody is a client: that the package has taken over the document
-      // of the one in whose place it was moved is told of itself alone.
+      // What lies in a package is shown to nobody: that the package has taken over the document of
+      // the one in whose place it was moved is told of itself alone.
       const std::string parent = place.parent_path();
-      const bool isShown = !parent.empty() && parent.find(".package") == std::string::npos;
-      replica += " " + (isShown ? identity(see(parent)) : parent) + "/" + place.filename().native();
+      const bool isShown = !parent.empty() && !parent.ends_with(".package");
+      replica += " " + (isShown ? identity(see(parent)) : "") + "/" + place.filename().native();
     }
     replicas.insert_or_assign(identity(seen), replica);
   }
