@@ -44,7 +44,10 @@ endfunction()
 
 # What the tests run with: under a sanitizer, what is known of other libraries.
 set(mirabel_test_environment "")
-if(MIRABEL_SANITIZE)
+if(MIRABEL_SANITIZE MATCHES thread)
+  set(mirabel_test_environment ENVIRONMENT
+      "TSAN_OPTIONS=suppressions=${CMAKE_SOURCE_DIR}/tests/races.supp:print_suppressions=0")
+elseif(MIRABEL_SANITIZE)
   set(mirabel_test_environment ENVIRONMENT
       "LSAN_OPTIONS=suppressions=${CMAKE_SOURCE_DIR}/tests/leaks.supp:print_suppressions=0")
 endif()

@@ -284,8 +284,11 @@ class Manager final : public VesselManager {
 
   void signalEnumeratorForContainerItemIdentifier(std::string_view container,
                                                   SignalHandler completionHandler) override {
-    signals_.containers.emplace_back(container);
-    if (!signals_.answers) return signals_.waiting.push_back(std::move(completionHandler));
+    {
+      const std::lock_guard lock(mutex_);  // they come from the thread of a refresh, too
+      signals_.containers.emplace_back(container);
+      if (!signals_.answers) return signals_.waiting.push_back(std::move(completionHandler));
+    }
     const auto refusal = signals_.refusals.find(container);
     completionHandler(refusal == signals_.refusals.end() ? std::nullopt
                                                          : std::optional(refusal->second));
@@ -301,6 +304,7 @@ class Manager final : public VesselManager {
  private:
   URL documentStorage_;
   FakeSignals& signals_;
+  std::mutex mutex_;
 };
 
 class History final : public VolumeHistory {
