@@ -36,6 +36,10 @@ bool isLetter(char c) {
   return c >= 'a' && c <= 'z';
 }
 
+bool isDigit(char c) {
+  return c >= '0' && c <= '9';
+}
+
 bool containsLowered(std::string_view name, std::string_view part) {
   if (part.empty() || isLetter(part[0])) {
     return !std::ranges::search(name, part, {}, asciiLower).empty();
@@ -60,17 +64,28 @@ std::uint64_t lengthBit(std::size_t length) {
   return std::uint64_t{1} << std::min(length, longestCounted);
 }
 
+// Of what comes before a bracket: where one ends is another program's art.
 std::string_view longestLiteral(std::string_view pattern) {
+  pattern = pattern.substr(0, pattern.find('['));
   std::string_view longest;
   while (!pattern.empty()) {
     const std::string_view run = pattern.substr(0, pattern.find_first_of(wildcards));
     if (run.size() > longest.size()) longest = run;
-    pattern.remove_prefix(run.size());
-    // What stands in brackets is no literal.
-    const std::size_t skip = pattern.starts_with('[') ? pattern.find(']') : 0;
-    pattern.remove_prefix(std::min(pattern.size(), skip == pattern.npos ? skip : skip + 1));
+    pattern.remove_prefix(std::min(pattern.size(), run.size() + 1));
   }
   return longest;
+}
+
+// Whether brackets in it may stand for a dot: those that say what they are not, and ranges of
+// anything but digits or letters.
+bool mayHoldFurtherDots(std::string_view ending) {
+  if (ending.find("[!") != ending.npos || ending.find("[^") != ending.npos) return true;
+  for (std::size_t i = 1; i + 1 < ending.size(); ++i) {
+    const char from = ending[i - 1], to = ending[i + 1];
+    const bool isPlain = (isDigit(from) && isDigit(to)) || (isLetter(from) && isLetter(to));
+    if (ending[i] == '-' && !isPlain) return true;
+  }
+  return false;
 }
 
 }  // namespace
@@ -110,10 +125,11 @@ void NamePatterns::addWithWildcards(std::string_view pattern) {
   const bool anythingBefore = dot == 1 && pattern[0] == '*';
   // "*.[1-9]": the ending decides, as long as nothing in it can stand for a dot.
   if (anythingBefore && ending.find_first_of("*?\\") == ending.npos &&
-      ending.find("[!") == ending.npos && ending.find("[^") == ending.npos) {
+      !mayHoldFurtherDots(ending)) {
     return;
   }
-  if (!ending.empty() && !hasWildcard(ending)) {
+  // A dot before a "]" may be one of several bytes in brackets.
+  if (!ending.empty() && !hasWildcard(ending) && ending.find(']') == ending.npos) {
     ambiguousEndings_.emplace(ending);
     return;
   }
