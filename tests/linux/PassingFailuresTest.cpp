@@ -4,14 +4,13 @@
 #include <filesystem>
 #include <map>
 #include <memory>
-#include <sched.h>
 #include <set>
 #include <string>
 #include <string_view>
-#include <sys/mount.h>
 #include <sys/resource.h>
 
 #include "linux/FailingLooks.h"
+#include "linux/PrivateMount.h"
 #include "linux/VolumeFixture.h"
 
 namespace mirabel {
@@ -127,16 +126,8 @@ TEST_P(PassingFailuresTest, AnErrorNamesWhatCouldNotBeLookedAt) {
 
 TEST_P(PassingFailuresTest, ADeadMountIsUnreadableAndTheRestIsFollowed) {
   makeFolder("m/server");
-  if (::unshare(CLONE_NEWNS) != 0 ||
-      ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
-      ::mount("none", path("m/server").c_str(), "tmpfs", 0, nullptr) != 0) {
-    GTEST_SKIP() << "may not mount";
-  }
-  std::unique_ptr<const std::string, void (*)(const std::string*)> mounted(
-      new std::string(path("m/server")), [](const std::string* place) {
-        EXPECT_EQ(::umount2(place->c_str(), MNT_DETACH), 0);
-        delete place;
-      });
+  auto mounted = std::make_unique<PrivateMount>(path("m/server"));
+  if (!mounted->isThere()) GTEST_SKIP() << "may not mount";
   close();  // what is open belongs to the mounts of before
   const auto unreadable = [this] { return index().status().following.unreadableFolders; };
   {

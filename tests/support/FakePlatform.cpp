@@ -284,11 +284,10 @@ class Manager final : public VesselManager {
 
   void signalEnumeratorForContainerItemIdentifier(std::string_view container,
                                                   SignalHandler completionHandler) override {
-    {
-      const std::lock_guard lock(mutex_);  // they come from the thread of a refresh, too
-      signals_.containers.emplace_back(container);
-      if (!signals_.answers) return signals_.waiting.push_back(std::move(completionHandler));
-    }
+    std::unique_lock lock(mutex_);  // they come from the thread of a refresh, too
+    signals_.containers.emplace_back(container);
+    if (!signals_.answers) return signals_.waiting.push_back(std::move(completionHandler));
+    lock.unlock();
     const auto refusal = signals_.refusals.find(container);
     completionHandler(refusal == signals_.refusals.end() ? std::nullopt
                                                          : std::optional(refusal->second));
