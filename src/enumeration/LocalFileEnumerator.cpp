@@ -10,6 +10,17 @@
 namespace mirabel {
 namespace {
 
+// An offset from here on counts nothing, for no folder holds so much. It keeps the cursors of two
+// listings apart that stand at different places.
+constexpr std::uint64_t firstPlace = std::uint64_t{1} << 62;
+
+std::uint64_t newPlace() {
+  std::uint64_t place = 0;
+  for (const std::uint8_t byte : UUID::random().bytes)
+    place = (place << 5) ^ byte;
+  return firstPlace | (place & (firstPlace / 2 - 1));
+}
+
 std::optional<std::string> labelOfInitialPage(const Data& page) {
   if (stringView(page) == VesselInitialPageSortedByDate) return "initialPageSortedByDate";
   if (stringView(page) == VesselInitialPageSortedByName) return "initialPageSortedByName";
@@ -162,7 +173,10 @@ Result<LocalFileEnumerator::Start> LocalFileEnumerator::resume(const FSChangeTok
     return fail(Error::syncAnchorExpired());
   }
   logDebug("safe to resume gather phase from FSEventID " + std::to_string(cursor.streamEventID));
-  return Start{cursor.offset, check.lastProcessedFSEventID, std::move(walk)};
+  // As of the event that the next cursor holds, the place that a kept walk goes on from may have
+  // another offset by now.
+  const bool isPlace = walk && check.haveNamesChanged;
+  return Start{isPlace ? newPlace() : cursor.offset, check.lastProcessedFSEventID, std::move(walk)};
 }
 
 /// What the events alone do not tell. A walk that was kept, or is taken up at the position that
@@ -175,7 +189,7 @@ Result<bool> LocalFileEnumerator::isWhereItStood(std::unique_ptr<FSDirectoryWalk
   const bool mayHavePassed = scope_.isRecursive() && check.hasFolderMoved;
   if (walk) return !mayHavePassed && walk->resume();
   const auto position = keptPosition(cursor.encode());
-  if (!position) return !check.hasNameLeft;
+  if (!position) return !check.hasNameLeft && cursor.offset < firstPlace;
   if (mayHavePassed) return false;
   walk = GatherPage(services_.items, scope_).makeWalk();
   return walk->restore(*position);
@@ -183,21 +197,29 @@ Result<bool> LocalFileEnumerator::isWhereItStood(std::unique_ptr<FSDirectoryWalk
 
 std::optional<WalkPosition> LocalFileEnumerator::keptPosition(const Data& cursor) const {
   const auto bytes = services_.items.platform.positions.find(scope_.container, cursor);
-  return bytes ? WalkPosition::decode(*bytes) : std::nullopt;
+  return bytes && !bytes->empty() ? WalkPosition::decode(*bytes) : std::nullopt;
 }
 
 /// In this process and, before the host has the cursor, on disk for another. Where a position can't
-/// be kept the listing goes on by its offset.
+/// be kept the listing goes on by its offset; so do two that have the same cursor at different
+/// places, for something happened while their pages were made.
 void LocalFileEnumerator::keepForNextPage(std::unique_ptr<FSDirectoryWalk> walk,
                                           const Data& cursor) const {
   walk->pause();
-  if (const auto position = walk->position()) {
-    const auto kept =
-        services_.items.platform.positions.keep(scope_.container, cursor, position->encode());
-    if (!kept)
-      logDebug([&] { return "can't keep a listing's position; " + kept.error().description(); });
+  ListingPositions& positions = services_.items.platform.positions;
+  const auto place = walk->position();
+  Data position = place ? place->encode() : Data();
+  const auto standing = positions.find(scope_.container, cursor);
+  if (standing && *standing != position) {
+    services_.walks.spoil(scope_.container, cursor);
+    position.clear();
+  } else if (!services_.walks.keep(scope_.container, cursor, std::move(walk), position)) {
+    position.clear();
   }
-  services_.walks.keep(scope_.container, cursor, std::move(walk));
+  if (position.empty() && !standing) return;
+  const auto kept = positions.keep(scope_.container, cursor, position);
+  if (!kept)
+    logDebug([&] { return "can't keep a listing's position; " + kept.error().description(); });
 }
 
 Result<void> LocalFileEnumerator::finishPage(VesselEnumerationObserver& observer, Start start,

@@ -88,6 +88,10 @@ bool LocalRootEnumerator::isWorkingSet() const {
   return container_ == VesselWorkingSetContainerItemIdentifier;
 }
 
+bool LocalRootEnumerator::isRecursive() const {
+  return container_ != VesselRootContainerItemIdentifier;
+}
+
 bool LocalRootEnumerator::holdsAppLibraries() const {
   return container_ != VesselAllDirectoriesContainerItemIdentifier;
 }
@@ -142,8 +146,12 @@ void LocalRootEnumerator::enumerateItems(VesselEnumerationObserver& observer, co
     return files->enumerateItems(versioned, page);
   }
   auto cursor = FSChangeToken::decode(page);
-  if (!cursor) return files->enumerateItems(versioned, page);
-  if (cursor->appLibraryVersionToken != version) {
+  if (!cursor) {
+    logError("can't create change token from anchor data, resetting");
+    return observer.finishEnumeratingWithError(Error::syncAnchorExpired());
+  }
+  // The root itself goes no further than the document storage.
+  if (isRecursive() && cursor->appLibraryVersionToken != version) {
     logInfo("the app libraries changed while they were listed, need to restart from scratch " +
             versions(cursor->appLibraryVersionToken));
     return observer.finishEnumeratingWithError(Error::syncAnchorExpired());

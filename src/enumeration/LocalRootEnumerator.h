@@ -27,7 +27,8 @@ namespace mirabel {
 /// refused, and the host lists the container again. All directories holds no app libraries, only
 /// what lies in them, and has no such case: what came or went is told by the event history.
 ///
-/// A page cursor goes with the version too: the libraries are walked in the order of their list.
+/// A page cursor of the recursive containers goes with the version too: the libraries are walked in
+/// the order of their list.
 class LocalRootEnumerator final : public VesselEnumerator {
  public:
   /// Its own manager starts with the working-set cache for the working set, where the versions
@@ -53,6 +54,7 @@ class LocalRootEnumerator final : public VesselEnumerator {
 
   [[nodiscard]] bool holdsAppLibraries() const;
   [[nodiscard]] bool isWorkingSet() const;
+  [[nodiscard]] bool isRecursive() const;
   [[nodiscard]] std::string versions(std::uint64_t changeTokenVersion) const;
   [[nodiscard]] std::vector<URL> monitoredRoots() const;
   void monitorRoots();

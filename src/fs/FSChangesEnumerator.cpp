@@ -45,6 +45,7 @@ FSChangesEnumerator::FSChangesEnumerator(const ItemContext& context, EventStream
 // The two passes --------------------------------------------------------------------------------
 
 void FSChangesEnumerator::start() {
+  currentToken_.version = 0;
   // The page of a listing carries an offset too, and must not be half believed.
   if (currentToken_.offset != 0 && (currentToken_.offset & offsetMark) == 0) {
     return finishWithError(Error::syncAnchorExpired());

@@ -1,7 +1,9 @@
 #include "fs/GatherPhaseResumeCheck.h"
 
+#include <algorithm>
 #include <mutex>
 #include <semaphore>
+#include <string_view>
 
 #include "fs/FSEventReader.h"
 
@@ -14,7 +16,9 @@ using Case = FSEventReaderGatherPhaseResumeStatus::Case;
 /// caller, who may do so while the rest of a batch is still coming in.
 class FSEventChecker final : public FSEventReaderDelegate {
  public:
-  explicit FSEventChecker(std::uint64_t previousEventID) {
+  FSEventChecker(const std::vector<URL>& folders, std::uint64_t previousEventID) {
+    for (const URL& folder : folders)
+      folders_.push_back(folder.properURL().path());
     check_.lastProcessedFSEventID = previousEventID;
   }
 
@@ -27,8 +31,13 @@ class FSEventChecker final : public FSEventReaderDelegate {
   void didUpdateItem(FSEventReader& reader, const std::shared_ptr<LocalItem>& item,
                      const URL& url) override {
     reader.streamQueue().assertOnQueue();
-    if (item->url().properURL() == url.properURL()) return;
-    note(item->vs_isContainer());
+    if (item->url().properURL() != url.properURL()) return noteLeft(item->vs_isContainer());
+    // Saved by renaming, it may be at another place of its folder: on btrfs at its end.
+    if ((reader.currentEvent()->flags & eventflag::changedObject) != 0) return noteLeft(false);
+    // A folder is told of for each name that comes to it.
+    if (!item->vs_isContainer()) return;
+    const std::lock_guard lock(mutex_);
+    check_.haveNamesChanged = true;
   }
 
   void didDeleteItem(FSEventReader& reader, const std::string& identifier,
@@ -45,11 +54,11 @@ class FSEventChecker final : public FSEventReaderDelegate {
 
   void didProcessEvents(FSEventReader& reader) override { reader.streamQueue().assertOnQueue(); }
 
-  void didDropEvent(FSEventReader& reader, const FileSystemEvent&, const std::optional<URL>&,
+  void didDropEvent(FSEventReader& reader, const FileSystemEvent&, const std::optional<URL>& url,
                     DropReason reason) override {
     reader.streamQueue().assertOnQueue();
-    if (reason == DropReason::noObject) note(false);
-    if (reason == DropReason::lookFailed || reason == DropReason::noPath) note(true);
+    if (reason == DropReason::hidden && isPassedOver(*url)) return;
+    noteLeft(reason == DropReason::lookFailed || reason == DropReason::noPath);
   }
 
   /// Nothing will come: the answer must not wait for it.
@@ -62,10 +71,25 @@ class FSEventChecker final : public FSEventReaderDelegate {
   }
 
  private:
-  void note(bool isFolder) {
+  void noteLeft(bool isFolder) {
     const std::lock_guard lock(mutex_);
+    check_.haveNamesChanged = true;
     check_.hasNameLeft = true;
     check_.hasFolderMoved = check_.hasFolderMoved || isFolder;
+  }
+
+  /// Whether a walk never counts it, for a name on the way begins with a dot. What else is hidden
+  /// is counted, such as an "Inbox", and shifts those behind it.
+  [[nodiscard]] bool isPassedOver(const URL& url) const {
+    constexpr std::string_view trash = "/.Trash/";
+    const URL canonical = url.properURL();
+    return std::ranges::all_of(folders_, [&](const std::string& folder) {
+      std::string_view path = canonical.path();
+      if (!path.starts_with(folder)) return true;
+      path.remove_prefix(folder.size());
+      if (path.starts_with(trash)) path.remove_prefix(trash.size() - 1);
+      return path.contains("/.");
+    });
   }
 
   /// The end of the history keeps what was found so far; the other answers replace it.
@@ -82,6 +106,7 @@ class FSEventChecker final : public FSEventReaderDelegate {
     sema_.release();
   }
 
+  std::vector<std::string> folders_;  // canonical paths
   std::mutex mutex_;
   GatherPhaseResumeCheck check_;
   std::counting_semaphore<> sema_{0};
@@ -94,7 +119,7 @@ GatherPhaseResumeCheck canResumeGatherPhase(const ItemContext& context, EventStr
                                             std::uint64_t previousEventID) {
   const auto reader = FSEventReader::create(context, events, on, previousEventID,
                                             FSEventReaderMode::pathBased, Verbosity::quiet);
-  const auto checker = std::make_shared<FSEventChecker>(previousEventID);
+  const auto checker = std::make_shared<FSEventChecker>(on, previousEventID);
   reader->setDelegate(checker);
   SerialQueue queue = reader->streamQueue();
   // On this thread, which waits for it anyway: waking others costs as much as a short replay.

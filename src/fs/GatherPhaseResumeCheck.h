@@ -29,8 +29,10 @@ struct GatherPhaseResumeCheck {
   FSEventReaderGatherPhaseResumeStatus status;
   /// The last event that was processed: where the next check starts.
   std::uint64_t lastProcessedFSEventID = 0;
-  /// A name no longer stands for what it stood for: counting entries from the start would not
-  /// lead to the same place again.
+  /// Names may have come or left: a place that is kept may have another offset by now.
+  bool haveNamesChanged = false;
+  /// A name no longer stands for what it stood for: counting entries from the start may not lead
+  /// to the same place again.
   bool hasNameLeft = false;
   /// A folder was moved: a walk that enters folders may pass its contents by.
   bool hasFolderMoved = false;

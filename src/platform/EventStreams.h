@@ -26,6 +26,9 @@ inline constexpr std::uint32_t eventIDsWrapped = 0x08;
 inline constexpr std::uint32_t historyDone = 0x10;
 /// Says of a path record that a folder became a package there, or stopped being one.
 inline constexpr std::uint32_t changedKind = 0x100'0000;
+/// Says of a path record that the document there passed to it from another object, as in a save by
+/// renaming.
+inline constexpr std::uint32_t changedObject = 0x200'0000;
 }  // namespace eventflag
 
 /// Bits of the flags that a stream is created with.

@@ -102,10 +102,7 @@ class EnumerationTest : public ItemsFixture {
   /// As another process has it: no walk stands open.
   void forgetWalks() {
     for (std::size_t i = 0; i < OpenWalks::mostWalks; ++i) {
-      walks.keep(
-          "", {},
-          std::make_unique<FSDirectoryWalk>(FSDirectoryWalk::Plan{}, fake.platform().directories,
-                                            fake.platform().resources));
+      walks.spoil("", {});
     }
   }
 

@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <cerrno>
+#include <set>
 
 #include "enumeration/EnumerationFixture.h"
 #include "enumeration/LocalFileEnumerator.h"
@@ -33,6 +34,11 @@ class ResumedListing : public EnumerationTest {
       page = listed.next;
     }
     return names;
+  }
+  void emptyTheStorage() {
+    fake.volume.remove(fake.path(""));
+    fake.volume.makeFolder(fake.path(""));
+    forgetListings();
   }
   Data& keptPosition() { return fake.positions.kept.rbegin()->second; }
 };
@@ -70,8 +76,7 @@ TEST_F(ResumedListing, StartsOverWhereSomethingLiesElsewhere) {
       change();
       if (!inOneProcess) forgetWalks();
       errors[inOneProcess ? 0 : 1] = list(*listing, *first.next).error;
-      fake.volume.remove(fake.path(""));
-      fake.volume.makeFolder(fake.path(""));
+      emptyTheStorage();
     }
     EXPECT_EQ(errors[0], errors[1]);
     return errors[0];
@@ -93,6 +98,79 @@ TEST_F(ResumedListing, StartsOverWhereSomethingLiesElsewhere) {
               events.append(fake.path("a/1"), fileID);
             }),
             expired);
+}
+
+/// Two listings of one folder that come to different places while it changes between their pages.
+TEST_F(ResumedListing, IsNotMixedUpWithAnother) {
+  const std::pair<const char*, std::function<void()>> cases[] = {
+      {"a name leaves", [&] { rename("005", "away/005"); }},
+      {"a name comes",
+       [&] {
+         addFile("0000");
+         for (const char* changed : {"0000", ""})
+           events.append(fake.path(changed), fake.volume.at(fake.path(changed)).fileID);
+       }},
+  };
+  for (const auto& [what, change] : cases) {
+    for (const bool inOneProcess : {true, false}) {
+      SCOPED_TRACE(what);
+      for (int i = 0; i < 650; ++i)
+        addFile(std::to_string(1000 + i).substr(1));
+      fake.volume.makeFolder(fake.path("away"));
+      const auto listing = enumerator();
+      const auto go = [&](const Data& page, std::set<std::string>& names) {
+        if (!inOneProcess) forgetWalks();
+        const ListedPage listed = list(*listing, page);
+        EXPECT_FALSE(listed.error);
+        names.insert(listed.names.begin(), listed.names.end());
+        return listed.next;
+      };
+      std::set<std::string> first;
+      std::set<std::string> second;
+      auto firstPlace = go(firstPage(), first);
+      change();
+      firstPlace = go(*firstPlace, first);
+      auto secondPlace = go(firstPage(), second);
+      secondPlace = go(*secondPlace, second);
+      EXPECT_NE(firstPlace, secondPlace);
+      while (firstPlace || secondPlace) {
+        if (firstPlace) firstPlace = go(*firstPlace, first);
+        if (secondPlace) secondPlace = go(*secondPlace, second);
+      }
+      for (int i = 6; i < 650; ++i) {
+        const std::string name = std::to_string(1000 + i).substr(1);
+        EXPECT_TRUE(first.contains(name) && second.contains(name)) << name;
+      }
+      emptyTheStorage();
+    }
+  }
+}
+
+/// Counting from the start would lead past a neighbour, also some pages later.
+TEST_F(ResumedListing, WithoutItsPositionStartsOverOnceANameHasLeft) {
+  const auto resumedAfter = [&](const std::function<void()>& change) {
+    std::optional<Error> errors[2];
+    for (const bool isRightAfter : {true, false}) {
+      addFiles("", 650);
+      addFile("Inbox/1");
+      const auto listing = enumerator();
+      ListedPage page = list(*listing);
+      change();
+      if (!isRightAfter) page = list(*listing, *page.next);
+      EXPECT_FALSE(page.error);
+      forgetListings();
+      errors[isRightAfter ? 0 : 1] = list(*listing, *page.next).error;
+      emptyTheStorage();
+    }
+    EXPECT_EQ(errors[0], errors[1]);
+    return errors[0];
+  };
+  const auto happens = [&](std::string_view name, std::uint32_t flags = 0) {
+    events.append({0, flags, fake.path(name), fake.volume.at(fake.path(name)).fileID, {}});
+  };
+  EXPECT_EQ(resumedAfter([&] { rename("5", "Inbox/5"); }), expired);
+  EXPECT_EQ(resumedAfter([&] { happens("Inbox"); }), expired);
+  EXPECT_EQ(resumedAfter([&] { happens("5", eventflag::changedObject); }), expired);
 }
 
 TEST_F(ResumedListing, OfOtherFoldersStartsOver) {

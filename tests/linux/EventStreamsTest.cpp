@@ -90,6 +90,22 @@ TEST(LinuxEventStreams, WritesToOneFileAreMerged) {
   EXPECT_EQ(listener.count(history.folder() + "/f"), 1u);
 }
 
+TEST(LinuxEventStreams, AnObjectThatADocumentPassedToIsToldFromOneThatWasWrittenTo) {
+  RealHistory history(WatcherKind::folderMarks);
+  const std::string written = history.folder() + "/written";
+  const std::string saved = history.folder() + "/saved";
+  history.change(written);
+  history.change(saved);
+  const std::uint64_t since = history.streams().currentEventID().value();
+  history.change(written);
+  history.save(saved);
+  StreamListener listener(history);
+  listener.startForPaths({history.folder()}, since);
+  ASSERT_TRUE(listener.waitForFlag(eventflag::historyDone));
+  EXPECT_EQ(listener.flags(written), 0U);
+  EXPECT_EQ(listener.flags(saved), eventflag::changedObject);
+}
+
 TEST(LinuxEventStreams, LibrariesThatCouldNotBeFollowedAreBeforeTheNextEventID) {
   RealHistory history(WatcherKind::folderMarks);
   const TempHome apps;

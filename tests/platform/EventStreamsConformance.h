@@ -78,6 +78,13 @@ class StreamListener {
     const std::lock_guard lock(state_->mutex);
     return state_->events;
   }
+  /// All bits that were told of the path.
+  [[nodiscard]] std::uint32_t flags(const std::string& path) const {
+    std::uint32_t flags = 0;
+    for (const FileSystemEvent& event : events())
+      if (event.path == path) flags |= event.flags;
+    return flags;
+  }
   [[nodiscard]] std::size_t count(const std::string& path) const {
     return static_cast<std::size_t>(std::ranges::count(events(), path, &FileSystemEvent::path));
   }

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <map>
 #include <set>
 #include <tuple>
 #include <utility>
@@ -58,6 +59,7 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
   EventStreams::Callback callback;
   std::optional<SerialQueue> queue;
   std::atomic<bool> isStopped = false;
+  std::optional<std::pair<std::uint32_t, std::uint64_t>> lastHandover;  // document, file
   std::vector<std::uint64_t> folders;  // the watched paths' own IDs: they may have had other names
 
   [[nodiscard]] std::chrono::milliseconds latency() const override { return patience; }
@@ -99,10 +101,23 @@ struct JournalStream::Run final : LiveStream, std::enable_shared_from_this<Run> 
     return true;
   }
 
-  [[nodiscard]] std::vector<FileSystemEvent> batchOf(std::vector<JournalRecord> records) const {
+  [[nodiscard]] std::vector<FileSystemEvent> batchOf(std::vector<JournalRecord> records) {
     std::vector<FileSystemEvent> batch;
+    // The object that a document passed to. Its place is told right after that, in this batch or
+    // first in the next one.
+    std::map<std::uint32_t, std::uint64_t> holders;
+    if (const auto last = std::exchange(lastHandover, {})) holders.insert(*last);
     for (JournalRecord& record : records) {
-      if (isSelected(record)) batch.push_back(eventOf(std::move(record)));
+      if (record.isDocument && record.destination != 0) {
+        lastHandover = {record.documentID, record.destination};
+        holders.insert_or_assign(record.documentID, record.destination);
+      }
+      if (!isSelected(record)) continue;
+      const auto holder = holders.find(record.documentID);
+      const bool changedObject =
+          !record.isDocument && holder != holders.end() && holder->second == record.fileID;
+      batch.push_back(eventOf(std::move(record)));
+      if (changedObject) batch.back().flags |= eventflag::changedObject;
     }
     // Of those that are alike the first one stands: whoever stops reading after it, at an event ID
     // that was the last when he began, must have had it.
