@@ -2,7 +2,6 @@
 
 #include <utility>
 
-#include "foundation/FatalError.h"
 #include "foundation/Log.h"
 #include "identity/MRBFileObjectIdentifier.h"
 
@@ -39,7 +38,9 @@ void LocalAppLibraryItem::leaveOutHiddenEntries() {
         reader.value(ResourceKey::isReachable, fileURL().appendingPathComponent(name));
     if (!isThere || *isThere != ResourceValue(true)) continue;
     const std::uint16_t count = *childItemCount();
-    if (count == 0) fatalError("a hidden entry of an app library was not among those counted");
+    // It came after the entries were counted. Whose folder this is could do so at any time, and
+    // must not end the process; the count is told again for the change.
+    if (count == 0) return;
     setChildItemCount(static_cast<std::uint16_t>(count - 1));
   }
 }

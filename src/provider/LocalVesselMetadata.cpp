@@ -68,6 +68,7 @@ LocalVessel::ItemResult LocalVessel::storeTagData(const std::optional<Data>& tag
     return fail(missing);
   }
   const auto payload = keyedarchive::archiveStrings(labelsIn(tagData));
+  // Refused, for otherwise the tags that the file has would go for ones that were never written.
   if (!payload) {
     const Error tooLong = Error::posix(E2BIG, "the labels have more than 64 KiB");
     logError("can't archive tags; " + payload.error().description());

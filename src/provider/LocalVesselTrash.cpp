@@ -113,7 +113,8 @@ std::optional<URL> LocalVessel::providedParent(std::string_view identifier) cons
   return {};
 }
 
-/// The folder that held the item, if it is still one that can.
+/// The folder that held the item, if it is still one that can. What lay at the put-back URL itself
+/// is in the trash, and its name, see `nameBeforeTrash`, goes with it wherever it is put back.
 std::optional<URL> LocalVessel::putBackFolder(const LocalItem& item) const {
   const auto& putBack = item.putBackURL();
   if (!putBack) {
