@@ -91,8 +91,12 @@ Result<std::optional<URL>> LocalContainer::placeOf(const HostedProvider& provide
   const ResourceReader reader(provider.platform().resources);
   auto isFolder = reader.value(ResourceKey::isDirectory, folder);
   if (!isFolder) return fail(isFolder.error());
-  if (*isFolder != ResourceValue(true)) return fail(Error::posix(ENOTDIR));
-  return folder;
+  auto isPackage = reader.value(ResourceKey::isPackage, folder);
+  if (!isPackage) return fail(isPackage.error());
+  if (*isFolder == ResourceValue(true) && *isPackage != ResourceValue(true)) return folder;
+  // A folder that became a package is told as gone, though it is found by its number.
+  if ((*item)->itemIdentifier() != identifier) return fail(Error::nonExistentItem(identifier));
+  return fail(Error::posix(ENOTDIR));
 }
 
 Result<VesselEnumerator*> LocalContainer::enumerator() {

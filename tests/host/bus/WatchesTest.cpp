@@ -123,9 +123,17 @@ TEST_F(Watches, OfAFolderThatIsDeletedAreWokenOnce) {
   EXPECT_EQ(client.provider("EnumerateChanges", a, Data()).error,
             "com.norvane.Vessel1.Error.NoSuchItem");
   EXPECT_EQ(BusClient().provider("Watch", a).error, "com.norvane.Vessel1.Error.NoSuchItem");
+  // What is no folder, or no longer: a package is an item of its own.
+  home.makeFolder("notes");
+  const std::string notes = client.idOf(home.at("notes"));
+  home.rename("notes", "notes.quill");
+  EXPECT_EQ(client.provider("ListItems", notes, Data()).error,
+            "com.norvane.Vessel1.Error.NoSuchItem");
   home.writeFile("doc");
-  EXPECT_EQ(BusClient().provider("Watch", client.idOf(home.at("doc"))).error,
-            "com.norvane.Vessel1.Error.POSIX.ENOTDIR");
+  for (const char* name : {"doc", "notes.quill"}) {
+    EXPECT_EQ(BusClient().provider("Watch", client.idOf(home.at(name))).error,
+              "com.norvane.Vessel1.Error.POSIX.ENOTDIR");
+  }
 }
 
 TEST_F(Watches, AreNotMoreThanAClientMayHave) {
