@@ -207,6 +207,23 @@ TEST_P(FollowedFoldersTest, ADeadMountOverOneHidesItAndOverTheDocumentsIsAnError
   EXPECT_FALSE(told.paths.contains("Documents/a.txt"));
 }
 
+TEST_P(FollowedFoldersTest, AMountThatComesOrGoesBelowOneIsTold) {
+  fs::create_directory(documents_ + "/m");
+  write("m/a.txt");
+  const PrivateMount namespaceOfItsOwn(base_ + "/apps");
+  if (!namespaceOfItsOwn.isThere()) GTEST_SKIP() << "may not mount";
+  const std::string folder = documents_ + "/m";
+  const std::uint64_t before = anchor();
+  ASSERT_EQ(::mount("none", folder.c_str(), "tmpfs", 0, nullptr), 0);
+  EXPECT_TRUE(toldSince(before).paths.contains("Documents/m/a.txt"));
+  const std::uint64_t under = anchor();
+  ASSERT_EQ(::umount(folder.c_str()), 0);
+  EXPECT_TRUE(toldSince(under).paths.contains("Documents/m/a.txt"));
+  const std::uint64_t after = anchor();
+  write("m/b.txt");
+  EXPECT_TRUE(toldSince(after).paths.contains("Documents/m/b.txt"));
+}
+
 INSTANTIATE_TEST_SUITE_P(Watching, FollowedFoldersTest,
                          ::testing::Values(std::nullopt, WatcherKind::folderMarks,
                                            WatcherKind::inotify));

@@ -4,6 +4,8 @@
 #include <poll.h>
 #include <utility>
 
+#include "linux/kernel/MountTable.h"
+
 namespace mirabel {
 namespace {
 
@@ -28,11 +30,13 @@ bool FollowThread::isStopped(int milliseconds) const {
 }
 
 void FollowThread::run() {
+  const MountTable mounts;
   while (true) {
     // Held while it is waited for: its descriptor must not become another's.
     const auto watcher = work_.watcher();
-    std::array<pollfd, 2> wait{pollfd{stop_.descriptor(), POLLIN, 0},
-                               pollfd{watcher ? watcher->descriptor() : -1, POLLIN, 0}};
+    std::array<pollfd, 3> wait{pollfd{stop_.descriptor(), POLLIN, 0},
+                               pollfd{watcher ? watcher->descriptor() : -1, POLLIN, 0},
+                               pollfd{mounts.descriptor(), POLLPRI, 0}};
     const int ready = ::poll(wait.data(), wait.size(), stop_.limited(longestWait));
     if (stop_.isSet()) return;
     if (ready > 0 && isStopped(restBeforeReading)) return;

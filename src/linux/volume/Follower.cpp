@@ -48,7 +48,12 @@ Follower::Follower(IndexContext context, Options options)
 
 Result<void> Follower::catchUp(const Transaction& transaction) {
   auto changed = options_.changedRoots();
-  if (changed.isFirst) isInStep_ = false;
+  // What lies under a mount is neither seen nor heard of while that is there.
+  const auto isBelowRoot = [this](std::string_view path) {
+    const auto place = context_.roots.locate(path);
+    return place && !place->relative.empty();
+  };
+  if (changed.isFirst || mounts_.hasChanged(isBelowRoot)) isInStep_ = false;
   if (!isInStep_) return compareAll(transaction);
   addRoots(changed.further);
   auto added = addChangedRoots(transaction);

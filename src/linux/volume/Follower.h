@@ -11,6 +11,7 @@
 #include <string_view>
 #include <vector>
 
+#include "linux/kernel/MountTable.h"
 #include "linux/volume/FollowStatus.h"
 #include "linux/volume/IndexContext.h"
 #include "linux/volume/MissingNames.h"
@@ -91,6 +92,7 @@ class Follower final : public RecentPlaces {
   std::set<std::string> changedRoots_;
   LookList later_;  // places whose folder was not where the index has it
   std::shared_ptr<FolderWatcher> watcher_;
+  MountTable mounts_;
   bool isInStep_ = false;
   bool hasLost_ = false;  // records, since the last full comparison began
   std::optional<Error> refusal_;
