@@ -1,7 +1,9 @@
 #include <filesystem>
 
 #include "linux/EnvironmentVariable.h"
+#include "linux/FailingLooks.h"
 #include "linux/FilesFixture.h"
+#include "linux/PrivateMount.h"
 #include "linux/files/LinuxPlatform.h"
 
 namespace mirabel::testing {
@@ -53,6 +55,28 @@ TEST_F(OpeningThePlatform, HonoursTheEnvironmentOnlyWithoutAnExplicitHome) {
   for (const EnvironmentVariable* each : {&state, &share})
     each->set("relative");
   EXPECT_EQ(folders({}), own);
+}
+
+TEST_F(OpeningThePlatform, FailsWhereALookFailsAndOpensNoOtherVolume) {
+  for (const bool isMounted : {false, true}) {
+    std::optional<PrivateMount> mounted;
+    if (isMounted) mounted.emplace(home.documents());
+    if (isMounted && !mounted->isThere()) GTEST_SKIP() << "may not mount";
+    home.writeFile("a.txt", "1");
+    const auto history = [this](const LinuxPlatform& opened) {
+      return opened.platform().history.historyUUID(home.url()).value();
+    };
+    const UUID expected = history(*LinuxPlatform::open({.home = home.path()}).value());
+    for (int n = 1;; ++n) {
+      const FailingNthLook failing(n, EIO);
+      const auto opened = LinuxPlatform::open({.home = home.path()});
+      if (!failing.wasMet()) break;
+      EXPECT_TRUE(opened || failureOf(opened) != ENOENT) << n;
+      if (!opened) continue;
+      EXPECT_EQ(history(**opened), expected) << n;
+      EXPECT_NE(failureOf((*opened)->platform().objects.open(home.url("a.txt"))), ENOENT) << n;
+    }
+  }
 }
 
 }  // namespace

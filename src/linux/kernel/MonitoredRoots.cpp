@@ -37,6 +37,12 @@ Result<UniqueFd> openBelow(int root, std::uint64_t device, const std::string& re
   return opened;
 }
 
+// A dead mount is another's to whoever meets one; to those who look for the document storage it is
+// what the answer has to wait for.
+int errnoOf(const Error& error) {
+  return error.isPosix(EXDEV) ? EREMOTEIO : static_cast<int>(error.code);
+}
+
 }  // namespace
 
 /// What is at a root's path now.
@@ -51,6 +57,8 @@ struct MonitoredRoots::Root {
   // Written by `refresh` alone. Whoever reads a descriptor that is replaced at that moment may use
   // it a little longer, so former ones are closed some changes later.
   std::atomic<bool> isThere = false;
+  // Of the last look, where that says nothing: what is not there is then not known to be missing.
+  std::atomic<int> failure = 0;
   std::atomic<int> descriptor = -1;
   std::atomic<std::uint64_t> device = 0;
   std::atomic<std::uint64_t> inode = 0;
@@ -72,7 +80,7 @@ struct MonitoredRoots::Root {
 MonitoredRoots::MonitoredRoots(std::vector<std::string> paths)
     : firstPath_(paths.empty() ? std::string() : std::move(paths.front())),
       first_(std::make_shared<Root>(firstPath_, 0, Root::Kept::open)) {
-  static_cast<void>(refresh(*first_));
+  static_cast<void>(refresh(*first_));  // what it could not see is asked for, see `isFirstThere`
   if (!paths.empty()) setFurther({paths.begin() + 1, paths.end()});
 }
 
@@ -120,12 +128,15 @@ bool MonitoredRoots::refresh(Root& root) {
   const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
   // The document storage itself may be mounted, from a server that does not answer just now.
   const bool isSilent = !status && root.isKeptOpen && status.error().isPosix(EXDEV);
-  if (!status && (!root.isThere || isSilent || !saysOutOfReach(status.error()))) return false;
+  const bool saysNothing = isSilent || (!status && !saysOutOfReach(status.error()));
+  if (!status && !root.isThere) root.failure = saysNothing ? errnoOf(status.error()) : 0;
+  if (saysNothing || (!status && !root.isThere)) return false;
   if (status && root.isThere && status->inode == root.inode && status->device == root.device) {
     return false;
   }
   root.take(status ? std::move(*opened) : UniqueFd(),
             status ? std::optional(*status) : std::nullopt);
+  root.failure = 0;  // after the descriptor, see `open`
   return true;
 }
 
@@ -162,6 +173,11 @@ bool MonitoredRoots::isThere(std::string_view rootPath) const {
   return root && root->path == rootPath && root->isThere;
 }
 
+Result<bool> MonitoredRoots::isFirstThere() const {
+  if (const int failure = first_->failure; failure != 0) return fail(Error::posix(failure));
+  return first_->isThere.load();
+}
+
 Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const {
   if (path.find('\0') != std::string::npos) return fail(Error::posix(EINVAL));
   const int allFlags = flags | ((flags & O_PATH) != 0 ? 0 : O_NONBLOCK | O_NOCTTY);
@@ -169,7 +185,8 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
   if (!root) return openLongPath(AT_FDCWD, path, allFlags);
   const std::string relative(below(root->path, path));
   if (root->isKeptOpen) {
-    if (root->descriptor < 0) return fail(Error::posix(ENOENT));
+    const int failure = root->failure;
+    if (root->descriptor < 0) return fail(Error::posix(failure != 0 ? failure : ENOENT));
     return openBelow(root->descriptor, root->device, relative, allFlags);
   }
   // Whatever folder is there by now: whose it is, is for those to say who look into it.

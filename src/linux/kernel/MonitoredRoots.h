@@ -53,6 +53,9 @@ class MonitoredRoots {
   /// Whether there was a folder at the path of that root when it was looked at last; false for a
   /// path that is no root's.
   [[nodiscard]] bool isThere(std::string_view rootPath) const;
+  /// The same of the document storage. An error where it was never seen and the last look failed
+  /// for a passing reason: then nobody knows, and `open` fails with that error too.
+  [[nodiscard]] Result<bool> isFirstThere() const;
 
   /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
   /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its

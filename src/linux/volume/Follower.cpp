@@ -53,9 +53,11 @@ Result<void> Follower::catchUp(const Transaction& transaction) {
     const auto place = context_.roots.locate(path);
     return place && !place->relative.empty();
   };
-  if (changed.isFirst || mounts_.hasChanged(isBelowRoot)) isInStep_ = false;
+  const bool haveMountsChanged = mounts_.hasChanged(isBelowRoot);
+  if (!changed || changed->isFirst || haveMountsChanged) isInStep_ = false;
+  if (!changed) return fail(changed.error());
   if (!isInStep_) return compareAll(transaction);
-  addRoots(changed.further);
+  addRoots(changed->further);
   auto added = addChangedRoots(transaction);
   auto outcome = added ? follow(transaction) : fail(added.error());
   if (!outcome) isInStep_ = false;

@@ -32,8 +32,9 @@ class Follower final : public RecentPlaces {
   struct Options {
     /// Makes the watcher; nothing: no folder is watched.
     std::function<Result<std::unique_ptr<FolderWatcher>>()> makeWatcher;
-    /// Says which roots are other folders than they were, which no record tells of.
-    std::function<MonitoredRoots::Changes()> changedRoots;
+    /// Says which roots are other folders than they were, which no record tells of; after an error
+    /// nothing is taken in.
+    std::function<Result<MonitoredRoots::Changes>()> changedRoots;
     /// Called when everything was compared and changes are heard of from now on.
     std::function<void()> hasCompared;
     /// Told, once, when folders can't be watched.

@@ -34,7 +34,7 @@ class StoredVolumeIndex final : public VolumeIndex {
                  options.isPackageName),
         follower_(
             {learner_, state_->store(), recorder_, paths_, roots, device, options.isPackageName},
-            {options.makeWatcher, [&roots] { return roots.refresh(); },
+            {options.makeWatcher, [this] { return changedRoots(); },
              [this] { state_->releaseMemory(); }, options.notice}),
         followsInBackground_(options.followsInBackground && options.makeWatcher),
         device_(device),
@@ -270,6 +270,12 @@ class StoredVolumeIndex final : public VolumeIndex {
 
   Transaction transactions() {
     return [this](const std::function<Result<void>()>& work) { return inTransaction(work); };
+  }
+
+  Result<MonitoredRoots::Changes> changedRoots() {
+    auto changes = roots_.refresh();
+    if (auto isThere = roots_.isFirstThere(); !isThere) return fail(isThere.error());
+    return changes;
   }
 
   void startThread() {

@@ -8,6 +8,7 @@
 #include <sys/statfs.h>
 #include <sys/vfs.h>
 
+#include "foundation/LookFailure.h"
 #include "linux/kernel/LongPath.h"
 
 namespace mirabel {
@@ -34,10 +35,12 @@ Result<UUID> uuidFromFileSystemID(int folder) {
   return uuid;
 }
 
-// A folder that may be searched but not read still tells its file system's ID.
+// A folder that may be searched but not read still tells its file system's ID. After any other
+// failure the ID would stand for the UUID, and the same volume for another.
 Result<UniqueFd> openSearchable(const std::string& path) {
   auto opened = openLongPath(AT_FDCWD, path, O_RDONLY | O_DIRECTORY);
-  if (!opened) opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
+  if (!opened && lookFailure(opened.error()) == LookFailure::closed)
+    opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
   return opened;
 }
 
