@@ -26,8 +26,8 @@ std::optional<std::chrono::milliseconds> watchdogPeriod() {
   return std::chrono::milliseconds(microseconds / 2000);
 }
 
-/// One run of the service. It fails where the state has become unusable: its manager starts it
-/// again.
+/// One run of the service. It fails where the state has become unusable, or belongs to another
+/// volume than the documents do by now: its manager starts it again.
 class Serving {
  public:
   explicit Serving(Program& program) : program_(program) {}
@@ -39,8 +39,9 @@ class Serving {
 
   Program& program_;
   EndSignals signals_;  // before the threads of the documents
-  WakeUp ended_;        // the bus has gone away, or the state is broken
-  std::atomic<bool> isBroken_ = false;
+  WakeUp ended_;        // the bus has gone away, or the state can't be used any more
+  std::string whyBroken_;
+  std::atomic<bool> isBroken_ = false;  // after the reason is there
   // What the documents have under way reports to the service, so that they go first.
   std::unique_ptr<bus::BusService> service_;
   std::unique_ptr<LocalDocuments> documents_;
@@ -57,8 +58,7 @@ ExitCode Serving::run() {
   documents_.reset();
   service_.reset();
   if (!isBroken_) return ExitCode::done;
-  return program_.reportFailed(
-      "the disk failed under the volume's state; the next start checks what is there");
+  return program_.reportFailed(whyBroken_);
 }
 
 /// Watches, listings and the files of calls take descriptors, more than most sessions allow at
@@ -84,7 +84,9 @@ ExitCode Serving::open() {
   options.home = program_.options().home;
   options.timeout = program_.options().timeout;
   options.notice = [this](std::string_view text) { program_.note(text); };
-  options.broken = [this] {
+  options.broken = [this](std::string_view why) {
+    if (isBroken_) return;
+    whyBroken_ = why;
     isBroken_ = true;
     ended_.set();
   };

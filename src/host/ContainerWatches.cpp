@@ -211,8 +211,10 @@ void ContainerWatches::run() {
     if (bell_->mustEnd) return;
     bell_->isSignalled = false;
     lock.unlock();
-    const std::uint64_t last = provider_.linuxPlatform().index().status().lastEventID;
-    if (wasSignalled || last != checkedUpTo) check();
+    const auto now = provider_.linuxPlatform().index().status();
+    const std::uint64_t last = now.lastEventID;
+    // Of an index that can't be used any more no signal comes; who watches is told why.
+    if (wasSignalled || last != checkedUpTo || !now.isUsable) check();
     checkedUpTo = last;
     lock.lock();
   }

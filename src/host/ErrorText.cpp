@@ -36,7 +36,7 @@ std::string posixMeaning(int code) {
 bool detailIsEnough(std::int64_t code) {
   return code == EBUSY || code == EINVAL || code == ENOTDIR || code == EPERM || code == ENOTCONN ||
          code == ENOBUFS || code == EADDRINUSE || code == ECANCELED || code == EDEADLK ||
-         code == E2BIG;
+         code == E2BIG || code == EMEDIUMTYPE;
 }
 
 std::string posixText(const Error& error) {

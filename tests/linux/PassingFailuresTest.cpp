@@ -1,6 +1,7 @@
 // A look that fails for the moment tells nothing: neither is what was looked at gone, nor are its
 // changes forgotten.
 #include <cerrno>
+#include <fcntl.h>
 #include <filesystem>
 #include <map>
 #include <memory>
@@ -145,6 +146,38 @@ TEST_P(PassingFailuresTest, ADeadMountIsUnreadableAndTheRestIsFollowed) {
   remove("m");
   anchor();
   EXPECT_EQ(unreadable(), 0U);
+}
+
+TEST_P(PassingFailuresTest, OfAnotherVolumeInThePlaceOfTheDocumentsNothingIsTold) {
+  const std::uint64_t since = anchor();
+  const auto isRefused = [](const auto& answer) {
+    return !answer && answer.error().isPosix(EMEDIUMTYPE);
+  };
+  const auto expectRefused = [&](std::uint64_t known) {
+    EXPECT_TRUE(isRefused(index().learnPath(path("new"), status(""), false)));
+    EXPECT_TRUE(isRefused(index().learn(documents_, AT_FDCWD, {})));
+    EXPECT_TRUE(isRefused(index().pathOfFileID(known)));
+    EXPECT_TRUE(isRefused(index().fileIDOfDocument(1)));
+    EXPECT_TRUE(isRefused(index().currentEventID()));
+    EXPECT_TRUE(isRefused(index().events(0, 1)));
+    EXPECT_FALSE(index().status().isUsable);
+  };
+  auto mounted = std::make_unique<PrivateMount>(documents_);
+  if (!mounted->isThere()) GTEST_SKIP() << "may not mount";
+  write("new");
+  expectRefused(files_["c/g"]);
+  EXPECT_EQ(timesBroken_, 1);
+  close();
+  EXPECT_EQ(document("new"), 1U) << "it is the first of its volume";
+  anchor();
+  const std::uint64_t mountedFile = file("new");
+  mounted.reset();
+  expectRefused(mountedFile);
+  close();
+  anchor();
+  EXPECT_EQ(told(since), (std::map<std::string, bool>()));
+  for (const char* name : names_)
+    EXPECT_EQ(findFile(files_[name]), name);
 }
 
 TEST_P(PassingFailuresTest, TooManyOpenFilesIsNoDeletion) {

@@ -109,7 +109,7 @@ Result<std::unique_ptr<VolumeIndex>> VolumeFixture::tryOpen(std::chrono::millise
   options.timeout = timeout;
   options.isPackageName = [](std::string_view name) { return name.ends_with(".package"); };
   options.notice = [this](std::string_view line) { notices_.emplace_back(line); };
-  options.broken = [this] { ++timesBroken_; };
+  options.broken = [this](std::string_view) { ++timesBroken_; };
   options.makeWatcher = makeWatcher_;
   options.followsInBackground = false;
   return VolumeIndex::open(*roots_, std::move(options));

@@ -44,16 +44,10 @@ class OpenObject final : public FileObject {
   UniqueFd object_;
 };
 
-std::uint64_t deviceOfFirstRoot(const LookContext& context) {
-  const auto root = context.roots.open(context.roots.firstPath(), O_PATH | O_DIRECTORY);
-  const auto status = root ? statusAt(root->get(), "") : fail(root.error());
-  return status ? status->device : context.index.device();
-}
-
 }  // namespace
 
 LinuxFileObjects::LinuxFileObjects(const LookContext& context)
-    : context_(context), volume_(deviceOfFirstRoot(context)) {}
+    : context_(context), volume_(context.roots.volume().value_or(context.index.device())) {}
 
 Result<std::unique_ptr<FileObject>> LinuxFileObjects::open(const URL& url) {
   auto place = placeOf(context_.roots, url);

@@ -77,15 +77,14 @@ Result<std::unique_ptr<LinuxPlatform>> LinuxPlatform::open(Options options) {
   auto layout = HomeLayout::resolve({options.home, options.documents, options.stateFolder});
   if (!layout) return fail(layout.error());
   auto roots = std::make_unique<MonitoredRoots>(std::vector{layout->documents});
-  const auto isThere = roots->isFirstThere();
-  if (!isThere) {
+  if (const auto known = roots->volume(); !known) {
     return fail(
-        Error::posix(static_cast<int>(isThere.error().code),
+        Error::posix(static_cast<int>(known.error().code),
                      "the document storage \"" + layout->documents + "\" cannot be looked at"));
   }
   VolumeIndex::Options indexOptions;
   // A document storage that is missing belongs where it would be made.
-  indexOptions.volumePath = *isThere ? layout->documents : layout->home;
+  indexOptions.volumePath = roots->isThere(layout->documents) ? layout->documents : layout->home;
   indexOptions.stateFolder = layout->stateFolder;
   indexOptions.isPackageName = PackageTypes::isPackageName;
   indexOptions.makeWatcher = std::move(options.makeWatcher);

@@ -46,9 +46,10 @@ class LinuxPlatform {
     std::chrono::milliseconds timeout{30'000};
     /// Told what a person should know: that it has to wait, that a damaged database was set aside.
     std::function<void(std::string_view)> notice{};
-    /// Told once, on any thread, when an error of the disk has made the volume's state unusable:
-    /// calls fail until it is opened anew. It may wake somebody, and call nothing of this.
-    std::function<void()> broken{};
+    /// Told once, on any thread, when calls fail until all of this is opened anew, and why, for
+    /// people: an error of the disk has made the volume's state unusable, or the document storage
+    /// is on another volume now. It may wake somebody, and call nothing of this.
+    std::function<void(std::string_view why)> broken{};
   };
 
   /// Makes nothing but the state folder. A document storage that is missing is empty. Errors, with

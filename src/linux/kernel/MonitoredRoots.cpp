@@ -37,6 +37,18 @@ Result<UniqueFd> openBelow(int root, std::uint64_t device, const std::string& re
   return opened;
 }
 
+// The file system of the folder, or of the one that it would be made in where it is missing.
+Result<std::uint64_t> fileSystemFor(std::string path) {
+  while (true) {
+    const auto opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
+    const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
+    if (status) return status->device;
+    if (!saysAbsent(status.error()) || path == "/") return fail(status.error());
+    path = splitPath(path).parent;
+    if (path.empty()) path = "/";
+  }
+}
+
 // A dead mount is another's to whoever meets one; to those who look for the document storage it is
 // what the answer has to wait for.
 int errnoOf(const Error& error) {
@@ -59,6 +71,8 @@ struct MonitoredRoots::Root {
   std::atomic<bool> isThere = false;
   // Of the last look, where that says nothing: what is not there is then not known to be missing.
   std::atomic<int> failure = 0;
+  // Of one that is kept open: where it lies for good; 0 until that is known.
+  std::atomic<std::uint64_t> volume = 0;
   std::atomic<int> descriptor = -1;
   std::atomic<std::uint64_t> device = 0;
   std::atomic<std::uint64_t> inode = 0;
@@ -126,14 +140,22 @@ bool MonitoredRoots::refresh(Root& root) {
   const auto resolve = root.isKeptOpen ? 0 : withoutLinks;
   auto opened = openLongPath(AT_FDCWD, root.path, O_PATH | O_DIRECTORY, resolve);
   const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
+  auto volume = status ? Result<std::uint64_t>(status->device) : fail(status.error());
+  if (root.isKeptOpen && !status && saysAbsent(status.error())) volume = fileSystemFor(root.path);
   // The document storage itself may be mounted, from a server that does not answer just now.
-  const bool isSilent = !status && root.isKeptOpen && status.error().isPosix(EXDEV);
-  const bool saysNothing = isSilent || (!status && !saysOutOfReach(status.error()));
-  if (!status && !root.isThere) root.failure = saysNothing ? errnoOf(status.error()) : 0;
-  if (saysNothing || (!status && !root.isThere)) return false;
-  if (status && root.isThere && status->inode == root.inode && status->device == root.device) {
-    return false;
+  const bool isSilent = !volume && root.isKeptOpen && volume.error().isPosix(EXDEV);
+  const bool saysNothing = isSilent || (!volume && !saysOutOfReach(volume.error()));
+  if (!status && !root.isThere) root.failure = saysNothing ? errnoOf(volume.error()) : 0;
+  if (saysNothing) return false;
+  if (root.isKeptOpen && volume) {
+    if (root.volume == 0) root.volume = *volume;
+    // Neither are another volume's files to be seen here, nor those of this one to be missed.
+    if (*volume != root.volume) return false;
   }
+  const bool isSame =
+      status ? root.isThere && status->inode == root.inode && status->device == root.device
+             : !root.isThere;
+  if (isSame) return false;
   root.take(status ? std::move(*opened) : UniqueFd(),
             status ? std::optional(*status) : std::nullopt);
   root.failure = 0;  // after the descriptor, see `open`
@@ -173,9 +195,20 @@ bool MonitoredRoots::isThere(std::string_view rootPath) const {
   return root && root->path == rootPath && root->isThere;
 }
 
-Result<bool> MonitoredRoots::isFirstThere() const {
+Result<std::uint64_t> MonitoredRoots::volume() const {
   if (const int failure = first_->failure; failure != 0) return fail(Error::posix(failure));
-  return first_->isThere.load();
+  const std::uint64_t volume = first_->volume;
+  if (volume == 0) return fail(Error::posix(EACCES));
+  return volume;
+}
+
+bool MonitoredRoots::hasLeftVolume() const {
+  const std::uint64_t volume = first_->volume;
+  if (volume == 0) return false;
+  // One system call, as long as nothing has happened.
+  if (const auto seen = statusOf(firstPath_); seen && seen->device == volume) return false;
+  const auto now = fileSystemFor(firstPath_);
+  return now && *now != volume;
 }
 
 Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const {

@@ -22,8 +22,8 @@ namespace mirabel {
 class MonitoredRoots {
  public:
   /// Paths are absolute and resolved; the first is the document storage, which is kept open, and
-  /// stands for the same folder between two calls of `refresh`. One that does not exist is kept and
-  /// is simply empty.
+  /// stands for the same folder between two calls of `refresh`, and for one on the same file system
+  /// always. One that does not exist is kept and is simply empty.
   explicit MonitoredRoots(std::vector<std::string> paths);
   ~MonitoredRoots();
 
@@ -53,9 +53,13 @@ class MonitoredRoots {
   /// Whether there was a folder at the path of that root when it was looked at last; false for a
   /// path that is no root's.
   [[nodiscard]] bool isThere(std::string_view rootPath) const;
-  /// The same of the document storage. An error where it was never seen and the last look failed
-  /// for a passing reason: then nobody knows, and `open` fails with that error too.
-  [[nodiscard]] Result<bool> isFirstThere() const;
+  /// The file system of the document storage when it was first looked at, or of the folder that it
+  /// would have been made in. An error where it is not there and the last look failed for a passing
+  /// reason: then nobody knows, and `open` fails with that error too.
+  [[nodiscard]] Result<std::uint64_t> volume() const;
+  /// Looks whether the path of the document storage leads to another file system than that: one was
+  /// mounted there, or went away. It stands for the folder of before all the same.
+  [[nodiscard]] bool hasLeftVolume() const;
 
   /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
   /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its

@@ -22,6 +22,12 @@
 namespace mirabel {
 namespace {
 
+Error onAnotherVolume(const MonitoredRoots& roots) {
+  return Error::posix(EMEDIUMTYPE, "the document storage \"" + roots.firstPath() +
+                                       "\" has come to lie on another volume, which has identities "
+                                       "of its own; ask again");
+}
+
 class StoredVolumeIndex final : public VolumeIndex {
  public:
   StoredVolumeIndex(std::unique_ptr<VolumeState> state, MonitoredRoots& roots, std::uint64_t device,
@@ -38,6 +44,7 @@ class StoredVolumeIndex final : public VolumeIndex {
              [this] { state_->releaseMemory(); }, options.notice}),
         followsInBackground_(options.followsInBackground && options.makeWatcher),
         device_(device),
+        tellBroken_(options.broken),
         isPackageName_(options.isPackageName) {
     learner_.setRecentPlaces(&follower_);
     reserve_.make();
@@ -71,6 +78,7 @@ class StoredVolumeIndex final : public VolumeIndex {
                               std::span<Sighting> sightings) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     const std::string path = plainPath(folderPath);
     return answeredInTransaction([&] { return learner_.learn(path, folder, sightings); });
   }
@@ -79,6 +87,7 @@ class StoredVolumeIndex final : public VolumeIndex {
                              bool isPackage) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     return answeredInTransaction(
         [&] { return learner_.learnPath(plainPath(path), status, isPackage); });
   }
@@ -86,6 +95,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<void> learnPaths(std::span<const std::string> paths) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     return inTransactionAtLast([&]() -> Result<void> {
       for (const std::string& path : paths) {
         const std::string plain = plainPath(path);
@@ -104,6 +114,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<std::string> pathOfFileID(std::uint64_t fileID) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     std::optional<std::string> path;
     // Where changes are heard of, what has not happened to it need not be searched for.
     auto done = follower_.isInStep() ? stand(fileID, path) : Result<void>();
@@ -119,6 +130,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<std::vector<std::string>> pathsOfFileID(std::uint64_t fileID) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     return answeredInTransaction([&]() -> Result<std::vector<std::string>> {
       auto row = state_->store().objectByFileID(fileID);
       if (!row) return fail(row.error());
@@ -135,6 +147,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<std::uint64_t> fileIDOfDocument(std::uint32_t documentID) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     auto done = follower_.isInStep() ? follower_.catchUp(transactions()) : Result<void>();
     if (!done) return fail(done.error());
     auto holder = answeredInTransaction([&] { return learner_.holderOf(documentID); });
@@ -146,12 +159,14 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<void> reconcile() override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     return follower_.compareAll(transactions());
   }
 
   Result<std::uint64_t> currentEventID() override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     if (auto done = follower_.catchUp(transactions()); !done) return fail(done.error());
     auto begun = inTransaction([&]() -> Result<void> {
       if (auto active = state_->journal().activate(); !active) return active;
@@ -167,6 +182,7 @@ class StoredVolumeIndex final : public VolumeIndex {
 
   Result<std::vector<JournalRecord>> events(std::uint64_t since, std::size_t limit) override {
     const std::scoped_lock lock(mutex_);
+    if (left_) return fail(*left_);
     if (!state_->journal().canReplay(since)) return fail(Error::posix(ESTALE));
     return state_->journal().replay(since, limit);
   }
@@ -174,6 +190,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Result<void> follow(const std::vector<FollowedFolder>& folders, std::uint64_t version) override {
     const Ringing ringing(*this);
     const std::scoped_lock lock(mutex_);
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     const auto difference = followed_.differenceTo(folders, version);
     if (difference.isEmpty()) return {};
     const std::uint64_t lastEvent = state_->journal().lastID();
@@ -209,6 +226,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   Status status() override {
     const std::scoped_lock lock(mutex_);
     Status status{follower_.status()};
+    status.isUsable = stayOnVolume() && !state_->isBroken();
     if (!state_->journal().isActive()) return status;
     status.firstEventID = state_->journal().firstID();
     status.lastEventID = state_->journal().lastID();
@@ -274,8 +292,20 @@ class StoredVolumeIndex final : public VolumeIndex {
 
   Result<MonitoredRoots::Changes> changedRoots() {
     auto changes = roots_.refresh();
-    if (auto isThere = roots_.isFirstThere(); !isThere) return fail(isThere.error());
+    if (auto known = roots_.volume(); !known) return fail(known.error());
+    if (auto stays = stayOnVolume(); !stays) return fail(stays.error());
     return changes;
+  }
+
+  /// Identities are those of one volume. Once the document storage was seen on another one, nothing
+  /// is answered any more, also when it has come back: what happened meanwhile was not heard of.
+  Result<void> stayOnVolume() {
+    if (left_) return fail(*left_);
+    if (!roots_.hasLeftVolume()) return {};
+    left_ = onAnotherVolume(roots_);
+    logError("the volume's state can't be used any more; " + left_->description());
+    if (tellBroken_) tellBroken_(left_->userInfo.find(errorkey::detail)->second);
+    return fail(*left_);
   }
 
   void startThread() {
@@ -287,6 +317,7 @@ class StoredVolumeIndex final : public VolumeIndex {
                            [this] {
                              const Ringing ringing(*this);
                              const std::scoped_lock lock(mutex_);
+                             if (!stayOnVolume()) return;
                              auto done = follower_.catchUp(transactions());
                              if (!done)
                                logError("can't follow changes; " + done.error().description());
@@ -337,6 +368,8 @@ class StoredVolumeIndex final : public VolumeIndex {
   Follower follower_;
   bool followsInBackground_;
   std::uint64_t device_;
+  std::function<void(std::string_view)> tellBroken_;
+  std::optional<Error> left_;  // the volume
   std::function<bool(std::string_view)> isPackageName_;
   JournalBell bell_;
   KeptAttributes keptAttributes_{[this](const auto& work) {
@@ -365,6 +398,10 @@ Result<std::unique_ptr<VolumeIndex>> openOnce(MonitoredRoots& roots,
   if (!state) return fail(state.error());
   auto index =
       std::make_unique<StoredVolumeIndex>(std::move(*state), roots, status->device, options);
+  // Something may have been mounted since it was looked at.
+  const auto volume = roots.volume();
+  if (!volume) return fail(volume.error());
+  if (*volume != status->device || roots.hasLeftVolume()) return fail(onAnotherVolume(roots));
   auto loaded = index->forgetLongGone();
   if (loaded) loaded = index->loadKeptAttributes();
   if (loaded) loaded = index->loadFollowedFolders();

@@ -58,15 +58,17 @@ class VolumeIndex {
     bool followsInBackground = true;
     /// Told once when it has to wait, and when a damaged database was set aside.
     std::function<void(std::string_view)> notice;
-    /// Told once when the state has become unusable until it is opened anew, see `VolumeState`. Not
-    /// to call the index from.
-    std::function<void()> broken;
+    /// Told once, and why, when the index has become unusable until it is opened anew: see
+    /// `VolumeState`, or the document storage is on another volume now, and nothing of this state
+    /// is true of that. Not to call the index from.
+    std::function<void(std::string_view why)> broken;
   };
 
   /// Opens or makes the index of the volume that holds `volumePath`. Errors: POSIX EBUSY when
   /// another process owned it to the end of the timeout; EPERM for a state folder that is a
-  /// symbolic link or belongs to somebody else; EINVAL for one below a root; other POSIX errors;
-  /// `ErrorDomain::store`.
+  /// symbolic link or belongs to somebody else; EINVAL for one below a root; EMEDIUMTYPE where the
+  /// first root is on another volume, as with whatever is asked after it has come to be; other
+  /// POSIX errors; `ErrorDomain::store`.
   [[nodiscard]] static Result<std::unique_ptr<VolumeIndex>> open(MonitoredRoots& roots,
                                                                  Options options);
   virtual ~VolumeIndex() = default;
@@ -121,6 +123,7 @@ class VolumeIndex {
     /// Events kept: IDs from `firstEventID` to `lastEventID`; both 0 before the history begins.
     std::uint64_t firstEventID = 0;
     std::uint64_t lastEventID = 0;
+    bool isUsable = true;  ///< see `Options::broken`
   };
   [[nodiscard]] virtual Status status() = 0;
 

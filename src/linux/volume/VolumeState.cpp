@@ -228,7 +228,9 @@ void VolumeState::breakOff(const Error& error) {
   if (broken_) return;
   broken_ = error;
   logError("the volume's state can't be used before it was opened anew; " + error.description());
-  if (isAdopted_ && tellBroken_) tellBroken_();
+  if (isAdopted_ && tellBroken_) {
+    tellBroken_("the disk failed under the volume's state; the next start checks what is there");
+  }
 }
 
 void VolumeState::closeInOrder() {

@@ -40,7 +40,7 @@ namespace mirabel {
 class VolumeState {
  public:
   using Notice = std::function<void(std::string_view)>;
-  using Broken = std::function<void()>;
+  using Broken = std::function<void(std::string_view why)>;
 
   /// `broken` is called once, when an I/O error of the database or damage was met after it was
   /// opened: every transaction fails from then on, until the state is opened anew, which finds out
@@ -60,6 +60,7 @@ class VolumeState {
   [[nodiscard]] const StateFolder& folder() const { return folder_; }
   /// Transactions that wrote something.
   [[nodiscard]] std::uint64_t commits() const { return commits_; }
+  [[nodiscard]] bool isBroken() const { return broken_.has_value(); }
   [[nodiscard]] const UUID& history() const { return witness_.history; }
 
   /// Runs `work` in a transaction. What it wrote is on disk when this returns without an error,
