@@ -163,10 +163,10 @@ class BusService::Impl {
     memory_.used();
     for (CallLane* lane : {&lookups_, &enumerations_, &operations_})
       lane->forget(name);
-    // Not here, where the bus is driven: a signal that is being sent would wait for this.
-    if (!enumerations_.submit(name, [caller](const auto&) { caller->leave(); })) {
-      callers_.putBack(caller);
-    }
+    // Not here, where the bus is driven: a signal that is being sent would wait for this. Where the
+    // lane has ended, so does the service, and all callers leave.
+    static_cast<void>(
+        enumerations_.submit(name, [this, caller](const auto&) { callers_.leave(caller); }));
   }
 
   void signal(const std::string& caller, const std::string& container) {

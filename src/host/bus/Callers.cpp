@@ -91,22 +91,27 @@ std::shared_ptr<Caller> Callers::of(const std::string& uniqueName) {
 
 std::shared_ptr<Caller> Callers::take(const std::string& uniqueName) {
   const std::lock_guard lock(mutex_);
-  auto node = callers_.extract(uniqueName);
-  return node ? std::move(node.mapped()) : nullptr;
+  const auto node = callers_.extract(uniqueName);
+  if (!node) return nullptr;
+  leaving_.insert(node.mapped());
+  return node.mapped();
 }
 
-void Callers::putBack(const std::shared_ptr<Caller>& caller) {
+void Callers::leave(const std::shared_ptr<Caller>& caller) {
+  caller->leave();
   const std::lock_guard lock(mutex_);
-  callers_.try_emplace(caller->name(), caller);
+  leaving_.erase(caller);
 }
 
 void Callers::leaveAll() {
-  std::map<std::string, std::shared_ptr<Caller>> all;
+  std::set<std::shared_ptr<Caller>> all;
   {
     const std::lock_guard lock(mutex_);
-    all.swap(callers_);
+    all.swap(leaving_);
+    for (const auto& [name, caller] : std::exchange(callers_, {}))
+      all.insert(caller);
   }
-  for (const auto& [name, caller] : all)
+  for (const auto& caller : all)
     caller->leave();
 }
 

@@ -7,6 +7,7 @@
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <set>
 #include <string>
 
 #include "host/bus/CallerIdentity.h"
@@ -77,11 +78,12 @@ class Callers {
   /// The caller of that name on the bus. To be called for each message in the order in which they
   /// came, so that what a caller sent before it left does not bring it back.
   [[nodiscard]] std::shared_ptr<Caller> of(const std::string& uniqueName);
-  /// Forgets the caller; whoever gets it has it leave. Null for one that has not called.
+  /// Forgets the name of the caller, who is to leave. Null for one that has not called.
   [[nodiscard]] std::shared_ptr<Caller> take(const std::string& uniqueName);
-  /// Takes it back, for whoever can't have it leave yet.
-  void putBack(const std::shared_ptr<Caller>& caller);
-  /// Has all of them leave.
+  /// Has one that was taken leave.
+  void leave(const std::shared_ptr<Caller>& caller);
+  /// Has all of them leave, also those that were taken and have not left. For when none of their
+  /// calls runs any more, nor `leave`.
   void leaveAll();
 
  private:
@@ -89,6 +91,8 @@ class Callers {
   CallerIdentities identities_;
   std::mutex mutex_;
   std::map<std::string, std::shared_ptr<Caller>> callers_;
+  /// Those that were taken: nobody else may be left who would have them leave.
+  std::set<std::shared_ptr<Caller>> leaving_;
 };
 
 }  // namespace mirabel::bus

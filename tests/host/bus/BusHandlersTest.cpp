@@ -8,8 +8,10 @@
 #include "host/bus/BusCall.h"
 #include "host/bus/BusClient.h"
 #include "host/bus/BusErrors.h"
+#include "host/bus/Callers.h"
 #include "host/bus/RemoteDocuments.h"
 #include "host/bus/ServiceFixture.h"
+#include "mirabel/Containers.h"
 
 namespace mirabel::testing {
 namespace {
@@ -66,6 +68,21 @@ TEST_F(BusHandlers, AnswerAlsoWhereTheReplyCantBeWritten) {
   const auto answer = BusClient().provider("GetItem", std::string("did=1"));
   EXPECT_EQ(answer.error, "org.freedesktop.DBus.Error.LimitsExceeded");
   EXPECT_EQ(answer.message, "too long");
+}
+
+// When the service ends, nobody else may come to have the one leave that the bus said has left.
+TEST_F(BusHandlers, KeepNothingOfACallerWhoLeavesWhileTheServiceEnds) {
+  auto documents = LocalDocuments::open({.home = home.path()}).value();
+  bus::Callers callers(*documents);
+  const std::string name = connection->getUniqueName();
+  auto signalled = std::make_shared<int>();
+  const std::weak_ptr<int> watch = signalled;
+  ASSERT_TRUE(callers.of(name)->watch(std::string(VesselRootContainerItemIdentifier),
+                                      [signalled = std::move(signalled)] { ++*signalled; }));
+  const auto leaving = callers.take(name);
+  callers.leaveAll();
+  EXPECT_TRUE(watch.expired());
+  documents.reset();
 }
 
 TEST_F(BusHandlers, OfSomebodyWhoNeverAnswersAreNotWaitedFor) {
