@@ -1,49 +1,94 @@
+#include <cerrno>
 #include <cstdint>
-#include <filesystem>
+#include <fcntl.h>
 #include <nlohmann/json.hpp>
 #include <ostream>
-#include <system_error>
+#include <utility>
+#include <vector>
 
 #include "cli/ItemArgument.h"
 #include "cli/ItemCommands.h"
 #include "cli/ItemJSON.h"
 #include "cli/OperationRun.h"
 #include "cli/Printing.h"
+#include "linux/kernel/LongPath.h"
+#include "linux/kernel/ObjectStatus.h"
+#include "linux/kernel/RawDirectory.h"
 
 namespace mirabel {
 namespace {
-
-namespace fs = std::filesystem;
 
 /// What would go with an item.
 struct Contents {
   std::uint64_t entries = 0;
   std::uint64_t bytes = 0;
+
+  void add(const ObjectStatus& status) {
+    ++entries;
+    if (status.kind == FileKind::regular) bytes += status.size;
+  }
 };
 
-void count(const fs::directory_entry& entry, Contents& contents) {
-  std::error_code ignored;
-  ++contents.entries;
-  if (entry.is_regular_file(ignored) && !entry.is_symlink(ignored)) {
-    const auto size = entry.file_size(ignored);
-    if (!ignored) contents.bytes += size;
+/// Counts what lies in a folder as a removal would find it: links are not followed, and other file
+/// systems not entered.
+class ContentsWalk {
+ public:
+  explicit ContentsWalk(UniqueFd top) : top_(std::move(top)) {}
+
+  Result<void> run(Contents& contents) {
+    pending_.emplace_back();
+    while (!pending_.empty()) {
+      const std::string path = std::move(pending_.back());
+      pending_.pop_back();
+      // From the top each time: one descriptor is enough for any depth.
+      auto folder = openLongPath(top_.get(), path, O_RDONLY | O_DIRECTORY, resolveBeneath);
+      if (!folder && (hasVanished(folder.error()) || folder.error().isPosix(EXDEV))) continue;
+      if (!folder) return fail(folder.error());
+      if (auto read = readFolder(path, RawDirectory(std::move(*folder)), contents); !read)
+        return read;
+    }
+    return {};
   }
-}
+
+ private:
+  static bool hasVanished(const Error& error) {
+    return error.isPosix(ENOENT) || error.isPosix(ENOTDIR) || error.isPosix(ELOOP);
+  }
+
+  Result<void> readFolder(const std::string& path, RawDirectory folder, Contents& contents) {
+    while (true) {
+      const auto entry = folder.next();
+      if (!entry) return fail(entry.error());
+      if (!*entry) return {};
+      const std::string name((*entry)->name);
+      if (name == "." || name == "..") continue;
+      const auto status = statusAt(folder.descriptor(), name);
+      if (!status && hasVanished(status.error())) continue;
+      if (!status && status.error().isPosix(EXDEV)) {
+        ++contents.entries;  // a mount, whose server is gone
+        continue;
+      }
+      if (!status) return fail(status.error());
+      contents.add(*status);
+      if (status->kind != FileKind::folder) continue;
+      pending_.push_back(path.empty() ? name : path + "/" + name);
+    }
+  }
+
+  UniqueFd top_;
+  std::vector<std::string> pending_;  ///< below the top
+};
 
 Result<Contents> contentsOf(const std::string& path) {
-  std::error_code failure;
+  const auto top = statusOf(path);
+  if (!top) return fail(top.error());
   Contents contents;
-  const fs::directory_entry top(path, failure);
-  if (!failure) count(top, contents);
-  if (failure || top.is_symlink(failure) || !top.is_directory(failure)) {
-    if (failure) return fail(Error::posix(failure.value()));
-    return contents;
-  }
-  for (auto entry = fs::recursive_directory_iterator(path, failure);
-       !failure && entry != fs::recursive_directory_iterator(); entry.increment(failure)) {
-    count(*entry, contents);
-  }
-  if (failure) return fail(Error::posix(failure.value()));
+  contents.add(*top);
+  if (top->kind != FileKind::folder) return contents;
+  auto folder = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
+  if (!folder) return fail(folder.error());
+  if (auto walked = ContentsWalk(std::move(*folder)).run(contents); !walked)
+    return fail(walked.error());
   return contents;
 }
 

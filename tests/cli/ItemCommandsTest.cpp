@@ -133,6 +133,18 @@ TEST_F(ItemCommands, ADryRunSaysWhatWouldGoAndLeavesIt) {
   EXPECT_TRUE(exists("folder/doc.txt"));
 }
 
+TEST_F(ItemCommands, ADryRunCountsWhatLiesDeeperThanAPathMayBeLong) {
+  std::string chain;
+  for (int i = 0; i < 12; ++i)
+    chain += "/" + std::string(200, 'd');
+  fs::create_directories(home.at("a" + chain));
+  fs::create_directories(home.at("b" + chain));
+  home.writeFile("b" + chain + "/deep", "12345");
+  home.makeSymlink("b/link", home.at("folder"));
+  home.rename("b", "a" + chain + "/b");
+  EXPECT_THAT(run({"rm", "--dry-run", home.at("a")}).out, HasSubstr("(28 entries, 5 B)"));
+}
+
 TEST_F(ItemCommands, OfAFileWithSeveralNamesChangeTheOneThatTheyWereGiven) {
   using Words = std::vector<std::string>;
   const std::pair<Words, const char*> commands[] = {{{"rm", "@"}, nullptr},
