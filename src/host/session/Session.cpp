@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <memory>
+#include <string>
 #include <utility>
 
 #include "host/LocalDocuments.h"
@@ -33,13 +35,14 @@ Result<std::unique_ptr<Documents>> localDocuments(const SessionOptions& options,
   return LocalDocuments::open(std::move(platformOptions));
 }
 
-/// The same text in a row is told once.
+/// The same text in a row is told once, also by copies.
 std::function<void(std::string_view)> withoutRepetition(
     std::function<void(std::string_view)> notice) {
   if (!notice) return {};
-  return [notice = std::move(notice), last = std::string()](std::string_view text) mutable {
-    if (std::exchange(last, text) != text) notice(text);
-  };
+  return
+      [notice = std::move(notice), last = std::make_shared<std::string>()](std::string_view text) {
+        if (std::exchange(*last, text) != text) notice(text);
+      };
 }
 
 }  // namespace
