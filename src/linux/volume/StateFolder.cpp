@@ -27,14 +27,15 @@ Result<UniqueFd> openFolder(const std::string& path) {
   }
   if (errno != ENOENT) return fail(Error::posix(errno, path));
   const std::size_t slash = path.rfind('/');
-  if (slash != std::string::npos && slash > 0) {
-    struct stat status {};
-    const std::string parent = path.substr(0, slash);
-    if (::stat(parent.c_str(), &status) != 0) {
-      if (auto above = openFolder(parent); !above) return fail(above.error());
-    }
+  const std::string parent = slash == 0 ? "/" : path.substr(0, slash);
+  struct stat status {};
+  if (slash != std::string::npos && ::stat(parent.c_str(), &status) != 0) {
+    if (auto made = openFolder(parent); !made) return fail(made.error());
   }
   if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST) return fail(Error::posix(errno, path));
+  // What is synchronised in there later is lost with a folder that is not on disk itself.
+  const UniqueFd above(::open(parent.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (above && ::fsync(above.get()) != 0) return fail(Error::posix(errno, path));
   folder.reset(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
   if (!folder) return fail(Error::posix(errno, path));
   return folder;
