@@ -35,7 +35,8 @@ class FileObject {
 /// What `status` tells of a path.
 struct FileStatus {
   std::uint64_t fileID = 0;
-  /// For a folder 2 + the number of its entries, at most 65,535; 2 for one that cannot be read.
+  /// For a folder 2 + the number of its entries, at most 65,535; 2 for one that is not ours to
+  /// read.
   std::uint16_t linkCount = 0;
 };
 
@@ -45,7 +46,8 @@ class FileObjects {
   virtual ~FileObjects() = default;
   /// POSIX error ENOENT where nothing is there.
   [[nodiscard]] virtual Result<std::unique_ptr<FileObject>> open(const URL& url) = 0;
-  /// Answers from the URL's resource cache what that already knows.
+  /// Answers from the URL's resource cache what that already knows. Where the entries of a folder
+  /// can't be counted for the moment, it fails.
   [[nodiscard]] virtual Result<FileStatus> status(const URL& url) = 0;
   /// Where the object lies now, checked against the disk before it is answered. POSIX error
   /// ENOENT when no object of that ID is to be found in the monitored folders; no object has the

@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "linux/FilesFixture.h"
+#include "support/NoDescriptors.h"
 #include "support/OrdinaryUser.h"
 
 namespace mirabel::testing {
@@ -112,6 +113,29 @@ TEST_F(ResourceValuesOnDisk, WritableMeansThatThisUserMayWrite) {
   EXPECT_FALSE(valuesOf("listed").isWritable);
   EXPECT_EQ(failureOf(platform().sizes.directorySize(home.url())), EACCES);
   closePlatform();
+}
+
+TEST_F(ResourceValuesOnDisk, AFolderThatCanNotBeCountedForTheMomentIsNotAnEmptyOne) {
+  if (NoDescriptors::areNeeded) GTEST_SKIP() << "the sanitizer takes descriptors itself";
+  for (const char* name : {"folder", "folder/sub", "closed", "closed/sub"})
+    home.makeFolder(name);
+  const URL folder = home.url("folder"), closed = home.url("closed");
+  const auto status = [this](const URL& url) { return platform().objects.status(url); };
+  // Of which all but the count is known.
+  for (const URL* url : {&folder, &closed})
+    ASSERT_TRUE(platform().resources.prefetch({url, 1}));
+  {
+    const NoDescriptors none;
+    EXPECT_EQ(failureOf(status(folder)), EMFILE);
+  }
+  EXPECT_EQ(status(folder).value().linkCount, 3);
+  std::filesystem::remove_all(folder.path());
+  EXPECT_EQ(failureOf(status(folder)), ENOENT);
+
+  home.setMode("closed", 0);
+  if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
+  const OrdinaryUser user;
+  EXPECT_EQ(status(closed).value().linkCount, 2) << "it is not ours to read";
 }
 
 TEST_F(ResourceValuesOnDisk, SizesCountEachFileOnceAndLinksNot) {

@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <limits>
 
+#include "foundation/LookFailure.h"
 #include "foundation/URL.h"
 #include "linux/files/FolderOpening.h"
 #include "linux/files/PackageTypes.h"
@@ -65,9 +66,10 @@ Result<FileStatus> LinuxFileObjects::status(const URL& url) {
     if (!looked) return fail(looked.error());
     values = std::move(*looked);
   }
-  const bool isFolder = values->kind == FileKind::folder;
-  return FileStatus{values->fileID,
-                    isFolder ? linkCountOfFolder(url) : static_cast<std::uint16_t>(1)};
+  if (values->kind != FileKind::folder) return FileStatus{values->fileID, 1};
+  const auto links = linkCountOfFolder(url);
+  if (!links) return fail(links.error());
+  return FileStatus{values->fileID, *links};
 }
 
 Result<std::string> LinuxFileObjects::pathOfFileID(DeviceID device, std::uint64_t fileID) {
@@ -82,15 +84,18 @@ Result<std::vector<std::string>> LinuxFileObjects::pathsOfFileID(DeviceID device
 }
 
 // The kernel's own count of a folder's links tells the folders in it on some file systems and
-// nothing on others, so the entries are counted, as far as the answer can count.
-std::uint16_t LinuxFileObjects::linkCountOfFolder(const URL& url) const {
+// nothing on others, so the entries are counted, as far as the answer can count. What can't be
+// counted for the moment is no empty folder.
+Result<std::uint16_t> LinuxFileObjects::linkCountOfFolder(const URL& url) const {
   auto opened = openFolderForReading(context_.roots, url.path());
-  if (!opened) return linksOfEmptyFolder;
+  if (!opened && lookFailure(opened.error()) == LookFailure::closed) return linksOfEmptyFolder;
+  if (!opened) return fail(opened.error());
   RawDirectory directory(std::move(opened->descriptor));
   std::uint16_t links = linksOfEmptyFolder;
   while (links < mostLinks) {
     auto entry = directory.next();
-    if (!entry || !*entry) break;
+    if (!entry) return fail(entry.error());
+    if (!*entry) break;
     const std::string_view name = (*entry)->name;
     if (name != "." && name != "..") ++links;
   }

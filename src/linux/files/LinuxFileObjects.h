@@ -19,7 +19,7 @@ class LinuxFileObjects final : public FileObjects {
   Result<std::vector<std::string>> pathsOfFileID(DeviceID device, std::uint64_t fileID) override;
 
  private:
-  std::uint16_t linkCountOfFolder(const URL& url) const;
+  [[nodiscard]] Result<std::uint16_t> linkCountOfFolder(const URL& url) const;
 
   LookContext context_;
   std::uint64_t volume_;  // st_dev of the volume
