@@ -1,10 +1,11 @@
 #include "linux/apps/ContainerFolders.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
 #include <utility>
 
-#include "linux/apps/PassingErrors.h"
+#include "foundation/LookFailure.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/kernel/ObjectStatus.h"
 
@@ -32,6 +33,22 @@ std::string_view reasonFor(const Error& error, int directory, std::string_view p
   return status && status->kind == FileKind::symbolicLink ? throughLink : noFolder;
 }
 
+// Whether a mount that is dead is on the way to `path`, or at its beginning or end.
+bool leadsToDeadMount(int directory, std::string_view path) {
+  for (std::size_t end = 0; end <= path.size();
+       end = std::min(path.find('/', end + 1), path.size())) {
+    const auto status = statusAt(directory, std::string(path.substr(0, end)));
+    if (!status && status.error().isPosix(EXDEV)) return true;
+    if (end == path.size()) break;
+  }
+  return false;
+}
+
+// After the failure to reach `path`: whether nothing may be concluded from it.
+bool isPassing(const Error& error, int directory, std::string_view path) {
+  return !saysOutOfReach(error) && !leadsToDeadMount(directory, path);
+}
+
 }  // namespace
 
 ContainerFolders::ContainerFolders(const std::string& home, std::uint64_t device)
@@ -50,7 +67,8 @@ Result<ContainerFolders::Opened> ContainerFolders::open() const {
     opened.folder_ = std::move(*folder);
     return opened;
   }
-  if (isPassing(folder.error())) return fail(folder.error());
+  if (!home && !saysOutOfReach(home.error())) return fail(home.error());
+  if (home && isPassing(folder.error(), home->get(), pathInHome)) return fail(folder.error());
   if (home) opened.reason_ = reasonFor(folder.error(), home->get(), pathInHome);
   return opened;
 }
@@ -60,10 +78,11 @@ Result<ContainerFolders::Look> ContainerFolders::Opened::look(const std::string&
   const std::string path = identifier + std::string(documentsSuffix);
   const auto documents = openLongPath(folder_.get(), path, folderFlags, resolve);
   if (!documents) {
-    if (isPassing(documents.error())) return fail(documents.error());
+    if (isPassing(documents.error(), folder_.get(), path)) return fail(documents.error());
     return Look{.reason = reasonFor(documents.error(), folder_.get(), path)};
   }
   const auto status = statusAt(documents->get(), "");
+  if (!status && !saysOutOfReach(status.error())) return fail(status.error());
   if (!status) return Look{.reason = unreachable};
   if (status->device != device_) return Look{.reason = elsewhere};
   return Look{.hasDocuments = true, .inode = status->inode};

@@ -30,7 +30,8 @@ class ContainerFolders {
   /// The folder of all containers at one moment, to look at many.
   class Opened {
    public:
-    /// Errors: those that say nothing of the container, see `isPassing`.
+    /// Errors: passing ones, see `LookFailure`. What lies behind a mount whose server is gone is
+    /// as good as not there: it may stay away for long, and would hold up everything else.
     [[nodiscard]] Result<Look> look(const std::string& identifier) const;
     /// Why none of them is shown though the folder is there; of static storage, or empty.
     [[nodiscard]] std::string_view reason() const { return reason_; }

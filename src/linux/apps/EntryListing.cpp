@@ -8,6 +8,7 @@
 #include <tuple>
 #include <utility>
 
+#include "foundation/LookFailure.h"
 #include "linux/apps/ApplicationIdentifier.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/kernel/ObjectStatus.h"
@@ -21,11 +22,6 @@ struct Folder {
   unsigned depth;
 };
 
-bool isAbsentOrClosed(const Error& error) {
-  return error.isPosix(ENOENT) || error.isPosix(ENOTDIR) || error.isPosix(EACCES) ||
-         error.isPosix(EPERM) || error.isPosix(ELOOP) || error.isPosix(ENAMETOOLONG);
-}
-
 // The directory itself may be a link; what is below it was seen to be a folder.
 Result<UniqueFd> openFolder(const std::string& directory, const Folder& folder) {
   const int links = folder.depth == 0 ? 0 : O_NOFOLLOW;
@@ -35,10 +31,12 @@ Result<UniqueFd> openFolder(const std::string& directory, const Folder& folder) 
   return UniqueFd(fd);
 }
 
-bool isFolder(int directory, const RawDirectory::Entry& entry) {
+Result<bool> isFolder(int directory, const RawDirectory::Entry& entry) {
   if (entry.type != DT_UNKNOWN) return entry.type == DT_DIR;
   const auto status = statusAt(directory, std::string(entry.name));
-  return status && status->kind == FileKind::folder;
+  if (!status && saysOutOfReach(status.error())) return false;
+  if (!status) return fail(status.error());
+  return status->kind == FileKind::folder;
 }
 
 /// Goes through a directory and the folders below it.
@@ -57,7 +55,7 @@ class Walk {
       const Folder folder = std::move(waiting_.back());
       waiting_.pop_back();
       auto opened = openFolder(directory_, folder);
-      if (!opened && isAbsentOrClosed(opened.error())) continue;
+      if (!opened && saysOutOfReach(opened.error())) continue;
       if (!opened) return fail(opened.error());
       if (onFolder_(folder) == Visit::stop) break;
       if (auto done = read(RawDirectory(std::move(*opened)), folder); !done) return done;
@@ -79,7 +77,9 @@ class Walk {
       const auto type = (*entry)->type;
       isStopped_ = onEntry_(path, type != DT_LNK && type != DT_UNKNOWN) == Visit::stop;
       if (where.depth == deepestEntryFolder || name.starts_with('.')) continue;
-      if (isFolder(folder.descriptor(), **entry)) waiting_.push_back({path + "/", where.depth + 1});
+      const auto goesOn = isFolder(folder.descriptor(), **entry);
+      if (!goesOn) return fail(goesOn.error());
+      if (*goesOn) waiting_.push_back({path + "/", where.depth + 1});
     }
     return {};
   }

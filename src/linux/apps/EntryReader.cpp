@@ -6,7 +6,7 @@
 #include <optional>
 #include <utility>
 
-#include "linux/apps/PassingErrors.h"
+#include "foundation/LookFailure.h"
 #include "mirabel/UniqueFd.h"
 
 namespace mirabel {
@@ -26,7 +26,7 @@ bool isSame(const ObjectStatus& a, const ObjectStatus& b) {
 }
 
 Result<EntryReading> failedReading(const Error& error) {
-  if (isPassing(error)) return fail(error);
+  if (!saysOutOfReach(error)) return fail(error);
   const bool isGone = error.isPosix(ENOENT) || error.isPosix(ENOTDIR);
   return EntryReading{nullptr, isGone ? std::string_view() : unreadable};
 }

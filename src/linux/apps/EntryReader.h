@@ -29,8 +29,8 @@ class EntryReader {
   /// `languages` as `languagesOf` makes them. Files of more than `mostBytes` are not read.
   EntryReader(std::vector<std::string> languages, std::size_t mostBytes);
 
-  /// The path may be that of a link to a regular file. Errors: those that say nothing of the file,
-  /// see `isPassing`.
+  /// The path may be that of a link to a regular file. Errors: passing ones, see
+  /// `LookFailure`.
   [[nodiscard]] Result<EntryReading> read(const std::string& path);
 
   /// To be called after each look at many entries: drops what none of the last such looks read.

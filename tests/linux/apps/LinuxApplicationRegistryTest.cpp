@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <filesystem>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -5,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "linux/FailingLooks.h"
 #include "linux/apps/ApplicationsHome.h"
 #include "linux/apps/LinuxApplicationRegistry.h"
 #include "support/NoDescriptors.h"
@@ -151,6 +153,22 @@ TEST_F(LinuxApplicationRegistryTest, TooManyOpenFilesAreAnErrorAndNotAnEmptyMach
   }
   EXPECT_EQ(reported, 0);
   EXPECT_THAT(users(), ElementsAre("a"));
+}
+
+TEST_F(LinuxApplicationRegistryTest, AReadErrorIsAnErrorAndNoApplicationLess) {
+  home.install("a");
+  home.makeDocuments("a");
+  for (int n = 1;; ++n) {
+    // In another registry: nothing of it is known yet.
+    LinuxApplicationRegistry fresh(home.options());
+    const FailingNthLook failing(n, EIO);
+    std::vector<bool> haveDocuments;
+    const auto done = fresh.enumerateApplicationsOfType(ApplicationType::user, [&](auto& one) {
+      haveDocuments.push_back(one && one->dataContainerURL);
+    });
+    if (!failing.wasMet()) break;
+    EXPECT_TRUE(done ? haveDocuments == std::vector{true} : done.error().isPosix(EIO)) << n;
+  }
 }
 
 }  // namespace
