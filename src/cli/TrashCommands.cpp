@@ -55,8 +55,9 @@ ExitCode runRestore(Program& program, const RestoreOptions& options) {
     const auto found = ItemArgument(*options.parent).item(*documents);
     if (!found) return program.report(found.error(), "can't find " + *options.parent);
     if (found->isTrashed) {
-      return program.report(Error::invalidParameter("parent", found->itemIdentifier),
-                            "can't restore to " + *options.parent + ", which is in the trash");
+      Error unfit = Error::invalidParameter("parent", found->itemIdentifier);
+      unfit.userInfo[std::string(errorkey::detail)] = "it is in the trash itself";
+      return program.report(unfit, "can't restore to " + *options.parent);
     }
     parent = found->itemIdentifier;
   }

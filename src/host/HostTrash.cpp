@@ -37,7 +37,9 @@ void HostTrash::restore(std::string_view identifier, const std::optional<URL>& p
     return provider_.untrashItemWithIdentifier(identifier, toParentItemIdentifier,
                                                std::move(completionHandler), {}, place);
   }
-  if (!toParentItemIdentifier) toParentItemIdentifier = origin->parentItemIdentifier;
+  if (!toParentItemIdentifier || !provider_.untrashParent(*toParentItemIdentifier)) {
+    toParentItemIdentifier = origin->parentItemIdentifier;
+  }
   provider_.untrashItemWithIdentifier(
       identifier, toParentItemIdentifier,
       [this, fileID, done = std::move(completionHandler)](auto result) {

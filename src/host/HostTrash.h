@@ -22,8 +22,8 @@ class HostTrash {
   /// moved; where that can't be, it is not moved. Errors of `ErrorDomain::store` too.
   void trash(std::string_view identifier, const std::optional<URL>& place,
              LocalVessel::ItemHandler completionHandler);
-  /// See `LocalVessel::untrashItemWithIdentifier`; without a parent, an item goes back to the one
-  /// that it had, under its own name.
+  /// See `LocalVessel::untrashItemWithIdentifier`; without a parent, or with one that is
+  /// unknown or in the trash, an item goes back to the one that it had, under its own name.
   void restore(std::string_view identifier, const std::optional<URL>& place,
                std::optional<std::string> toParentItemIdentifier,
                LocalVessel::ItemHandler completionHandler);

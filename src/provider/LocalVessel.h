@@ -125,6 +125,8 @@ class LocalVessel {
                                  ItemHandler completionHandler,
                                  std::optional<std::string> formerName = {},
                                  const std::optional<URL>& place = {});
+  /// The folder of a parent that may be given to that; nothing where it is unknown or in the trash.
+  [[nodiscard]] std::optional<URL> untrashParent(std::string_view identifier) const;
   /// Deletes for good what was trashed before the date. What has no date of its own, because
   /// another program put it there, gets the current one, and so goes one period later. The trash
   /// is walked before the call returns, on the caller's thread, which waits while many deletions
@@ -204,7 +206,6 @@ class LocalVessel {
   void setPutBackString(const URL& preTrashURL, const URL& trashedURL) const;
   [[nodiscard]] std::optional<URL> untrashDestination(
       const LocalItem& item, const std::optional<std::string>& parentIdentifier) const;
-  [[nodiscard]] std::optional<URL> providedParent(std::string_view identifier) const;
   [[nodiscard]] std::optional<URL> putBackFolder(const LocalItem& item) const;
   [[nodiscard]] std::optional<URL> appLibraryRoot(const LocalItem& item) const;
 

@@ -97,13 +97,13 @@ void LocalVessel::untrashItemWithIdentifier(
 
 std::optional<URL> LocalVessel::untrashDestination(
     const LocalItem& item, const std::optional<std::string>& parentIdentifier) const {
-  auto folder = parentIdentifier ? providedParent(*parentIdentifier) : std::nullopt;
+  auto folder = parentIdentifier ? untrashParent(*parentIdentifier) : std::nullopt;
   if (!folder) folder = putBackFolder(item);
   if (!folder) folder = appLibraryRoot(item);
   return folder;
 }
 
-std::optional<URL> LocalVessel::providedParent(std::string_view identifier) const {
+std::optional<URL> LocalVessel::untrashParent(std::string_view identifier) const {
   auto parent = _urlForItemWithPersistentIdentifier(identifier);
   if (!parent || !isInTrash(*parent)) return parent;
   logDebug([&] {

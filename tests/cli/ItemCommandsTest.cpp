@@ -265,12 +265,15 @@ TEST_F(TrashCommands, WhereThatFolderCanTakeNothingTheUserIsAsked) {
   }
   home.remove("replaced");
   home.writeFile("replaced", "a file now");
-  trash("trashed");
+  const std::string folder = trash("trashed");
   home.remove("gone");
   for (const std::string& identifier : items) {
     const Answer refused = run({"restore", identifier});
     EXPECT_EQ(refused.code, 1);
     EXPECT_THAT(refused.err, HasSubstr("say with --to where it shall go"));
+    const Answer nowhere = run({"restore", identifier, "--to", folder});
+    EXPECT_EQ(nowhere.code, 1);
+    EXPECT_THAT(nowhere.err, ::testing::EndsWith("; it is in the trash itself\n"));
     EXPECT_EQ(run({"restore", identifier, "--to", home.at("target")}).code, 0);
   }
   for (const char* file : {"target/replaced", "target/trashed", "target/gone"})
