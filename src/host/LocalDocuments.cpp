@@ -18,6 +18,18 @@ LocalVessel::ItemHandler recorded(Documents::ItemHandler handler) {
   };
 }
 
+/// For what gives an item a name or a place: it is looked at when that is done, and may not be
+/// shown there. The code alone would say that nothing had happened.
+LocalVessel::ItemHandler recordedWhenDone(Documents::ItemHandler handler) {
+  return recorded([handler = std::move(handler)](Documents::ItemResult result) {
+    if (!result && result.error().is(LocalVesselError::invalidItemIdentifier)) {
+      result.error().userInfo[std::string(errorkey::detail)] =
+          "it was done, but under that name it is not shown";
+    }
+    handler(std::move(result));
+  });
+}
+
 std::optional<URL> placeOf(const ItemTarget& item) {
   if (item.path.empty()) return {};
   return URL::fileURL(item.path);
@@ -78,23 +90,23 @@ Result<UniqueFd> LocalDocuments::openFile(std::string_view identifier, Access ac
 void LocalDocuments::importDocument(const std::string& source, const std::string& parent,
                                     ItemHandler handler) {
   provider_->vessel().importDocumentAtURL(URL::fileURL(source), parent,
-                                          recorded(std::move(handler)));
+                                          recordedWhenDone(std::move(handler)));
 }
 
 void LocalDocuments::createDirectory(const std::string& name, const std::string& parent,
                                      ItemHandler handler) {
-  provider_->vessel().createDirectoryWithName(name, parent, recorded(std::move(handler)));
+  provider_->vessel().createDirectoryWithName(name, parent, recordedWhenDone(std::move(handler)));
 }
 
 void LocalDocuments::rename(const ItemTarget& item, const std::string& name, ItemHandler handler) {
   provider_->vessel().renameItemWithIdentifier(item.itemIdentifier, name,
-                                               recorded(std::move(handler)), placeOf(item));
+                                               recordedWhenDone(std::move(handler)), placeOf(item));
 }
 
 void LocalDocuments::reparent(const ItemTarget& item, const std::string& parent,
                               const std::optional<std::string>& newName, ItemHandler handler) {
-  provider_->vessel().reparentItemWithIdentifier(item.itemIdentifier, parent, newName,
-                                                 recorded(std::move(handler)), placeOf(item));
+  provider_->vessel().reparentItemWithIdentifier(
+      item.itemIdentifier, parent, newName, recordedWhenDone(std::move(handler)), placeOf(item));
 }
 
 void LocalDocuments::remove(const ItemTarget& item, ErrorHandler handler) {
@@ -103,13 +115,14 @@ void LocalDocuments::remove(const ItemTarget& item, ErrorHandler handler) {
 }
 
 void LocalDocuments::trash(const ItemTarget& item, ItemHandler handler) {
-  provider_->trash().trash(item.itemIdentifier, placeOf(item), recorded(std::move(handler)));
+  provider_->trash().trash(item.itemIdentifier, placeOf(item),
+                           recordedWhenDone(std::move(handler)));
 }
 
 void LocalDocuments::restore(const ItemTarget& item, const std::optional<std::string>& parent,
                              ItemHandler handler) {
   provider_->trash().restore(item.itemIdentifier, placeOf(item), parent,
-                             recorded(std::move(handler)));
+                             recordedWhenDone(std::move(handler)));
 }
 
 void LocalDocuments::setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,

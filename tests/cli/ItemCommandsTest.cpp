@@ -97,6 +97,9 @@ TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
       {{"mkdir", "new", "--in", doc}, 1, "not a folder"},
       {{"mkdir", "new", "--in", home.at("nowhere")}, 3, "no such file"},
       {{"import", home.path() + "/nothing", "--in", home.at("folder")}, 3, "no such file"},
+      {{"mkdir", "Inbox", "--in", home.at("target")},
+       3,
+       "it was done, but under that name it is not shown"},
       {{"rename", "did=999", "name"}, 3, "no item has this identifier"},
       {{"mv", doc, home.at("target")}, 6, "the name is taken by " + taker},
       {{"mv", doc, "root"}, 5, "choose a folder in it"},
@@ -112,6 +115,7 @@ TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
   EXPECT_EQ(run({"tag", doc, "red", "--clear"}).code, 2);
   EXPECT_EQ(run({"mkdir", "new"}).code, 2);
   EXPECT_TRUE(exists("folder/doc.txt"));
+  EXPECT_TRUE(exists("target/Inbox"));
 }
 
 TEST_F(ItemCommands, OfSeveralItemsOneFailureDoesNotStopTheOthers) {
