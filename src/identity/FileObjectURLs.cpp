@@ -239,6 +239,8 @@ Result<std::optional<URL>> FileObjectURLs::findItem(std::string_view identifier)
 Result<std::optional<URL>> FileObjectURLs::findAgain(std::string_view identifier) const {
   const bool isDocument = identifier.starts_with("did=");
   if (!isDocument && !identifier.starts_with("fid=")) return std::nullopt;
+  // A third component makes it no identifier; said above.
+  if (identifier.find('=') != identifier.rfind('=')) return std::nullopt;
   const auto device = deviceIDWithError(platform_.manager.documentStorageURL());
   if (!device) return fail(device.error());
   const std::int64_t number = decimalPrefix(identifier.substr(4));

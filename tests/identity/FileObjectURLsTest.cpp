@@ -73,6 +73,13 @@ TEST(FileObjectURLsCanonical, BothSpellingsOfVarAreOnePlace) {
   }
 }
 
+TEST_F(FileObjectURLsTest, WhatOnlyBeginsLikeAnIdentifierIsOfNoItem) {
+  fake.volume.writeFile(fake.path("f"));
+  ASSERT_EQ(idOf("f"), "did=1");
+  for (const std::string& text : {std::string("did=1=6"), fid("f") + "=6", std::string("did=1=")})
+    EXPECT_EQ(identity.findItem(text), Result<std::optional<URL>>(std::nullopt)) << text;
+}
+
 TEST_F(FileObjectURLsTest, WhatHasNoIdentifierSaysWhy) {
   fake.volume.writeFile(fake.path("f"));
   fake.volume.makeFolder(fake.path("folder"));
