@@ -70,8 +70,6 @@ std::string_view nameOf(ResourceKey key) {
       return "documentIdentifier";
     case ResourceKey::linkCount:
       return "linkCount";
-    case ResourceKey::fileResourceIdentifier:
-      return "fileResourceIdentifier";
   }
   return {};
 }
@@ -102,8 +100,6 @@ ResourceValue resourceValue(const ResourceValues& values, ResourceKey key, std::
       return documentIDOrAbsent(values);
     case ResourceKey::linkCount:
       return Number::of(std::uint64_t{values.linkCount});
-    case ResourceKey::fileResourceIdentifier:
-      return {};
   }
   return {};
 }

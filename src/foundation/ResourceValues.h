@@ -28,7 +28,6 @@ enum class ResourceKey {
   fileIdentifier,           ///< number: the file ID
   documentIdentifier,       ///< number: the document ID, absent when none was assigned yet
   linkCount,                ///< number: how many names it has on its file system; 1 for a folder
-  fileResourceIdentifier,   ///< never stored; its name stands in one message
 };
 
 /// The key's name as messages print it ("documentIdentifier").

@@ -39,7 +39,6 @@ TEST_F(ResourceReaderTest, AbsentValuesAndOtherTypesReadAsNothingWithoutALine) {
   EXPECT_EQ(reader.number(ResourceKey::documentIdentifier, url), std::nullopt);
   EXPECT_EQ(reader.date(ResourceKey::creationDate, url), std::nullopt);
   EXPECT_EQ(reader.string(ResourceKey::typeIdentifier, url), std::nullopt);
-  EXPECT_EQ(reader.number(ResourceKey::fileResourceIdentifier, url), std::nullopt);
   EXPECT_EQ(reader.boolean(ResourceKey::isDirectory, url), true);
 
   EXPECT_EQ(reader.number(ResourceKey::name, url), std::nullopt);
