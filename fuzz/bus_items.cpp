@@ -41,11 +41,15 @@ constexpr std::array itemKeys{"itemIdentifier",
                               "vs_appContainerBundleIdentifierBytes",
                               "putBackPath",
                               "path"};
-constexpr std::array statusKeys{
-    "watcher",      "watching",     "refusal",      "needsMarks",  "foldersWatched",
-    "marksNeeded",  "marksAllowed", "marksSetting", "historyUUID", "unreadableFolders",
-    "firstEventID", "lastEventID",  "appLibraries", "leftOut",     "appLibraryVersion",
-    "home",         "stateFolder"};
+constexpr std::array statusKeys{"watcher",           "watching",
+                                "refusal",           "needsMarks",
+                                "foldersWatched",    "marksNeeded",
+                                "marksAllowed",      "marksSetting",
+                                "historyUUID",       "unreadableFolders",
+                                "firstEventID",      "lastEventID",
+                                "appLibraries",      "leftOut",
+                                "appLibraryVersion", "home",
+                                "stateFolder",       "appLibrariesFailure"};
 
 void requireSound(const std::optional<Date>& date) {
   require(!date || date->nanoseconds < 1'000'000'000);
@@ -82,6 +86,7 @@ bool areEqual(const StatusReport& a, const StatusReport& b) {
          a.historyUUID == b.historyUUID && a.firstEventID == b.firstEventID &&
          a.lastEventID == b.lastEventID && a.appLibraries == b.appLibraries &&
          a.appLibraryVersion == b.appLibraryVersion &&
+         a.appLibrariesFailure == b.appLibrariesFailure &&
          std::ranges::equal(a.leftOut, b.leftOut, isSame) && a.home == b.home &&
          a.stateFolder == b.stateFolder;
 }

@@ -25,6 +25,7 @@ struct StatusReport {
   std::uint64_t lastEventID = 0;
   std::uint64_t appLibraries = 0;
   std::uint64_t appLibraryVersion = 0;  ///< of the list of them; grows with each change of it
+  std::optional<std::string> appLibrariesFailure;  ///< why the list may not be that of now
   /// Applications whose documents are not shown for a reason that a person should know.
   struct LeftOutApplication {
     std::string identifier;  ///< empty: stands for all that there is no room to name

@@ -17,7 +17,7 @@ bool MRBAppLibraryManager::refreshFromRegistry() {
   return inBackground([&] {
     std::optional<std::vector<BundleProxy>> latest;
     const auto refreshed = refreshMainCache(platform_.applications, caches_.main, &latest);
-    isRefreshed_ = refreshed.has_value();
+    note(refreshFailure_, refreshed ? std::nullopt : std::optional(refreshed.error()));
     if (!latest) return false;
     hasLibraries_ = !latest->empty();
     latestNames_.clear();
@@ -41,13 +41,24 @@ void MRBAppLibraryManager::followLibraries(EventStreams& events) {
                                        : std::move(record.localizedName).value_or("")});
     }
     auto done = events.followLibraries(libraries, shared_.versionToken());
-    isFollowed_ = done.has_value();
+    note(followFailure_, done ? std::nullopt : std::optional(done.error()));
     if (!done) logError("can't follow the app libraries; " + done.error().description());
   });
 }
 
 bool MRBAppLibraryManager::upgradeFromMainCache(VesselChangeObserver* observer) {
   return inBackground([&] { return shared_.upgradeFromMainCache(observer); });
+}
+
+std::optional<Error> MRBAppLibraryManager::failure() const {
+  const std::lock_guard lock(mutex_);
+  return refreshFailure_ ? refreshFailure_ : followFailure_;
+}
+
+void MRBAppLibraryManager::note(std::optional<Error>& failure,
+                                const std::optional<Error>& outcome) {
+  const std::lock_guard lock(mutex_);
+  failure = outcome;
 }
 
 bool MRBAppLibraryManager::inBackground(const std::function<bool()>& work) {

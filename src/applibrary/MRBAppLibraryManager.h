@@ -1,8 +1,8 @@
 #pragma once
 
-#include <atomic>
 #include <functional>
 #include <map>
+#include <mutex>
 #include <optional>
 #include <string>
 
@@ -11,6 +11,7 @@
 #include "foundation/SerialQueue.h"
 #include "identity/AppLibraryRoots.h"
 #include "items/AppLibraryOwners.h"
+#include "mirabel/Error.h"
 #include "platform/EnumerationObservers.h"
 #include "platform/EventStreams.h"
 #include "platform/Platform.h"
@@ -37,7 +38,9 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   void followLibraries(EventStreams& events);
   /// Whether both the last refresh and the last following succeeded, or else it is time to try
   /// again after a while.
-  [[nodiscard]] bool isInStep() const { return isRefreshed_ && isFollowed_; }
+  [[nodiscard]] bool isInStep() const { return !failure(); }
+  /// Why not.
+  [[nodiscard]] std::optional<Error> failure() const;
 
   [[nodiscard]] LocalAppLibraryManager& shared() { return shared_; }
   [[nodiscard]] AppLibraryCaches& caches() { return caches_; }
@@ -52,6 +55,7 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
 
  private:
   bool inBackground(const std::function<bool()>& work);
+  void note(std::optional<Error>& failure, const std::optional<Error>& outcome);
 
   Platform platform_;
   AppLibraryCaches caches_;
@@ -59,8 +63,9 @@ class MRBAppLibraryManager final : public AppLibraryRoots, public AppLibraryOwne
   // What the registry told last; on the background queue.
   bool hasLibraries_ = true;
   std::map<std::string, std::string> latestNames_;  // by path of the container
-  std::atomic<bool> isRefreshed_ = true;
-  std::atomic<bool> isFollowed_ = true;
+  mutable std::mutex mutex_;  // of the failures: who asks for them does not wait for the queue
+  std::optional<Error> refreshFailure_;
+  std::optional<Error> followFailure_;
   SerialQueue backgroundQueue_{"mirabel.app-library.background"};
 };
 

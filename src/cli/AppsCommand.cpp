@@ -40,6 +40,10 @@ ExitCode runApps(Program& program) {
   if (documents == nullptr) return program.exitCode();
   const auto libraries = documents->appLibraries();
   if (!libraries) return program.report(libraries.error(), "can't list the app libraries");
+  if (const auto status = documents->status(); status && status->appLibrariesFailure) {
+    program.note("the list of app libraries can't be brought up to date; " +
+                 *status->appLibrariesFailure);
+  }
   if (!program.options().json) {
     printRows(program, *libraries);
     return ExitCode::done;

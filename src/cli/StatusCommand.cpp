@@ -34,6 +34,9 @@ void printJSON(const Program& program, const StatusReport& status) {
   object["lastEventID"] = std::to_string(status.lastEventID);
   object["appLibraries"] = std::to_string(status.appLibraries);
   object["appLibraryVersion"] = std::to_string(status.appLibraryVersion);
+  if (status.appLibrariesFailure) {
+    object["appLibrariesFailure"] = utf8Lossy(*status.appLibrariesFailure);
+  }
   setText(object, "stateFolder", status.stateFolder);
   program.out() << object.dump() << '\n';
 }
@@ -53,6 +56,9 @@ void printRows(const Program& program, const StatusReport& status) {
                 : "none yet");
   row("app libraries", std::to_string(status.appLibraries) + ", version " +
                            std::to_string(status.appLibraryVersion));
+  if (status.appLibrariesFailure) {
+    row("", "not up to date: " + printable(*status.appLibrariesFailure));
+  }
   row("state", printable(status.stateFolder));
 }
 

@@ -64,6 +64,8 @@ Result<StatusReport> statusOf(const HostedProvider& provider) {
   const LocalAppLibraryManager& libraries = provider.libraries().shared();
   report.appLibraries = libraries.rootURLsForAppLibraries()->size();
   report.appLibraryVersion = libraries.versionToken();
+  if (const auto failure = provider.libraries().failure())
+    report.appLibrariesFailure = explanation(*failure);
   for (const LeftOut& leftOut : platform.applications().leftOut())
     report.leftOut.push_back({leftOut.identifier, leftOut.reason});
   report.home = platform.home();

@@ -47,6 +47,7 @@ constexpr std::array statusProperties{
     ofStatus<&StatusReport::lastEventID>("lastEventID", "t"),
     ofStatus<&StatusReport::appLibraries>("appLibraries", "t"),
     ofStatus<&StatusReport::appLibraryVersion>("appLibraryVersion", "t"),
+    ofStatus<&StatusReport::appLibrariesFailure>("appLibrariesFailure", "s"),
     Property<StatusReport>{"leftOut", "a(ss)", readLeftOut},
     ofStatus<&StatusReport::home>("home", "ay"),
     ofStatus<&StatusReport::stateFolder>("stateFolder", "ay"),
@@ -81,6 +82,9 @@ void write(sdbus::Message& message, const StatusReport& status) {
   writer.add("lastEventID", "t", status.lastEventID);
   writer.add("appLibraries", "t", status.appLibraries);
   writer.add("appLibraryVersion", "t", status.appLibraryVersion);
+  if (status.appLibrariesFailure) {
+    writer.addText("appLibrariesFailure", *status.appLibrariesFailure);
+  }
   writer.addWritten("leftOut", "a(ss)",
                     [&](sdbus::Message& to) { writeLeftOut(to, status.leftOut); });
   writer.addBytes("home", status.home);

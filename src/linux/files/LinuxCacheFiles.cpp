@@ -44,7 +44,7 @@ Result<std::optional<Data>> readAt(int folder, const std::string& name, std::siz
 /// Locked until it is closed. Processes hold it for no longer than one file is written.
 Result<UniqueFd> lockedFolder(const std::string& path) {
   UniqueFd folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!folder) return fail(Error::posix(errno));
+  if (!folder) return fail(Error::posix(errno, path));
   while (::flock(folder.get(), LOCK_EX) != 0)
     if (errno != EINTR) return fail(Error::posix(errno));
   return folder;
@@ -73,14 +73,16 @@ Result<std::optional<Data>> LinuxCacheFiles::read(const URL& file, std::size_t l
 Result<void> LinuxCacheFiles::createDirectory(const URL& folder) {
   std::error_code error;
   std::filesystem::create_directories(folder.path(), error);
-  if (error) return fail(Error::posix(error.value()));
+  if (error) return fail(Error::posix(error.value(), folder.path()));
   return {};
 }
 
 Result<void> LinuxCacheFiles::replace(const URL& file, const Data& bytes) {
   const auto folder = lockedFolder(file.deletingLastPathComponent().path());
   if (!folder) return fail(folder.error());
-  return replaceFile(folder->get(), std::string(file.lastPathComponent()), bytes);
+  auto replaced = replaceFile(folder->get(), std::string(file.lastPathComponent()), bytes);
+  if (!replaced) replaced.error().userInfo.try_emplace(std::string(errorkey::detail), file.path());
+  return replaced;
 }
 
 Result<std::uint64_t> LinuxCacheFiles::claimVersion(std::string_view name, std::uint64_t after) {

@@ -151,6 +151,7 @@ TEST_F(BusItems, StatusAndTrashFindingsComeBackAsTheyWere) {
                             6,
                             7,
                             8,
+                            "can't be kept",
                             {{"org.example.One", "reason"}, {"", "there are more"}},
                             "/caf\xe9",
                             "/caf\xe9/state"};
@@ -166,7 +167,7 @@ TEST_F(BusItems, StatusAndTrashFindingsComeBackAsTheyWere) {
     return std::tie(of.watcher, of.watching, of.refusal, of.needsMarks, of.foldersWatched,
                     of.marksNeeded, of.marksAllowed, of.marksSetting, of.unreadableFolders,
                     of.historyUUID.bytes, of.firstEventID, of.lastEventID, of.appLibraries,
-                    of.appLibraryVersion, of.home, of.stateFolder);
+                    of.appLibraryVersion, of.appLibrariesFailure, of.home, of.stateFolder);
   };
   EXPECT_EQ(fields(read), fields(status));
   ASSERT_EQ(read.leftOut.size(), 2u);
