@@ -124,6 +124,8 @@ Result<void> TreeScan::giveUp(const Folder& folder, const Error& error) {
   if (watcher_ != nullptr) watcher_->forget(folder.id);
   if (error.domain != ErrorDomain::posix) return fail(error);
   const auto entry = error.userInfo.find(errorkey::detail);
+  // Of something else, such as a file of the state.
+  if (entry != error.userInfo.end() && entry->second.starts_with('/')) return fail(error);
   const std::string name = entry == error.userInfo.end() ? "" : "/" + entry->second;
   return fail(Error::posix(static_cast<int>(error.code), "\"" + folder.path + name + "\""));
 }
