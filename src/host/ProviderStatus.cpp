@@ -29,6 +29,9 @@ std::string refusalText(const FollowStatus& following) {
     return "it needs more marks than are allowed; raise \"" + following.limits.setting +
            "\" with sysctl";
   }
+  if (following.refusal->isPosix(EMFILE)) {
+    return "there are as many watchers as are allowed; raise " + std::string(watcherSettings);
+  }
   return explanation(*following.refusal);
 }
 

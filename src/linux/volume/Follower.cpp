@@ -316,10 +316,12 @@ void Follower::giveUpWatching(const Error& error) {
     text += ": that needs " + std::to_string(now.marksNeeded) + " marks, and " +
             std::to_string(*now.limits.allowed) + " are allowed; raise \"" + now.limits.setting +
             "\" with sysctl";
+  } else if (error.isPosix(EMFILE)) {
+    text += ": there are as many watchers as are allowed; raise " + std::string(watcherSettings);
   } else {
     text += " (" + error.description() + ")";
   }
-  options_.notice(text + "; until then every question is answered by a look at all files");
+  options_.notice(text + "; meanwhile every question is answered by a look at all files");
 }
 
 FollowStatus Follower::status() const {
