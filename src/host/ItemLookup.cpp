@@ -81,6 +81,10 @@ Result<std::shared_ptr<LocalItem>> ItemLookup::byIdentifierAgain(
   if (!values && isRoot && saysAbsent(values.error())) {
     return fail(Error::posix(ENOENT, "the document storage \"" + storage() + "\""));
   }
+  // Other errors have a detail that is to stand, or need none.
+  if (!values && isRoot && (values.error().isPosix(EACCES) || values.error().isPosix(EIO))) {
+    return fail(withDetail(values.error(), "the document storage \"" + storage() + "\""));
+  }
   if (!values && (isRoot || !saysOutOfReach(values.error()))) return fail(values.error());
   auto item = provider_.vessel().itemForIdentifier(identifier);
   if (item && isShown(**item)) return item;

@@ -113,7 +113,12 @@ Result<HomeLayout> HomeLayout::resolve(const Choices& choices) {
   const std::filesystem::path state = choices.stateFolder.value_or(
       folderOf("XDG_STATE_HOME", *home + "/.local/state", usesEnvironment) + "/mirabel");
   auto above = resolvedPath(state.parent_path());
-  if (!above) return fail(above.error());
+  if (!above) {
+    const int code = static_cast<int>(above.error().code);
+    const std::string why = code == ENOTDIR ? ": something on the way is not a folder" : "";
+    return fail(
+        Error::posix(code, "the state folder " + inQuotes(state) + " cannot be reached" + why));
+  }
   return HomeLayout{std::move(*home), std::move(*documents),
                     std::filesystem::path(*above) / state.filename(),
                     std::move(applicationSupport)};
