@@ -2,33 +2,29 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <map>
+#include <memory>
 #include <nlohmann/json.hpp>
 #include <ostream>
-#include <system_error>
+#include <sys/statvfs.h>
+#include <unistd.h>
+#include <utility>
 #include <vector>
 
 #include "cli/Commands.h"
+#include "cli/Finding.h"
 #include "cli/ItemJSON.h"
 #include "cli/Printing.h"
+#include "cli/VolumeFindings.h"
 #include "host/ErrorText.h"
 #include "host/bus/RemoteDocuments.h"
+#include "linux/apps/ApplicationDirectories.h"
 #include "linux/files/HomeLayout.h"
 #include "linux/kernel/LongPath.h"
-#include "linux/volume/FollowStatus.h"
-#include "linux/volume/VolumeAbilities.h"
+#include "linux/kernel/ObjectStatus.h"
+#include "linux/kernel/RawDirectory.h"
 
 namespace mirabel {
 namespace {
-
-enum class Health { good, limited, bad };
-
-/// One line: what was looked at, how it is, and how to mend it where it can be mended.
-struct Finding {
-  std::string subject;
-  Health health;
-  std::string text;
-  std::string remedy;
-};
 
 std::string_view nameOf(Health health) {
   switch (health) {
@@ -42,132 +38,128 @@ std::string_view nameOf(Health health) {
   return "";
 }
 
-Finding attributesFinding(const Result<void>& tried) {
-  const std::string subject = "extended attributes";
-  if (tried) return {subject, Health::good, "the volume keeps user attributes", ""};
-  const Error& error = tried.error();
-  if (error.isPosix(EOPNOTSUPP) || error.isPosix(EPERM)) {
-    return {subject, Health::bad,
-            "the volume keeps no user attributes: tags, favourites, dates of use and where a "
-            "trashed item came from can't be kept; identities last all the same",
-            "use a file system that has them, and mount it without \"nouser_xattr\""};
-  }
-  return {subject, Health::limited, "could not be tried: " + explanation(error),
-          "make the document storage writable"};
+bool isForbidden(const Error& error) {
+  return error.isPosix(EACCES) || error.isPosix(EPERM);
 }
 
-Finding birthTimeFinding(bool has) {
-  const std::string subject = "birth times";
-  if (has) return {subject, Health::good, "the volume tells when a file was made", ""};
-  return {subject, Health::limited, "the volume does not tell when a file was made",
-          "creation dates are absent, and every question about an item takes a look at the disk"};
+bool isFull(const Error& error) {
+  return error.isPosix(ENOSPC) || error.isPosix(EDQUOT);
 }
 
-Finding handleFinding(bool has, bool hasBirthTimes) {
-  const std::string subject = "file handles";
-  if (has) {
-    return {subject, Health::good,
-            "the volume tells a new file from a deleted one with the same inode number", ""};
-  }
-  return {subject, hasBirthTimes ? Health::limited : Health::bad,
-          "the volume gives no file handles: a new file with a used inode number is recognised by "
-          "its times alone",
-          "keep documents on ext4, xfs, btrfs or tmpfs"};
+/// Of a home that can't be made out.
+std::string remedyForLayout(const Error& error) {
+  if (isForbidden(error)) return "run it as the user whose home that is, or have it opened to you";
+  if (error.isPosix(EINVAL)) return "have the documents lie in another home";
+  return "put a folder there, or name another home with --home";
 }
 
-Finding uuidFinding(bool has) {
-  const std::string subject = "volume UUID";
-  if (has) return {subject, Health::good, "the volume has one of its own", ""};
-  return {subject, Health::limited,
-          "the volume has none, or the kernel does not tell it (6.9 and later do); one is made "
-          "from the file system's ID",
-          ""};
-}
-
-Result<FollowStatus> tryWatching(const std::string& folder) {
-  auto opened = openLongPath(AT_FDCWD, folder, O_PATH | O_DIRECTORY);
+Result<void> tryReading(const std::string& folder) {
+  auto opened = openLongPath(AT_FDCWD, folder, O_RDONLY | O_DIRECTORY);
   if (!opened) return fail(opened.error());
-  auto watcher = makeWatcher();
-  if (!watcher) return fail(watcher.error());
-  FollowStatus status;
-  status.watcher = (*watcher)->kind();
-  status.limits = WatchLimits::of((*watcher)->kind());
-  auto watched = (*watcher)->watch(opened->get(), 1);
-  if (!watched) status.refusal = watched.error();
-  return status;
+  RawDirectory entries(std::move(*opened));
+  if (auto entry = entries.next(); !entry) return fail(entry.error());
+  // What can be listed but not entered is no use either.
+  if (auto entered = statusAt(entries.descriptor(), "."); !entered) return fail(entered.error());
+  return {};
 }
 
-// The kernel has limits of its own for whoever watches.
-std::string remedyForWatching(const Error& error) {
-  if (!error.isPosix(EMFILE)) return "";
-  return "raise \"fs.fanotify.max_user_groups\" and \"fs.inotify.max_user_instances\" with sysctl, "
-         "those of \"user.\" where that is a container's, or end other programs that watch";
+Finding documentsFinding(const HomeLayout& layout) {
+  const std::string subject = "documents";
+  const auto readable = tryReading(layout.documents);
+  if (readable) return {subject, Health::good, layout.documents, ""};
+  const Error& error = readable.error();
+  std::string remedy = "mount it, or mend the disk that it lies on";
+  if (error.isPosix(ENOENT)) remedy = "make the folder";
+  if (isForbidden(error)) remedy = "let yourself read and enter it, as with chmod u+rwx";
+  return {subject, Health::bad,
+          layout.documents + ": " + explanation(error) + "; there is nothing to present", remedy};
 }
 
-// One folder is tried. How many there are is not counted for this: "mirabel status" knows.
-Finding watchingFinding(const std::string& folder) {
-  const std::string subject = "watching";
-  const std::string without = ": every question about changes is answered by a look at all files";
-  const auto tried = tryWatching(folder);
-  if (!tried) {
-    return {subject, Health::limited,
-            "folders can't be watched (" + explanation(tried.error()) + ")" + without,
-            remedyForWatching(tried.error())};
-  }
-  std::string limit;
-  if (tried->limits.allowed) {
-    limit = std::to_string(*tried->limits.allowed) + " folders at most, by \"" +
-            tried->limits.setting + "\"";
-  }
-  if (!tried->refusal) {
-    return {subject, Health::good,
-            std::string(nameOf(*tried->watcher)) + (limit.empty() ? "" : "; ") + limit, ""};
-  }
-  if (tried->refusal->isPosix(ENOSPC) && !limit.empty()) {
-    return {subject, Health::limited, "no further folder can be watched; " + limit + without,
-            "raise \"" + tried->limits.setting + "\" with sysctl"};
-  }
-  return {subject, Health::limited,
-          "folders can't be watched there (" + explanation(*tried->refusal) + ")" + without, ""};
-}
+/// What the file system of the state has left.
+struct Room {
+  bool isTold = false;
+  bool hasFiles = true;  ///< whether another file can be made
+  std::uint64_t bytes = 0;
+};
 
-Finding stateFinding(const Result<void>& opened, const HomeLayout& layout) {
-  const std::string subject = "state";
-  if (opened) return {subject, Health::good, layout.stateFolder, ""};
-  const std::string text = explanation(opened.error());
-  if (opened.error().isPosix(EBUSY)) return {subject, Health::limited, text, ""};
-  if (opened.error().isPosix(EROFS)) {
-    return {subject, Health::bad, text,
-            "nothing can be presented until the home can be written to, or XDG_STATE_HOME names a "
-            "folder that can"};
+Result<Room> roomFor(std::string path) {
+  struct statvfs found {};
+  // Where the folder is still to be made, what it is made in has the room.
+  while (::statvfs(path.c_str(), &found) != 0) {
+    if (errno != ENOENT || path == "/") return fail(Error::posix(errno));
+    path = std::filesystem::path(path).parent_path();
   }
-  return {subject, Health::bad, layout.stateFolder + ": " + text,
-          "identities can't be kept until this is mended"};
-}
-
-Finding changesFinding(const Error& error, const HomeLayout& layout) {
-  return {"changes", Health::bad, layout.documents + ": " + explanation(error),
-          "what has changed can't be told until this is mended"};
+  return Room{found.f_blocks > 0, found.f_files == 0 || found.f_favail > 0,
+              std::uint64_t{found.f_bavail} * found.f_frsize};
 }
 
 // The log of the volume's database may grow to 16 MiB before it is moved into it.
-Finding roomFinding(const HomeLayout& layout) {
-  constexpr std::uintmax_t enough = 64 << 20;
-  constexpr std::uintmax_t least = 1 << 20;
+Finding roomFinding(const Result<Room>& room) {
+  constexpr std::uint64_t enough = 64 << 20;
+  constexpr std::uint64_t least = 1 << 20;
   const std::string subject = "room";
-  std::error_code failure;
-  const auto space = std::filesystem::space(layout.stateFolder, failure);
-  if (failure) return {subject, Health::limited, "can't be told: " + failure.message(), ""};
-  const std::string text = humanSize(space.available) + " where the state is kept";
-  if (space.available >= enough) return {subject, Health::good, text, ""};
-  return {
-      subject, space.available < least ? Health::bad : Health::limited,
-      text + ": what is known is answered; what is new may not be remembered, and then is refused",
-      "make room there"};
+  const std::string where = " where the state is kept";
+  const std::string without =
+      ": what is known is answered; what is new may not be remembered, and then is refused";
+  if (!room) {
+    return {subject, Health::limited, "can't be told: " + explanation(room.error()),
+            "let yourself reach the folder of the state"};
+  }
+  if (!room->hasFiles) {
+    return {subject, Health::bad, "no further file can be made" + where + without,
+            "delete files there, small ones too: it is their number that is used up"};
+  }
+  if (!room->isTold) return {subject, Health::good, "the file system does not tell" + where, ""};
+  const std::string text = humanSize(room->bytes) + where;
+  if (room->bytes >= enough) return {subject, Health::good, text, ""};
+  return {subject, room->bytes < least ? Health::bad : Health::limited, text + without,
+          "make room there"};
 }
 
-std::string plural(std::size_t count, const std::string& one, const std::string& several) {
-  return std::to_string(count) + " " + (count == 1 ? one : several);
+/// For the folder that the error names.
+std::string remedyForState(const Error& error) {
+  if (error.isPosix(EACCES)) {
+    return "let yourself write there, or have XDG_STATE_HOME name a folder where you may";
+  }
+  if (error.isPosix(EROFS)) {
+    return "mount it for writing, or have XDG_STATE_HOME name a folder that can be written to";
+  }
+  if (isFull(error)) return "see \"room\"";
+  if (isForbidden(error)) return "have a folder of your own in its place";
+  if (error.domain == ErrorDomain::store) {
+    return "move the folder of the state away; identities then begin anew";
+  }
+  return "mend the disk, or have XDG_STATE_HOME name a folder elsewhere";
+}
+
+/// The path, and why, which mostly names a path itself.
+std::string withPath(const std::string& path, const Error& error) {
+  const std::string text = explanation(error);
+  return text.find('/') == std::string::npos ? path + ": " + text : text;
+}
+
+Finding stateFinding(const Error& error, const HomeLayout& layout, bool hasFiles) {
+  const std::string subject = "state";
+  if (error.isPosix(EBUSY)) {
+    return {subject, Health::limited,
+            layout.stateFolder +
+                ": another process is using it, so that what it holds was not "
+                "examined; other commands wait too",
+            "try again when that is done, or wait longer with --timeout SECONDS"};
+  }
+  const std::string text = isFull(error) && !hasFiles
+                               ? layout.stateFolder + ": no further file can be made"
+                               : withPath(layout.stateFolder, error);
+  return {subject, Health::bad, text + "; identities can't be kept, and nothing can be presented",
+          remedyForState(error)};
+}
+
+Finding changesFinding(const Error& error, const HomeLayout& layout) {
+  std::string remedy = "try again; else mend the disk";
+  if (isForbidden(error)) remedy = "let yourself read what it names";
+  if (isFull(error)) remedy = "see \"room\"";
+  return {"changes", Health::bad,
+          withPath(layout.documents, error) + "; what has changed can't be told", remedy};
 }
 
 /// What was left out for the same reason, in one line.
@@ -183,11 +175,49 @@ struct LeftOutKind {
   }
 };
 
-void addApplicationFindings(const StatusReport& status, std::vector<Finding>& findings) {
-  findings.push_back({"app libraries", Health::good,
-                      plural(status.appLibraries, "application shows its documents",
-                             "applications show their documents"),
-                      ""});
+Finding appLibrariesFinding(const StatusReport& status, const HomeLayout& layout) {
+  const std::string subject = "app libraries";
+  const std::string shown = counted(status.appLibraries, "application shows its documents",
+                                    "applications show their documents");
+  if (!status.appLibrariesFailure) return {subject, Health::good, shown, ""};
+  return {subject, Health::bad,
+          "the list of them can't be brought up to date (" + *status.appLibrariesFailure +
+              "), and is that of before: " + shown,
+          "let yourself write to " + layout.applicationSupport +
+              "/Mirabel, where it is kept, and make room there"};
+}
+
+// A directory of entries that is closed to the user counts as empty.
+void addClosedDirectories(const HomeLayout& layout, ApplicationDirectories::Reach reach,
+                          std::vector<Finding>& findings) {
+  const auto directories = ApplicationDirectories::of(layout.home, reach);
+  std::vector<std::string> all = directories.user;
+  all.insert(all.end(), directories.system.begin(), directories.system.end());
+  all.push_back(layout.home + "/.var/app");
+  for (const std::string& directory : all) {
+    const bool isClosed =
+        ::faccessat(AT_FDCWD, directory.c_str(), R_OK | X_OK, AT_EACCESS) != 0 && errno == EACCES;
+    if (!isClosed) continue;
+    findings.push_back({"applications", Health::limited,
+                        directory + ": permission denied; what it would tell is left out",
+                        "let yourself read and enter it"});
+  }
+}
+
+void addUnreadableFolders(const StatusReport& status, const HomeLayout& layout,
+                          std::vector<Finding>& findings) {
+  if (status.unreadableFolders == 0) return;
+  findings.push_back({"folders", Health::limited,
+                      counted(status.unreadableFolders, "folder", "folders") +
+                          " can't be read: what lies in there is not shown",
+                      "find " + layout.documents +
+                          " -type d ! -readable -prune -print names those "
+                          "of the documents"});
+}
+
+void addApplicationFindings(const StatusReport& status, const HomeLayout& layout,
+                            std::vector<Finding>& findings) {
+  findings.push_back(appLibrariesFinding(status, layout));
   std::map<std::string, LeftOutKind> kinds;
   for (const auto& leftOut : status.leftOut)
     kinds[leftOut.reason].add(leftOut.identifier);
@@ -220,40 +250,42 @@ Result<std::unique_ptr<Documents>> openedBy(const Program& program) {
                         [&](std::string_view text) { program.note(text); }});
 }
 
-void addStateFindings(const Program& program, const HomeLayout& layout,
+/// What is told by whoever has the state.
+void addStateFindings(const Result<std::unique_ptr<Documents>>& documents,
+                      const Result<StatusReport>& status, const HomeLayout& layout,
                       std::vector<Finding>& findings) {
-  const auto documents = openedBy(program);
-  findings.push_back(stateFinding(documents ? Result<void>() : fail(documents.error()), layout));
+  const auto room = roomFor(layout.stateFolder);
+  if (documents) {
+    findings.push_back({"state", Health::good, layout.stateFolder, ""});
+  } else {
+    findings.push_back(stateFinding(documents.error(), layout, !room || room->hasFiles));
+  }
+  findings.push_back(roomFinding(room));
   if (!documents) return;
-  findings.push_back(roomFinding(layout));
-  const auto status = (*documents)->status();
   if (!status) return findings.push_back(changesFinding(status.error(), layout));
-  addApplicationFindings(*status, findings);
+  addUnreadableFolders(*status, layout, findings);
+  addApplicationFindings(*status, layout, findings);
 }
 
 std::vector<Finding> examine(Program& program, const HomeLayout& layout) {
   std::vector<Finding> findings;
   findings.push_back({"home", Health::good, layout.home, ""});
-  auto abilities = volumeAbilities(layout.documents);
-  const std::string* volume = &layout.documents;
-  if (!abilities) {
-    findings.push_back({"documents", Health::bad,
-                        layout.documents + ": " + explanation(abilities.error()),
-                        "make the folder; until then there is nothing to present"});
-    volume = &layout.home;
-    abilities = volumeAbilities(*volume);
-  } else {
-    findings.push_back({"documents", Health::good, layout.documents, ""});
-  }
-  if (abilities) {
-    findings.push_back(attributesFinding(abilities->userAttributes));
-    findings.push_back(birthTimeFinding(abilities->hasBirthTimes));
-    findings.push_back(handleFinding(abilities->hasHandles, abilities->hasBirthTimes));
-    findings.push_back(uuidFinding(abilities->hasUUID));
-    findings.push_back(watchingFinding(*volume));
-  }
+  findings.push_back(documentsFinding(layout));
+  const bool isThere = ::access(layout.documents.c_str(), F_OK) == 0;
+  const std::string& volume = isThere ? layout.documents : layout.home;
+  for (Finding& finding : volumeFindings(volume))
+    findings.push_back(std::move(finding));
+  const auto documents = openedBy(program);
+  const auto status =
+      documents ? (*documents)->status() : Result<StatusReport>(fail(documents.error()));
+  findings.push_back(watchingFinding(volume, status ? &*status : nullptr));
   findings.push_back(serviceFinding(layout));
-  addStateFindings(program, layout, findings);
+  addStateFindings(documents, status, layout, findings);
+  const bool isGiven = program.options().home.has_value();
+  addClosedDirectories(layout,
+                       isGiven ? ApplicationDirectories::Reach::homeAlone
+                               : ApplicationDirectories::Reach::wholeMachine,
+                       findings);
   return findings;
 }
 
@@ -261,14 +293,14 @@ void print(Program& program, const Finding& finding) {
   if (program.options().json) {
     nlohmann::json line = {{"subject", finding.subject}, {"health", nameOf(finding.health)}};
     setText(line, "text", finding.text);
-    if (!finding.remedy.empty()) line["remedy"] = finding.remedy;
+    if (!finding.remedy.empty()) setText(line, "remedy", finding.remedy);
     program.out() << line.dump() << '\n';
     return;
   }
   std::string label(nameOf(finding.health));
   label.resize(9, ' ');
   program.out() << label << finding.subject << ": " << printable(finding.text);
-  if (!finding.remedy.empty()) program.out() << " (" << finding.remedy << ")";
+  if (!finding.remedy.empty()) program.out() << " (" << printable(finding.remedy) << ")";
   program.out() << '\n';
 }
 
@@ -279,7 +311,8 @@ ExitCode runDoctor(Program& program) {
   choices.home = program.options().home;
   auto layout = HomeLayout::resolve(choices);
   if (!layout) {
-    static_cast<void>(program.report(layout.error(), "can't examine the home"));
+    const Error& error = layout.error();
+    print(program, {"home", Health::bad, explanation(error), remedyForLayout(error)});
     return ExitCode::failed;
   }
   ExitCode result = ExitCode::done;

@@ -125,6 +125,10 @@ std::string humanSize(std::uint64_t bytes) {
   return text.data();
 }
 
+std::string counted(std::uint64_t count, std::string_view one, std::string_view several) {
+  return std::to_string(count) + " " + std::string(count == 1 ? one : several);
+}
+
 std::string humanDate(const Date& date) {
   const std::time_t seconds = date.seconds;
   std::tm local{};

@@ -20,6 +20,9 @@ namespace mirabel {
 
 /// "812 B", "14.2 kB", "3.0 GB": powers of a thousand.
 [[nodiscard]] std::string humanSize(std::uint64_t bytes);
+/// "1 folder", "2 folders".
+[[nodiscard]] std::string counted(std::uint64_t count, std::string_view one,
+                                  std::string_view several);
 /// "2026-11-21 09:30" in the local time zone.
 [[nodiscard]] std::string humanDate(const Date& date);
 

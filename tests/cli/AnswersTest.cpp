@@ -1,10 +1,13 @@
+#include <filesystem>
 #include <set>
 
 #include "cli/CommandLineFixture.h"
+#include "support/OrdinaryUser.h"
 
 namespace mirabel::testing {
 namespace {
 
+namespace fs = std::filesystem;
 using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
 using Answers = CommandLineFixture;
@@ -101,6 +104,27 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
   EXPECT_EQ(subjects, (std::set<std::string>{
                           "home", "documents", "extended attributes", "birth times", "file handles",
                           "volume UUID", "watching", "service", "state", "room", "app libraries"}));
+  home.makeFolder("closed");
+  home.setMode("closed", 0);
+  const std::string data = home.path() + "/.local/share";
+  fs::create_directories(data + "/applications");
+  if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
+  fs::permissions(data + "/applications", fs::perms::none);
+  {
+    const OrdinaryUser user;
+    const Answer closed = run({"doctor"});
+    EXPECT_EQ(closed.code, 0) << closed.out;
+    EXPECT_THAT(closed.out, HasSubstr("limited  folders: 1 folder can't be read"));
+    EXPECT_THAT(closed.out, HasSubstr("limited  applications: " + data + "/applications: "));
+    home.setMode("", 0);
+    const Answer unread = run({"doctor"});
+    EXPECT_EQ(unread.code, 1);
+    EXPECT_THAT(unread.out, HasSubstr("missing  documents: " + home.documents() +
+                                      ": permission denied; there is nothing to present (let "));
+    expectFailure(run({"ls"}), 5, "the document storage \"" + home.documents() + "\": permission");
+    home.setMode("", 0700);
+  }
+  fs::permissions(data + "/applications", fs::perms::owner_all);
   home.remove("");
   const Answer missing = run({"doctor"});
   EXPECT_EQ(missing.code, 1);

@@ -5,6 +5,7 @@
 
 #include "cli/CommandLineFixture.h"
 #include "cli/InstalledApps.h"
+#include "support/OrdinaryUser.h"
 
 namespace mirabel::testing {
 namespace {
@@ -184,6 +185,23 @@ TEST_F(Apps, HaveTheirDocumentsPutBackThoughNothingIsNotedOnThem) {
     EXPECT_EQ(::removexattr(inDraw(".Trash/sketch.txt").c_str(), name), 0);
   EXPECT_EQ(done({"restore", inDraw(".Trash/sketch.txt")}).value("path", ""),
             inDraw("Old/sketch.txt"));
+}
+
+TEST_F(Apps, WhoseListCannotBeKeptAreNotPassedOverInSilence) {
+  if (OrdinaryUser::isRoot()) home.giveTo(OrdinaryUser::substitute);
+  const std::string data = home.path() + "/.local/share";
+  const OrdinaryUser user;
+  fs::permissions(data, fs::perms::owner_read | fs::perms::owner_exec);
+  const Answer listed = run({"apps"});
+  EXPECT_THAT(listed.err, HasSubstr("can't be brought up to date; " + data + "/Mirabel: perm"));
+  const Answer doctor = run({"doctor"});
+  EXPECT_EQ(doctor.code, 1);
+  EXPECT_THAT(doctor.out, HasSubstr("missing  app libraries: the list of them can't be brought "));
+  EXPECT_THAT(doctor.out, HasSubstr("(let yourself write to " + data + "/Mirabel"));
+  fs::permissions(data, fs::perms::owner_all);
+  const Answer mended = run({"apps"});
+  EXPECT_THAT(mended.out, HasSubstr("#" + draw));
+  EXPECT_EQ(mended.err, "");
 }
 
 TEST_F(Apps, ThatAreLeftOutAreSaidWhyOncePerReason) {

@@ -10,6 +10,7 @@ namespace {
 
 namespace fs = std::filesystem;
 using ::testing::HasSubstr;
+using ::testing::MatchesRegex;
 
 class BadInput : public CommandLineFixture {
  protected:
@@ -31,10 +32,12 @@ TEST_F(BadInput, AHomeThatIsNoneIsRefused) {
       {home.at("inner"), "lies below another folder named \"Documents\""},
       {"", "the home folder \"\""}};
   for (const auto& [path, message] : cases) {
-    for (const char* command : {"ls", "doctor"}) {
-      const Answer answer = shell("\"$mirabel\" --home '" + path + "' " + command);
-      expectFailure(answer, 1, message);
-    }
+    const std::string onThat = "\"$mirabel\" --home '" + path + "' ";
+    expectFailure(shell(onThat + "ls"), 1, message);
+    const Answer doctor = shell(onThat + "doctor");
+    EXPECT_EQ(doctor.code, 1);
+    EXPECT_THAT(doctor.out, MatchesRegex("missing  home: .* \\(.*\\)\n"));
+    EXPECT_THAT(doctor.out, HasSubstr(message));
   }
   EXPECT_EQ(shell("env -u HOME \"$mirabel\" --home \"$home\" ls").code, 0);
   EXPECT_FALSE(fs::exists(home.at("inner/.local")));

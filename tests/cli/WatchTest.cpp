@@ -248,6 +248,8 @@ TEST_F(WatchWithFewMarks, ChangesAreRightAndTheLimitIsToldOnce) {
   const Batch object = runLimited({"--json", "status"}).json();
   EXPECT_FALSE(object.contains("watcher"));
   EXPECT_THAT(object.at("refusal").get<std::string>(), HasSubstr("raise \"user.max_"));
+  EXPECT_THAT(runLimited({"doctor"}).out,
+              HasSubstr("limited  watching: 51 folders are there; 10 folders at most, by \"user."));
 }
 
 TEST_F(WatchWithFewMarks, ChangesAreToldAsTheyCome) {

@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <fcntl.h>
+#include <string>
 #include <sys/xattr.h>
 
 #include "linux/kernel/LongPath.h"
@@ -11,11 +12,22 @@
 namespace mirabel {
 namespace {
 
+constexpr const char* attribute = "user.com.norvane.check";
+
+Result<void> askForUserAttribute(int folder) {
+  const std::string path = "/proc/self/fd/" + std::to_string(folder);
+  const bool isKept = ::getxattr(path.c_str(), attribute, nullptr, 0) >= 0 || errno == ENODATA;
+  if (!isKept) return fail(Error::posix(errno));
+  return {};
+}
+
 Result<void> tryUserAttributes(int folder) {
   // A file without a name: nobody sees it, and it is gone with the descriptor.
   const UniqueFd file(::openat(folder, ".", O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
+  // Not every file system has those; what asking for an attribute is answered tells as much.
+  if (!file && errno == EOPNOTSUPP) return askForUserAttribute(folder);
   if (!file) return fail(Error::posix(errno));
-  if (::fsetxattr(file.get(), "user.com.norvane.check", "x", 1, 0) != 0) {
+  if (::fsetxattr(file.get(), attribute, "x", 1, 0) != 0) {
     return fail(Error::posix(errno));
   }
   return {};
