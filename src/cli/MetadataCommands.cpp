@@ -1,6 +1,9 @@
+#include <algorithm>
 #include <charconv>
 #include <nlohmann/json.hpp>
+#include <optional>
 #include <ostream>
+#include <string>
 #include <utility>
 
 #include "cli/ItemArgument.h"
@@ -9,6 +12,7 @@
 #include "cli/OperationRun.h"
 #include "cli/Printing.h"
 #include "cli/ReferenceDate.h"
+#include "foundation/Unicode.h"
 #include "mirabel/TagData.h"
 
 namespace mirabel {
@@ -27,6 +31,13 @@ std::optional<Number> numberFrom(const std::string& text) {
   double real = 0;
   const auto read = std::from_chars(text.data(), end, real, std::chars_format::general);
   if (read.ec == std::errc() && read.ptr == end && real - real == 0) return Number::of(real);
+  return {};
+}
+
+/// What keeps a text from being a label; nothing else does.
+std::optional<std::string> faultOf(const std::string& label) {
+  if (label.empty()) return "a tag can't be empty; --clear takes all tags away";
+  if (!isUTF8(label)) return "can't use " + label + "; a tag is text in UTF-8";
   return {};
 }
 
@@ -54,8 +65,11 @@ ExitCode runTag(Program& program, const TagOptions& options) {
   if (!options.clears) {
     std::vector<Tag> tags;
     tags.reserve(options.labels.size());
-    for (const std::string& label : options.labels)
-      tags.push_back({label});
+    for (const std::string& label : options.labels) {
+      if (auto fault = faultOf(label)) return program.reportUsage(*fault);
+      const Tag tag{label};
+      if (std::ranges::find(tags, tag) == tags.end()) tags.push_back(tag);
+    }
     auto encoded = encodeTagData(tags);
     if (!encoded) return program.reportUsage("the labels have more than 64 KiB");
     tagData = *std::move(encoded);

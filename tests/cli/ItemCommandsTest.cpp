@@ -78,6 +78,10 @@ TEST_F(ItemCommands, MetadataIsClearedAndTagsArePrinted) {
   const std::string doc = home.at("folder/doc.txt");
   EXPECT_EQ(run({"tag", doc, "red", "late\nr"}).code, 0);
   EXPECT_EQ(run({"tag", doc}).out, "red\nlate\\nr\n");
+  EXPECT_EQ(done({"tag", doc, "a", "b", "a", "A"}).at("tags"), nlohmann::json({"a", "b", "A"}));
+  expectFailure(run({"tag", doc, "c", ""}), 2, "a tag can't be empty");
+  expectFailure(run({"tag", doc, "\xff"}), 2, "can't use \\xff; a tag is text in UTF-8");
+  EXPECT_EQ(run({"tag", doc}).out, "a\nb\nA\n");
   EXPECT_EQ(done({"tag", doc, "--clear"}).at("tags"), nlohmann::json::array());
   EXPECT_EQ(done({"favorite", doc}).at("favoriteRank"), "1");
   EXPECT_EQ(done({"favorite", doc, "2.5"}).at("favoriteRank"), 2.5);
