@@ -63,6 +63,35 @@ TEST_F(Usage, TheManualKnowsEveryOptionAndCommandOfTheHelp) {
   EXPECT_GT(count, 40);
 }
 
+TEST_F(Usage, TheCompletionKnowsWhatStandsWhere) {
+  // The words as bash takes them apart, of which the last is being completed; and what is offered.
+  const std::pair<const char*, const char*> cases[] = {
+      {"mirabel --home d", "docs"},
+      {"mirabel --home = d", "docs"},
+      {"mirabel icon -o ''", "docs file"},
+      {"mirabel mkdir new --in r", "root"},
+      {"mirabel ls --page ''", ""},
+      {"mirabel --home ls st", "status"},
+      {"mirabel --home = ls completion ''", "bash fish zsh"},
+      {"mirabel rm -- --h", ""},
+      {"mirabel id --h", "--help --home"},
+      {"mirabel watch ''", "alldirs docs file root workingset"},
+      {"mirabel search ''", ""}};
+  std::string script =
+      "cd \"$home\" && mkdir work && cd work && mkdir docs && touch file\n"
+      "\"$mirabel\" completion bash > \"$home/completion\"\n"
+      "exec bash -c '. \"$0\"; while read -r line; do eval \"COMP_WORDS=($line)\"; "
+      "COMP_CWORD=$((${#COMP_WORDS[@]} - 1)) COMPREPLY=(); _mirabel; "
+      "echo $(printf \"%s\\n\" \"${COMPREPLY[@]}\" | LC_ALL=C sort); done' \"$home/completion\" << "
+      "'END'\n";
+  std::string offered;
+  for (const auto& [words, answer] : cases) {
+    script += std::string(words) + "\n";
+    offered += std::string(answer) + "\n";
+  }
+  EXPECT_EQ(shell(script + "END\n").out, offered);
+}
+
 TEST_F(Usage, GlobalOptionsMayFollowTheCommandAndPathsMayLookLikeOptions) {
   for (const char* name : {"-x", "--json", "ls", "[a]", "\"b\"", "{c}", "a=b", "%%", "@"}) {
     home.writeFile(name);
