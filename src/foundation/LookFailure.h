@@ -1,5 +1,7 @@
 #pragma once
 
+#include <string>
+
 #include "mirabel/Error.h"
 
 namespace mirabel {
@@ -10,6 +12,10 @@ enum class LookFailure {
   closed,   ///< something that is not ours: no permission, or a file system of its own
   passing,  ///< nothing at all: the next look may succeed, and no conclusion may be drawn
 };
+
+/// Of the document storage at `path`, which is there and can't be read: POSIX EACCES. A passing
+/// failure, unlike those of the folders in it: the person has not put everything away.
+[[nodiscard]] Error closedStorage(const std::string& path);
 
 /// Any error that isn't known to say something of the place is a passing one.
 [[nodiscard]] LookFailure lookFailure(const Error& error);

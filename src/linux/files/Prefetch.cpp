@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <fcntl.h>
 #include <string>
 #include <string_view>
 #include <sys/stat.h>
@@ -79,7 +78,7 @@ std::vector<Folder> groupByFolder(const MonitoredRoots& roots, std::span<const U
 }
 
 bool openFolder(const MonitoredRoots& roots, Folder& folder) {
-  auto opened = roots.open(std::string(folder.path), O_PATH | O_DIRECTORY);
+  auto opened = roots.openHolder(std::string(folder.path));
   if (!opened) return false;
   folder.descriptor = std::move(*opened);
   const auto status = statusAt(folder.descriptor.get(), "");

@@ -19,7 +19,7 @@ Result<EntryPlace> placeOf(const MonitoredRoots& roots, const URL& url) {
     place.folderPath = path.substr(0, path.size() - last.size() - 1);
     place.name = last;
   }
-  auto folder = roots.open(isEntry ? place.folderPath : path, O_PATH | (isEntry ? O_DIRECTORY : 0));
+  auto folder = isEntry ? roots.openHolder(place.folderPath) : roots.open(path, O_PATH);
   if (!folder) return fail(folder.error());
   place.folder = std::move(*folder);
   return place;

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "foundation/LookFailure.h"
+#include "linux/kernel/ClosedFolders.h"
 #include "linux/kernel/ObjectStatus.h"
 
 namespace mirabel {
@@ -34,6 +35,10 @@ Result<UniqueFd> openBelow(int root, std::uint64_t device, const std::string& re
   const auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
   if (status->device != device) return fail(Error::posix(EXDEV));
+  const bool isRead = status->kind == FileKind::folder && (flags & O_PATH) == 0;
+  if (leadsThroughClosed(root, relative) || (isRead && isClosed(opened->get()))) {
+    return fail(Error::posix(EACCES));
+  }
   return opened;
 }
 
@@ -142,8 +147,10 @@ bool MonitoredRoots::refresh(Root& root) {
   const auto status = opened ? statusAt(opened->get(), "") : fail(opened.error());
   auto volume = status ? Result<std::uint64_t>(status->device) : fail(status.error());
   if (root.isKeptOpen && !status && saysAbsent(status.error())) volume = fileSystemFor(root.path);
-  // The document storage itself may be mounted, from a server that does not answer just now.
-  const bool isSilent = !volume && root.isKeptOpen && volume.error().isPosix(EXDEV);
+  // The document storage itself may be mounted, from a server that does not answer just now, or a
+  // folder above it be closed: it is there all the same.
+  const bool isSilent =
+      !volume && root.isKeptOpen && lookFailure(volume.error()) == LookFailure::closed;
   const bool saysNothing = isSilent || (!volume && !saysOutOfReach(volume.error()));
   if (!status && !root.isThere) root.failure = saysNothing ? errnoOf(volume.error()) : 0;
   if (saysNothing) return false;
@@ -220,6 +227,7 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
   if (root->isKeptOpen) {
     const int failure = root->failure;
     if (root->descriptor < 0) return fail(Error::posix(failure != 0 ? failure : ENOENT));
+    if (isClosed(root->descriptor)) return fail(closedStorage(root->path));
     return openBelow(root->descriptor, root->device, relative, allFlags);
   }
   // Whatever folder is there by now: whose it is, is for those to say who look into it.
@@ -227,7 +235,16 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
   if (!folder) return fail(folder.error());
   const auto status = statusAt(folder->get(), "");
   if (!status) return fail(status.error());
+  if (isClosed(folder->get())) return fail(Error::posix(EACCES));
   return openBelow(folder->get(), status->device, relative, allFlags);
+}
+
+Result<UniqueFd> MonitoredRoots::openHolder(const std::string& path) const {
+  auto folder = open(path, O_PATH | O_DIRECTORY);
+  const auto place = locate(path);
+  const bool isBelow = place && !place->relative.empty();
+  if (folder && isBelow && isClosed(folder->get())) return fail(Error::posix(EACCES));
+  return folder;
 }
 
 }  // namespace mirabel

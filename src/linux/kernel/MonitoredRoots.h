@@ -64,8 +64,12 @@ class MonitoredRoots {
   /// Opens the object at `path` with `flags` (O_PATH, or O_RDONLY | O_DIRECTORY, …; O_NOFOLLOW,
   /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its
   /// final link not followed. POSIX errors: ELOOP for a symbolic link on the way, EXDEV for
-  /// another mount and for a subvolume, ENOENT.
+  /// another mount and for a subvolume, ENOENT; EACCES for a folder that is to be read and is
+  /// closed (see `isClosed`), for a root that is, and for all that lies in them, whatever the
+  /// kernel would let through: they hold nothing. Of the document storage it is `closedStorage`.
   [[nodiscard]] Result<UniqueFd> open(const std::string& path, int flags) const;
+  /// Opens the folder at `path` with O_PATH, to look at what lies in it. The same errors.
+  [[nodiscard]] Result<UniqueFd> openHolder(const std::string& path) const;
 
  private:
   struct Root;

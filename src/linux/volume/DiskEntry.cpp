@@ -9,7 +9,7 @@ Result<DiskEntry> lookAt(const MonitoredRoots& roots, const std::string& path) {
   const auto place = roots.locate(path);
   const bool isRoot = path == "/" || (place && place->relative.empty());
   const SplitPath split = isRoot ? SplitPath{path, ""} : splitPath(path);
-  auto folder = roots.open(split.parent, O_PATH | O_DIRECTORY);
+  auto folder = isRoot ? roots.open(path, O_PATH | O_DIRECTORY) : roots.openHolder(split.parent);
   if (!folder) return fail(folder.error());
   auto status = statusAt(folder->get(), split.name);
   if (!status) return fail(status.error());

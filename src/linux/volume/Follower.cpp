@@ -85,6 +85,10 @@ Result<void> Follower::addChangedRoots(const Transaction& transaction) {
 // Following records -----------------------------------------------------------------------------
 
 Result<Follower::Outcome> Follower::follow(const Transaction& transaction) {
+  if (scan_.hasUnheard()) {
+    auto looked = transaction([&] { return scan_.lookAtUnheard(); });
+    if (!looked) return fail(looked.error());
+  }
   for (int round = 0; round < mostRounds; ++round) {
     auto isSound = drain();
     if (!isSound) return fail(isSound.error());

@@ -1,6 +1,5 @@
 #include "linux/volume/ObjectFinder.h"
 
-#include <fcntl.h>
 #include <set>
 #include <utility>
 
@@ -30,7 +29,7 @@ Result<std::optional<ObjectFinder::Found>> ObjectFinder::lookAt(const ObjectRow&
 Result<std::optional<ObjectFinder::Found>> ObjectFinder::findAmong(
     const ObjectRow& row, const std::vector<RecentPlace>& places) const {
   for (const RecentPlace& place : places) {
-    auto folder = roots_.open(place.folderPath, O_PATH | O_DIRECTORY);
+    auto folder = roots_.openHolder(place.folderPath);
     if (!folder && saysOutOfReach(folder.error())) continue;
     if (!folder) return fail(folder.error());
     auto found = lookAt(row, {place.folderPath, folder->get(), place.name, row.inode});

@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "foundation/LookFailure.h"
+#include "linux/kernel/ClosedFolders.h"
 #include "linux/volume/DiskEntry.h"
 #include "linux/volume/ObjectMatcher.h"
 
@@ -56,10 +57,10 @@ Result<PlaceLooks::Presence> PlaceLooks::open(std::uint64_t id, Folder& folder) 
   folder.row = std::move(**row);
   folder.path = std::move(**path);
   auto opened = context_.roots.open(folder.path, O_PATH | O_DIRECTORY);
+  if (!opened && !saysOutOfReach(opened.error())) return fail(opened.error());
   // Whoever closed a folder above has left a record of that.
   if (!opened && opened.error().isPosix(EACCES)) return Presence::gone;
-  if (!opened && saysOutOfReach(opened.error())) return Presence::moved;
-  if (!opened) return fail(opened.error());
+  if (!opened) return Presence::moved;
   auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
   const bool isIt = status->inode == folder.row.inode && status->device == context_.device &&
@@ -73,13 +74,28 @@ Result<PlaceLooks::Presence> PlaceLooks::lookInFolder(FolderWatcher& watcher, st
   Folder folder;
   auto presence = open(id, folder);
   if (!presence || *presence == Presence::moved) return presence;
-  if (*presence == Presence::gone) {
+  const bool isOpen = *presence == Presence::here && !isClosed(folder.descriptor.get());
+  if (!isOpen) {
     // What was linked in it or written to, and left with it, may live on elsewhere.
     for (const auto& [name, look] : names) {
       if (auto done = noteOthers(look, nullptr); !done) return fail(done.error());
     }
-    return presence;
   }
+  if (*presence == Presence::gone) return presence;
+  if (isOpen) {
+    presence = lookAtNames(watcher, folder, names);
+    if (!presence || *presence != Presence::here) return presence;
+  }
+  const auto itself = names.find("");
+  const bool attributesChanged = itself != names.end() && itself->second.contentChanged;
+  if (itself == names.end() && !hasEntryChange(names)) return Presence::here;
+  if (auto done = lookAtItself(folder, attributesChanged); !done) return fail(done.error());
+  return Presence::here;
+}
+
+Result<PlaceLooks::Presence> PlaceLooks::lookAtNames(FolderWatcher& watcher, const Folder& folder,
+                                                     const Names& names) {
+  const std::uint64_t id = folder.row.fileID;
   auto seen = sightings(folder, names);
   if (!seen) return fail(seen.error());
   auto learned = context_.learner.learn(folder.path, folder.descriptor.get(), id, *seen);
@@ -92,10 +108,6 @@ Result<PlaceLooks::Presence> PlaceLooks::lookInFolder(FolderWatcher& watcher, st
     }
     if (sighting.status.kind == FileKind::folder) followFolder(watcher, folder, sighting);
   }
-  const auto itself = names.find("");
-  const bool attributesChanged = itself != names.end() && itself->second.contentChanged;
-  if (itself == names.end() && !hasEntryChange(names)) return Presence::here;
-  if (auto done = lookAtItself(folder, attributesChanged); !done) return fail(done.error());
   return Presence::here;
 }
 

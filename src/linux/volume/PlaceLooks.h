@@ -45,6 +45,8 @@ class PlaceLooks {
   [[nodiscard]] Result<Presence> open(std::uint64_t id, Folder& folder) const;
   [[nodiscard]] Result<Presence> lookInFolder(FolderWatcher& watcher, std::uint64_t id,
                                               const Names& names);
+  [[nodiscard]] Result<Presence> lookAtNames(FolderWatcher& watcher, const Folder& folder,
+                                             const Names& names);
   /// Looks at names in a folder; those that are there are answered, the others noted as missing.
   [[nodiscard]] Result<std::vector<Sighting>> sightings(const Folder& folder, const Names& names);
   [[nodiscard]] Result<void> endUnlinked(const Folder& folder, const std::string& name,

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <fcntl.h>
 #include <utility>
 
 #include "foundation/LookFailure.h"
@@ -211,7 +210,7 @@ Result<void> Placer::noteArrival(const ObjectRow& row, const std::optional<Locat
 }
 
 Result<ObjectRow> Placer::placeFound(ObjectRow row, const ObjectFinder::Found& found) {
-  auto folder = roots_.open(found.folderPath, O_PATH | O_DIRECTORY);
+  auto folder = roots_.openHolder(found.folderPath);
   // The way there is changing right now: whoever looks next finds out.
   const auto isChanging = [](const Error& error) {
     return error.isPosix(ESTALE) || saysOutOfReach(error);

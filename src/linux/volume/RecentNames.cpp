@@ -1,6 +1,5 @@
 #include "linux/volume/RecentNames.h"
 
-#include <fcntl.h>
 #include <utility>
 
 #include "foundation/LookFailure.h"
@@ -68,7 +67,7 @@ Result<std::optional<ObjectStatus>> RecentNames::statusOf(const Name& name) cons
   const auto path = pathOf(context_, name.folder);
   if (!path) return fail(path.error());
   if (!*path) return std::nullopt;
-  auto folder = context_.roots.open(**path, O_PATH | O_DIRECTORY);
+  auto folder = context_.roots.openHolder(**path);
   const auto status = folder ? statusAt(folder->get(), name.name) : fail(folder.error());
   if (status) return *status;
   if (saysOutOfReach(status.error())) return std::nullopt;

@@ -2,11 +2,13 @@
 
 #include <cerrno>
 #include <fcntl.h>
+#include <iterator>
 #include <optional>
 #include <utility>
 
 #include "foundation/LookFailure.h"
 #include "linux/kernel/RawDirectory.h"
+#include "linux/volume/DiskEntry.h"
 #include "linux/volume/ObjectMatcher.h"
 
 namespace mirabel {
@@ -99,12 +101,8 @@ Result<void> TreeScan::readBatch(const Pause& pause) {
 Result<void> TreeScan::read(const Folder& folder) {
   ++entriesRead_;
   auto opened = context_.roots.open(folder.path, O_RDONLY | O_DIRECTORY);
-  if (!opened && !isClosedToUs(opened.error())) return fail(opened.error());
-  if (!opened) {
-    unreadable_[folder.id] = 1;
-    read_.insert(folder.id);
-    return findMissing(folder);
-  }
+  if (!opened && isClosedToUs(opened.error())) return passOver(folder);
+  if (!opened) return fail(opened.error());
   auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
   // What is mounted there, or is a volume of its own, is another's.
@@ -114,9 +112,32 @@ Result<void> TreeScan::read(const Folder& folder) {
   watch(opened->get(), *id);
   const Folder itself{folder.path, *id, folder.depth};
   auto begun = beginReading(std::move(*opened));
+  // Closed since it was opened.
+  if (!begun && isClosedToUs(begun.error())) return passOver(itself);
   if (!begun) return giveUp(itself, begun.error());
   if (auto done = readNext(*begun); !done) return giveUp(itself, done.error());
   return takeIn(itself, std::move(*begun));
+}
+
+Result<void> TreeScan::passOver(const Folder& folder) {
+  if (auto awaited = awaitOpening(folder); !awaited) return awaited;
+  unreadable_[folder.id] = 1;
+  read_.insert(folder.id);
+  return findMissing(folder);
+}
+
+/// Nobody else tells that it can be read again.
+Result<void> TreeScan::awaitOpening(const Folder& folder) {
+  if (watcher_ == nullptr) return {};
+  const auto closed = context_.roots.open(folder.path, O_PATH | O_DIRECTORY);
+  // One above it is closed as well, or it is another's.
+  if (!closed && isClosedToUs(closed.error())) return {};
+  if (!closed) return fail(closed.error());
+  auto id = context_.learner.folderID(folder.path, closed->get());
+  if (!id) return fail(id.error());
+  if (*id != folder.id) return fail(Error::posix(ESTALE));
+  watch(closed->get(), folder.id);
+  return {};
 }
 
 /// Who is watched is known: whoever meets the folder under its new name reads it.
@@ -144,6 +165,7 @@ std::size_t TreeScan::unreadableFolders() const {
 Result<void> TreeScan::takeIn(const Folder& folder, FolderReading reading) {
   auto done = lookAtItself(folder, reading.status);
   if (done) done = takeInEntries(folder, reading);
+  if (!done && isClosedToUs(done.error())) return passOver(folder);
   if (!done) return giveUp(folder, done.error());
   if (reading.deadMounts == 0) unreadable_.erase(folder.id);
   if (reading.deadMounts != 0) unreadable_[folder.id] = reading.deadMounts;
@@ -166,8 +188,37 @@ Result<void> TreeScan::lookAtItself(const Folder& folder, const ObjectStatus& st
 void TreeScan::watch(int folder, std::uint64_t id) {
   if (watcher_ == nullptr || watchFailure_) return;
   auto watched = watcher_->watch(folder, id);
-  // Closed to us since it was opened: then its parent hears when that changes.
-  if (!watched && !watched.error().isPosix(EACCES)) watchFailure_ = watched.error();
+  unheard_.erase(id);
+  if (watched) return;
+  // Closed to us: then it is heard of when that changes.
+  const bool isClosed = watched.error().isPosix(EACCES);
+  if (!isClosed) watchFailure_ = watched.error();
+  if (isClosed && !watcher_->isWatched(id)) unheard_.insert(id);
+}
+
+Result<void> TreeScan::lookAtUnheard() {
+  for (auto id = unheard_.begin(); id != unheard_.end();) {
+    auto isThere = lookAtUnheard(*id);
+    if (!isThere) return fail(isThere.error());
+    id = *isThere ? std::next(id) : unheard_.erase(id);
+  }
+  return {};
+}
+
+Result<bool> TreeScan::lookAtUnheard(std::uint64_t id) {
+  auto row = context_.store.objectByFileID(id);
+  if (!row) return fail(row.error());
+  if (!*row || !(*row)->location) return false;
+  auto path = context_.paths.pathOfFolder(**row);
+  if (!path) return fail(path.error());
+  if (!*path) return false;
+  const auto look = lookAt(context_.roots, **path);
+  if (!look && !saysOutOfReach(look.error())) return fail(look.error());
+  // Elsewhere by now, which a record has told.
+  if (!look || look->seen.status.inode != (*row)->inode) return true;
+  auto done = lookAtItself({**path, id, Depth::folder}, look->seen.status);
+  if (!done && !isDisturbance(done.error())) return fail(done.error());
+  return true;
 }
 
 Result<void> TreeScan::takeInEntries(const Folder& folder, FolderReading& reading) {

@@ -46,6 +46,11 @@ class TreeScan {
   /// `pause` is called every so many entries.
   [[nodiscard]] Result<void> run(const Transaction& transaction, const Pause& pause);
 
+  /// Looks at the closed folders that could not be watched, for no record tells that something came
+  /// into one of them or left, which shows in its dates.
+  [[nodiscard]] Result<void> lookAtUnheard();
+  [[nodiscard]] bool hasUnheard() const { return !unheard_.empty(); }
+
   /// Whether that folder was gone through since the last `clear`.
   [[nodiscard]] bool hasRead(std::uint64_t id) const { return read_.contains(id); }
   [[nodiscard]] std::size_t foldersRead() const { return read_.size(); }
@@ -66,12 +71,17 @@ class TreeScan {
   };
   [[nodiscard]] Result<void> readBatch(const Pause& pause);
   [[nodiscard]] Result<void> read(const Folder& folder);
+  /// Takes in that the folder can't be read, and so holds nothing.
+  [[nodiscard]] Result<void> passOver(const Folder& folder);
+  [[nodiscard]] Result<void> awaitOpening(const Folder& folder);
   [[nodiscard]] Result<void> giveUp(const Folder& folder, const Error& error);
   [[nodiscard]] Result<void> takeIn(const Folder& folder, FolderReading reading);
   [[nodiscard]] Result<void> takeInEntries(const Folder& folder, FolderReading& reading);
   [[nodiscard]] Result<std::uint64_t> takeInBatch(const Folder& folder, FolderReading& reading);
   [[nodiscard]] Result<void> findMissing(const Folder& folder);
   [[nodiscard]] Result<void> lookAtItself(const Folder& folder, const ObjectStatus& status);
+  /// False when it is nowhere any more.
+  [[nodiscard]] Result<bool> lookAtUnheard(std::uint64_t id);
   void watch(int folder, std::uint64_t id);
 
   const IndexContext& context_;
@@ -83,6 +93,7 @@ class TreeScan {
   std::vector<std::uint64_t> disturbed_;
   // Folders that could not be read, and how many there are in and at each.
   std::unordered_map<std::uint64_t, std::size_t> unreadable_;
+  std::unordered_set<std::uint64_t> unheard_;
   std::optional<Error> watchFailure_;
 };
 

@@ -10,6 +10,7 @@
 
 #include "foundation/LookFailure.h"
 #include "linux/kernel/LongPath.h"
+#include "linux/kernel/ObjectStatus.h"
 
 namespace mirabel {
 namespace {
@@ -35,13 +36,19 @@ Result<UUID> uuidFromFileSystemID(int folder) {
   return uuid;
 }
 
-// A folder that may be searched but not read still tells its file system's ID. After any other
-// failure the ID would stand for the UUID, and the same volume for another.
-Result<UniqueFd> openSearchable(const std::string& path) {
+// The folder, or where it can't be read one above it on the same file system: it must not have
+// another UUID, and its volume another state, while it is closed.
+Result<UniqueFd> openReadable(const std::string& path) {
   auto opened = openLongPath(AT_FDCWD, path, O_RDONLY | O_DIRECTORY);
-  if (!opened && lookFailure(opened.error()) == LookFailure::closed)
-    opened = openLongPath(AT_FDCWD, path, O_PATH | O_DIRECTORY);
-  return opened;
+  if (opened || lookFailure(opened.error()) != LookFailure::closed) return opened;
+  const auto status = statusOf(path);
+  if (!status) return fail(status.error());
+  for (std::string above = splitPath(path).parent;; above = splitPath(above).parent) {
+    auto folder = openLongPath(AT_FDCWD, above, O_RDONLY | O_DIRECTORY);
+    const auto seen = folder ? statusAt(folder->get(), "") : fail(folder.error());
+    if (seen && seen->device == status->device) return folder;
+    if (above == "/") return fail(Error::posix(EACCES, "\"" + path + "\""));
+  }
 }
 
 std::optional<UUID> uuidFromKernel(int folder) {
@@ -58,13 +65,13 @@ std::optional<UUID> uuidFromKernel(int folder) {
 }  // namespace
 
 std::optional<UUID> kernelVolumeUUID(const std::string& folder) {
-  auto opened = openSearchable(folder);
+  auto opened = openReadable(folder);
   if (!opened) return std::nullopt;
   return uuidFromKernel(opened->get());
 }
 
 Result<UUID> volumeUUID(const std::string& folder) {
-  auto opened = openSearchable(folder);
+  auto opened = openReadable(folder);
   if (!opened) return fail(opened.error());
   if (auto uuid = uuidFromKernel(opened->get())) return *uuid;
   return uuidFromFileSystemID(opened->get());

@@ -39,15 +39,31 @@ Result<void> FanotifyWatcher::watch(int folder, std::uint64_t id) {
   auto handle = handleAt(folder, "");
   if (!handle) return fail(Error::posix(EOPNOTSUPP));
   // Marked first: what is known to be watched is heard of.
-  if (auto marked = mark(folder); !marked) return marked;
-  if (const auto known = handles_.find(id); known != handles_.end()) {
-    if (*known->second == *handle) return {};
-    folders_.erase(folders_.find(*known->second));
+  auto marked = mark(folder);
+  if (marked) {
+    closed_.remove(id);
+    marked_.add(std::move(*handle), id);
+  } else if (marked.error().isPosix(EACCES) && !isWatched(id)) {
+    closed_.add(std::move(*handle), id);
   }
-  const auto [entry, isNew] = folders_.try_emplace(std::move(*handle), id);
-  if (!isNew) handles_.erase(std::exchange(entry->second, id));
-  handles_[id] = &entry->first;
-  return {};
+  return marked;
+}
+
+void FanotifyWatcher::Folders::add(std::string handle, std::uint64_t id) {
+  if (const auto known = handles.find(id); known != handles.end()) {
+    if (*known->second == handle) return;
+    numbers.erase(numbers.find(*known->second));
+  }
+  const auto [entry, isNew] = numbers.try_emplace(std::move(handle), id);
+  if (!isNew) handles.erase(std::exchange(entry->second, id));
+  handles[id] = &entry->first;
+}
+
+void FanotifyWatcher::Folders::remove(std::uint64_t id) {
+  const auto known = handles.find(id);
+  if (known == handles.end()) return;
+  numbers.erase(numbers.find(*known->second));
+  handles.erase(known);
 }
 
 Result<void> FanotifyWatcher::mark(int folder) {
@@ -63,18 +79,24 @@ Result<void> FanotifyWatcher::mark(int folder) {
 }
 
 bool FanotifyWatcher::isWatched(std::uint64_t id) const {
-  return handles_.contains(id);
+  return marked_.handles.contains(id);
 }
 
 std::size_t FanotifyWatcher::watchedFolders() const {
-  return handles_.size();
+  return marked_.handles.size();
 }
 
 void FanotifyWatcher::forget(std::uint64_t id) {
-  const auto known = handles_.find(id);
-  if (known == handles_.end()) return;
-  folders_.erase(folders_.find(*known->second));
-  handles_.erase(known);
+  marked_.remove(id);
+  closed_.remove(id);
+}
+
+std::optional<std::uint64_t> FanotifyWatcher::numberOf(std::string_view handle) const {
+  for (const Numbers* numbers : {&marked_.numbers, &closed_.numbers}) {
+    const auto folder = numbers->find(handle);
+    if (folder != numbers->end()) return folder->second;
+  }
+  return std::nullopt;
 }
 
 Result<FolderWatcher::Drained> FanotifyWatcher::drain(LookList& looks) {
@@ -83,11 +105,7 @@ Result<FolderWatcher::Drained> FanotifyWatcher::drain(LookList& looks) {
   if (::ioctl(group_.get(), FIONREAD, &queued) != 0) return fail(Error::posix(errno));
   // The kernel counts the fixed part of each record, not what follows it.
   auto left = static_cast<std::size_t>(queued) / sizeof(fanotify_event_metadata);
-  const WatchedFolder watched = [&](std::string_view handle) -> std::optional<std::uint64_t> {
-    const auto folder = folders_.find(handle);
-    if (folder == folders_.end()) return std::nullopt;
-    return folder->second;
-  };
+  const WatchedFolder watched = [this](std::string_view handle) { return numberOf(handle); };
   while (left > 0) {
     const ssize_t count = ::read(group_.get(), buffer_.get(), bufferSize);
     if (count < 0 && errno == EINTR) continue;

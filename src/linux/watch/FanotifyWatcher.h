@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -31,6 +32,7 @@ class FanotifyWatcher final : public FolderWatcher {
  private:
   FanotifyWatcher(UniqueFd group, WatcherKind kind);
   [[nodiscard]] Result<void> mark(int folder);
+  [[nodiscard]] std::optional<std::uint64_t> numberOf(std::string_view handle) const;
 
   struct Hash {
     using is_transparent = void;
@@ -41,8 +43,19 @@ class FanotifyWatcher final : public FolderWatcher {
   UniqueFd group_;
   WatcherKind kind_;
   bool hasFileSystemMark_ = false;
-  std::unordered_map<std::string, std::uint64_t, Hash, std::equal_to<>> folders_;  // by handle
-  std::unordered_map<std::uint64_t, const std::string*> handles_;  // keys of the other, one each
+  using Numbers = std::unordered_map<std::string, std::uint64_t, Hash, std::equal_to<>>;
+  using Handles = std::unordered_map<std::uint64_t, const std::string*>;
+  /// Folders, and under which handle each has its number.
+  struct Folders {
+    Numbers numbers;
+    Handles handles;  // keys of the other, one each
+    void add(std::string handle, std::uint64_t id);
+    void remove(std::uint64_t id);
+  };
+  Folders marked_;
+  // Those that could not be marked: what happens to one of them itself comes with its own handle,
+  // through the mark of the folder that it lies in.
+  Folders closed_;
   std::unique_ptr<std::byte[]> buffer_;
 };
 

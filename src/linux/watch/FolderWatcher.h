@@ -27,7 +27,9 @@ class FolderWatcher {
 
   /// Hears of that folder from now on, under the number `id`; again is harmless. `folder` may be
   /// open with O_PATH. POSIX errors: ENOSPC when the user has no further watches (see
-  /// `WatchLimits`); EACCES for a folder that can't be read; EXDEV for another file system.
+  /// `WatchLimits`); EACCES for a folder that can't be read, of which nothing is heard but, as long
+  /// as the folder that it lies in is watched, that its own attributes were changed; EXDEV for
+  /// another file system.
   [[nodiscard]] virtual Result<void> watch(int folder, std::uint64_t id) = 0;
   /// Records of that folder are passed over from now on. The kernel may keep the mark until the
   /// folder, or the watcher, is gone.
