@@ -186,5 +186,33 @@ TEST_F(VolumeStateTest, AFailingDiskEndsItUntilItIsOpenedAnew) {
   EXPECT_EQ(index().historyUUID(), history);
 }
 
+TEST_F(VolumeStateTest, WithoutItsFolderNothingIsAnsweredAnyMore) {
+  namespace fs = std::filesystem;
+  const std::function<void()> ways[] = {
+      [this] { fs::remove_all(state_); }, [this] { fs::remove_all(volumeFolder()); },
+      [this] { fs::rename(state_, base_ + "/aside"); },
+      // Another process has begun a state of its own in its place.
+      [this] {
+        const fs::path folder = volumeFolder();
+        fs::rename(folder, base_ + "/elsewhere");
+        fs::create_directory(folder);
+        std::ofstream(folder / "lock") << "";
+      }};
+  write("doc");
+  int times = 0;
+  for (const auto& way : ways) {
+    const std::uint64_t file = this->file("doc");
+    const std::uint32_t document = this->document("doc");
+    EXPECT_TRUE(index().currentEventID());
+    way();
+    EXPECT_FALSE(index().pathOfFileID(file)) << times;
+    EXPECT_FALSE(index().fileIDOfDocument(document)) << times;
+    EXPECT_FALSE(index().currentEventID()) << times;
+    EXPECT_EQ(timesBroken_, ++times);
+    close();
+  }
+  EXPECT_TRUE(index().currentEventID());
+}
+
 }  // namespace
 }  // namespace mirabel

@@ -76,6 +76,15 @@ Result<void> lock(int file, std::chrono::milliseconds timeout,
 
 }  // namespace
 
+bool StateFolder::isInPlace() const {
+  struct stat held {};
+  struct stat there {};
+  if (::fstat(lock_.get(), &held) != 0) return true;
+  const int looked = ::lstat(file("lock").c_str(), &there);
+  if (looked != 0) return errno != ENOENT && errno != ENOTDIR;
+  return there.st_ino == held.st_ino && there.st_dev == held.st_dev;
+}
+
 Result<StateFolder> StateFolder::acquire(const std::string& base, const UUID& volume,
                                          std::chrono::milliseconds timeout,
                                          const std::function<void(std::string_view)>& waiting) {

@@ -24,6 +24,9 @@ class StateFolder {
       const std::function<void(std::string_view)>& waiting);
 
   [[nodiscard]] const std::string& path() const { return path_; }
+  /// Whether the folder that is held is still the one at its path: another process that opens that
+  /// would have a state of its own.
+  [[nodiscard]] bool isInPlace() const;
   [[nodiscard]] int descriptor() const { return folder_.get(); }
   [[nodiscard]] std::string file(std::string_view name) const {
     return path_ + "/" + std::string(name);

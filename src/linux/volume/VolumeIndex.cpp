@@ -301,6 +301,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   /// is answered any more, also when it has come back: what happened meanwhile was not heard of.
   Result<void> stayOnVolume() {
     if (left_) return fail(*left_);
+    if (auto usable = state_->stayUsable(); !usable) return usable;
     if (!roots_.hasLeftVolume()) return {};
     left_ = onAnotherVolume(roots_);
     logError("the volume's state can't be used any more; " + left_->description());

@@ -1,6 +1,7 @@
 #include "linux/volume/VolumeState.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <malloc.h>
 #include <sqlite3.h>
 #include <utility>
@@ -12,6 +13,8 @@ namespace {
 
 // Pages in the log after which it is moved into the database, 16 MiB.
 constexpr int longLog = 4000;
+constexpr std::string_view failedDisk =
+    "the disk failed under the volume's state; the next start checks what is there";
 
 bool isCorruption(const Error& error) {
   if (error.domain != ErrorDomain::store) return false;
@@ -149,6 +152,14 @@ Result<void> VolumeState::startOver(bool isFirst) {
 
 // Writing ---------------------------------------------------------------------------------------
 
+Result<void> VolumeState::stayUsable() {
+  if (!broken_ && !folder_.isInPlace()) {
+    const std::string gone = "the state folder \"" + folder_.path() + "\" was deleted or replaced";
+    breakOff(Error::posix(EIO, gone), gone);
+  }
+  return broken_ ? fail(*broken_) : Result<void>();
+}
+
 Result<void> VolumeState::transaction(const std::function<Result<void>()>& work) {
   if (broken_) return fail(*broken_);
   if (auto begun = database_->begin(); !begun) return begun;
@@ -161,7 +172,7 @@ Result<void> VolumeState::transaction(const std::function<Result<void>()>& work)
     logDebug("can't roll back; " + undone.error().description());
   }
   store_->folderPaths().clear();
-  if (auto reloaded = journal_->reload(); !reloaded) breakOff(reloaded.error());
+  if (auto reloaded = journal_->reload(); !reloaded) breakOff(reloaded.error(), failedDisk);
   return done;
 }
 
@@ -221,16 +232,14 @@ void VolumeState::noteFailure(const Error& error) {
   // A failed sync leaves unknown what is on disk: nothing more is written, whoever opens it next
   // checks.
   if (isCorruption(error)) files_.markAsDamaged();
-  if (isCorruption(error) || isInputOutput(error)) breakOff(error);
+  if (isCorruption(error) || isInputOutput(error)) breakOff(error, failedDisk);
 }
 
-void VolumeState::breakOff(const Error& error) {
+void VolumeState::breakOff(const Error& error, std::string_view why) {
   if (broken_) return;
   broken_ = error;
   logError("the volume's state can't be used before it was opened anew; " + error.description());
-  if (isAdopted_ && tellBroken_) {
-    tellBroken_("the disk failed under the volume's state; the next start checks what is there");
-  }
+  if (isAdopted_ && tellBroken_) tellBroken_(why);
 }
 
 void VolumeState::closeInOrder() {

@@ -43,8 +43,8 @@ class VolumeState {
   using Broken = std::function<void(std::string_view why)>;
 
   /// `broken` is called once, when an I/O error of the database or damage was met after it was
-  /// opened: every transaction fails from then on, until the state is opened anew, which finds out
-  /// what can be trusted. It is called under the lock of the index.
+  /// opened, or its folder is gone: every transaction fails from then on, until the state is opened
+  /// anew, which finds out what can be trusted. It is called under the lock of the index.
   [[nodiscard]] static Result<std::unique_ptr<VolumeState>> open(StateFolder folder,
                                                                  const Notice& notice,
                                                                  Broken broken = {});
@@ -63,6 +63,9 @@ class VolumeState {
   [[nodiscard]] bool isBroken() const { return broken_.has_value(); }
   [[nodiscard]] const UUID& history() const { return witness_.history; }
 
+  /// Whether it can still be answered from: an error when it is broken, which it is as well when
+  /// its folder was deleted, or another came to its place.
+  [[nodiscard]] Result<void> stayUsable();
   /// Runs `work` in a transaction. What it wrote is on disk when this returns without an error,
   /// and nothing of it otherwise. A lack of room passes: the next call may succeed.
   [[nodiscard]] Result<void> transaction(const std::function<Result<void>()>& work);
@@ -86,7 +89,7 @@ class VolumeState {
   [[nodiscard]] bool foldLog(Database::Log log);
   void note();
   void noteFailure(const Error& error);
-  void breakOff(const Error& error);
+  void breakOff(const Error& error, std::string_view why);
   void closeInOrder();
 
   StateFolder folder_;
