@@ -12,25 +12,6 @@
 #include "linux/volume/VolumeIndex.h"
 
 namespace mirabel {
-/// Somebody who watches.
-class ContainerWatches::Watcher {
- public:
-  explicit Watcher(std::function<void()> changed) : changed_(std::move(changed)) {}
-
-  void wake() {
-    const std::lock_guard lock(mutex_);
-    if (changed_) changed_();
-  }
-  void end() {
-    // From within the call itself nothing has to be waited for.
-    const std::lock_guard lock(mutex_);
-    changed_ = {};
-  }
-
- private:
-  std::recursive_mutex mutex_;
-  std::function<void()> changed_;
-};
 
 /// A container with those who watch it. Its members are used by one thread at a time: the one that
 /// adds the first watcher, and then that of the watches.

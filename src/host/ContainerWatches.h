@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "host/HostedProvider.h"
+#include "host/Watcher.h"
 #include "mirabel/Documents.h"
 
 namespace mirabel {
@@ -44,7 +45,6 @@ class ContainerWatches {
 
  private:
   class Watched;
-  class Watcher;
   class Entry;
 
   void remove(const std::shared_ptr<Watcher>& watcher);

@@ -1,9 +1,6 @@
 #include "host/bus/RemoteWatches.h"
 
-#include <algorithm>
-#include <set>
 #include <utility>
-#include <vector>
 
 #include "host/bus/BusNames.h"
 
@@ -18,92 +15,89 @@ BusConnection::Write named(const std::string& container) {
 
 class RemoteWatches::Entry final : public ContainerWatch {
  public:
-  explicit Entry(std::shared_ptr<RemoteWatches> watches) : watches_(std::move(watches)) {}
-  ~Entry() override { watches_->remove(this); }
+  Entry(std::shared_ptr<RemoteWatches> watches, std::string container,
+        std::shared_ptr<Watcher> watcher)
+      : watches_(std::move(watches)),
+        container_(std::move(container)),
+        watcher_(std::move(watcher)) {}
+  ~Entry() override { watches_->remove(container_, watcher_); }
   Entry(const Entry&) = delete;
   Entry& operator=(const Entry&) = delete;
 
  private:
   std::shared_ptr<RemoteWatches> watches_;
+  std::string container_;
+  std::shared_ptr<Watcher> watcher_;
 };
 
 Result<std::unique_ptr<ContainerWatch>> RemoteWatches::add(
     const std::shared_ptr<RemoteWatches>& watches, const std::string& container,
     std::function<void()> changed) {
-  auto entry = std::make_unique<Entry>(watches);
+  const auto watcher = std::make_shared<Watcher>(std::move(changed));
   {
     // Before it is asked for, so that no signal comes too early.
     const std::lock_guard lock(watches->mutex_);
-    watches->watching_[entry.get()] = {container, std::move(changed)};
+    watches->watchers_[container].push_back(watcher);
   }
+  auto entry = std::make_unique<Entry>(watches, container, watcher);
   const auto begun = watches->connection_.call(providerInterface, "Watch", named(container),
                                                [](sdbus::Message&) { return true; });
   if (!begun) return fail(begun.error());
   return entry;
 }
 
-void RemoteWatches::remove(const Entry* entry) {
-  std::string container;
+void RemoteWatches::remove(const std::string& container, const std::shared_ptr<Watcher>& watcher) {
+  watcher->end();
   {
     const std::lock_guard lock(mutex_);
-    const auto found = watching_.find(entry);
-    container = std::move(found->second.container);
-    watching_.erase(found);
-    const bool isWatchedStill = std::any_of(watching_.begin(), watching_.end(), [&](auto& other) {
-      return other.second.container == container;
-    });
-    if (isWatchedStill) return;
+    const auto watched = watchers_.find(container);
+    std::erase(watched->second, watcher);
+    if (!watched->second.empty()) return;
+    watchers_.erase(watched);
   }
   // A service that does not hear it has left, or sees us leave.
   connection_.callAsync(providerInterface, "Unwatch", named(container),
                         [](sdbus::Message*, const Error&) {});
-  watchAgain(container);
+  // Who began to watch it while the others' end was on its way is not to be ended with them.
+  if (isWatched(container)) askToWatch(container);
 }
 
-// Who began to watch it while the others' end was on its way is not to be ended with them.
-void RemoteWatches::watchAgain(const std::string& container) {
-  {
-    const std::lock_guard lock(mutex_);
-    const bool isWatched = std::any_of(watching_.begin(), watching_.end(), [&](auto& other) {
-      return other.second.container == container;
-    });
-    if (!isWatched) return;
-  }
+bool RemoteWatches::isWatched(const std::string& container) {
+  const std::lock_guard lock(mutex_);
+  return watchers_.contains(container);
+}
+
+void RemoteWatches::askToWatch(const std::string& container) {
   connection_.callAsync(providerInterface, "Watch", named(container),
                         [this, container](sdbus::Message*, const Error&) { signalled(container); });
 }
 
 void RemoteWatches::signalled(const std::string& container) {
-  const std::lock_guard lock(mutex_);
-  std::vector<std::function<void()>> woken;
-  for (const auto& [entry, watching] : watching_)
-    if (watching.container == container) woken.push_back(watching.changed);
-  for (const auto& wake : woken)
-    wake();
+  std::vector<std::shared_ptr<Watcher>> woken;
+  {
+    const std::lock_guard lock(mutex_);
+    const auto watched = watchers_.find(container);
+    if (watched != watchers_.end()) woken = watched->second;
+  }
+  for (const auto& watcher : woken)
+    watcher->wake();
 }
 
-void RemoteWatches::wakeAll() {
+std::vector<std::string> RemoteWatches::containers() {
+  std::vector<std::string> watched;
   const std::lock_guard lock(mutex_);
-  std::vector<std::function<void()>> woken;
-  woken.reserve(watching_.size());
-  for (const auto& [entry, watching] : watching_)
-    woken.push_back(watching.changed);
-  for (const auto& wake : woken)
-    wake();
+  for (const auto& [container, watchers] : watchers_)
+    watched.push_back(container);
+  return watched;
 }
 
 void RemoteWatches::serviceMoved(bool isThere) {
-  if (!isThere) return wakeAll();
-  std::set<std::string> containers;
-  {
-    const std::lock_guard lock(mutex_);
-    for (const auto& [entry, watching] : watching_)
-      containers.insert(watching.container);
-  }
-  for (const std::string& container : containers) {
-    connection_.callAsync(
-        providerInterface, "Watch", named(container),
-        [this, container](sdbus::Message*, const Error&) { signalled(container); });
+  for (const std::string& container : containers()) {
+    if (isThere) {
+      askToWatch(container);
+    } else {
+      signalled(container);
+    }
   }
 }
 

@@ -5,7 +5,9 @@
 #include <memory>
 #include <mutex>
 #include <string>
+#include <vector>
 
+#include "host/Watcher.h"
 #include "host/bus/BusConnection.h"
 #include "mirabel/Documents.h"
 
@@ -29,18 +31,15 @@ class RemoteWatches {
 
  private:
   class Entry;
-  void remove(const Entry* entry);
-  void watchAgain(const std::string& container);
-  void wakeAll();
+  void remove(const std::string& container, const std::shared_ptr<Watcher>& watcher);
+  [[nodiscard]] bool isWatched(const std::string& container);
+  /// Asks the service to watch it; whoever does is woken by the answer.
+  void askToWatch(const std::string& container);
+  [[nodiscard]] std::vector<std::string> containers();
 
   BusConnection& connection_;
-  /// Recursive, for a call that wakes may end its own watch.
-  std::recursive_mutex mutex_;
-  struct Watching {
-    std::string container;
-    std::function<void()> changed;
-  };
-  std::map<const Entry*, Watching> watching_;
+  std::mutex mutex_;  ///< for what follows; nobody is woken with it
+  std::map<std::string, std::vector<std::shared_ptr<Watcher>>> watchers_;  ///< by container
 };
 
 }  // namespace mirabel::bus

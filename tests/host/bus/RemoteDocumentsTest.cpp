@@ -1,5 +1,8 @@
+#include <atomic>
 #include <cerrno>
+#include <chrono>
 #include <future>
+#include <semaphore>
 
 #include "host/bus/ServiceFixture.h"
 #include "mirabel/Session.h"
@@ -51,6 +54,27 @@ TEST_F(RemoteDocumentsTest, QuestionsFromItsOwnCallsAreRefusedAtOnce) {
   });
   home.writeFile("folder/change");
   EXPECT_TRUE(askedAgain.get_future().get().error().isPosix(EDEADLK));
+}
+
+TEST_F(RemoteDocumentsTest, AWatchThatAnotherCallHasEndedIsNotCalledAnyMore) {
+  std::unique_ptr<ContainerWatch> watches[2];
+  int calls[2] = {};
+  std::atomic<bool> areBothThere = false;
+  for (int i = 0; i < 2; ++i) {
+    const auto endOther = [&, i] {
+      if (areBothThere && ++calls[i] == 1) watches[1 - i].reset();
+    };
+    watches[i] = documents->watch(folder, endOther).value();
+  }
+  areBothThere = true;
+  // Once it is woken for a second thing, all have been for the first.
+  std::counting_semaphore<> fence{0};
+  const auto last = documents->watch(folder, [&] { fence.release(); }).value();
+  for (const char* file : {"folder/one", "folder/two"}) {
+    home.writeFile(file);
+    ASSERT_TRUE(fence.try_acquire_for(std::chrono::seconds(30)));
+  }
+  EXPECT_NE(calls[0] > 0, calls[1] > 0);
 }
 
 }  // namespace
