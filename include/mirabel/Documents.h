@@ -157,8 +157,9 @@ class MIRABEL_EXPORT Documents {
   [[nodiscard]] virtual Result<UniqueFd> openFile(std::string_view identifier, Access access) = 0;
 
   // Operations. Handlers are called exactly once, on any thread, perhaps before the call returns,
-  // with the item as it is then. On success the change is on disk; after a crash it is done or
-  // undone, never half. Of a file with several hard links the name at the target's path is
+  // with the item as it is then, and before the documents are gone: what the service has not
+  // answered until then ends with ENOTCONN. On success the change is on disk; after a crash it is
+  // done or undone, never half. Of a file with several hard links the name at the target's path is
   // changed, one of them where it has none, and the others stay.
   // Errors: `VesselErrorCode::noSuchItem` for an identifier that leads nowhere, and for a document
   // that is not at the target's path any more; `VesselErrorCode::collision`, or where what is in

@@ -34,10 +34,16 @@ std::string ownerOfName(sdbus::IConnection& connection) {
 
 class BusConnection::Pending {
  public:
-  std::uint64_t add(Handler handle) {
-    const std::lock_guard lock(mutex_);
-    handlers_.emplace(++last_, std::move(handle));
-    return last_;
+  /// Nothing where it was refused.
+  std::optional<std::uint64_t> add(Handler handle) {
+    std::unique_lock lock(mutex_);
+    if (!refusal_) {
+      handlers_.emplace(++last_, std::move(handle));
+      return last_;
+    }
+    lock.unlock();
+    handle(nullptr, *refusal_);
+    return {};
   }
   void answer(std::uint64_t number, sdbus::Message* reply, const Error& error) {
     std::unique_lock lock(mutex_);
@@ -45,8 +51,10 @@ class BusConnection::Pending {
     lock.unlock();
     if (node) node.mapped()(reply, error);
   }
+  /// Those to come as well.
   void refuseAll(const Error& error) {
     std::unique_lock lock(mutex_);
+    if (!refusal_) refusal_ = error;
     const auto refused = std::exchange(handlers_, {});
     lock.unlock();
     for (const auto& [number, handle] : refused)
@@ -57,9 +65,20 @@ class BusConnection::Pending {
   std::mutex mutex_;
   std::uint64_t last_ = 0;
   std::map<std::uint64_t, Handler> handlers_;
+  std::optional<Error> refusal_;  ///< stays as it is once it is there
 };
 
 BusConnection::BusConnection() : pending_(std::make_shared<Pending>()) {}
+
+BusConnection::~BusConnection() {
+  end();
+}
+
+void BusConnection::end() {
+  if (loop_) loop_->end();
+  isLost_ = true;
+  pending_->refuseAll(Error::posix(ENOTCONN, "the answer is not waited for any more"));
+}
 
 std::shared_ptr<BusConnection> BusConnection::open() {
   // Where neither is set there is no session, and looking for its bus would take its time.
@@ -176,20 +195,22 @@ sdbus::MethodReply BusConnection::sendToOwner(const char* interface, const char*
 
 void BusConnection::callAsync(const char* interface, const char* method, const Write& write,
                               Handler handle) {
-  const std::uint64_t number = pending_->add(std::move(handle));
+  const auto number = pending_->add(std::move(handle));
+  if (!number) return;
   try {
     sdbus::IProxy& service = owner();
     auto message = service.createMethodCall(interface, method);
     if (write) write(message);
     service.callMethod(
         message,
-        [pending = pending_, number](sdbus::MethodReply& reply, const sdbus::Error* error) {
+        [pending = pending_, number = *number](sdbus::MethodReply& reply,
+                                               const sdbus::Error* error) {
           if (error == nullptr) return pending->answer(number, &reply, {});
           pending->answer(number, nullptr, errorFromBus(BusError::read(reply, *error)));
         },
         withoutTimeout);
   } catch (const sdbus::Error& error) {
-    pending_->answer(number, nullptr, errorFromBus(error));
+    pending_->answer(*number, nullptr, errorFromBus(error));
   }
 }
 

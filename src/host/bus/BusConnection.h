@@ -28,6 +28,13 @@ class BusConnection {
   /// Whether there is a session bus that can be reached.
   [[nodiscard]] static bool hasBus();
 
+  ~BusConnection();
+  BusConnection(const BusConnection&) = delete;
+  BusConnection& operator=(const BusConnection&) = delete;
+  /// Has what waits for answers told that there will be none, POSIX ENOTCONN, and whoever asks from
+  /// now on. Waits for what is being handled. Not on the connection's thread.
+  void end();
+
   using Write = std::function<void(sdbus::Message& call)>;
   using Handler = std::function<void(sdbus::Message* reply, const Error& error)>;
 
@@ -66,7 +73,7 @@ class BusConnection {
 
  private:
   BusConnection();
-  /// What waits for answers; those that come no more, for the bus has gone, are refused.
+  /// What waits for answers; those that come no more are refused.
   class Pending;
 
   [[nodiscard]] static Error deadlock();

@@ -19,9 +19,10 @@ BusLoop::BusLoop(sdbus::IConnection& connection, std::function<void()> lost)
         }
       }) {}
 
-BusLoop::~BusLoop() {
+void BusLoop::end() {
+  if (!thread_.joinable()) return;
   connection_.leaveEventLoop();
-  if (thread_.joinable()) thread_.join();
+  thread_.join();
 }
 
 }  // namespace mirabel::bus

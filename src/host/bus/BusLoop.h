@@ -15,9 +15,12 @@ class BusLoop {
  public:
   /// The connection outlives it. `lost` is called on that thread, at most once.
   BusLoop(sdbus::IConnection& connection, std::function<void()> lost);
-  ~BusLoop();
+  ~BusLoop() { end(); }
   BusLoop(const BusLoop&) = delete;
   BusLoop& operator=(const BusLoop&) = delete;
+
+  /// Drives no more, and waits for what the thread is at. Not on that thread, nor on two.
+  void end();
 
   /// Whether the caller is on that thread, where nothing that has yet to come can be waited for.
   [[nodiscard]] bool isOnItsThread() const {

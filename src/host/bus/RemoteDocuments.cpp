@@ -166,7 +166,9 @@ RemoteDocuments::RemoteDocuments(std::shared_ptr<BusConnection> connection, Home
       });
 }
 
-RemoteDocuments::~RemoteDocuments() = default;
+RemoteDocuments::~RemoteDocuments() {
+  connection_->end();
+}
 
 Documents::ItemResult RemoteDocuments::item(std::string_view identifier) {
   return connection_->call(providerInterface, "GetItem", arguments(Identifier(identifier)),

@@ -1,8 +1,11 @@
 #include <cerrno>
 #include <functional>
 #include <future>
+#include <mutex>
 #include <new>
+#include <optional>
 #include <stdexcept>
+#include <vector>
 
 #include "host/LocalDocuments.h"
 #include "host/bus/BusCall.h"
@@ -30,6 +33,16 @@ class BusHandlers : public ServiceFixture {
     begin();
     connection->enterEventLoopAsync();
   }
+  /// What `RemoteDocuments::connect` asks for.
+  void answerGetHome() {
+    object->registerMethod(bus::managerInterface, "GetHome", "", "ayay",
+                           [this](const sdbus::MethodCall& call) {
+                             auto reply = call.createReply();
+                             bus::write(reply, dataFromString(places.home));
+                             bus::write(reply, dataFromString(places.stateFolder));
+                             reply.send();
+                           });
+  }
   /// As other types than the service does.
   void answerWithText(const char* interface, const char* method, const char* arguments) {
     object->registerMethod(interface, method, arguments, "s", [](const sdbus::MethodCall& call) {
@@ -43,6 +56,7 @@ class BusHandlers : public ServiceFixture {
     connection->requestName(bus::serviceName);
   }
 
+  const HomePlaces places{"/home/me", "/home/me/.local/state/mirabel"};
   std::unique_ptr<sdbus::IConnection> connection;
   std::unique_ptr<sdbus::IObject> object;
 };
@@ -91,14 +105,7 @@ TEST_F(BusHandlers, OfSomebodyWhoNeverAnswersAreNotWaitedFor) {
 }
 
 TEST_F(BusHandlers, WhoseAnswersAreOfOtherTypesGiveErrors) {
-  const HomePlaces places{"/home/me", "/home/me/.local/state/mirabel"};
-  object->registerMethod(bus::managerInterface, "GetHome", "", "ayay",
-                         [&](const sdbus::MethodCall& call) {
-                           auto reply = call.createReply();
-                           bus::write(reply, dataFromString(places.home));
-                           bus::write(reply, dataFromString(places.stateFolder));
-                           reply.send();
-                         });
+  answerGetHome();
   answerWithText(bus::managerInterface, "GetStatus", "");
   answerWithText(bus::providerInterface, "GetItem", "s");
   answerWithText(bus::operationsInterface, "Trash", "sa{sv}");
@@ -117,6 +124,35 @@ TEST_F(BusHandlers, WhoseAnswersAreOfOtherTypesGiveErrors) {
   Documents::ItemResult result;
   ASSERT_NO_THROW(result = told.get());
   EXPECT_TRUE(result.error().isPosix(EIO));
+}
+
+TEST_F(BusHandlers, WhoseAnswersNeverComeLeaveNobodyWaiting) {
+  constexpr std::size_t number = 5;
+  answerGetHome();
+  std::mutex mutex;
+  std::vector<sdbus::MethodCall> kept;
+  object->registerMethod(bus::operationsInterface, "Delete", "sa{sv}", "",
+                         [&](const sdbus::MethodCall& call) {
+                           const std::lock_guard lock(mutex);
+                           kept.push_back(call);
+                         });
+  begin();
+  connection->enterEventLoopAsync();
+  std::unique_ptr<Documents> documents = bus::RemoteDocuments::connect(places);
+  ASSERT_NE(documents, nullptr);
+  std::vector<std::optional<Error>> told;
+  const auto tell = [&](const std::optional<Error>& error) { told.push_back(error); };
+  for (std::size_t i = 1; i < number; ++i)
+    documents->remove("did=1", tell);
+  documents->remove("did=1", [&, all = documents.get()](const std::optional<Error>& error) {
+    tell(error);
+    all->remove("did=2", tell);
+  });
+  documents.reset();
+  ASSERT_EQ(told.size(), number + 1);
+  for (const auto& error : told)
+    EXPECT_TRUE(error && error->isPosix(ENOTCONN));
+  connection->leaveEventLoop();
 }
 
 }  // namespace
