@@ -98,7 +98,9 @@ void importDocument(Documents& documents, const CallPointer& call, const std::st
   if (!name) return;
   // Before anything is copied for somebody who has no place to put it.
   if (auto place = documents.item(parent); !place) return call->fail(place.error());
-  auto staged = StagedImport::of(file.get(), *name, stagingFolder, stopping);
+  const FileCalls calls(
+      [&](std::string_view) { return stopping.stop_requested() ? ECANCELED : 0; });
+  auto staged = StagedImport::of(file.get(), *name, stagingFolder, calls);
   if (!staged) return call->fail(staged.error());
   const auto kept = std::make_shared<StagedImport>(*std::move(staged));
   documents.importDocument(kept->path(), parent, [call, kept](const Documents::ItemResult& result) {

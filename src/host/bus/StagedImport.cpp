@@ -1,18 +1,17 @@
 #include "host/bus/StagedImport.h"
 
-#include <array>
 #include <cerrno>
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
-#include <string_view>
 #include <sys/stat.h>
 #include <system_error>
 #include <unistd.h>
 #include <utility>
 
-#include "linux/kernel/FileReplacement.h"
+#include "linux/operations/FileCopy.h"
 #include "linux/operations/ItemNames.h"
+#include "linux/operations/OperationProgress.h"
 #include "mirabel/UniqueFd.h"
 
 namespace mirabel::bus {
@@ -20,9 +19,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr std::size_t pieceSize = 1 << 20;
-// Between two of these it is seen whether to go on.
-constexpr std::size_t kernelPieceSize = 1 << 24;
 constexpr mode_t permissions = 0777;
 
 Result<void> requireReadableFile(int file, const struct stat& status) {
@@ -34,27 +30,15 @@ Result<void> requireReadableFile(int file, const struct stat& status) {
   return {};
 }
 
-// The kernel copies by itself where both files are on one volume, and shares blocks where it can.
-Result<void> copyAll(int from, int to, const std::stop_token& stopping) {
-  off_t position = 0;
-  while (!stopping.stop_requested()) {
-    const ssize_t count = ::copy_file_range(from, &position, to, nullptr, kernelPieceSize, 0);
-    if (count == 0) break;
-    if (count < 0 && errno == EINTR) continue;
-    if (count < 0) break;
-  }
-  // It also says nothing of files that the kernel makes up as they are read.
-  std::string piece(pieceSize, '\0');
-  while (true) {
-    if (stopping.stop_requested()) return fail(Error::posix(ECANCELED));
-    const ssize_t count = ::pread(from, piece.data(), piece.size(), position);
-    if (count < 0 && errno == EINTR) continue;
-    if (count < 0) return fail(Error::posix(errno));
-    if (count == 0) return {};
-    const std::string_view bytes(piece.data(), static_cast<std::size_t>(count));
-    if (auto written = writeAll(to, bytes); !written) return written;
-    position += count;
-  }
+// Read through a descriptor of its own the position is not the caller's. What may not be opened
+// once more can be read all the same.
+Result<void> copyContents(int from, int to, const FileCalls& calls) {
+  const auto own = calls.reopen(from, O_RDONLY);
+  OperationProgress unasked;
+  FileCopy copy(calls, unasked, CopyKind::copy);
+  const auto copied = own ? copy.copyWhole(own->get(), to, FileCopy::Position::own)
+                          : copy.copyWhole(from, to, FileCopy::Position::shared);
+  return copied ? Result<void>() : fail(copied.error());
 }
 
 // What can be read has to stay readable for whoever imports it. A file without a name, as programs
@@ -68,8 +52,7 @@ Result<void> copyPermissions(const struct stat& from, int to) {
 }  // namespace
 
 Result<StagedImport> StagedImport::of(int file, const std::string& name,
-                                      const std::string& stagingFolder,
-                                      const std::stop_token& stopping) {
+                                      const std::string& stagingFolder, const FileCalls& calls) {
   struct stat status {};
   if (::fstat(file, &status) != 0) return fail(Error::posix(errno));
   if (auto readable = requireReadableFile(file, status); !readable) return fail(readable.error());
@@ -84,7 +67,7 @@ Result<StagedImport> StagedImport::of(int file, const std::string& name,
   const UniqueFd copy(
       ::open(staged.path_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
   if (!copy) return fail(Error::posix(errno));
-  if (auto copied = copyAll(file, copy.get(), stopping); !copied) return fail(copied.error());
+  if (auto copied = copyContents(file, copy.get(), calls); !copied) return fail(copied.error());
   if (auto set = copyPermissions(status, copy.get()); !set) return fail(set.error());
   return staged;
 }

@@ -1,9 +1,9 @@
 #pragma once
 
-#include <stop_token>
 #include <string>
 #include <utility>
 
+#include "linux/operations/FileCalls.h"
 #include "mirabel/Error.h"
 
 namespace mirabel::bus {
@@ -16,10 +16,11 @@ class StagedImport {
   /// `file` is left open, with its position where it was. The copy has its permissions; that of a
   /// file without a name, which nobody chose any for, is the user's alone. POSIX errors: EBADF
   /// where it is not open for reading, EISDIR, ENOTSUP for what is no regular file; EINVAL and
-  /// ENAMETOOLONG for the name; ECANCELED once it is to stop; those of writing.
+  /// ENAMETOOLONG for the name; EAGAIN for a file that is written to all the time; those of
+  /// writing, and of the check of `calls`, which may have it end.
   [[nodiscard]] static Result<StagedImport> of(int file, const std::string& name,
                                                const std::string& stagingFolder,
-                                               const std::stop_token& stopping);
+                                               const FileCalls& calls);
   StagedImport(StagedImport&& other) noexcept : folder_(std::exchange(other.folder_, {})) {
     path_.swap(other.path_);
   }

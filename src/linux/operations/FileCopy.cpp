@@ -20,6 +20,8 @@ namespace {
 constexpr std::size_t mostUnsynced = 128;
 constexpr std::size_t mostUnsyncedPairs = 32;
 constexpr std::size_t bufferSize = 64u << 10;
+// Between two of these it is seen whether to go on.
+constexpr std::int64_t kernelPieceSize = 16 << 20;
 constexpr int mostAttempts = 3;
 
 bool isUnchanged(const ObjectStatus& before, const ObjectStatus& after) {
@@ -46,27 +48,31 @@ std::pair<std::int64_t, std::int64_t> dataAfter(int file, std::int64_t from, std
 Result<void> FileCopy::copy(UniqueFd source, int folder, const std::string& name) {
   auto made = calls_.open(folder, name, O_RDWR | O_CREAT | O_EXCL, 0600);
   if (!made) return fail(made.error());
-  for (int attempt = 1;; ++attempt) {
-    const auto before = calls_.status(source.get());
-    if (!before) return fail(before.error());
-    if (before->kind != FileKind::regular) return fail(Error::posix(EAGAIN));
-    // Of an attempt before this one.
-    if (attempt > 1 && ::ftruncate(made->get(), 0) != 0) return fail(Error::posix(errno));
-    if (auto copied = copyContents(source.get(), *before, made->get()); !copied) return copied;
-    const auto after = calls_.status(source.get());
-    if (!after) return fail(after.error());
-    if (isUnchanged(*before, *after)) {
-      auto done = copyProperties(source.get(), *before, made->get());
-      if (!done) return done;
-      break;
-    }
-    if (attempt == mostAttempts) return fail(Error::posix(EAGAIN));
-  }
+  const auto status = copyWhole(source.get(), made->get(), Position::own);
+  if (!status) return fail(status.error());
+  if (auto done = copyProperties(source.get(), *status, made->get()); !done) return done;
   calls_.beginWriting(made->get());
   progress_.entriesCopied.fetch_add(1, std::memory_order_relaxed);
   unsynced_.push_back({kind_ == CopyKind::move ? std::move(source) : UniqueFd(), std::move(*made)});
   const std::size_t most = kind_ == CopyKind::move ? mostUnsyncedPairs : mostUnsynced;
   return unsynced_.size() < most ? Result<void>() : flush();
+}
+
+Result<ObjectStatus> FileCopy::copyWhole(int source, int copy, Position position) {
+  for (int attempt = 1;; ++attempt) {
+    auto before = calls_.status(source);
+    if (!before) return fail(before.error());
+    if (before->kind != FileKind::regular) return fail(Error::posix(EAGAIN));
+    // Of an attempt before this one.
+    if (attempt > 1 && ::ftruncate(copy, 0) != 0) return fail(Error::posix(errno));
+    if (auto copied = copyContents(source, *before, copy, position); !copied)
+      return fail(copied.error());
+    const auto after = calls_.status(source);
+    if (!after) return fail(after.error());
+    if (isUnchanged(*before, *after)) return before;
+    if (attempt == mostAttempts)
+      return fail(Error::posix(EAGAIN, "it was written to while it was copied"));
+  }
 }
 
 Result<void> FileCopy::flush() {
@@ -79,7 +85,8 @@ Result<void> FileCopy::flush() {
   return {};
 }
 
-Result<void> FileCopy::copyContents(int source, const ObjectStatus& status, int copy) {
+Result<void> FileCopy::copyContents(int source, const ObjectStatus& status, int copy,
+                                    Position position) {
   if (auto checked = calls_.check("copy contents"); !checked) return checked;
   const auto size = static_cast<std::int64_t>(status.size);
   if (size > 0) {
@@ -92,7 +99,8 @@ Result<void> FileCopy::copyContents(int source, const ObjectStatus& status, int 
     if (auto copied = copyByHand(source, copy, 0, INT64_MAX); !copied) return copied;
   }
   for (std::int64_t from = 0; from < size;) {
-    const auto [start, stop] = dataAfter(source, from, size);
+    const auto [start, stop] =
+        position == Position::own ? dataAfter(source, from, size) : std::pair(from, size);
     if (start < stop) {
       if (auto copied = copyRange(source, copy, start, stop); !copied) return copied;
     }
@@ -112,10 +120,11 @@ Result<bool> FileCopy::clone(int source, int copy) {
 
 Result<void> FileCopy::copyRange(int source, int copy, std::int64_t from, std::int64_t to) {
   while (from < to && mayCopyInKernel_) {
+    if (auto checked = calls_.check("go on copying"); !checked) return checked;
     off64_t in = from;
     off64_t out = from;
-    const ssize_t copied =
-        ::copy_file_range(source, &in, copy, &out, static_cast<std::size_t>(to - from), 0);
+    const auto wanted = static_cast<std::size_t>(std::min(to - from, kernelPieceSize));
+    const ssize_t copied = ::copy_file_range(source, &in, copy, &out, wanted, 0);
     if (copied < 0 && errno == EINTR) continue;
     if (copied < 0 && !cannot(errno)) return fail(Error::posix(errno));
     if (copied < 0) mayCopyInKernel_ = false;
@@ -129,6 +138,7 @@ Result<void> FileCopy::copyRange(int source, int copy, std::int64_t from, std::i
 Result<void> FileCopy::copyByHand(int source, int copy, std::int64_t from, std::int64_t to) {
   std::vector<char> buffer(bufferSize);
   while (from < to) {
+    if (auto checked = calls_.check("go on copying"); !checked) return checked;
     const auto wanted = std::min<std::int64_t>(to - from, bufferSize);
     const ssize_t count = ::pread(source, buffer.data(), static_cast<std::size_t>(wanted), from);
     if (count < 0 && errno == EINTR) continue;

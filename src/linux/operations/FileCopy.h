@@ -24,8 +24,14 @@ class FileCopy {
       : calls_(calls), progress_(progress), kind_(kind) {}
 
   /// Copies the regular file that is open as `source` into a new file (`folder`, `name`). It is on
-  /// disk only after `flush`. EAGAIN when the source changed each time that it was read.
+  /// disk only after `flush`. The errors of `copyWhole`.
   [[nodiscard]] Result<void> copy(UniqueFd source, int folder, const std::string& name);
+  /// Copies the contents of the regular file that is open as `source` into the empty one that is
+  /// open as `copy`, and answers what the source was like meanwhile. Its position moves, unless it
+  /// is somebody else's too: then holes are filled. EAGAIN when the source changed each time that
+  /// it was read.
+  enum class Position { own, shared };
+  [[nodiscard]] Result<ObjectStatus> copyWhole(int source, int copy, Position position);
   /// Has all that was copied on disk. POSIX errors, EIO for a copy that is not like its source.
   [[nodiscard]] Result<void> flush();
 
@@ -34,7 +40,8 @@ class FileCopy {
   [[nodiscard]] Result<void> copyProperties(int source, const ObjectStatus& status, int copy) const;
 
  private:
-  [[nodiscard]] Result<void> copyContents(int source, const ObjectStatus& status, int copy);
+  [[nodiscard]] Result<void> copyContents(int source, const ObjectStatus& status, int copy,
+                                          Position position);
   [[nodiscard]] Result<bool> clone(int source, int copy);
   [[nodiscard]] Result<void> copyRange(int source, int copy, std::int64_t from, std::int64_t to);
   [[nodiscard]] Result<void> copyByHand(int source, int copy, std::int64_t from, std::int64_t to);
