@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <functional>
 #include <memory>
 #include <sdbus-c++/sdbus-c++.h>
@@ -8,6 +9,7 @@
 
 #include "host/bus/BusErrors.h"
 #include "host/bus/BusItems.h"
+#include "host/bus/CallSize.h"
 #include "host/bus/Callers.h"
 #include "mirabel/Error.h"
 
@@ -35,6 +37,8 @@ class BusCall {
 
   /// Has the next argument be the first again.
   void readAgain() { message_.rewind(true); }
+  /// See `sizeOfArguments`; before any of them is read.
+  [[nodiscard]] std::size_t size(std::size_t most) { return sizeOfArguments(message_, most); }
 
   [[nodiscard]] Caller& caller() const { return *caller_; }
 

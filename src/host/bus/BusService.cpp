@@ -35,6 +35,13 @@ constexpr std::size_t operationsOfACaller = 2;
 constexpr std::size_t mostWaiting = 4096;
 // Each holds a descriptor, of which the whole service has a limited number.
 constexpr std::size_t mostFilesWaiting = 128;
+// Arguments are names, paths, words and what the service has handed out; there is no method that
+// takes so much of any.
+constexpr std::size_t mostBytesWaiting = 4u << 20;
+
+constexpr CallLane::Limits limits(std::size_t threads, std::size_t mostRunning) {
+  return {threads, mostRunning, mostWaiting, mostFilesWaiting, mostBytesWaiting};
+}
 
 // A burst of calls leaves freed memory in the allocator and pages of the databases in their caches.
 // Short, so that it is a burst and not the day that memory is kept for; what was given back costs a
@@ -117,14 +124,16 @@ class BusService::Impl {
 
   void add(BusMethod method) {
     // Descriptors within a variant, or that no argument names, can't be told before it is read.
-    const auto holds = std::string_view(method.inputSignature).find('h') == std::string_view::npos
-                           ? CallLane::Holds::memory
-                           : CallLane::Holds::file;
-    const auto answer = [this, holds, lane = method.lane, answer = std::move(method.answer),
+    const bool isWithFile =
+        std::string_view(method.inputSignature).find('h') != std::string_view::npos;
+    const auto answer = [this, isWithFile, lane = method.lane, answer = std::move(method.answer),
                          atOnce = std::move(method.answerAtOnce)](sdbus::MethodCall message) {
       memory_.used();
       const std::string name = message.getSender();
       const auto call = std::make_shared<BusCall>(std::move(message), callers_.of(name));
+      const CallLane::Holds holds{call->size(mostBytesWaiting), isWithFile};
+      if (holds.bytes > mostBytesWaiting)
+        return call->fail(Error::posix(E2BIG, "a call may have arguments of 4 MiB at most"));
       if (atOnce && answersAtOnce(atOnce, *call)) return;
       const auto run = [call, answer](std::shared_ptr<void> turn) {
         call->keepTurn(std::move(turn));
@@ -166,7 +175,7 @@ class BusService::Impl {
     // Not here, where the bus is driven: a signal that is being sent would wait for this. Where the
     // lane has ended, so does the service, and all callers leave.
     static_cast<void>(
-        enumerations_.submit(name, [this, caller](const auto&) { callers_.leave(caller); }));
+        enumerations_.submit(name, [this, caller](const auto&) { callers_.leave(caller); }, {}));
   }
 
   void signal(const std::string& caller, const std::string& container) {
@@ -188,9 +197,9 @@ class BusService::Impl {
   std::unique_ptr<sdbus::IObject> object_;
   sdbus::Slot leaving_;
   std::stop_source stopping_;
-  CallLane lookups_{{lookupThreads, 1, mostWaiting, mostFilesWaiting}};
-  CallLane enumerations_{{enumerationThreads, 1, mostWaiting, mostFilesWaiting}};
-  CallLane operations_{{operationThreads, operationsOfACaller, mostWaiting, mostFilesWaiting}};
+  CallLane lookups_{limits(lookupThreads, 1)};
+  CallLane enumerations_{limits(enumerationThreads, 1)};
+  CallLane operations_{limits(operationThreads, operationsOfACaller)};
   std::atomic<bool> hasStopped_ = false;
   std::mutex answeringAtOnce_;
   std::unique_ptr<BusLoop> loop_;

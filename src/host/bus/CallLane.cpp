@@ -33,9 +33,11 @@ bool CallLane::submit(const std::string& caller, Call call, Holds holds) {
   if (mustEnd_) return false;
   Waiting& waiting = waiting_[caller];
   if (waiting.calls.size() >= limits_.mostWaiting) return false;
-  if (holds == Holds::file && waiting.files >= limits_.mostFilesWaiting) return false;
+  if (holds.isFile && waiting.files >= limits_.mostFilesWaiting) return false;
+  if (holds.bytes > limits_.mostBytesWaiting - waiting.bytes) return false;
   waiting.calls.push_back({std::move(call), holds});
-  if (holds == Holds::file) ++waiting.files;
+  if (holds.isFile) ++waiting.files;
+  waiting.bytes += holds.bytes;
   queueIfItCanRun(caller, waiting);
   return true;
 }
@@ -56,6 +58,7 @@ void CallLane::forget(const std::string& caller) {
   if (found == waiting_.end()) return;
   dropped.swap(found->second.calls);
   found->second.files = 0;
+  found->second.bytes = 0;
   if (found->second.running == 0 && !found->second.isInTurn) waiting_.erase(found);
 }
 
@@ -85,7 +88,8 @@ void CallLane::run() {
     }
     auto [call, holds] = std::move(found->second.calls.front());
     found->second.calls.pop_front();
-    if (holds == Holds::file) --found->second.files;
+    if (holds.isFile) --found->second.files;
+    found->second.bytes -= holds.bytes;
     ++found->second.running;
     queueIfItCanRun(caller, found->second);
     lock.unlock();

@@ -22,6 +22,7 @@ class CallLane {
     std::size_t mostRunning;       ///< calls of one caller at a time
     std::size_t mostWaiting;       ///< calls that a caller may have waiting
     std::size_t mostFilesWaiting;  ///< those among them that hold a file open meanwhile
+    std::size_t mostBytesWaiting;  ///< that they hold together
   };
   explicit CallLane(Limits limits);
   ~CallLane() { end(); }
@@ -36,9 +37,12 @@ class CallLane {
   /// No turn may outlive the lane.
   using Call = std::function<void(std::shared_ptr<void> turn)>;
   /// What a call holds while it waits.
-  enum class Holds { memory, file };
+  struct Holds {
+    std::size_t bytes = 0;
+    bool isFile = false;
+  };
   /// False, and nothing is run, where the caller has too many waiting, or the lane has ended.
-  [[nodiscard]] bool submit(const std::string& caller, Call call, Holds holds = Holds::memory);
+  [[nodiscard]] bool submit(const std::string& caller, Call call, Holds holds);
   /// Drops what of that caller waits.
   void forget(const std::string& caller);
 
@@ -49,7 +53,8 @@ class CallLane {
   };
   struct Waiting {
     std::deque<Submitted> calls;
-    std::size_t files = 0;  ///< how many of the calls hold one
+    std::size_t files = 0;  ///< that the calls hold
+    std::size_t bytes = 0;
     std::size_t running = 0;
     bool isInTurn = false;  ///< whether it stands among the turns
   };

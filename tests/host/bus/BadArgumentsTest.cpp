@@ -183,6 +183,21 @@ TEST_F(BadArguments, OfAnotherTypeAreRefusedByTheBus) {
   }
 }
 
+TEST_F(BadArguments, ThatAreTooLargeAreNotKept) {
+  const std::string text(5 << 20, 'x');
+  const Data bytes(text.size());
+  const std::string tooLarge = "com.norvane.Vessel1.Error.POSIX.E2BIG";
+  EXPECT_EQ(client->operations("SetTagData", kept, bytes).error, tooLarge);
+  EXPECT_EQ(client->provider("Search", Texts{text}, BusOptions()).error, tooLarge);
+  EXPECT_EQ(client->provider("Search", Texts(1 << 20), BusOptions()).error, tooLarge);
+  // Whether an option is known or not, and however deep it lies.
+  BusOptions options;
+  for (int depth = 0; depth < 10; ++depth)
+    options = {{"nested", sdbus::Variant(options)}, {"bytes", sdbus::Variant(Data(1 << 19))}};
+  EXPECT_EQ(client->operations("Delete", kept, options).error, tooLarge);
+  expectItWorks("what is too large");
+}
+
 TEST_F(BadArguments, OfTheRightTypeGetAnAnswer) {
   const Data anchor = client->anchorOf(folder);
   auto listed = client->provider("ListItems", folder, Data());

@@ -17,15 +17,15 @@ using bus::CallLane;
 struct Crowd {
   static constexpr int callers = 3, each = 20;
 
-  explicit Crowd(std::size_t threads) : lane({threads, 1, each, 1}) {
+  explicit Crowd(std::size_t threads) : lane({threads, 1, each, 1, 0}) {
     for (std::size_t thread = 0; thread < threads; ++thread) {
       EXPECT_TRUE(lane.submit("gate" + std::to_string(thread),
-                              [this](const auto&) { everybodyAsked.wait(); }));
+                              [this](const auto&) { everybodyAsked.wait(); }, {}));
     }
     for (int caller = 0; caller < callers; ++caller) {
       for (int call = 0; call < each; ++call) {
         EXPECT_TRUE(lane.submit(std::to_string(caller),
-                                [this, caller, call](const auto&) { serve(caller, call); }));
+                                [this, caller, call](const auto&) { serve(caller, call); }, {}));
       }
     }
     everybodyAsked.count_down();
@@ -62,21 +62,24 @@ TEST(CallLane, CallersTakeTurnsAndEachIsServedInOrder) {
     EXPECT_EQ(call, next[caller]++);
 }
 
-TEST(CallLane, RefusesCallsOfACallerThatWouldHoldManyFiles) {
+TEST(CallLane, RefusesCallsOfACallerThatWouldHoldMuch) {
   std::mutex busy;
-  CallLane lane({1, 1, 5, 2});
+  CallLane lane({1, 1, 5, 2, 100});
   const std::lock_guard lock(busy);  // goes before the lane does, so that its call ends
   const auto waits = [&busy](const auto&) { const std::lock_guard untilFree(busy); };
   const auto nothing = [](const auto&) {};
+  const CallLane::Holds file{0, true};
   // Only what waits counts: this may have begun or not.
-  ASSERT_TRUE(lane.submit("one", waits));
-  EXPECT_TRUE(lane.submit("one", nothing, CallLane::Holds::file));
-  EXPECT_TRUE(lane.submit("one", nothing, CallLane::Holds::file));
-  EXPECT_FALSE(lane.submit("one", nothing, CallLane::Holds::file));
-  EXPECT_TRUE(lane.submit("one", nothing));
-  EXPECT_TRUE(lane.submit("other", nothing, CallLane::Holds::file));
+  ASSERT_TRUE(lane.submit("one", waits, {}));
+  EXPECT_TRUE(lane.submit("one", nothing, file));
+  EXPECT_TRUE(lane.submit("one", nothing, file));
+  EXPECT_FALSE(lane.submit("one", nothing, file));
+  EXPECT_TRUE(lane.submit("one", nothing, {60}));
+  EXPECT_FALSE(lane.submit("one", nothing, {41}));
+  EXPECT_TRUE(lane.submit("other", nothing, file));
+  EXPECT_TRUE(lane.submit("other", nothing, {100}));
   lane.forget("one");
-  EXPECT_TRUE(lane.submit("one", nothing, CallLane::Holds::file));
+  EXPECT_TRUE(lane.submit("one", nothing, {100, true}));
 }
 
 }  // namespace
