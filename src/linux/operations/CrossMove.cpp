@@ -17,19 +17,23 @@ Result<void> CrossMove::run(const ItemPlace& item, const OpenFolder& folder,
   if (auto allowed = mayBeTakenAway(item); !allowed) return allowed;
   auto copy = context_.pending.temporaryName(folder.path);
   if (!copy) return fail(copy.error());
-  auto done = TreeCopy(context_.calls, context_.progress, CopyKind::move)
-                  .run(item.folder.descriptor.get(), item.name, folder.descriptor.get(), *copy);
-  auto record = done ? recordOf(item, folder, name, *copy) : fail(done.error());
+  auto done =
+      TreeCopy(context_.calls, context_.progress, CopyKind::move)
+          .run(item.folder.descriptor.get(), item.name, folder.descriptor.get(), copy->name);
+  auto hidden = done ? context_.pending.temporaryName(item.folder.path) : fail(done.error());
+  auto record = hidden ? recordOf(item, folder, name, *copy, *hidden) : fail(hidden.error());
   if (record) done = context_.pending.begin(*record);
   if (!record) done = fail(record.error());
-  if (done) done = exchange(item, folder, *copy, *record);
+  if (hidden && !done) context_.pending.isGone(*hidden);
+  if (done) done = exchange(item, folder, copy->name, *hidden, *record);
   if (!done) {
     removeTemporary(context_, folder, *copy);
     return done;
   }
+  context_.pending.isGone(*copy);
   // From here on the hidden item is nothing but something to be removed. Where that can't be noted,
   // the next start does it: what is half removed would look like something to be kept.
-  if (context_.pending.end(*record)) removeTemporary(context_, item.folder, record->hiddenSource);
+  if (context_.pending.end(*record)) removeTemporary(context_, item.folder, *hidden);
   return {};
 }
 
@@ -47,26 +51,23 @@ Result<void> CrossMove::mayBeTakenAway(const ItemPlace& item) const {
 }
 
 Result<PendingMove> CrossMove::recordOf(const ItemPlace& item, const OpenFolder& folder,
-                                        const std::string& name, const std::string& copy) const {
-  auto made = pendingCopyAt(context_, folder.descriptor.get(), copy);
+                                        const std::string& name, const TemporaryName& copy,
+                                        const TemporaryName& hidden) const {
+  auto made = pendingCopyAt(context_, folder.descriptor.get(), copy.name);
   if (!made) return fail(made.error());
-  auto hidden = context_.pending.temporaryName(item.folder.path);
-  if (!hidden) return fail(hidden.error());
-  auto from = context_.pending.folderAt(item.folder.path);
-  auto to = context_.pending.folderAt(folder.path);
-  if (!from || !to) return fail(from ? to.error() : from.error());
-  return PendingMove{*std::move(from), item.name, *std::move(hidden),
-                     *std::move(to),   name,      *std::move(made)};
+  return PendingMove{hidden.folder, item.name, hidden.name, copy.folder, name, *std::move(made)};
 }
 
 /// After a failure the item has its name, and the copy has none.
 Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder,
-                                 const std::string& copy, const PendingMove& record) const {
+                                 const std::string& copy, const TemporaryName& hidden,
+                                 const PendingMove& record) const {
   const FileCalls& calls = context_.calls;
   const int from = item.folder.descriptor.get();
   const int to = folder.descriptor.get();
-  auto done = renameWithin(context_, from, item.name, record.hiddenSource);
+  auto done = renameWithin(context_, from, item.name, hidden.name);
   if (!done) {
+    context_.pending.isGone(hidden);
     static_cast<void>(context_.pending.end(record));
     return done;
   }
@@ -80,8 +81,10 @@ Result<void> CrossMove::exchange(const ItemPlace& item, const OpenFolder& folder
     }
   }
   if (done) return {};
-  if (giveNameBack(context_, item.folder, record.hiddenSource, item.name)) {
-    static_cast<void>(context_.pending.end(record));
+  if (giveNameBack(context_, item.folder, hidden.name, item.name)) {
+    // Whatever still had the hidden name when the record is gone would be removed.
+    if (forgetTemporary(context_, item.folder, hidden, Unreadable::refused))
+      static_cast<void>(context_.pending.end(record));
   } else {
     logError("\"" + item.folder.url(item.name).path() +
              "\" has a hidden name until the next start");

@@ -23,10 +23,11 @@ class CrossMove {
  private:
   [[nodiscard]] Result<void> mayBeTakenAway(const ItemPlace& item) const;
   [[nodiscard]] Result<PendingMove> recordOf(const ItemPlace& item, const OpenFolder& folder,
-                                             const std::string& name,
-                                             const std::string& copy) const;
+                                             const std::string& name, const TemporaryName& copy,
+                                             const TemporaryName& hidden) const;
   [[nodiscard]] Result<void> exchange(const ItemPlace& item, const OpenFolder& folder,
-                                      const std::string& copy, const PendingMove& record) const;
+                                      const std::string& copy, const TemporaryName& hidden,
+                                      const PendingMove& record) const;
   [[nodiscard]] Result<void> compare(const ItemPlace& item, const OpenFolder& folder,
                                      const std::string& copy, const PendingMove& record) const;
 

@@ -38,13 +38,13 @@ Result<URL> importItem(const OperationContext& context, const URL& source, const
   auto copy = context.pending.temporaryName(target->path);
   if (!copy) return fail(copy.error());
   auto done = TreeCopy(context.calls, context.progress, CopyKind::copy)
-                  .run(from->folder.get(), from->name, descriptor, *copy);
-  if (done) done = context.calls.rename(descriptor, *copy, descriptor, name);
+                  .run(from->folder.get(), from->name, descriptor, copy->name);
+  if (done) done = context.calls.rename(descriptor, copy->name, descriptor, name);
   if (!done) {
     removeTemporary(context, *target, *copy);
     return fail(operationError(done.error(), url));
   }
-  if (auto synced = syncFolder(context, descriptor); !synced) return fail(synced.error());
+  if (auto synced = forgetTemporary(context, *target, *copy); !synced) return fail(synced.error());
   return url;
 }
 

@@ -21,24 +21,31 @@ class FolderRemoval {
   Result<void> run() {
     if (auto examined = removal_.examine(top_.get()); !examined) return examined;
     auto hidden = context_.pending.temporaryName(item_.folder.path);
-    auto taken = hidden ? rename(item_.name, *hidden) : fail(hidden.error());
+    auto taken = hidden ? rename(item_.name, hidden->name) : fail(hidden.error());
+    if (hidden && !taken) context_.pending.isGone(*hidden);
     // Whoever removes something on a full disk wants to make room.
     if (!taken && isFull(taken.error())) return removeInPlace();
     if (!taken) return taken;
-    if (auto same = isExamined(*hidden); !same) {
-      if (!giveNameBack(context_, item_.folder, *hidden, item_.name)) {
+    if (auto same = isExamined(hidden->name); !same) {
+      if (giveNameBack(context_, item_.folder, hidden->name, item_.name)) {
+        static_cast<void>(forgetTemporary(context_, item_.folder, *hidden));
+      } else {
         logError("can't give \"" + item_.folder.url(item_.name).path() + "\" its name back");
       }
       return same;
     }
     auto done = syncFolder(context_, item_.folder.descriptor.get());
-    if (done) done = emptyAndRemove(*hidden);
-    // It is gone already as far as anybody can see.
-    if (done) static_cast<void>(syncFolder(context_, item_.folder.descriptor.get()));
-    if (done) return {};
+    if (done) done = emptyAndRemove(hidden->name);
+    if (done) {
+      // It is gone already as far as anybody can see.
+      static_cast<void>(forgetTemporary(context_, item_.folder, *hidden));
+      return {};
+    }
     // Nothing in it is removed: it gets its name back, unless that was given away meanwhile.
-    if (!removal_.hasRemoved() && rename(*hidden, item_.name)) return done;
-    context_.pending.keepOnRecord(item_.folder.path);
+    if (!removal_.hasRemoved() && rename(hidden->name, item_.name)) {
+      static_cast<void>(forgetTemporary(context_, item_.folder, *hidden));
+      return done;
+    }
     logError("what was in \"" + item_.folder.url(item_.name).path() +
              "\" is not all removed yet; " + done.error().description());
     return {};

@@ -111,12 +111,21 @@ Result<void> removeWhole(const OperationContext& context, int folder, const std:
 }
 
 void removeTemporary(const OperationContext& context, const OpenFolder& folder,
-                     const std::string& name) {
-  auto removed = removeWhole(context, folder.descriptor.get(), name);
-  if (removed || removed.error().isPosix(ENOENT)) return;
-  context.pending.keepOnRecord(folder.path);
-  logError("can't remove \"" + folder.url(name).path() + "\" yet; " +
+                     const TemporaryName& temporary) {
+  auto removed = removeWhole(context, folder.descriptor.get(), temporary.name);
+  if (removed || removed.error().isPosix(ENOENT)) {
+    static_cast<void>(forgetTemporary(context, folder, temporary));
+    return;
+  }
+  logError("can't remove \"" + folder.url(temporary.name).path() + "\" yet; " +
            removed.error().description());
+}
+
+Result<void> forgetTemporary(const OperationContext& context, const OpenFolder& folder,
+                             const TemporaryName& temporary, Unreadable unreadable) {
+  auto synced = syncFolder(context, folder.descriptor.get(), unreadable);
+  if (synced) context.pending.isGone(temporary);
+  return synced;
 }
 
 }  // namespace mirabel

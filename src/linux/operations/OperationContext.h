@@ -78,9 +78,13 @@ enum class Unreadable { passedOver, refused };
 /// Removes what lies at (`folder`, `name`), a folder with everything in it.
 [[nodiscard]] Result<void> removeWhole(const OperationContext& context, int folder,
                                        const std::string& name);
-/// The same for something of `PendingWork::temporaryName`; what can't be removed is left to the
-/// next start, with a line in the log.
+/// The same for what has such a name, if anything has; what can't be removed is left to the next
+/// start, with a line in the log.
 void removeTemporary(const OperationContext& context, const OpenFolder& folder,
-                     const std::string& name);
+                     const TemporaryName& temporary);
+/// Nothing has the name any more: so it is on disk, or else the next start looks once more.
+Result<void> forgetTemporary(const OperationContext& context, const OpenFolder& folder,
+                             const TemporaryName& temporary,
+                             Unreadable unreadable = Unreadable::passedOver);
 
 }  // namespace mirabel

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
+#include <iterator>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -18,6 +19,9 @@ constexpr const char* fileName = "pending";
 constexpr const char* damagedFileName = "pending.damaged";
 // More than that was not written by this program.
 constexpr std::size_t largestFile = 16u << 20;
+// Whoever works in the same few folders again and again has them noted once. Each is written anew
+// with every other.
+constexpr std::size_t mostUnused = 32;
 
 std::string keptPrefix() {
   return std::string(unfinishedNamePrefix) + "kept-";
@@ -29,14 +33,14 @@ std::string removedPrefix() {
   return std::string(unfinishedNamePrefix) + id.substr(0, 16) + "-";
 }
 
+/// Nothing of what can't be a record.
 Result<Data> readFile(int folder) {
   UniqueFd file(::openat(folder, fileName, O_RDONLY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK));
   if (!file) return fail(Error::posix(errno));
   struct stat status {};
   if (::fstat(file.get(), &status) != 0) return fail(Error::posix(errno));
-  if (!S_ISREG(status.st_mode) || static_cast<std::size_t>(status.st_size) > largestFile) {
-    return fail(Error::posix(EINVAL));
-  }
+  if (!S_ISREG(status.st_mode) || static_cast<std::size_t>(status.st_size) > largestFile)
+    return Data();
   Data bytes(static_cast<std::size_t>(status.st_size));
   errno = EIO;
   if (::pread(file.get(), bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
@@ -60,16 +64,20 @@ PendingRecords PendingWork::load() {
   const int folder = index_.stateFolder().descriptor();
   const auto bytes = readFile(folder);
   if (!bytes && bytes.error().isPosix(ENOENT)) return {};
+  const auto refuse = [this](std::int64_t code) {
+    unreadable_ = Error::posix(static_cast<int>(code),
+                               "what operations left behind can't be read from \"" +
+                                   index_.stateFolder().path() + "/" + fileName + "\"");
+  };
   if (!bytes) {
-    unreadable_ = bytes.error();
+    refuse(bytes.error().code);
     logError("can't read what operations left behind; " + bytes.error().description());
     return {};
   }
   auto records = PendingRecords::decode(*bytes);
   if (!records) {
     logError("what operations left behind is not known, the file is damaged");
-    if (::renameat(folder, fileName, folder, damagedFileName) != 0)
-      unreadable_ = Error::posix(errno);
+    if (::renameat(folder, fileName, folder, damagedFileName) != 0) refuse(errno);
     return {};
   }
   before_ = *std::move(records);
@@ -91,19 +99,38 @@ std::string PendingWork::nextName(std::string_view prefix) {
   return std::string(prefix) + std::to_string(++count_);
 }
 
-Result<std::string> PendingWork::temporaryName(const std::string& path) {
+std::vector<PendingWork::Removals>::iterator PendingWork::removalsIn(const PendingFolder& folder) {
+  return std::ranges::find(removals_, folder, &Removals::folder);
+}
+
+Result<TemporaryName> PendingWork::temporaryName(const std::string& path) {
   auto folder = folderAt(path);
   if (!folder) return fail(folder.error());
   const std::scoped_lock lock(mutex_);
-  const auto isNoted = [&](const PendingRemovals& each) { return each.folder == *folder; };
-  if (std::ranges::none_of(records_.removals, isNoted)) {
-    records_.removals.push_back({*std::move(folder), prefix_});
+  auto removals = removalsIn(*folder);
+  if (removals == removals_.end()) {
+    forgetUnused(mostUnused);
+    removals_.push_back({*folder});
     if (auto written = write(); !written) {
-      records_.removals.pop_back();
+      removals_.pop_back();
       return fail(written.error());
     }
+    removals = std::prev(removals_.end());
   }
-  return nextName(prefix_);
+  ++removals->names;
+  return TemporaryName{nextName(prefix_), *std::move(folder)};
+}
+
+void PendingWork::isGone(const TemporaryName& temporary) {
+  const std::scoped_lock lock(mutex_);
+  --removalsIn(temporary.folder)->names;
+}
+
+void PendingWork::forgetUnused(std::size_t most) {
+  const auto isUnused = [](const Removals& removals) { return removals.names == 0; };
+  auto unused = static_cast<std::size_t>(std::ranges::count_if(removals_, isUnused));
+  std::erase_if(removals_,
+                [&](const Removals& removals) { return isUnused(removals) && unused-- > most; });
 }
 
 std::string PendingWork::hiddenName() {
@@ -122,52 +149,40 @@ Result<PendingFolder> PendingWork::folderAt(const std::string& path) {
 
 Result<void> PendingWork::begin(const PendingMove& move) {
   const std::scoped_lock lock(mutex_);
-  records_.moves.push_back(move);
+  moves_.push_back(move);
   auto written = write();
-  if (!written) records_.moves.pop_back();
+  if (!written) moves_.pop_back();
   return written;
 }
 
 Result<void> PendingWork::end(const PendingMove& move) {
   const std::scoped_lock lock(mutex_);
-  std::erase(records_.moves, move);
+  std::erase(moves_, move);
   auto written = write();
-  if (!written) records_.moves.push_back(move);
+  if (!written) moves_.push_back(move);
   return written;
 }
 
 Result<void> PendingWork::begin(const PendingRename& rename) {
   const std::scoped_lock lock(mutex_);
-  records_.renames.push_back(rename);
+  renames_.push_back(rename);
   auto written = write();
-  if (!written) records_.renames.pop_back();
+  if (!written) renames_.pop_back();
   return written;
 }
 
 void PendingWork::end(const PendingRename& rename) {
   const std::scoped_lock lock(mutex_);
-  std::erase(records_.renames, rename);
+  std::erase(renames_, rename);
   // Found once more by the next start, it is seen to be done.
   static_cast<void>(write());
 }
 
-void PendingWork::keepOnRecord(const std::string& path) {
-  const std::scoped_lock lock(mutex_);
-  kept_.push_back(path);
-}
-
 void PendingWork::close() {
   const std::scoped_lock lock(mutex_);
-  // What a move has hidden is removed as one of these, by the start that finishes the move.
-  const auto isMovedFrom = [&](const PendingFolder& folder) {
-    return std::ranges::any_of(records_.moves, [&](const PendingMove& move) {
-      return move.sourceFolder == folder || move.folder == folder;
-    });
-  };
-  const auto isDone = [&](const PendingRemovals& each) {
-    return std::ranges::find(kept_, each.folder.path) == kept_.end() && !isMovedFrom(each.folder);
-  };
-  if (std::erase_if(records_.removals, isDone) > 0) static_cast<void>(write());
+  const std::size_t noted = removals_.size();
+  forgetUnused(0);
+  if (removals_.size() < noted) static_cast<void>(write());
 }
 
 Result<void> PendingWork::write() {
@@ -175,9 +190,10 @@ Result<void> PendingWork::write() {
   if (auto checked = calls_.check("note"); !checked) return checked;
   const int folder = index_.stateFolder().descriptor();
   PendingRecords all = before_;
-  append(all.removals, records_.removals);
-  append(all.moves, records_.moves);
-  append(all.renames, records_.renames);
+  for (const Removals& removals : removals_)
+    all.removals.push_back({removals.folder, prefix_});
+  append(all.moves, moves_);
+  append(all.renames, renames_);
   if (all.isEmpty()) {
     if (::unlinkat(folder, fileName, 0) != 0 && errno != ENOENT) return fail(Error::posix(errno));
     return ::fsync(folder) == 0 ? Result<void>() : fail(Error::posix(errno));

@@ -146,11 +146,31 @@ TEST_F(Recovery, WaitsForARootThatIsNotThere) {
 
 TEST_F(Recovery, RemovesNothingOnTheWordOfADamagedRecord) {
   home.writeFile("from/" + hidden, "x");
-  std::ofstream(state_ + "/pending") << "MRBPEND2 and then something else";
-  static_cast<void>(opened());
-  EXPECT_TRUE(fs::exists(home.at("from/" + hidden)));
-  EXPECT_TRUE(fs::exists(state_ + "/pending.damaged"));
-  EXPECT_TRUE(createFolder("to", "new"));
+  // The latter is larger than any.
+  for (const std::uintmax_t size : {40u, 17u << 20}) {
+    std::ofstream(state_ + "/pending") << "MRBPEND2 and then something else";
+    fs::resize_file(state_ + "/pending", size);
+    static_cast<void>(opened());
+    EXPECT_TRUE(fs::exists(home.at("from/" + hidden)));
+    EXPECT_TRUE(fs::remove(state_ + "/pending.damaged"));
+    makeFolder("to/folder");
+    EXPECT_EQ(remove("to/folder"), std::nullopt);
+    close();
+  }
+}
+
+TEST_F(Recovery, RecordDoesNotGrowWithTheFoldersThatWereWorkedIn) {
+  std::uintmax_t largest = 0;
+  for (int i = 0; i < 150; ++i) {
+    const std::string name = std::to_string(1000 + i);
+    makeFolder(name + "/folder");
+    ASSERT_EQ(remove(name + "/folder"), std::nullopt);
+    const std::uintmax_t size = fs::file_size(state_ + "/pending");
+    if (i == 50) largest = size + 100;
+    ASSERT_TRUE(i < 50 || size <= largest) << i << ": " << size;
+  }
+  close();
+  EXPECT_FALSE(hasPendingWork());
 }
 
 PendingRecords sample() {
