@@ -193,7 +193,8 @@ class MIRABEL_EXPORT Documents {
 
   // What the user says of a file; nothing given takes it away. It lies in an extended attribute of
   // the file, which stays as it was after an error: POSIX ENOTSUP where the file system has none,
-  // ENOSPC where there is no room for it, EACCES and EPERM.
+  // ENOSPC where there is no room for it, EACCES and EPERM. That of what can't hold any, such as a
+  // link, lies in the volume's state; errors of `ErrorDomain::store` too.
 
   virtual void setLastUsedDate(const std::string& identifier, const std::optional<Date>& date,
                                ItemHandler handler) = 0;

@@ -65,8 +65,7 @@ class FileOperations {
   virtual void vs_deleteWithCompletionHandler(const URL& item, ErrorHandler completionHandler) = 0;
 
   /// Runs `block` with the file open so that its attributes can be written, and answers what that
-  /// answers, or why the file could not be opened. When it answers a POSIX error, errno is its
-  /// code.
+  /// answers, or why the file could not be opened.
   [[nodiscard]] virtual std::optional<Error> vs_withReadWriteAccess(const URL& url,
                                                                     const AccessBlock& block) = 0;
 };

@@ -96,18 +96,12 @@ LocalVessel::ItemResult LocalVessel::storeFavoriteRank(const std::optional<Numbe
   return itemForIdentifier(identifier);
 }
 
-/// Writes the attribute, or removes it where there is no value. The error is that of the errno
-/// which the access left, whatever the steps inside it called their own.
+/// Writes the attribute, or removes it where there is no value.
 std::optional<Error> LocalVessel::writeAttribute(std::string_view name,
                                                  const std::optional<Data>& value,
                                                  const URL& url) const {
-  const FileOperations::AccessBlock write = [&](AttributeTarget& target) {
-    return setExtendedAttribute(target, value, name);
-  };
-  const auto failure = platform_.operations.vs_withReadWriteAccess(url, write);
-  const int code = errno;  // before anything else has a say in it
-  if (!failure) return {};
-  return Error::posix(code);
+  return platform_.operations.vs_withReadWriteAccess(
+      url, [&](AttributeTarget& target) { return setExtendedAttribute(target, value, name); });
 }
 
 }  // namespace mirabel

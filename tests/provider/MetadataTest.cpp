@@ -54,7 +54,7 @@ TEST_F(MetadataTest, WhatNoArchiveHoldsRemovesTheAttribute) {
   EXPECT_THAT(attributes(), IsEmpty());
 }
 
-TEST_F(MetadataTest, AFailedWriteIsTheErrnoThatItLeft) {
+TEST_F(MetadataTest, AFailedWriteIsTheErrorThatItHad) {
   const struct {
     std::function<void(const std::string&)> start;
     std::string attribute;
@@ -69,21 +69,18 @@ TEST_F(MetadataTest, AFailedWriteIsTheErrnoThatItLeft) {
   const struct {
     Op op;
     Error error;
-    int code;
   } failures[] = {
-      {Op::readWriteAccess, Error::posix(EACCES), EACCES},
-      {Op::attributeSet, Error::posix(ENOSPC), ENOSPC},
-      // An error that says nothing of errno counts for less than errno.
-      {Op::attributeSet, Error::file(FileErrorCode::writeNotPermitted), EDQUOT},
+      {Op::readWriteAccess, Error::posix(EACCES)},
+      {Op::attributeSet, Error::posix(ENOSPC, "with a detail")},
+      {Op::attributeSet, Error::store(11, "malformed")},
   };
   for (const auto& setter : setters) {
     for (const auto& failure : failures) {
       clear();
       attributes()[setter.attribute] = {1};
       fake.faults.fail(failure.op, failure.error);
-      errno = EDQUOT;
       setter.start(file);
-      EXPECT_EQ(done.error(), Error::posix(failure.code));
+      EXPECT_EQ(done.error(), failure.error);
       EXPECT_EQ(attributes()[setter.attribute], Data{1});
     }
     clear();

@@ -94,11 +94,9 @@ TEST_F(TrashTest, NotesThatCannotBeWrittenDoNotUndoTheMove) {
   EXPECT_TRUE(attributes().empty());
   EXPECT_THAT(log.messages(), Contains(error(line + Error::posix(EROFS).description())));
 
-  // The line tells errno, whatever error the access answered with.
   fake.volume.rename(after, before);
   clear();
-  fake.faults.fail(Op::attributeSet, Error::file(FileErrorCode::writeNotPermitted), 2);
-  errno = EDQUOT;
+  fake.faults.fail(Op::attributeSet, Error::posix(EDQUOT), 2);
   vessel->trashItemWithIdentifier(file, done.handler());
   EXPECT_TRUE(done.item()->isTrashed());
   EXPECT_TRUE(attributes().contains(attributename::trashDate));

@@ -77,18 +77,12 @@ void FakeFileOperations::vs_deleteWithCompletionHandler(const URL& item,
 
 std::optional<Error> FakeFileOperations::vs_withReadWriteAccess(const URL& url,
                                                                 const AccessBlock& block) {
-  const auto failing = [](Error error) {
-    if (error.domain == ErrorDomain::posix) errno = static_cast<int>(error.code);
-    return error;
-  };
   std::unique_lock lock(core_.mutex);
   const auto node = core_.look(Op::readWriteAccess, url);
   lock.unlock();
-  if (!node) return failing(node.error());
+  if (!node) return node.error();
   FakeAttributeTarget target(core_, *node);
-  auto outcome = block(target);
-  if (!outcome) return {};
-  return failing(*std::move(outcome));
+  return block(target);
 }
 
 void FakeFileOperations::report(Result<URL> outcome, URLHandler completionHandler) {

@@ -1,6 +1,5 @@
 #include "linux/operations/LinuxFileOperations.h"
 
-#include <cerrno>
 #include <utility>
 
 #include "linux/operations/FolderCreation.h"
@@ -96,13 +95,8 @@ void LinuxFileOperations::vs_deleteWithCompletionHandler(const URL& item,
 
 std::optional<Error> LinuxFileOperations::vs_withReadWriteAccess(const URL& url,
                                                                  const AccessBlock& block) {
-  std::optional<Error> error;
-  {
-    auto target = attributes_.open(url);
-    error = target ? block(**target) : std::optional(target.error());
-  }
-  if (error) errno = error->domain == ErrorDomain::posix ? static_cast<int>(error->code) : EIO;
-  return error;
+  auto target = attributes_.open(url);
+  return target ? block(**target) : std::optional(target.error());
 }
 
 }  // namespace mirabel
