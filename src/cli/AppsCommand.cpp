@@ -58,7 +58,7 @@ ExitCode runContainer(Program& program, const std::string& bundle) {
   if (documents == nullptr) return program.exitCode();
   const auto container = documents->applicationContainer(bundle);
   if (!container) {
-    return program.report(container.error(), "can't find the folder of " + bundle);
+    return program.report(container.error(), "can't find the folder of " + named(bundle));
   }
   if (!container->isAppLibrary) {
     program.note("the application does not show its documents: this folder is no app library");

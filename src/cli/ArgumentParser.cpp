@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "cli/TextOptions.h"
+#include "cli/UsageText.h"
 
 namespace mirabel {
 namespace {
@@ -102,7 +103,8 @@ void addAppCommands(CLI::App& app, Arguments& arguments) {
   addText(*icon, "ITEM", arguments.icon.item, "#bundle, or the path of its documents")
       ->required()
       ->type_name("");
-  addText(*icon, "-o,--output", arguments.icon.file, "The file that it goes to; it is replaced")
+  addText(*icon, "-o,--output", arguments.icon.file,
+          "The file that it goes to, which is replaced; - for standard output")
       ->required()
       ->type_name("FILE");
   icon->add_option("--size", arguments.icon.size, "Its width and height in pixels (256)")
@@ -148,11 +150,13 @@ void addCommands(CLI::App& app, Arguments& arguments) {
 }
 
 // One line, with exit code 2; the parser's own codes start at 100.
-int wrongUsage(const CLI::App& app, const std::vector<std::string>& arguments, std::string message,
-               Streams streams) {
+int wrongUsage(const CLI::App& app, const std::vector<std::string>& arguments,
+               const UsageFault& fault, Streams streams) {
   const auto commands = app.get_subcommands();
-  const std::string command = commands.empty() ? "" : commands.front()->get_name() + " ";
-  message += "; see mirabel " + command + "--help";
+  const bool isGlobal = !fault.option.empty() && app.get_option_no_throw(fault.option) != nullptr;
+  const std::string command =
+      commands.empty() || isGlobal ? "" : commands.front()->get_name() + " ";
+  const std::string message = fault.text + "; see mirabel " + command + "--help";
   // Where parsing failed, options that it did not come to are not set.
   const auto end = std::find(arguments.begin(), arguments.end(), "--");
   const bool asJSON = std::find(arguments.begin(), end, "--json") != end;
@@ -189,7 +193,7 @@ std::optional<int> ArgumentParser::parse(const std::vector<std::string>& argumen
   const Arguments nothing;
   parsed_ = nothing;
   if (const auto option = optionWithoutValue(arguments)) {
-    return wrongUsage(*app_, arguments, *option + " has no value", streams);
+    return wrongUsage(*app_, arguments, {*option + " has no value", ""}, streams);
   }
   auto guarded = withGuardedBrackets(arguments);
   // The parser takes its arguments from the back.
@@ -199,19 +203,22 @@ std::optional<int> ArgumentParser::parse(const std::vector<std::string>& argumen
   } catch (const CLI::ParseError& error) {
     // Help was asked for; it is that of the command, if one was named.
     if (error.get_exit_code() == 0) return app_->exit(error, streams.out, streams.err);
-    return wrongUsage(*app_, arguments, withoutGuards(error.what()), streams);
+    return wrongUsage(*app_, arguments, usageFault(*app_, error), streams);
   }
   if (parsed_.showVersion) {
     streams.out << "mirabel " MIRABEL_VERSION "\n";
     return 0;
   }
   if (app_->get_subcommands().empty()) {
+    if (parsed_.global.json)
+      return wrongUsage(*app_, arguments, {"no command is given", ""}, streams);
     streams.err << app_->help();
     return static_cast<int>(ExitCode::usage);
   }
   // Written so that what is no number is refused too.
   if (!(parsed_.timeoutSeconds >= 0 && parsed_.timeoutSeconds <= longestTimeout)) {
-    return wrongUsage(*app_, arguments, "--timeout takes 0 to 86400 seconds", streams);
+    return wrongUsage(*app_, arguments, {"--timeout takes 0 to 86400 seconds", "--timeout"},
+                      streams);
   }
   parsed_.global.timeout =
       std::chrono::milliseconds(static_cast<long>(parsed_.timeoutSeconds * 1000));

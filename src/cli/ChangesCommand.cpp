@@ -6,6 +6,7 @@
 #include "cli/ChangeBatch.h"
 #include "cli/Commands.h"
 #include "cli/ContainerArgument.h"
+#include "cli/Printing.h"
 
 namespace mirabel {
 namespace {
@@ -37,9 +38,9 @@ ExitCode runAnchor(Program& program, const std::string& item) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto container = find(*documents, item);
-  if (!container) return program.report(container.error(), "can't find " + item);
+  if (!container) return program.report(container.error(), "can't find " + named(item));
   const auto anchor = ChangeBatch::currentAnchor(**container);
-  if (!anchor) return program.report(anchor.error(), "can't take an anchor of " + item);
+  if (!anchor) return program.report(anchor.error(), "can't take an anchor of " + named(item));
   if (program.options().json) {
     program.out() << nlohmann::json{{"anchor", *anchor}}.dump() << '\n';
   } else {
@@ -51,7 +52,7 @@ ExitCode runAnchor(Program& program, const std::string& item) {
 ExitCode runChanges(Program& program, const ChangesOptions& options) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
-  const std::string failure = "can't tell the changes of " + options.item;
+  const std::string failure = "can't tell the changes of " + named(options.item);
   const auto container = find(*documents, options.item);
   if (!container) return program.report(container.error(), failure);
   const auto told = tellChanges(program, **container, options.since);

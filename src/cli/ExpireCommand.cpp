@@ -83,7 +83,7 @@ std::uint64_t difference(std::uint64_t before, std::uint64_t after) {
 ExitCode runExpire(Program& program, const ExpireOptions& options) {
   const auto reference = referenceDateFrom(options.olderThan, Date::now());
   if (!reference) {
-    return program.reportUsage("can't use " + options.olderThan +
+    return program.reportUsage("can't use " + named(options.olderThan) +
                                "; --older-than takes a date like 2026-11-21 or "
                                "2026-11-21T09:30:00Z, or an age like 30d, 12h, 2w, 45m or 90s");
   }

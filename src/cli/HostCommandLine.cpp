@@ -64,7 +64,10 @@ void addHostCommands(CLI::App& app, HostArguments& arguments, const std::string&
   addText(completion, "SHELL", arguments.shell, "bash, zsh or fish")
       ->required()
       ->type_name("")
-      ->check(CLI::IsMember({"bash", "zsh", "fish"}));
+      ->check([](const std::string& shell) {
+        const bool isKnown = shell == "bash" || shell == "zsh" || shell == "fish";
+        return isKnown ? "" : "is bash, zsh or fish";
+      });
 }
 
 std::optional<ExitCode> runHostCommand(const CLI::App& app, Program& program,

@@ -12,7 +12,7 @@ ExitCode runId(Program& program, const std::string& path) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto item = ItemArgument::itemAtPath(*documents, path);
-  if (!item) return program.report(item.error(), "can't identify " + path);
+  if (!item) return program.report(item.error(), "can't identify " + named(path));
   const std::string& identifier = item->itemIdentifier;
   if (program.options().json) {
     nlohmann::json line;

@@ -70,7 +70,7 @@ ExitCode runInfo(Program& program, const std::string& item) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   auto found = ItemArgument(item).item(*documents);
-  if (!found) return program.report(found.error(), "can't find " + item);
+  if (!found) return program.report(found.error(), "can't find " + named(item));
   if (program.options().json) {
     program.out() << itemJSON(*found).dump() << '\n';
   } else {

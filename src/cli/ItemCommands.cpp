@@ -4,11 +4,12 @@
 
 #include "cli/ItemArgument.h"
 #include "cli/OperationRun.h"
+#include "cli/Printing.h"
 
 namespace mirabel {
 
 ExitCode runMakeFolder(Program& program, const CreateOptions& options) {
-  return runOnItem(program, options.parent, "can't make the folder " + options.name,
+  return runOnItem(program, options.parent, "can't make the folder " + named(options.name),
                    [&](const ItemRecord& parent, auto done) {
                      program.documents()->createDirectory(options.name, parent.itemIdentifier,
                                                           std::move(done));
@@ -19,7 +20,7 @@ ExitCode runImport(Program& program, const ImportOptions& options) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto parent = ItemArgument(options.parent).item(*documents);
-  if (!parent) return program.report(parent.error(), "can't find " + options.parent);
+  if (!parent) return program.report(parent.error(), "can't find " + named(options.parent));
   const OperationRun run(program, *documents);
   // All at once, for they wait for the disk most of the time, and told in their order.
   std::vector<std::pair<std::string, OperationRun::Begun>> begun;
@@ -35,7 +36,7 @@ ExitCode runImport(Program& program, const ImportOptions& options) {
   for (auto& [file, operation] : begun) {
     const auto result = run.wait(std::move(operation));
     if (!result) {
-      outcomes.add(program.report(result.error(), "can't import " + file));
+      outcomes.add(program.report(result.error(), "can't import " + named(file)));
     } else {
       printOutcome(program, *result);
     }
@@ -44,7 +45,8 @@ ExitCode runImport(Program& program, const ImportOptions& options) {
 }
 
 ExitCode runRename(Program& program, const RenameOptions& options) {
-  return runOnItem(program, options.item, "can't rename " + options.item + " to " + options.name,
+  return runOnItem(program, options.item,
+                   "can't rename " + named(options.item) + " to " + named(options.name),
                    [&](const ItemRecord& item, auto done) {
                      program.documents()->rename(item, options.name, std::move(done));
                    });
@@ -54,12 +56,12 @@ ExitCode runMove(Program& program, const MoveOptions& options) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto parent = ItemArgument(options.parent).item(*documents);
-  if (!parent) return program.report(parent.error(), "can't find " + options.parent);
-  return runOnItem(program, options.item, "can't move " + options.item + " to " + options.parent,
-                   [&](const ItemRecord& item, auto done) {
-                     documents->reparent(item, parent->itemIdentifier, options.name,
-                                         std::move(done));
-                   });
+  if (!parent) return program.report(parent.error(), "can't find " + named(options.parent));
+  return runOnItem(
+      program, options.item, "can't move " + named(options.item) + " to " + named(options.parent),
+      [&](const ItemRecord& item, auto done) {
+        documents->reparent(item, parent->itemIdentifier, options.name, std::move(done));
+      });
 }
 
 }  // namespace mirabel

@@ -78,8 +78,8 @@ ExitCode runList(Program& program, const ListOptions& options) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto identifier = ContainerArgument(options.item).identifier(*documents);
-  if (!identifier) return program.report(identifier.error(), "can't find " + options.item);
-  const std::string failure = "can't list " + options.item;
+  if (!identifier) return program.report(identifier.error(), "can't find " + named(options.item));
+  const std::string failure = "can't list " + named(options.item);
   const auto container = documents->container(*identifier);
   if (!container) return program.report(container.error(), failure);
   const auto listed = list(program, **container, options);

@@ -45,7 +45,7 @@ ExitCode tellTags(Program& program, const std::string& item) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto found = ItemArgument(item).item(*documents);
-  if (!found) return program.report(found.error(), "can't find " + item);
+  if (!found) return program.report(found.error(), "can't find " + named(item));
   if (program.options().json) {
     program.out() << itemJSON(*found).dump() << '\n';
     return ExitCode::done;
@@ -74,7 +74,7 @@ ExitCode runTag(Program& program, const TagOptions& options) {
     if (!encoded) return program.reportUsage("the labels have more than 64 KiB");
     tagData = *std::move(encoded);
   }
-  return runOnItem(program, options.item, "can't tag " + options.item,
+  return runOnItem(program, options.item, "can't tag " + named(options.item),
                    [&](const ItemRecord& found, const auto& done) {
                      program.documents()->setTagData(found.itemIdentifier, tagData, done);
                    });
@@ -84,9 +84,10 @@ ExitCode runFavorite(Program& program, const FavoriteOptions& options) {
   std::optional<Number> rank;
   if (!options.clears) {
     rank = options.rank ? numberFrom(*options.rank) : Number::of(std::int64_t{1});
-    if (!rank) return program.reportUsage("can't use " + *options.rank + "; a rank is a number");
+    if (!rank)
+      return program.reportUsage("can't use " + named(*options.rank) + "; a rank is a number");
   }
-  return runOnItem(program, options.item, "can't rank " + options.item,
+  return runOnItem(program, options.item, "can't rank " + named(options.item),
                    [&](const ItemRecord& found, const auto& done) {
                      program.documents()->setFavoriteRank(found.itemIdentifier, rank, done);
                    });
@@ -97,11 +98,11 @@ ExitCode runUsed(Program& program, const UsedOptions& options) {
   if (!options.clears) {
     date = options.date ? dateFrom(*options.date) : Date::now();
     if (!date) {
-      return program.reportUsage("can't use " + *options.date +
+      return program.reportUsage("can't use " + named(*options.date) +
                                  "; a date is written like 2026-11-21 or 2026-11-21T09:30:00Z");
     }
   }
-  return runOnItem(program, options.item, "can't note when " + options.item + " was used",
+  return runOnItem(program, options.item, "can't note when " + named(options.item) + " was used",
                    [&](const ItemRecord& found, const auto& done) {
                      program.documents()->setLastUsedDate(found.itemIdentifier, date, done);
                    });

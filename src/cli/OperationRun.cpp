@@ -89,7 +89,7 @@ ExitCode runOnItem(Program& program, const std::string& item, std::string_view w
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto found = ItemArgument(item).item(*documents);
-  if (!found) return program.report(found.error(), "can't find " + item);
+  if (!found) return program.report(found.error(), "can't find " + named(item));
   const auto result = OperationRun(program, *documents).item([&](auto done) {
     operation(*found, std::move(done));
   });

@@ -12,7 +12,7 @@ ExitCode runPath(Program& program, const std::string& item) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   auto found = ItemArgument(item).item(*documents);
-  if (!found) return program.report(found.error(), "can't find " + item);
+  if (!found) return program.report(found.error(), "can't find " + named(item));
   const std::string& path = found->path;
   if (program.options().json) {
     nlohmann::json line;

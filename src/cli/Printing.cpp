@@ -73,6 +73,10 @@ std::string utf8Lossy(std::string_view bytes) {
   return text;
 }
 
+std::string named(const std::string& given) {
+  return given.empty() ? "\"\"" : given;
+}
+
 std::string base64(std::string_view bytes) {
   std::string text;
   text.reserve((bytes.size() + 2) / 3 * 4);

@@ -14,6 +14,9 @@ namespace mirabel {
 /// UTF-8, each byte that is none replaced by U+FFFD; control characters are kept.
 [[nodiscard]] std::string utf8Lossy(std::string_view bytes);
 
+/// What a person gave, for a message: an empty text in quotes.
+[[nodiscard]] std::string named(const std::string& given);
+
 [[nodiscard]] std::string base64(std::string_view bytes);
 /// Nothing for text that is no canonical base64.
 [[nodiscard]] std::optional<std::string> fromBase64(std::string_view text);

@@ -116,12 +116,12 @@ ExitCode removeOne(Program& program, const std::string& item, bool isDryRun) {
   Documents* documents = program.documents();
   if (documents == nullptr) return program.exitCode();
   const auto found = ItemArgument(item).item(*documents);
-  if (!found) return program.report(found.error(), "can't find " + item);
+  if (!found) return program.report(found.error(), "can't find " + named(item));
   if (isDryRun) return tellWhatWouldGo(program, *found);
   const auto error = OperationRun(program, *documents).error([&](auto done) {
     documents->remove(*found, std::move(done));
   });
-  if (error) return program.report(*error, "can't remove " + item);
+  if (error) return program.report(*error, "can't remove " + named(item));
   if (program.options().json) {
     program.out() << nlohmann::json{{"deleted", {utf8Lossy(found->itemIdentifier)}}}.dump() << '\n';
   } else {

@@ -3,6 +3,7 @@
 #include "cli/ItemArgument.h"
 #include "cli/ItemCommands.h"
 #include "cli/OperationRun.h"
+#include "cli/Printing.h"
 #include "host/ErrorText.h"
 
 namespace mirabel {
@@ -23,12 +24,13 @@ ExitCode restoreOne(Program& program, const std::string& item,
                     const std::optional<std::string>& parent) {
   Documents& documents = *program.documents();
   const auto found = ItemArgument(item).item(documents);
-  if (!found) return program.report(found.error(), "can't find " + item);
+  if (!found) return program.report(found.error(), "can't find " + named(item));
   const auto result = OperationRun(program, documents).item([&](auto done) {
     documents.restore(*found, parent, std::move(done));
   });
   if (!result) {
-    return program.report(explained(result.error(), found->isTrashed), "can't restore " + item);
+    return program.report(explained(result.error(), found->isTrashed),
+                          "can't restore " + named(item));
   }
   printOutcome(program, *result);
   return ExitCode::done;
@@ -39,10 +41,10 @@ ExitCode restoreOne(Program& program, const std::string& item,
 ExitCode runTrash(Program& program, const std::vector<std::string>& items) {
   Outcomes outcomes;
   for (const std::string& item : items) {
-    outcomes.add(
-        runOnItem(program, item, "can't trash " + item, [&](const ItemRecord& found, auto done) {
-          program.documents()->trash(found, std::move(done));
-        }));
+    outcomes.add(runOnItem(program, item, "can't trash " + named(item),
+                           [&](const ItemRecord& found, auto done) {
+                             program.documents()->trash(found, std::move(done));
+                           }));
   }
   return outcomes.exitCode();
 }
@@ -53,11 +55,11 @@ ExitCode runRestore(Program& program, const RestoreOptions& options) {
   std::optional<std::string> parent;
   if (options.parent) {
     const auto found = ItemArgument(*options.parent).item(*documents);
-    if (!found) return program.report(found.error(), "can't find " + *options.parent);
+    if (!found) return program.report(found.error(), "can't find " + named(*options.parent));
     if (found->isTrashed) {
       Error unfit = Error::invalidParameter("parent", found->itemIdentifier);
       unfit.userInfo[std::string(errorkey::detail)] = "it is in the trash itself";
-      return program.report(unfit, "can't restore to " + *options.parent);
+      return program.report(unfit, "can't restore to " + named(*options.parent));
     }
     parent = found->itemIdentifier;
   }

@@ -8,6 +8,7 @@
 #include "cli/Commands.h"
 #include "cli/ContainerArgument.h"
 #include "cli/EndSignals.h"
+#include "cli/Printing.h"
 #include "linux/kernel/WakeUp.h"
 
 namespace mirabel {
@@ -17,7 +18,7 @@ namespace {
 class Watch {
  public:
   Watch(Program& program, const WatchOptions& options)
-      : program_(program), options_(options), failure_("can't watch " + options.item) {}
+      : program_(program), options_(options), failure_("can't watch " + named(options.item)) {}
   Watch(const Watch&) = delete;
   Watch& operator=(const Watch&) = delete;
 

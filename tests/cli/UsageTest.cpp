@@ -28,6 +28,28 @@ TEST_F(Usage, WrongUsageOfAnyKindIsOneLineAndExitCodeTwo) {
     EXPECT_EQ(programs.error().at("code"), 2);
   }
   EXPECT_EQ(run({}).code, 2);
+  EXPECT_EQ(run({"--json"}).error().at("code"), 2);
+}
+
+TEST_F(Usage, WhatIsWrongIsSaidInWordsThatHelp) {
+  const std::pair<std::vector<std::string>, const char*> cases[] = {
+      {{"unknown"}, "there is no command unknown; see mirabel --help"},
+      {{"id"}, "PATH is missing; see mirabel id --help"},
+      {{"id", "a", "b]"}, "\"b]\" is one argument too many; see mirabel id --help"},
+      {{"id", "-x"}, "there is no option -x; a name that begins with a dash follows --; see mir"},
+      {{"ls", "--page"}, "--page has no value; see mirabel ls --help"},
+      {{"ls", "--page", "a", "--page", "b"}, "--page is given more than once"},
+      {{"ls", "--pages", "0"}, "--pages takes a number from 1; see"},
+      {{"changes"}, "--since is missing; see"},
+      {{"tag", "f", "a", "--clear"}, "LABEL and --clear don't go together"},
+      {{"completion", "tcsh"}, "SHELL is bash, zsh or fish"},
+      // The help of the command does not have the options that all commands share.
+      {{"--timeout", "x", "id", "."}, "--timeout takes a number; see mirabel --help"},
+      {{"--timeout", "-1", "id", "."}, "--timeout takes 0 to 86400 seconds; see mirabel --help"},
+      {{"id", ".", "--json=x"}, "--json takes no value; see mirabel --help"}};
+  for (const auto& [arguments, text] : cases)
+    expectFailure(run(arguments), 2, text);
+  expectFailure(run({"id", ""}), 3, "can't identify \"\"; no such file or folder");
 }
 
 TEST_F(Usage, TheUsageLineHasWhatMustBeGiven) {
