@@ -112,6 +112,8 @@ TEST_F(Apps, HaveTheirIconsWritten) {
   // The signature, and width and height in the first chunk.
   EXPECT_EQ(bytes, std::string("\x89PNG\r\n\x1a\n\0\0\0\rIHDR\0\0\0\x30\0\0\0\x30", 24));
   EXPECT_LT(fs::file_size(file), 100'000u) << "nothing is left of what was there";
+  EXPECT_EQ(run({"icon", "#" + draw, "-o", "-", "--size", "48"}).out.substr(0, 24), bytes);
+  expectFailure(run({"icon", "#" + draw, "-o", "-"}, Output::terminal), 2, "shows no picture");
 
   fs::remove(file);
   const std::tuple<std::vector<std::string>, int, std::string> refused[] = {
