@@ -49,6 +49,10 @@ void BusCall::fail(const sdbus::Error& error) {
   sendError(error, nullptr);
 }
 
+void BusCall::failInvalid(const std::string& why) {
+  fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", why));
+}
+
 void BusCall::sendError(const sdbus::Error& error, const BusError::Info* info) {
   isAnswered_ = true;
   try {

@@ -50,6 +50,8 @@ class BusCall {
   void reply(const Result<std::vector<ItemRecord>>& items);
   void fail(const Error& error);
   void fail(const sdbus::Error& error);
+  /// For arguments that can't be understood.
+  void failInvalid(const std::string& why);
 
   /// The documents as the caller may see them; null, and the call is answered, where it may not.
   [[nodiscard]] Documents* documents();

@@ -21,10 +21,9 @@ constexpr std::chrono::milliseconds betweenLooks{500};
 /// Fails where nobody has the service's name.
 std::string ownerOfName(sdbus::IConnection& connection) {
   std::string owner;
-  const auto daemon =
-      sdbus::createProxy(connection, "org.freedesktop.DBus", "/org/freedesktop/DBus");
+  const auto daemon = sdbus::createProxy(connection, daemonName, daemonPath);
   daemon->callMethod("GetNameOwner")
-      .onInterface("org.freedesktop.DBus")
+      .onInterface(daemonName)
       .withArguments(std::string(serviceName))
       .storeResultsTo(owner);
   return owner;
@@ -236,18 +235,15 @@ void BusConnection::listen(std::function<void(const std::string& container)> sig
                                     signalled(container);
                                   });
   service_->finishRegistration();
-  moving_ = connection_->addMatch(
-      std::string("type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
-                  "interface='org.freedesktop.DBus',member='NameOwnerChanged',arg0='") +
-          serviceName + "'",
-      [this, moved = std::move(moved)](sdbus::Message& message) {
-        std::string name;
-        std::string before;
-        std::string now;
-        message >> name >> before >> now;
-        setOwner(now);
-        moved(!now.empty());
-      });
+  moving_ = connection_->addMatch(std::string(ownerChanges) + ",arg0='" + serviceName + "'",
+                                  [this, moved = std::move(moved)](sdbus::Message& message) {
+                                    std::string name;
+                                    std::string before;
+                                    std::string now;
+                                    message >> name >> before >> now;
+                                    setOwner(now);
+                                    moved(!now.empty());
+                                  });
 }
 
 }  // namespace mirabel::bus

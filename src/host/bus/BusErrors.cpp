@@ -142,7 +142,7 @@ Error errorFromBus(const sdbus::Error& error) {
            "org.freedesktop.DBus.Error.Disconnected"sv, "org.freedesktop.DBus.Error.Timeout"sv,
            "System.Error.ENOTCONN"sv, "System.Error.ECONNRESET"sv, "System.Error.ETIMEDOUT"sv}))
     return Error::posix(ENOTCONN, "the service does not answer");
-  if (isOneOf(name, {"org.freedesktop.DBus.Error.AccessDenied"sv}))
+  if (name == "org.freedesktop.DBus.Error.AccessDenied")
     return Error::posix(EACCES, error.getMessage());
   return Error::posix(EIO, std::string(name) + ": " + error.getMessage());
 }

@@ -14,4 +14,12 @@ inline constexpr const char* operationsInterface = "com.norvane.Vessel1.Operatio
 /// Status and maintenance; not for sandboxed callers.
 inline constexpr const char* managerInterface = "com.norvane.Vessel1.Manager";
 
+/// The bus itself, which is an object on it too.
+inline constexpr const char* daemonName = "org.freedesktop.DBus";
+inline constexpr const char* daemonPath = "/org/freedesktop/DBus";
+/// Matches what it says when a name gets another owner, or none: arguments name, before, now.
+inline constexpr const char* ownerChanges =
+    "type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
+    "interface='org.freedesktop.DBus',member='NameOwnerChanged'";
+
 }  // namespace mirabel::bus

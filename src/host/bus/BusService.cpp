@@ -48,10 +48,6 @@ constexpr CallLane::Limits limits(std::size_t threads, std::size_t mostRunning) 
 // few milliseconds to have again.
 constexpr AfterUse::Times givingBack{std::chrono::seconds(2), std::chrono::seconds(60)};
 
-constexpr const char* leavingMatch =
-    "type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"
-    "interface='org.freedesktop.DBus',member='NameOwnerChanged',arg2=''";
-
 }  // namespace
 
 class BusService::Impl {
@@ -66,7 +62,8 @@ class BusService::Impl {
     StagedImport::clear(stagingFolder_);
     object_ = sdbus::createObject(*connection_, objectPath);
     addMethods();
-    leaving_ = connection_->addMatch(leavingMatch, [this](sdbus::Message& message) {
+    const std::string leaving = std::string(ownerChanges) + ",arg2=''";
+    leaving_ = connection_->addMatch(leaving, [this](sdbus::Message& message) {
       try {
         std::string name;
         message >> name;

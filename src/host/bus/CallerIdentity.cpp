@@ -9,13 +9,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "host/bus/BusNames.h"
 #include "mirabel/UniqueFd.h"
 
 namespace mirabel::bus {
 namespace {
 
-constexpr const char* daemonName = "org.freedesktop.DBus";
-constexpr const char* daemonPath = "/org/freedesktop/DBus";
 constexpr std::size_t longestInfo = 64 * 1024;
 
 std::string_view trimmed(std::string_view text) {

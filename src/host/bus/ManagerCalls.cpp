@@ -53,10 +53,7 @@ void getProgress(const CallPointer& call) {
 /// The moment that the first argument names; nothing, and the call is answered, for what is none.
 std::optional<Date> momentOf(const CallPointer& call) {
   const auto date = Date::fromRFC3339(call->argument<std::string>());
-  if (!date) {
-    call->fail(
-        sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", "this is no date in RFC 3339 form"));
-  }
+  if (!date) call->failInvalid("this is no date in RFC 3339 form");
   return date;
 }
 

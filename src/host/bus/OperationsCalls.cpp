@@ -24,10 +24,6 @@ Documents::ErrorHandler answeringError(const CallPointer& call) {
   };
 }
 
-void invalidArgument(const CallPointer& call, const std::string& text) {
-  call->fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", text));
-}
-
 /// Runs `operation` with what the caller may change.
 template <class Operation>
 auto onDocuments(const Operation& operation) {
@@ -43,7 +39,7 @@ std::optional<Options> optionsOf(const CallPointer& call,
   auto options = call->argument<Options>();
   const auto mistyped = mistypedOption(options, known);
   if (!mistyped) return options;
-  invalidArgument(call, *mistyped);
+  call->failInvalid(*mistyped);
   return {};
 }
 
@@ -139,7 +135,7 @@ void setLastUsedDate(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
   const auto text = call->argument<std::string>();
   const auto date = Date::fromRFC3339(text);
-  if (!date && !text.empty()) return invalidArgument(call, "this is no date in RFC 3339 form");
+  if (!date && !text.empty()) return call->failInvalid("this is no date in RFC 3339 form");
   documents.setLastUsedDate(item, date, answering(call));
 }
 
@@ -164,7 +160,7 @@ void setTagData(Documents& documents, const CallPointer& call) {
 void setFavoriteRank(Documents& documents, const CallPointer& call) {
   const auto item = call->argument<std::string>();
   const auto rank = numberFrom(call->argument<sdbus::Variant>());
-  if (!rank) return invalidArgument(call, "a rank is a number");
+  if (!rank) return call->failInvalid("a rank is a number");
   documents.setFavoriteRank(item, rank, answering(call));
 }
 

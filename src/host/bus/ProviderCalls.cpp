@@ -103,10 +103,7 @@ void openItem(const CallPointer& call) {
   if (documents == nullptr) return;
   const auto identifier = call->argument<std::string>();
   const auto mode = call->argument<std::string>();
-  if (mode != "r" && mode != "rw") {
-    return call->fail(
-        sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", "the mode is \"r\" or \"rw\""));
-  }
+  if (mode != "r" && mode != "rw") return call->failInvalid("the mode is \"r\" or \"rw\"");
   auto file = documents->openFile(
       identifier, mode == "r" ? Documents::Access::reading : Documents::Access::readingAndWriting);
   if (!file) return call->fail(file.error());
@@ -147,9 +144,7 @@ void search(const CallPointer& call) {
   auto words = call->argument<std::vector<std::string>>();
   const auto options = call->argument<Options>();
   const auto query = queryFrom(std::move(words), options);
-  if (!query) {
-    return call->fail(sdbus::Error("org.freedesktop.DBus.Error.InvalidArgs", query.error()));
-  }
+  if (!query) return call->failInvalid(query.error());
   call->reply(documents->search(*query));
 }
 
