@@ -84,8 +84,9 @@ void RemoteWatches::signalled(const std::string& container) {
 }
 
 std::vector<std::string> RemoteWatches::containers() {
-  std::vector<std::string> watched;
   const std::lock_guard lock(mutex_);
+  std::vector<std::string> watched;
+  watched.reserve(watchers_.size());
   for (const auto& [container, watchers] : watchers_)
     watched.push_back(container);
   return watched;
