@@ -81,6 +81,8 @@ struct MonitoredRoots::Root {
   std::atomic<int> descriptor = -1;
   std::atomic<std::uint64_t> device = 0;
   std::atomic<std::uint64_t> inode = 0;
+  // Of one that is not kept open, and need not be watched: nobody else tells when that changes.
+  std::atomic<bool> isReadable = false;
   UniqueFd current{};
   std::deque<UniqueFd> former{};
 
@@ -162,7 +164,9 @@ bool MonitoredRoots::refresh(Root& root) {
   const bool isSame =
       status ? root.isThere && status->inode == root.inode && status->device == root.device
              : !root.isThere;
-  if (isSame) return false;
+  const bool isReadable = status && !root.isKeptOpen && !isClosed(opened->get());
+  const bool wasReadable = root.isReadable.exchange(isReadable);
+  if (isSame && isReadable == wasReadable) return false;
   root.take(status ? std::move(*opened) : UniqueFd(),
             status ? std::optional(*status) : std::nullopt);
   root.failure = 0;  // after the descriptor, see `open`
@@ -231,19 +235,19 @@ Result<UniqueFd> MonitoredRoots::open(const std::string& path, int flags) const 
     return openBelow(root->descriptor, root->device, relative, allFlags);
   }
   // Whatever folder is there by now: whose it is, is for those to say who look into it.
-  const auto folder = openLongPath(AT_FDCWD, root->path, O_PATH | O_DIRECTORY, withoutLinks);
+  auto folder = openLongPath(AT_FDCWD, root->path, O_PATH | O_DIRECTORY, withoutLinks);
   if (!folder) return fail(folder.error());
   const auto status = statusAt(folder->get(), "");
   if (!status) return fail(status.error());
+  if (relative.empty() && (flags & O_PATH) != 0) return folder;
   if (isClosed(folder->get())) return fail(Error::posix(EACCES));
   return openBelow(folder->get(), status->device, relative, allFlags);
 }
 
 Result<UniqueFd> MonitoredRoots::openHolder(const std::string& path) const {
   auto folder = open(path, O_PATH | O_DIRECTORY);
-  const auto place = locate(path);
-  const bool isBelow = place && !place->relative.empty();
-  if (folder && isBelow && isClosed(folder->get())) return fail(Error::posix(EACCES));
+  const bool isOfRoot = path != firstPath_ && locate(path);
+  if (folder && isOfRoot && isClosed(folder->get())) return fail(Error::posix(EACCES));
   return folder;
 }
 

@@ -35,8 +35,9 @@ class MonitoredRoots {
     std::vector<std::string> further{};  ///< the paths of others
   };
   /// Looks whether each root is still the folder at its path: one may have been moved away, made
-  /// since, or have something mounted on it. Answers those that changed. One that can't be looked
-  /// at for a passing reason, such as too many open files, is as it was.
+  /// since, or have something mounted on it; a further one may also have been opened, or closed.
+  /// Answers those that changed. One that can't be looked at for a passing reason, such as too many
+  /// open files, is as it was; the document storage also where a folder above it is closed.
   [[nodiscard]] Changes refresh();
 
   struct Place {
@@ -65,8 +66,8 @@ class MonitoredRoots {
   /// O_CLOEXEC and O_NONBLOCK are added). A path outside the roots is opened as it stands, its
   /// final link not followed. POSIX errors: ELOOP for a symbolic link on the way, EXDEV for
   /// another mount and for a subvolume, ENOENT; EACCES for a folder that is to be read and is
-  /// closed (see `isClosed`), for a root that is, and for all that lies in them, whatever the
-  /// kernel would let through: they hold nothing. Of the document storage it is `closedStorage`.
+  /// closed (see `isClosed`), and for all that lies in one, whatever the kernel would let through:
+  /// it holds nothing. Of the document storage, closed itself, it is always `closedStorage`.
   [[nodiscard]] Result<UniqueFd> open(const std::string& path, int flags) const;
   /// Opens the folder at `path` with O_PATH, to look at what lies in it. The same errors.
   [[nodiscard]] Result<UniqueFd> openHolder(const std::string& path) const;

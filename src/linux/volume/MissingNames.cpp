@@ -29,14 +29,17 @@ Result<void> MissingNames::settle() {
 Result<void> MissingNames::settle(const Missing& missing) {
   auto row = context_.store.objectInSlot(missing.slot);
   if (!row) return fail(row.error());
+  const bool isHere = *row && (missing.isLink || (*row)->location == missing.location);
+  // It may have come back since, or the folder that it lies in was closed for a moment.
+  auto stands = isHere ? context_.paths.isAt(**row, missing.location) : false;
+  if (!stands || *stands) return stands ? Result<void>() : fail(stands.error());
   if (missing.isLink) {
     auto removed = context_.store.removeLink(missing.location.folder, missing.location.name);
     if (!removed || !*row) return removed;
     context_.recorder.noteSurvivor((*row)->fileID);
     return context_.recorder.changed(**row, missing.location);
   }
-  if (!*row || (*row)->location != missing.location) return {};
-  return context_.learner.leave(std::move(**row));
+  return !isHere ? Result<void>() : context_.learner.leave(std::move(**row));
 }
 
 }  // namespace mirabel

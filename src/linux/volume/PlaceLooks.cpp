@@ -57,10 +57,10 @@ Result<PlaceLooks::Presence> PlaceLooks::open(std::uint64_t id, Folder& folder) 
   folder.row = std::move(**row);
   folder.path = std::move(**path);
   auto opened = context_.roots.open(folder.path, O_PATH | O_DIRECTORY);
-  if (!opened && !saysOutOfReach(opened.error())) return fail(opened.error());
-  // Whoever closed a folder above has left a record of that.
-  if (!opened && opened.error().isPosix(EACCES)) return Presence::gone;
-  if (!opened) return Presence::moved;
+  // Whoever closed a folder above has left a record of that; it may be open again by then, so that
+  // this one must not be forgotten.
+  if (!opened && saysOutOfReach(opened.error())) return Presence::moved;
+  if (!opened) return fail(opened.error());
   auto status = statusAt(opened->get(), "");
   if (!status) return fail(status.error());
   const bool isIt = status->inode == folder.row.inode && status->device == context_.device &&
