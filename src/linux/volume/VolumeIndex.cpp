@@ -319,11 +319,16 @@ class StoredVolumeIndex final : public VolumeIndex {
                              const Ringing ringing(*this);
                              const std::scoped_lock lock(mutex_);
                              if (!stayOnVolume()) return;
-                             auto done = follower_.catchUp(transactions());
-                             if (!done)
-                               logError("can't follow changes; " + done.error().description());
+                             tellFailure(follower_.catchUp(transactions()));
                            },
                            [this] { return isDue(); }});
+  }
+
+  /// Once for as long as it stays the same: documents may be closed for days.
+  void tellFailure(const Result<void>& followed) {
+    const std::string failure = followed ? "" : followed.error().description();
+    if (failure != lastFailure_ && !followed) logError("can't follow changes; " + failure);
+    lastFailure_ = failure;
   }
 
   /// Whether whoever waits for changes has to be told by a look at everything.
@@ -380,6 +385,7 @@ class StoredVolumeIndex final : public VolumeIndex {
   std::atomic<std::uint64_t> lastEventID_ = 0;
   std::atomic<std::uint64_t> commits_ = 0;
   std::chrono::steady_clock::time_point forgotAt_{};
+  std::string lastFailure_;  // of the thread
   std::unique_ptr<FollowThread> thread_;
 };
 
