@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "foundation/LookFailure.h"
+#include "linux/kernel/ClosedFolders.h"
 #include "linux/kernel/LongPath.h"
 #include "linux/kernel/ObjectStatus.h"
 
@@ -85,6 +86,7 @@ Result<ContainerFolders::Look> ContainerFolders::Opened::look(const std::string&
   if (!status && !saysOutOfReach(status.error())) return fail(status.error());
   if (!status) return Look{.reason = unreachable};
   if (status->device != device_) return Look{.reason = elsewhere};
+  if (isClosed(documents->get())) return Look{.reason = unreachable};
   return Look{.hasDocuments = true, .inode = status->inode};
 }
 

@@ -105,6 +105,12 @@ TEST_F(ApplicationMonitorTest, DocumentFoldersComeAndGo) {
     fs::create_directory(home.container(identifier) + "/Documents");
     EXPECT_TRUE(hears(registered)) << identifier;
     passOn();
+    // It may be closed, and opened again.
+    for (const fs::perms permissions : {fs::perms::none, fs::perms::owner_all}) {
+      fs::permissions(home.container(identifier) + "/Documents", permissions);
+      EXPECT_TRUE(hears(registered)) << identifier;
+      passOn();
+    }
     fs::remove(home.container(identifier) + "/Documents");
     EXPECT_TRUE(hears(unregistered)) << identifier;
   }
