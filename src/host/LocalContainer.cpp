@@ -64,6 +64,12 @@ Result<Data> currentAnchorOf(VesselEnumerator& enumerator) {
   return *std::move(anchor);
 }
 
+Error reasonFor(Error noAnchor, const HostedProvider& provider) {
+  if (!noAnchor.is(LocalVesselError::unableToGetDeviceUUID)) return noAnchor;
+  const auto event = provider.linuxPlatform().index().currentEventID();
+  return event ? noAnchor : event.error();
+}
+
 Result<std::unique_ptr<LocalContainer>> LocalContainer::open(HostedProvider& provider,
                                                              std::string identifier) {
   std::unique_ptr<LocalContainer> container(new LocalContainer(provider, std::move(identifier)));
@@ -131,10 +137,7 @@ Result<Data> LocalContainer::currentSyncAnchor() {
   const auto of = enumerator();
   if (!of) return fail(of.error());
   auto anchor = currentAnchorOf(**of);
-  if (anchor) return anchor;
-  // An enumerator says no more than that there is none.
-  const auto event = provider_.linuxPlatform().index().currentEventID();
-  return event ? anchor : fail(event.error());
+  return anchor ? anchor : fail(reasonFor(anchor.error(), provider_));
 }
 
 }  // namespace mirabel

@@ -15,6 +15,9 @@ namespace mirabel {
 [[nodiscard]] Result<ItemChanges> changesSince(VesselEnumerator& enumerator, const Data& anchor);
 /// Error: `LocalVesselError::unableToGetDeviceUUID`.
 [[nodiscard]] Result<Data> currentAnchorOf(VesselEnumerator& enumerator);
+/// Why there was no anchor, where the provider can tell: an enumerator says no more than that there
+/// is none. Any other error is answered as it is.
+[[nodiscard]] Error reasonFor(Error noAnchor, const HostedProvider& provider);
 
 /// A container of the provider in this process. What was found by its identifier is followed by
 /// it, wherever it is moved.

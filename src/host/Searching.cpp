@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "foundation/Log.h"
+#include "host/LocalContainer.h"
 #include "host/SearchableItems.h"
 
 namespace mirabel {
@@ -34,7 +35,7 @@ Result<SearchIndex*> Searching::inStep() {
     }
   }
   if (auto fed = feeder_->catchUp(*workingSet_, stopping_.get_token()); !fed)
-    return fail(fed.error());
+    return fail(reasonFor(fed.error(), provider_));
   return *index;
 }
 
