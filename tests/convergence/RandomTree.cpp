@@ -5,9 +5,11 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <sstream>
 #include <stdio.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
+#include <system_error>
 #include <unistd.h>
 #include <utility>
 
@@ -16,8 +18,14 @@ namespace {
 
 namespace fs = std::filesystem;
 
+// Of what lies in a closed folder nothing is known.
+fs::file_status statusOf(const std::string& path) {
+  std::error_code closed;
+  return fs::symlink_status(path, closed);
+}
+
 void writeFile(const std::string& path, std::size_t size, std::ios::openmode mode) {
-  const auto status = fs::symlink_status(path);
+  const auto status = statusOf(path);
   if (fs::exists(status) && !fs::is_regular_file(status)) return;
   std::ofstream file(path, mode | std::ios::binary);
   file << std::string(size, 'x');
@@ -32,13 +40,14 @@ std::uint64_t inodeOf(const std::string& path) {
 
 std::vector<std::string> RandomTree::all(bool folders) const {
   std::vector<std::string> roots{root_}, result;
-  std::ranges::copy_if(others_, std::back_inserter(roots), [](const std::string& other) {
-    return fs::is_directory(fs::symlink_status(other));
-  });
+  std::ranges::copy_if(others_, std::back_inserter(roots),
+                       [](const std::string& other) { return fs::is_directory(statusOf(other)); });
   for (const std::string& root : roots) {
     if (folders) result.push_back(root);
-    for (const auto& entry : fs::recursive_directory_iterator(root)) {
-      const bool isFolder = !entry.is_symlink() && entry.is_directory();
+    constexpr auto closedHoldNothing = fs::directory_options::skip_permission_denied;
+    for (const auto& entry : fs::recursive_directory_iterator(root, closedHoldNothing)) {
+      std::error_code hidden;
+      const bool isFolder = !entry.is_symlink(hidden) && entry.is_directory(hidden);
       if (isFolder == folders) result.push_back(entry.path());
     }
   }
@@ -55,8 +64,18 @@ bool RandomTree::isShown(const std::string& path) const {
 std::set<std::uint64_t> RandomTree::shownFolders() const {
   std::set<std::uint64_t> shown;
   for (const std::string& folder : all(true))
-    if (isShown(folder)) shown.insert(inodeOf(folder));
+    if (isShown(folder) && isOpen(folder)) shown.insert(inodeOf(folder));
   return shown;
+}
+
+bool RandomTree::isOpen(const std::string& folder) {
+  return ::faccessat(AT_FDCWD, folder.c_str(), R_OK | X_OK, AT_EACCESS) == 0;
+}
+
+void RandomTree::openAll(const std::string& folder) {
+  ::chmod(folder.c_str(), 0755);
+  for (const auto& entry : fs::directory_iterator(folder))
+    if (!entry.is_symlink() && entry.is_directory()) openAll(entry.path());
 }
 
 void RandomTree::noteFollowed() {
@@ -105,7 +124,7 @@ std::string RandomTree::anyName() {
 // The ways in which editors save.
 void RandomTree::save(const std::string& path, std::size_t way) {
   // Where the file can't be put aside, it is written over.
-  if (!fs::is_regular_file(fs::symlink_status(path))) return;
+  if (!fs::is_regular_file(statusOf(path))) return;
   noteWriting(path);
   const std::string temporary = fs::path(path).parent_path() / ".save.tmp";
   const std::string backup = path + "~";
@@ -197,8 +216,20 @@ std::string RandomTree::changeLinked(const std::string& to) {
   }
 }
 
+// Half of the time it is opened again, or most of the tree would soon be out of everybody's sight.
+std::string RandomTree::changeMode(const std::string& folder) {
+  static constexpr mode_t modes[] = {0,    0111, 0300, 0311, 0400, 0444, 0555, 0600, 0644,
+                                     0755, 0755, 0755, 0755, 0755, 0755, 0755, 0755};
+  const mode_t mode = modes[pick(std::size(modes))];
+  if (folder == root_) return "no other mode for " + folder;
+  ::chmod(folder.c_str(), mode);
+  std::ostringstream text;
+  text << "chmod " << std::oct << mode << " " << folder;
+  return text.str();
+}
+
 std::string RandomTree::change() {
-  const std::size_t kind = pick(22);
+  const std::size_t kind = pick(24);
   const std::string file = any(false), folder = any(true), to = anyName();
   const bool isFixed = isRoot(folder);
   // What leaves is not followed when it comes back.
@@ -228,7 +259,7 @@ std::string RandomTree::change() {
       ::unlink(file.c_str());
       return "unlink " + file;
     case 8:
-      if (!isFixed && pick(3) == 0) fs::remove_all(folder);
+      if (std::error_code ignored; !isFixed && pick(3) == 0) fs::remove_all(folder, ignored);
       return "maybe remove tree " + folder;
     case 9:
       static_cast<void>(::symlink("nowhere", to.c_str()));
@@ -264,6 +295,9 @@ std::string RandomTree::change() {
     case 19:
     case 20:
       return changeLinked(to);
+    case 21:
+    case 22:
+      return changeMode(folder);
     default: {
       const std::string folderTo =
           fs::path(folder).parent_path() / (pick(2) == 0 ? "kind.quill" : "kind");

@@ -30,6 +30,10 @@ class RandomTree {
   /// Before it is caught up: what was written to a file through a name that is gone, in a folder
   /// that nobody followed, is a change of which nothing tells. Makes another, which shows.
   void makeUnheardHeard();
+  /// Whether this user can read the folder and look up what lies in it.
+  [[nodiscard]] static bool isOpen(const std::string& folder);
+  /// Opens every folder below that one, to be removed with it.
+  static void openAll(const std::string& folder);
   /// What comes next depends on the seed and on the tree alone.
   void reseed(unsigned seed) { random_.seed(seed); }
   [[nodiscard]] std::size_t pick(std::size_t n) { return random_() % n; }
@@ -43,6 +47,7 @@ class RandomTree {
   std::string link(const std::string& file, const std::string& to);
   void linkNameless(const std::string& to);
   std::string changeLinked(const std::string& to);
+  std::string changeMode(const std::string& folder);
 
   struct Written {
     std::uint64_t file, folder;  ///< inode numbers

@@ -59,6 +59,13 @@ class Run {
     tree_.noteFollowed();
   }
 
+  ~Run() {
+    host_.reset();
+    RandomTree::openAll(home_.path());
+  }
+  Run(const Run&) = delete;
+  Run& operator=(const Run&) = delete;
+
   /// False when the sequence has failed.
   bool make(const Step& step) {
     tree_.reseed(step.seed);
@@ -113,10 +120,7 @@ class Run {
     // left out of listings, and its going is not told yet.
     host_->refreshAppLibraries();
     for (Replica& replica : replicas_) {
-      // A folder that is gone or out of sight is nobody's container any more.
-      if (replica.container == watched_ && host_->identifierOf(home_.at("watched")) != watched_) {
-        continue;
-      }
+      if (replica.container == watched_ && !isWatchedListed()) continue;
       const int before = replica.restarts;
       host_->catchUp(replica);
       ++outcome.catchUps;
@@ -127,6 +131,13 @@ class Run {
     tree_.noteFollowed();
     tell("caught up");
     return true;
+  }
+
+  // A folder that is gone or out of sight is nobody's container any more, and one that is closed
+  // can't be listed.
+  bool isWatchedListed() const {
+    const std::string folder = home_.at("watched");
+    return host_->identifierOf(folder) == watched_ && RandomTree::isOpen(folder);
   }
 
   TempHome home_;
