@@ -61,6 +61,8 @@ void printItem(std::ostream& out, const ItemRecord& item) {
   if (const auto& bundle = item.appContainerBundleIdentifier) {
     row("application", printable(*bundle));
   }
+  if (const auto& domain = item.beaconDomainIdentifier) row("domain", printable(*domain));
+  if (const auto& place = item.putBackPath) row("came from", printable(*place));
   row("path", printable(item.path));
 }
 

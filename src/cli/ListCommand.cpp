@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cerrno>
 #include <nlohmann/json.hpp>
 #include <ostream>
@@ -12,7 +13,15 @@
 namespace mirabel {
 namespace {
 
-void printRow(const Program& program, const ItemRecord& item) {
+/// A column that all identifiers of a page fit in.
+std::size_t identifierWidth(const ItemPage& page) {
+  std::size_t width = 14;
+  for (const ItemRecord& item : page.items)
+    width = std::max(width, displayWidth(printable(item.itemIdentifier)));
+  return width;
+}
+
+void printRow(const Program& program, const ItemRecord& item, std::size_t width) {
   std::string size;
   if (item.documentSize) size = humanSize(item.documentSize->asUnsigned().value_or(0));
   if (item.childItemCount) size = std::to_string(*item.childItemCount) + " in it";
@@ -24,7 +33,8 @@ void printRow(const Program& program, const ItemRecord& item) {
   if (isFolder) name += '/';
   program.out() << padded(std::move(size), 12, Align::right) << "  "
                 << padded(std::move(date), 16, Align::left) << "  "
-                << padded(printable(item.itemIdentifier), 14, Align::left) << "  " << name << '\n';
+                << padded(printable(item.itemIdentifier), width, Align::left) << "  " << name
+                << '\n';
 }
 
 std::string textOf(const Data& cursor) {
@@ -33,8 +43,9 @@ std::string textOf(const Data& cursor) {
 
 void print(const Program& program, const ItemPage& page) {
   if (!program.options().json) {
+    const std::size_t width = identifierWidth(page);
     for (const auto& item : page.items)
-      printRow(program, item);
+      printRow(program, item, width);
     return;
   }
   nlohmann::json line;
