@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <string>
 #include <utility>
 
@@ -29,6 +30,9 @@ void LocalVessel::trashItemWithIdentifier(std::string_view identifier,
   const auto trash = trashFolderFor(*item);
   if (!trash) return completionHandler(fail(trash.error()));
   logDebug([&] { return "trash is located at " + quoted(trash->path()); });
+  if (item->path() == trash->path()) {
+    return completionHandler(fail(Error::posix(EPERM, "it is the trash itself")));
+  }
   if (const auto made = platform_.operations.createDirectory(*trash); !made) {
     return completionHandler(fail(made.error()));
   }

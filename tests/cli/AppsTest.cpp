@@ -84,6 +84,17 @@ TEST_F(Apps, ThatShowNoDocumentsAreNoItems) {
   EXPECT_TRUE(fs::exists(secret));
 }
 
+TEST_F(Apps, CannotBeChangedThemselvesAndTheirTrashSaysWhereItsItemsCameFrom) {
+  const std::string library = "#" + draw;
+  for (const auto& command :
+       {std::vector<std::string>{"rename", library, "Other"},
+        std::vector<std::string>{"trash", library}, std::vector<std::string>{"rm", library}})
+    expectFailure(run(command), 5, "the folder of an app library can't be changed itself");
+  EXPECT_EQ(run({"trash", inDraw("sketch.txt")}).code, 0);
+  EXPECT_THAT(run({"info", inDraw(".Trash/sketch.txt")}).out,
+              HasSubstr("\ncame from     " + inDraw("sketch.txt") + "\n"));
+}
+
 TEST_F(Apps, TellWhereTheirDocumentsLie) {
   EXPECT_EQ(run({"container", draw}).out, "#" + draw + "  " + apps.documents(draw) + "\n");
   EXPECT_EQ(done({"container", draw}).at("path"), apps.documents(draw));

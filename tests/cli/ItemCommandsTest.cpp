@@ -92,6 +92,7 @@ TEST_F(ItemCommands, MetadataIsClearedAndTagsArePrinted) {
 
 TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
   home.writeFile("target/doc.txt", "in the way");
+  home.makeFolder(".Trash");
   const std::string doc = home.at("folder/doc.txt");
   const std::string taker = idOf("target/doc.txt");
   const std::tuple<std::vector<std::string>, int, std::string> rows[] = {
@@ -110,6 +111,7 @@ TEST_F(ItemCommands, FailuresSayWhyAndEndWithTheirCode) {
       {{"mv", home.at("folder"), home.at("folder")}, 1, "a folder can't be moved into itself"},
       {{"rm", "root"}, 5, "the root itself can't be changed"},
       {{"restore", doc}, 1, "it is not in the trash"},
+      {{"trash", home.at(".Trash")}, 5, "it is the trash itself"},
       {{"favorite", doc, "many"}, 2, "a rank is a number"},
       {{"used", doc, "yesterday"}, 2, "a date is written like"},
   };

@@ -14,10 +14,14 @@ Result<ItemPlace> itemPlaceOf(const OperationContext& context, const URL& item) 
   if (!place) return fail(place.error());
   if (place->name.empty()) {
     const auto root = context.roots.locate(item.path());
-    const bool isRoot = root && root->relative.empty();
-    return fail(Error::posix(EPERM, isRoot ? "the root itself can't be changed"
-                                           : "it is not something in the documents that can be "
-                                             "changed"));
+    std::string why = "it is not something in the documents that can be changed";
+    if (root && root->relative.empty()) {
+      const bool isStorage = root->rootPath == context.roots.firstPath();
+      why = isStorage ? "the root itself can't be changed"
+                      : "the folder of an app library can't be changed itself; it comes and goes "
+                        "with its application";
+    }
+    return fail(Error::posix(EPERM, why));
   }
   return ItemPlace{{std::move(place->folder), std::move(place->folderPath)},
                    std::move(place->name)};
