@@ -3,6 +3,7 @@
 import os
 import pathlib
 import shutil
+import signal
 import subprocess
 import sys
 import tempfile
@@ -28,6 +29,11 @@ class Client:
     def __exit__(self, *_):
         self._process.terminate()
         self._process.communicate()
+
+    def interrupt(self):
+        """Ends it like Ctrl-C, and hands back its exit code."""
+        self._process.send_signal(signal.SIGINT)
+        return self._process.wait()
 
     def next_line(self):
         """The next thing that it says; an empty text where it has ended."""
@@ -112,6 +118,22 @@ class OtherExamples(unittest.TestCase):
                         private.environment) as follow:
                 keeps_up(self, follow, private.home / "Documents")
                 starts_over(self, follow, private)
+
+            self.follows_a_folder(private)
+
+    def follows_a_folder(self, private):
+        documents = private.home / "Documents"
+        (documents / "Letters/kept.txt").write_text("")
+        folder = private.run(bus.PROGRAM, "id", documents / "Letters").strip()
+        with Client([sys.executable, "-B", EXAMPLES / "python/follow.py", folder],
+                    private.environment) as follow:
+            self.assertEqual(follow.next_line(), "listed: 1 items\n")
+            (documents / "Letters/kept.txt").rename(documents / "left.txt")
+            self.assertEqual(follow.next_line(), "gone: kept.txt\n")
+            (documents / "left.txt").write_text("elsewhere")
+            (documents / "Letters/new.txt").write_text("")
+            self.assertEqual(follow.next_line(), "there: new.txt\n")
+            self.assertEqual(follow.interrupt(), 130)
 
     @unittest.skipUnless(shutil.which("jq"), "jq is not installed")
     def test_recent_changes_prints_what_happened_since_the_last_call(self):

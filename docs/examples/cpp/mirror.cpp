@@ -58,6 +58,8 @@ class Replica {
         if (const auto gone = items_.extract(identifier))
           std::cout << "gone: " << gone.mapped().filename << std::endl;
       }
+      // Of everything, which this follows, each is to be held. Of a folder, what has another parent
+      // would have to go: it has left, or never was in it.
       for (const auto& item : changes->updated) {
         items_[item.itemIdentifier] = item;
         std::cout << "there: " << item.filename << std::endl;

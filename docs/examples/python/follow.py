@@ -13,6 +13,8 @@ OBJECT = "/com/norvane/Vessel1"
 PROVIDER = "com.norvane.Vessel1.Provider"
 EXPIRED = "com.norvane.Vessel1.Error.SyncAnchorExpired"
 EVERYTHING = "VesselWorkingSetContainerItemIdentifier"
+# Containers that are made of several folders; any other is one folder.
+SETS = (EVERYTHING, "VesselAllDirectoriesContainerItemIdentifier")
 
 
 class Follower:
@@ -27,6 +29,14 @@ class Follower:
         return self.bus.call_sync(NAME, OBJECT, PROVIDER, method,
                                   GLib.Variant(signature, arguments), None,
                                   Gio.DBusCallFlags.NO_AUTO_START, GLib.MAXINT32, None).unpack()
+
+    def holds(self, item):
+        # The changes of a folder tell of things that lie elsewhere too: of what has left it.
+        return self.container in SETS or item["parentItemIdentifier"] == self.container
+
+    def forget(self, identifier):
+        if identifier in self.names:  # some it may never have known
+            print("gone:", self.names.pop(identifier), flush=True)
 
     def list_all(self):
         # The anchor comes first, so that what happens during the listing is told afterwards.
@@ -44,9 +54,11 @@ class Follower:
             updated, deleted, self.anchor, more = self.call("EnumerateChanges", "(say)",
                                                             self.container, self.anchor)
             for identifier in deleted:
-                if identifier in self.names:  # some it may never have known
-                    print("gone:", self.names.pop(identifier), flush=True)
+                self.forget(identifier)
             for item in updated:
+                if not self.holds(item):
+                    self.forget(item["itemIdentifier"])
+                    continue
                 self.names[item["itemIdentifier"]] = item["filename"]
                 print("there:", item["filename"], flush=True)
 
@@ -78,4 +90,7 @@ def main():
 
 
 if __name__ == "__main__":
-    main()
+    try:
+        main()
+    except KeyboardInterrupt:
+        sys.exit(130)  # as a shell has it of a program that SIGINT ended

@@ -1,6 +1,7 @@
 #!/bin/sh
 # Prints what has changed in a home's documents since this was last called: a line "there PATH" for
-# what was made, written or renamed, "gone IDENTIFIER" for what was deleted. The anchor in FILE says
+# what was made, written or renamed, "gone IDENTIFIER" for what was deleted. When a folder is renamed,
+# what lies in it has another path too, and the line of the folder alone says so. The anchor in FILE says
 # since when; the first call makes it, and prints everything. Needs jq.
 #
 # usage: recent-changes.sh FILE
