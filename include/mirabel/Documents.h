@@ -28,7 +28,11 @@ struct ItemPage {
 };
 
 /// What has changed: things as they are now, and the identifiers of those that have gone. Either
-/// may name what the client had been told already, or never knew. None is in both.
+/// may name what the client had been told already, or never knew. None is in both. Of a folder, or
+/// of the root, `updated` also names things that lie elsewhere, such as what has left it: a copy of
+/// one holds what has it as `parentItemIdentifier` and nothing else, so that an update with another
+/// parent takes a held item away. `path` is of the moment: when a folder is renamed, what lies in
+/// it is not told.
 struct ItemChanges {
   std::vector<ItemRecord> updated;
   std::vector<std::string> deleted;

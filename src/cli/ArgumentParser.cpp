@@ -19,8 +19,8 @@ constexpr const char* purpose =
     "renames, moves, atomic saves and restarts.";
 constexpr const char* itemHelp =
     "ITEM is the word root, an identifier or a path. What begins with fid=, did= or # and has\n"
-    "no / in it is an identifier: did=N for a document, fid=N for a folder, #bundle for the\n"
-    "documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
+    "no / in it is an identifier: did=N for a document, fid=N for a folder or anything else,\n"
+    "#bundle for the documents of an application. Everything else is a path; ./fid=3 is one.\n\n";
 const std::string containerHelp =
     "ITEM is the word root, a folder's identifier or path, workingset for everything, or alldirs\n"
     "for every folder.\n\n";
