@@ -53,7 +53,6 @@ class LocalAppLibraryCache {
   /// alone. The cache's token takes the file's where that is greater, and never goes down.
   [[nodiscard]] std::optional<Content> load();
 
-  [[nodiscard]] const URL& cacheURL() const { return cacheURL_; }
   [[nodiscard]] LocalAppLibraryCacheSource source() const { return source_; }
   /// For logs.
   [[nodiscard]] std::string description() const { return std::string(rawValue(source_)); }

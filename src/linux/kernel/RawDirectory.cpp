@@ -18,10 +18,6 @@ struct KernelEntry {
 };
 constexpr std::size_t nameOffset = offsetof(KernelEntry, type) + sizeof(KernelEntry::type);
 
-bool isDotOrDotDot(std::string_view name) {
-  return name == "." || name == "..";
-}
-
 }  // namespace
 
 RawDirectory::RawDirectory(UniqueFd folder, std::size_t bufferSize)
@@ -65,17 +61,6 @@ FileKind kindOfDirectoryType(unsigned char type) {
       return FileKind::symbolicLink;
     default:
       return FileKind::other;
-  }
-}
-
-Result<std::uint64_t> countEntries(UniqueFd folder) {
-  RawDirectory directory(std::move(folder));
-  std::uint64_t count = 0;
-  while (true) {
-    auto entry = directory.next();
-    if (!entry) return fail(entry.error());
-    if (!*entry) return count;
-    if (!isDotOrDotDot((*entry)->name)) ++count;
   }
 }
 

@@ -42,7 +42,4 @@ class RawDirectory {
 /// The kind that a directory record's type tells; `other` for DT_UNKNOWN.
 FileKind kindOfDirectoryType(unsigned char type);
 
-/// How many entries an open folder has, "." and ".." not counted. POSIX errors.
-[[nodiscard]] Result<std::uint64_t> countEntries(UniqueFd folder);
-
 }  // namespace mirabel
