@@ -151,7 +151,7 @@ class LocalVessel {
 
   void setLastUsedDate(const std::optional<Date>& date, std::string_view forItemIdentifier,
                        const ItemHandler& completionHandler);
-  /// Tags in the host's encoding, see items/TagData.h. Anything else is an empty list of tags.
+  /// Tags in the host's encoding, see mirabel/TagData.h. Anything else is an empty list of tags.
   void setTagData(const std::optional<Data>& tagData, std::string_view forItemIdentifier,
                   const ItemHandler& completionHandler);
   void setFavoriteRank(const std::optional<Number>& rank, std::string_view forItemIdentifier,

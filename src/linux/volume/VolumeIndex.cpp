@@ -389,10 +389,6 @@ class StoredVolumeIndex final : public VolumeIndex {
   std::unique_ptr<FollowThread> thread_;
 };
 
-}  // namespace
-
-namespace {
-
 Result<std::unique_ptr<VolumeIndex>> openOnce(MonitoredRoots& roots,
                                               const VolumeIndex::Options& options) {
   auto status = statusOf(options.volumePath);
