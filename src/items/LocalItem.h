@@ -60,7 +60,8 @@ class LocalItem {
   const std::optional<Data>& versionIdentifier() const { return versionIdentifier_; }
   bool isTrashed() const { return isTrashed_; }
   const std::optional<Date>& lastUsedDate() const { return lastUsedDate_; }
-  /// The host's encoding of the tags, see mirabel/TagData.h; empty for an attribute that holds none.
+  /// The host's encoding of the tags, see mirabel/TagData.h; empty for an attribute that holds
+  /// none.
   const std::optional<Data>& tagData() const { return tagData_; }
   const std::optional<Number>& favoriteRank() const { return favoriteRank_; }
   std::optional<std::uint64_t> fileID() const { return fileID_; }

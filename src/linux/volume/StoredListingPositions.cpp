@@ -2,26 +2,19 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdint>
 #include <fcntl.h>
+#include <string>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
+
+#include "linux/kernel/FileReplacement.h"
 
 namespace mirabel {
 namespace {
 
 constexpr const char* listingsFile = "listings";
-
-Result<void> writeAt(int file, const Data& bytes, std::size_t offset) {
-  for (std::size_t done = 0; done < bytes.size();) {
-    const ssize_t count =
-        ::pwrite(file, bytes.data() + done, bytes.size() - done, static_cast<off_t>(offset + done));
-    if (count < 0 && errno == EINTR) continue;
-    if (count <= 0) return fail(Error::posix(count < 0 ? errno : EIO));
-    done += static_cast<std::size_t>(count);
-  }
-  return {};
-}
 
 }  // namespace
 
@@ -39,8 +32,9 @@ Result<void> StoredListingPositions::keep(std::string_view container, const Data
   // Whatever becomes of the write, what was in the slot is gone.
   slot = {};
   Slot kept{++lastNumber_, std::string(container), cursor, position};
-  const auto at = static_cast<std::size_t>(&slot - slots_.data()) * slotSize;
-  if (auto written = writeAt(file_.get(), kept.encode(), at); !written) return written;
+  const auto at = (&slot - slots_.data()) * static_cast<std::int64_t>(slotSize);
+  if (auto written = writeAllAt(file_.get(), stringView(kept.encode()), at); !written)
+    return written;
   if (::fdatasync(file_.get()) != 0) return fail(Error::posix(errno, folder_.file(listingsFile)));
   slot = std::move(kept);
   return {};
@@ -85,7 +79,8 @@ Result<void> StoredListingPositions::make() {
   UniqueFd file(
       ::openat(directory, listingsFile, O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
   if (!file) return failure();
-  if (auto written = writeAt(file.get(), Data(slotCount * slotSize), 0); !written) return written;
+  if (auto written = writeAllAt(file.get(), std::string(slotCount * slotSize, '\0'), 0); !written)
+    return written;
   if (::fsync(file.get()) != 0 || ::fsync(directory) != 0) return failure();
   file_ = std::move(file);
   return {};
