@@ -71,7 +71,9 @@ class ContentsWalk {
       if (!status) return fail(status.error());
       contents.add(*status);
       if (status->kind != FileKind::folder) continue;
-      pending_.push_back(path.empty() ? name : path + "/" + name);
+      std::string& next = pending_.emplace_back(path);
+      if (!path.empty()) next += '/';
+      next += name;
     }
   }
 
