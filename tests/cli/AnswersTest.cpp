@@ -125,6 +125,7 @@ TEST_F(Answers, TheDoctorNamesEachFindingWithItsHealth) {
     home.setMode("", 0700);
   }
   fs::permissions(data + "/applications", fs::perms::owner_all);
+  home.setMode("closed", 0700);
   home.remove("");
   const Answer missing = run({"doctor"});
   EXPECT_EQ(missing.code, 1);
