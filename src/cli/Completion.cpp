@@ -110,6 +110,13 @@ std::string patternOf(const CLI::App& app, Value value) {
   return joined(found, "|");
 }
 
+/// The same of all that have a value, whichever.
+std::string patternOfAll(const CLI::App& app) {
+  return joined({patternOf(app, Value::text), patternOf(app, Value::folder),
+                 patternOf(app, Value::file), patternOf(app, Value::item)},
+                "|");
+}
+
 /// In single quotes, for any of the shells.
 std::string shellQuoted(std::string_view text) {
   std::string result = "'";
@@ -145,8 +152,7 @@ std::string forBash(const CLI::App& app) {
          "      case $word in\n"
          "        --) ended=1 ;;\n"
          "        " +
-         patternOf(app, Value::text) + "|" + patternOf(app, Value::folder) + "|" +
-         patternOf(app, Value::file) + "|" + patternOf(app, Value::item) +
+         patternOfAll(app) +
          ") expected=$word ;;\n"
          "      esac\n"
          "    fi\n"
@@ -217,8 +223,7 @@ std::string forZsh(const CLI::App& app) {
          "    case $word in\n"
          "      --) ended=1 ;;\n"
          "      " +
-         patternOf(app, Value::text) + "|" + patternOf(app, Value::folder) + "|" +
-         patternOf(app, Value::file) + "|" + patternOf(app, Value::item) +
+         patternOfAll(app) +
          ") expected=$word ;;\n"
          "    esac\n"
          "  fi\n"
